@@ -1,0 +1,7 @@
+# The same doors as ./run, for those whose fingers type make.
+COMMANDS := demo test build bench format lint install clean help
+
+.DEFAULT_GOAL := help
+.PHONY: $(COMMANDS)
+$(COMMANDS):
+	@./run $@

@@ -1,0 +1,96 @@
+# Compiler settings shared by all targets, and the two functions in which rooms and tests are declared.
+
+if(NOT CMAKE_BUILD_TYPE AND NOT CMAKE_CONFIGURATION_TYPES)
+  set(CMAKE_BUILD_TYPE Release CACHE STRING "Build type" FORCE)
+endif()
+
+set(CMAKE_CXX_STANDARD 20)
+set(CMAKE_CXX_STANDARD_REQUIRED ON)
+set(CMAKE_CXX_EXTENSIONS OFF)
+set(CMAKE_C_STANDARD 99)
+set(CMAKE_C_STANDARD_REQUIRED ON)
+set(CMAKE_C_EXTENSIONS OFF)
+set(CMAKE_EXPORT_COMPILE_COMMANDS ON)
+
+add_library(kz_settings INTERFACE)
+# Sums and products keep the bits that the source states: no contraction, no x87 registers.
+target_compile_options(kz_settings INTERFACE -ffp-contract=off)
+if(CMAKE_SYSTEM_PROCESSOR MATCHES "^(i[3-6]86|x86|x86_64|AMD64)$" AND CMAKE_SIZEOF_VOID_P EQUAL 4)
+  target_compile_options(kz_settings INTERFACE -msse2 -mfpmath=sse)
+endif()
+target_compile_options(kz_settings INTERFACE -Wall -Wextra -Wconversion -Wsign-conversion -Wshadow)
+if(KZ_WERROR)
+  target_compile_options(kz_settings INTERFACE -Werror)
+endif()
+if(KZ_SANITIZE)
+  target_compile_options(kz_settings INTERFACE -fsanitize=${KZ_SANITIZE} -fno-omit-frame-pointer
+                                               -fno-sanitize-recover=all)
+  target_link_options(kz_settings INTERFACE -fsanitize=${KZ_SANITIZE})
+endif()
+
+# kz_room(<name> [BELOW <room>...] HEADERS <public headers> SOURCES <files>)
+#
+# A room of the library becomes an object library. A room sees, and its tests link, only what is
+# named in BELOW and what lies below that: a call upwards does not link.
+function(kz_room name)
+  cmake_parse_arguments(PARSE_ARGV 1 room "" "" "BELOW;HEADERS;SOURCES")
+  set(target kz_${name})
+  add_library(${target} OBJECT ${room_SOURCES})
+  target_link_libraries(${target} PRIVATE kz_settings)
+  target_include_directories(${target} PRIVATE "${PROJECT_SOURCE_DIR}")
+  target_compile_options(${target} PRIVATE -fno-exceptions -fno-rtti)
+  set_target_properties(
+    ${target} PROPERTIES POSITION_INDEPENDENT_CODE ON CXX_VISIBILITY_PRESET hidden
+                         VISIBILITY_INLINES_HIDDEN ON)
+  set(closure ${name})
+  foreach(below IN LISTS room_BELOW)
+    get_property(lower GLOBAL PROPERTY KZ_ROOM_${below}_CLOSURE)
+    list(APPEND closure ${lower})
+  endforeach()
+  list(REMOVE_DUPLICATES closure)
+  set_property(GLOBAL PROPERTY KZ_ROOM_${name}_CLOSURE ${closure})
+  set_property(GLOBAL APPEND PROPERTY KZ_ROOMS ${name})
+  list(TRANSFORM room_HEADERS PREPEND "${CMAKE_CURRENT_SOURCE_DIR}/")
+  set_property(GLOBAL APPEND PROPERTY KZ_PUBLIC_HEADERS ${room_HEADERS})
+endfunction()
+
+# kz_test(<room>/<file>_test [ROOMS <room>...] [LIBS <target>...])
+#
+# Builds tests/<room>/<file>_test.cpp over the room's objects and everything below, with the
+# allocator wrapped so that tests can count blocks and make the n-th allocation fail, and registers
+# each of its test cases with CTest. ROOMS replaces the room taken from the path.
+function(kz_test path)
+  cmake_parse_arguments(PARSE_ARGV 1 test "" "" "ROOMS;LIBS;SOURCES")
+  get_filename_component(room "${path}" DIRECTORY)
+  get_filename_component(file "${path}" NAME)
+  string(REPLACE "/" "_" target "${room}/${file}")
+  if(NOT test_ROOMS)
+    set(test_ROOMS ${room})
+  endif()
+  set(objects "")
+  foreach(name IN LISTS test_ROOMS)
+    get_property(closure GLOBAL PROPERTY KZ_ROOM_${name}_CLOSURE)
+    list(APPEND objects ${closure})
+  endforeach()
+  list(REMOVE_DUPLICATES objects)
+  list(TRANSFORM objects PREPEND "kz_")
+  add_executable(${target} "${PROJECT_SOURCE_DIR}/tests/${path}.cpp" ${test_SOURCES})
+  target_link_libraries(${target} PRIVATE kz_settings ${objects} kz_test_support ${test_LIBS})
+  kz_register_test(${target})
+endfunction()
+
+# kz_public_test(<dir>/<file>_test [LIBS <target>...] [SOURCES <file>...])
+#
+# A test that sees the library as a user does: linked against the shared library, public names only.
+function(kz_public_test path)
+  cmake_parse_arguments(PARSE_ARGV 1 test "" "" "LIBS;SOURCES")
+  string(REPLACE "/" "_" target "${path}")
+  add_executable(${target} "${PROJECT_SOURCE_DIR}/tests/${path}.cpp" ${test_SOURCES})
+  target_link_libraries(${target} PRIVATE kz_settings kzsdk_shared GTest::gtest_main ${test_LIBS})
+  target_include_directories(${target} PRIVATE "${PROJECT_SOURCE_DIR}/tests")
+  kz_register_test(${target})
+endfunction()
+
+function(kz_register_test target)
+  gtest_discover_tests(${target} TEST_PREFIX "${target}." DISCOVERY_TIMEOUT 60 PROPERTIES TIMEOUT 600)
+endfunction()

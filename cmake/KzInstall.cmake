@@ -1,0 +1,52 @@
+# What `cmake --install` puts where: the libraries, the public headers, what find_package and
+# pkg-config look for, and the licence. The command-line program installs itself.
+include(CMakePackageConfigHelpers)
+
+install(
+  TARGETS kzsdk_shared kzsdk_static
+  EXPORT kzsdkTargets
+  ARCHIVE DESTINATION "${CMAKE_INSTALL_LIBDIR}"
+  LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}"
+  RUNTIME DESTINATION "${CMAKE_INSTALL_BINDIR}"
+  INCLUDES DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}")
+
+# Headers keep their place below kzsdk/, so that one spelling of an include serves in the tree and
+# out of it.
+get_property(public_headers GLOBAL PROPERTY KZ_PUBLIC_HEADERS)
+foreach(header IN LISTS public_headers ITEMS "${PROJECT_SOURCE_DIR}/kzsdk/kzsdk.h")
+  cmake_path(RELATIVE_PATH header BASE_DIRECTORY "${PROJECT_SOURCE_DIR}" OUTPUT_VARIABLE place)
+  cmake_path(GET place PARENT_PATH place)
+  install(FILES "${header}" DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}/${place}")
+endforeach()
+
+# find_package(kzsdk)
+set(package_dir "${CMAKE_INSTALL_LIBDIR}/cmake/kzsdk")
+install(
+  EXPORT kzsdkTargets
+  NAMESPACE kzsdk::
+  DESTINATION "${package_dir}")
+configure_package_config_file(
+  "${CMAKE_CURRENT_LIST_DIR}/kzsdkConfig.cmake.in" "${PROJECT_BINARY_DIR}/kzsdkConfig.cmake"
+  INSTALL_DESTINATION "${package_dir}" NO_SET_AND_CHECK_MACRO)
+write_basic_package_version_file("${PROJECT_BINARY_DIR}/kzsdkConfigVersion.cmake"
+                                 COMPATIBILITY SameMajorVersion)
+install(FILES "${PROJECT_BINARY_DIR}/kzsdkConfig.cmake"
+              "${PROJECT_BINARY_DIR}/kzsdkConfigVersion.cmake" DESTINATION "${package_dir}")
+
+# pkg-config: the file finds its prefix from its own place, so an installed tree can be moved.
+set(pkgconfig_dir "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
+if(IS_ABSOLUTE "${CMAKE_INSTALL_LIBDIR}" OR IS_ABSOLUTE "${CMAKE_INSTALL_INCLUDEDIR}")
+  set(KZ_PC_PREFIX "${CMAKE_INSTALL_PREFIX}")
+  set(KZ_PC_LIBDIR "${CMAKE_INSTALL_FULL_LIBDIR}")
+  set(KZ_PC_INCLUDEDIR "${CMAKE_INSTALL_FULL_INCLUDEDIR}")
+else()
+  file(RELATIVE_PATH up "/prefix/${pkgconfig_dir}" "/prefix")
+  string(REGEX REPLACE "/$" "" up "${up}")
+  set(KZ_PC_PREFIX "\${pcfiledir}/${up}")
+  set(KZ_PC_LIBDIR "\${prefix}/${CMAKE_INSTALL_LIBDIR}")
+  set(KZ_PC_INCLUDEDIR "\${prefix}/${CMAKE_INSTALL_INCLUDEDIR}")
+endif()
+configure_file("${CMAKE_CURRENT_LIST_DIR}/kzsdk.pc.in" "${PROJECT_BINARY_DIR}/kzsdk.pc" @ONLY)
+install(FILES "${PROJECT_BINARY_DIR}/kzsdk.pc" DESTINATION "${pkgconfig_dir}")
+
+install(FILES "${PROJECT_SOURCE_DIR}/LICENSE" DESTINATION "${CMAKE_INSTALL_DOCDIR}")

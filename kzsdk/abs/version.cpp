@@ -1,0 +1,23 @@
+#include "kzsdk/abs/version.h"
+
+// The dates are fixed: services that log these texts know them, and builds stay reproducible.
+
+const char* kz_abs_get_common_version() noexcept
+{
+    return "common-5";
+}
+
+const char* kz_abs_get_platspec_version() noexcept
+{
+    return "zonqa-abs-linux-5";
+}
+
+const char* kz_get_software_version() noexcept
+{
+    return "Device Software Version May 12 2011 00:44:31";
+}
+
+const char* kz_get_hardware_version() noexcept
+{
+    return "Device Hardware Version May 12 2011 00:44:31";
+}

@@ -1,0 +1,55 @@
+/**
+ * @file
+ * Discrete cosine transform, type II, in place.
+ */
+#ifndef KZSDK_DSP_DCT_H
+#define KZSDK_DSP_DCT_H
+
+#include "kzsdk/abs/base.h"
+
+KZ_C_BEGIN
+
+/** A fixed-point transform of one length. Read it, do not change it. */
+typedef struct KZDSP_DCT_fixed {
+    int32_t order;               /**< base-2 logarithm of the length */
+    uint32_t length;             /**< L: 16384 or 32768 points */
+    const int32_t* coefficients; /**< L butterfly factors; entry 0 is not used */
+    uint32_t owns_coefficients;  /**< always 0: the factors are constants */
+} KZDSP_DCT_fixed;
+
+/**
+ * Makes a transform of 2^@p order points.
+ *
+ * @param order  14 or 15.
+ * @return The transform, which the caller frees with KZDSP_DCT_fixed_destroy(); null for any other
+ *         order or when memory is short.
+ */
+KZ_API KZDSP_DCT_fixed* KZDSP_DCT_fixed_create(int32_t order) KZ_NOEXCEPT;
+
+/** Frees a transform; null is ignored. */
+KZ_API void KZDSP_DCT_fixed_destroy(KZDSP_DCT_fixed* dct) KZ_NOEXCEPT;
+
+/**
+ * Transforms the L words of @p data in place. Nothing happens when a pointer is null.
+ *
+ * With x the input, the output is
+ *
+ *     X[k] = (4 / L) sum over n of x[n] cos(pi (2n + 1) k / (2L))   for k >= 1
+ *     X[0] = (sum of x / L) * 185363 / 2^32
+ *
+ * less the roundings of log2(L) stages. Products are rounded towards minus infinity and sums
+ * gather that: low bins carry a bias of up to about L/2 (bin 1 the most), which is part of the result.
+ *
+ * Scaling:  no headroom is taken: the sum of any L / 2^s inputs that a stage adds must fit 32 bits,
+ *           else it wraps. Inputs below 2^31 / L in magnitude never wrap.
+ * Threads:  a transform holds no state of a call and may be shared.
+ *
+ * @param data  L words.
+ * @param mode  Accepted and ignored.
+ */
+KZ_API void KZDSP_DCT_fixed_compute(const KZDSP_DCT_fixed* dct, int32_t* data,
+                                    int32_t mode) KZ_NOEXCEPT;
+
+KZ_C_END
+
+#endif

@@ -1,0 +1,337 @@
+#include "kzsdk/dsp/fxp.h"
+
+#include <array>
+
+#include "kzsdk/dsp/fxp_ops.hpp"
+
+// The exported operations stay within 32-bit words and 16 by 16 bit products. Inner loops use the
+// inline forms of fxp_ops.hpp, which may take wider products and give the same words.
+
+namespace
+{
+
+using kz::fxp::leading_zeros;
+using kz::fxp::magnitude;
+using kz::fxp::normalised;
+using kz::fxp::Pair;
+using kz::fxp::shift_left;
+using kz::fxp::shift_right;
+using kz::fxp::wrap_add;
+using kz::fxp::wrap_negate;
+using kz::fxp::wrap_sub;
+
+constexpr uint32_t high_half(uint32_t word) noexcept
+{
+    return word >> 16;
+}
+constexpr uint32_t low_half(uint32_t word) noexcept
+{
+    return word & 0xffff;
+}
+constexpr int32_t signed_half(uint32_t half) noexcept
+{
+    return static_cast<int16_t>(half);
+}
+
+/// floor(a * half / 2^16) for a half in the range of 16 bits.
+constexpr int32_t word_times_half(int32_t a, int32_t half) noexcept
+{
+    const auto low = static_cast<int32_t>(low_half(static_cast<uint32_t>(a)));
+    return (a >> 16) * half + ((low * half) >> 16);
+}
+
+// A double word is shifted as two words, and the part that crosses the middle is shifted by
+// 32 - n. From n = 33 on that count is negative, so nothing crosses.
+
+template <class Long>
+constexpr Long shifted_right(Long x, int32_t n) noexcept
+{
+    const uint32_t crossing = shift_left(static_cast<uint32_t>(x.hi), wrap_sub(32, n));
+    return {.hi = shift_right(x.hi, n), .lo = shift_right(x.lo, n) + crossing};
+}
+
+template <class Long>
+constexpr Long shifted_left(Long x, int32_t n) noexcept
+{
+    const uint32_t crossing = shift_right(x.lo, wrap_sub(32, n));
+    const uint32_t hi = shift_left(static_cast<uint32_t>(x.hi), n) + crossing;
+    return {.hi = static_cast<decltype(x.hi)>(hi), .lo = shift_left(x.lo, n)};
+}
+
+template <class Long>
+constexpr Long shifted(Long x, int32_t n) noexcept
+{
+    return n < 0 ? shifted_right(x, wrap_negate(n)) : shifted_left(x, n);
+}
+
+/// The carry comes from the sum of the low 31 bits and the two top bits, which fit in a word.
+constexpr FxpUTypeLong sum(FxpUTypeLong a, FxpUTypeLong b) noexcept
+{
+    const uint32_t low_bits = (a.lo & 0x7fffffff) + (b.lo & 0x7fffffff);
+    const uint32_t carry = ((a.lo >> 31) + (b.lo >> 31) + (low_bits >> 31)) >> 1;
+    return {.hi = a.hi + b.hi + carry, .lo = a.lo + b.lo};
+}
+
+constexpr FxpUTypeLong negated(FxpUTypeLong x) noexcept
+{
+    return {.hi = ~x.hi + (x.lo == 0 ? 1u : 0u), .lo = 0u - x.lo};
+}
+
+constexpr FxpUTypeLong widened(uint32_t word) noexcept
+{
+    return {.hi = 0, .lo = word};
+}
+
+constexpr FxpTypeLong as_signed(FxpUTypeLong x) noexcept
+{
+    return {.hi = static_cast<int32_t>(x.hi), .lo = x.lo};
+}
+
+constexpr FxpUTypeLong product(uint32_t a, uint32_t b) noexcept
+{
+    const uint32_t ah = high_half(a);
+    const uint32_t al = low_half(a);
+    const uint32_t bh = high_half(b);
+    const uint32_t bl = low_half(b);
+    const FxpUTypeLong cross = sum(widened(ah * bl), widened(bh * al));
+    const FxpUTypeLong upper = sum(shifted_left(widened(ah * bh), 16), cross);
+    return sum(shifted_left(upper, 16), widened(al * bl));
+}
+
+/// The high word of product(), with only the carry of the low parts kept.
+constexpr uint32_t product_high(uint32_t a, uint32_t b) noexcept
+{
+    const uint32_t ah = high_half(a);
+    const uint32_t al = low_half(a);
+    const uint32_t bh = high_half(b);
+    const uint32_t bl = low_half(b);
+    const uint32_t middle = high_half(al * bl) + low_half(ah * bl) + low_half(bh * al);
+    return ah * bh + high_half(ah * bl) + high_half(bh * al) + high_half(middle);
+}
+
+struct Aligned {
+    int32_t first;
+    int32_t second;
+    int32_t exponent;
+};
+
+/// A value that lies 31 octaves or more below the other is taken as 0, also when it is negative:
+/// the sign fill would make -1 of it.
+constexpr int32_t lowered(int32_t mantissa, uint32_t octaves) noexcept
+{
+    return octaves < 31 ? mantissa >> octaves : 0;
+}
+
+/// Normalises both pairs and brings them to the larger exponent.
+constexpr Aligned aligned(Pair a, Pair b) noexcept
+{
+    a = normalised(a);
+    b = normalised(b);
+    const int32_t apart = wrap_sub(a.exponent, b.exponent);
+    if (apart < 0) {
+        return {lowered(a.mantissa, magnitude(apart)), b.mantissa, b.exponent};
+    }
+    return {a.mantissa, lowered(b.mantissa, magnitude(apart)), a.exponent};
+}
+
+/// 1/X in Q31 at the middle of each of the 64 segments of [0.5, 1), to start Newton's iteration.
+constexpr auto kReciprocalSeeds = [] {
+    std::array<uint32_t, 64> seeds{};
+    for (uint32_t i = 0; i < seeds.size(); ++i) {
+        seeds[i] = static_cast<uint32_t>((uint64_t{1} << 39) / (2 * i + 129));
+    }
+    return seeds;
+}();
+static_assert(kReciprocalSeeds.front() == 0xfe03f80f && kReciprocalSeeds.back() == 0x80808080);
+
+constexpr uint32_t reciprocal(uint32_t x) noexcept
+{
+    uint32_t y = kReciprocalSeeds[(x & 0x7fffffff) >> 25];
+    for (int step = 0; step < 3; ++step) {
+        const uint32_t residue = 0u - product_high(x, y); // 2 - XY, in units of 2^-31
+        y = 2 * product_high(residue, y);
+    }
+    return y;
+}
+
+} // namespace
+
+FxpType KZDSP_SmulWLo_SW_SL(FxpType a, FxpType b) noexcept
+{
+    return word_times_half(a, signed_half(low_half(static_cast<uint32_t>(b))));
+}
+
+FxpType KZDSP_SmulWHi_SW_SL(FxpType a, FxpType b) noexcept
+{
+    return word_times_half(a, b >> 16);
+}
+
+FxpType KZDSP_SmulAddWLo_SW_SL(FxpType a, FxpType b, FxpType acc) noexcept
+{
+    return wrap_add(KZDSP_SmulWLo_SW_SL(a, b), acc);
+}
+
+FxpType KZDSP_SmulAddWHi_SW_SL(FxpType a, FxpType b, FxpType acc) noexcept
+{
+    return wrap_add(KZDSP_SmulWHi_SW_SL(a, b), acc);
+}
+
+FxpTypeLong KZDSP_RSHFT_FxpTypeLong(int32_t hi, uint32_t lo, int32_t count) noexcept
+{
+    return shifted_right(FxpTypeLong{hi, lo}, count);
+}
+
+FxpTypeLong KZDSP_LSHFT_FxpTypeLong(int32_t hi, uint32_t lo, int32_t count) noexcept
+{
+    return shifted_left(FxpTypeLong{hi, lo}, count);
+}
+
+FxpTypeLong KZDSP_SHFT_FxpTypeLong(int32_t hi, uint32_t lo, int32_t count) noexcept
+{
+    return shifted(FxpTypeLong{hi, lo}, count);
+}
+
+FxpUTypeLong KZDSP_RSHFT_FxpUTypeLong(uint32_t hi, uint32_t lo, int32_t count) noexcept
+{
+    return shifted_right(FxpUTypeLong{hi, lo}, count);
+}
+
+FxpUTypeLong KZDSP_LSHFT_FxpUTypeLong(uint32_t hi, uint32_t lo, int32_t count) noexcept
+{
+    return shifted_left(FxpUTypeLong{hi, lo}, count);
+}
+
+FxpUTypeLong KZDSP_SHFT_FxpUTypeLong(uint32_t hi, uint32_t lo, int32_t count) noexcept
+{
+    return shifted(FxpUTypeLong{hi, lo}, count);
+}
+
+FxpType KZDSP_ADD_FxpType(FxpType a, FxpType b) noexcept
+{
+    return wrap_add(a, b);
+}
+
+FxpType KZDSP_SUB_FxpType(FxpType a, FxpType b) noexcept
+{
+    return wrap_sub(a, b);
+}
+
+FxpTypeLong KZDSP_ADD_FxpTypeLong(int32_t hi1, uint32_t lo1, int32_t hi2, uint32_t lo2) noexcept
+{
+    return as_signed(sum({static_cast<uint32_t>(hi1), lo1}, {static_cast<uint32_t>(hi2), lo2}));
+}
+
+FxpUTypeLong KZDSP_ADD_FxpUTypeLong(uint32_t hi1, uint32_t lo1, uint32_t hi2, uint32_t lo2) noexcept
+{
+    return sum({hi1, lo1}, {hi2, lo2});
+}
+
+FxpType KZDSP_ALIGNED_SUB_FxpType(FxpType m1, int32_t e1, FxpType m2, int32_t e2,
+                                  int32_t* exponent) noexcept
+{
+    const Aligned pairs = aligned({m1, e1}, {m2, e2});
+    *exponent = pairs.exponent;
+    return wrap_sub(pairs.first, pairs.second);
+}
+
+FxpType KZDSP_MUL_POW2_FxpType(FxpType m, int32_t k) noexcept
+{
+    return shift_left(m, k);
+}
+
+FxpTypeLong KZDSP_SMUL_FxpTypeLong(FxpType a, FxpType b) noexcept
+{
+    const FxpUTypeLong size = product(magnitude(a), magnitude(b));
+    return as_signed((a ^ b) < 0 ? negated(size) : size);
+}
+
+FxpUTypeLong KZDSP_UMUL_FxpUTypeLong(FxpUType a, FxpUType b) noexcept
+{
+    return product(a, b);
+}
+
+FxpUTypeLong KZDSP_UMUL_FxpUTypeLong2(uint32_t hi, uint32_t lo, FxpUType b) noexcept
+{
+    return sum(product(hi, b), widened(product_high(lo, b)));
+}
+
+FxpType KZDSP_SMUL_HIGH_FxpType(FxpType a, FxpType b) noexcept
+{
+    const uint32_t high = product_high(magnitude(a), magnitude(b));
+    return static_cast<FxpType>((a ^ b) < 0 ? 0u - high : high);
+}
+
+FxpUType KZDSP_UMUL_HIGH_FxpUType(FxpUType a, FxpUType b) noexcept
+{
+    return product_high(a, b);
+}
+
+FxpType KZDSP_SaturateAbsFxpType(FxpType x) noexcept
+{
+    return kz::fxp::saturate_abs(x);
+}
+
+int32_t kz_abs(int32_t x) noexcept
+{
+    return static_cast<int32_t>(magnitude(x));
+}
+
+int32_t KZDSP_CountLeadingZeros(uint32_t x) noexcept
+{
+    return leading_zeros(x);
+}
+
+uint32_t KZDSP_clp2(uint32_t x) noexcept
+{
+    return kz::fxp::next_power_of_two(x);
+}
+
+int32_t KZDSP_LESS_FxpType(FxpType m1, int32_t e1, FxpType m2, int32_t e2) noexcept
+{
+    if ((m1 ^ m2) < 0) {
+        return m1 < m2;
+    }
+    const Aligned pairs = aligned({m1, e1}, {m2, e2});
+    return pairs.first < pairs.second;
+}
+
+int32_t KZDSP_LESSEQ_FxpType(FxpType m1, int32_t e1, FxpType m2, int32_t e2) noexcept
+{
+    if ((m1 ^ m2) < 0) {
+        return m1 <= m2;
+    }
+    const Aligned pairs = aligned({m1, e1}, {m2, e2});
+    return pairs.first <= pairs.second;
+}
+
+int32_t KZDSP_LESS_FxpUType(FxpUType m1, int32_t e1, FxpUType m2, int32_t e2) noexcept
+{
+    const int32_t spare1 = m1 != 0 ? leading_zeros(m1) : 0;
+    const int32_t spare2 = m2 != 0 ? leading_zeros(m2) : 0;
+    const uint32_t first = m1 << spare1;
+    const uint32_t second = m2 << spare2;
+    const int32_t apart = wrap_sub(wrap_sub(e1, spare1), wrap_sub(e2, spare2));
+    const uint32_t octaves = magnitude(apart);
+    const auto lower = [octaves](uint32_t m) { return octaves < 32 ? m >> octaves : 0; };
+    return apart < 0 ? lower(first) < second : first < lower(second);
+}
+
+FxpUType KZDSP_Reciprocal(FxpUType x) noexcept
+{
+    return reciprocal(x);
+}
+
+FxpUType KZDSP_ReciprocalWithScaling(FxpUType x, int32_t* shift) noexcept
+{
+    *shift = leading_zeros(x);
+    return reciprocal(shift_left(x, *shift));
+}
+
+FxpUType KZDSP_UIntRatio_FxpUType(FxpUType a, FxpUType b, int32_t* exponent) noexcept
+{
+    int32_t b_shift = 0;
+    const uint32_t inverse = KZDSP_ReciprocalWithScaling(b, &b_shift);
+    const int32_t a_shift = leading_zeros(a);
+    *exponent = b_shift - a_shift + 1;
+    return product_high(shift_left(a, a_shift), inverse);
+}

@@ -1,0 +1,153 @@
+/// @file
+/// What the fixed-point and the floating-point resampler share: lengths, the history and the block
+/// protocol. A twin brings its record, whose fields have the same names, and its dot products.
+///
+/// One output is made from the newest P samples, P being the taps of one phase. Samples of earlier
+/// blocks wait in `history`, those of this block lie in `input`:
+///
+///        history                     input
+///     |......|============|       |===========|......................|
+///          start         end
+///            |<-pending-->|       |<--need--->|        pending + need = P
+///
+/// While `pending` is positive the sum runs over both pieces, newest sample first. Once the window
+/// has left the history, that is emptied, and every later window lies in `input` alone.
+#pragma once
+
+#include <algorithm>
+#include <cassert>
+#include <cstdint>
+#include <limits>
+#include <span>
+
+namespace kz::dsp
+{
+
+constexpr uint32_t saturated_to_word(uint64_t value) noexcept
+{
+    return static_cast<uint32_t>(std::min<uint64_t>(value, std::numeric_limits<uint32_t>::max()));
+}
+
+template <class Resampler>
+uint32_t resampled_length(const Resampler& r, uint32_t count) noexcept
+{
+    return saturated_to_word(uint64_t{count} * r.up / r.down);
+}
+
+template <class Resampler>
+uint32_t raw_length(const Resampler& r, uint32_t count) noexcept
+{
+    return saturated_to_word((uint64_t{count} * r.down + r.up - 1) / r.up);
+}
+
+template <class Resampler>
+bool copies(const Resampler& r) noexcept
+{
+    return r.up == 1 && r.down == 1;
+}
+
+/// Starts a stream over a history of `delay` zeros.
+template <class Resampler>
+void restart(Resampler& r, uint32_t delay) noexcept
+{
+    assert(delay <= r.taps_per_phase);
+    r.phase = 0;
+    r.history_start = 0;
+    r.history_end = delay;
+    std::fill_n(r.history, delay, 0);
+}
+
+/// Input samples that are still missing for the next output.
+template <class Resampler>
+uint32_t need(const Resampler& r) noexcept
+{
+    return r.taps_per_phase - (r.history_end - r.history_start);
+}
+
+/// Input samples that a call with plenty of input and room for `outputs` would consume.
+template <class Resampler>
+uint32_t input_for(const Resampler& r, uint32_t outputs) noexcept
+{
+    if (copies(r)) {
+        return outputs;
+    }
+    return saturated_to_word(need(r) + (r.phase + uint64_t{outputs} * r.down) / r.up);
+}
+
+/// The phase after `outputs` more outputs.
+template <class Resampler>
+uint32_t phase_after(const Resampler& r, uint32_t outputs) noexcept
+{
+    return static_cast<uint32_t>((r.phase + uint64_t{outputs} * r.down) % r.up);
+}
+
+struct BlockCounts {
+    uint32_t consumed;
+    uint32_t produced;
+};
+
+template <class Sample>
+BlockCounts copy_block(std::span<const Sample> input, std::span<Sample> output) noexcept
+{
+    const auto count = static_cast<uint32_t>(std::min(input.size(), output.size()));
+    std::copy_n(input.begin(), count, output.begin());
+    return {count, count};
+}
+
+/// Drops the samples before `history_start` and appends `tail`.
+template <class Resampler, class Sample>
+void keep_tail(Resampler& r, std::span<const Sample> tail) noexcept
+{
+    if (r.history_start > 0) {
+        std::copy(r.history + r.history_start, r.history + r.history_end, r.history);
+        r.history_end -= r.history_start;
+        r.history_start = 0;
+    }
+    assert(r.history_end + tail.size() <= r.taps_per_phase);
+    std::copy(tail.begin(), tail.end(), r.history + r.history_end);
+    r.history_end += static_cast<uint32_t>(tail.size());
+}
+
+/// Resamples one block.
+///
+/// @param inside  (oldest sample of the window, phase) -> output, for a window inside the block.
+/// @param across  (newer samples, older samples, phase) -> output, for a window that reaches into the
+///                history; both spans run forwards in time, and the newer one may be empty.
+template <class Resampler, class Sample, class Inside, class Across>
+BlockCounts resample_block(Resampler& r, std::span<const Sample> input, std::span<Sample> output,
+                           Inside inside, Across across) noexcept
+{
+    const uint32_t window = r.taps_per_phase;
+    const auto available = static_cast<uint32_t>(input.size());
+    uint32_t needed = need(r);
+    uint32_t oldest = 0; // first sample of the block that is still needed
+    uint32_t produced = 0;
+    while (produced < output.size() && needed <= available) {
+        // The phase advances before the taps are read and the window moves after: each output is
+        // up to one input sample off its ideal time, and this is how the stream is defined.
+        const uint32_t t = r.phase + r.down;
+        const uint32_t step = t / r.up;
+        r.phase = t % r.up;
+        const uint32_t pending = r.history_end - r.history_start;
+        if (pending == 0) {
+            output[produced] = inside(input.data() + oldest, r.phase);
+            oldest += step;
+        } else {
+            const std::span<const Sample> older(r.history + r.history_start, pending);
+            output[produced] = across(input.first(window - pending), older, r.phase);
+            r.history_start += step;
+            if (step >= pending) {
+                r.history_start = 0;
+                r.history_end = 0;
+                oldest = step - pending;
+            }
+        }
+        ++produced;
+        needed += step;
+    }
+    const uint32_t consumed = std::min(needed, available);
+    keep_tail(r, input.subspan(oldest, consumed - oldest));
+    return {consumed, produced};
+}
+
+} // namespace kz::dsp

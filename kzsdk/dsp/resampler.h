@@ -1,0 +1,175 @@
+/**
+ * @file
+ * Sample-rate conversion to the working rate.
+ *
+ * A resampler takes a mono stream block by block and keeps the tail of the input that later outputs
+ * still need. It is a polyphase filter: with L the up and M the down factor of the ratio, each output
+ * is one dot product of the newest P samples with every L-th tap of a low-pass prototype.
+ *
+ * Threads: one thread per resampler at a time; the tables are constants and shared.
+ */
+#ifndef KZSDK_DSP_RESAMPLER_H
+#define KZSDK_DSP_RESAMPLER_H
+
+#include "kzsdk/abs/base.h"
+#include "kzsdk/dsp/fxp.h"
+
+KZ_C_BEGIN
+
+/** A fixed-point resampler. Read it, do not change it. */
+typedef struct KZDSP_resampler_fixed {
+    uint32_t up;             /**< L */
+    uint32_t down;           /**< M */
+    uint32_t taps_per_phase; /**< P; 0 when samples are only copied */
+    uint32_t length;         /**< taps of the prototype, a multiple of L; 0 when copying */
+    const uint16_t* lsb;     /**< low halves of the taps */
+    const int16_t* msb;      /**< high halves of the taps */
+    uint32_t phase;          /**< 0 .. L - 1 */
+    FxpType* history;        /**< owned; room for P samples */
+    uint32_t history_start;  /**< oldest sample still needed */
+    uint32_t history_end;    /**< samples stored */
+} KZDSP_resampler_fixed;
+
+/**
+ * Makes a resampler between two rates.
+ *
+ * @param input_rate   Q15: hertz times 32768. 8000, 16000, 22050, 24000, 32000, 44100 or 48000 Hz.
+ * @param output_rate  Q15: 11025 Hz. Two further pairs are known: 2 and 1 "Hz", which halves any
+ *                     rate, and equal rates, which copy.
+ * @return The resampler, which the caller frees with KZDSP_resampler_fixed_destroy(); null for a
+ *         rate of 0, any other pair, or when memory is short.
+ */
+KZ_API KZDSP_resampler_fixed* KZDSP_resampler_fixed_create(uint32_t input_rate,
+                                                           uint32_t output_rate) KZ_NOEXCEPT;
+
+/** Frees a resampler; null is ignored. */
+KZ_API void KZDSP_resampler_fixed_destroy(KZDSP_resampler_fixed* resampler) KZ_NOEXCEPT;
+
+/**
+ * Starts a new stream: phase 0, and a history of zeros half a filter long, so that the first outputs
+ * are centred on the first inputs. Null is ignored.
+ */
+KZ_API void KZDSP_resampler_fixed_reset(KZDSP_resampler_fixed* resampler) KZ_NOEXCEPT;
+
+/**
+ * The outputs that @p count more inputs yield at most: count * L / M, truncated.
+ *
+ * @return 0 for a null resampler; 2^32 - 1 where the number does not fit.
+ */
+KZ_API uint32_t KZDSP_resampler_fixed_compute_resampled_length(
+    const KZDSP_resampler_fixed* resampler, uint32_t count) KZ_NOEXCEPT;
+
+/**
+ * The inputs that @p count outputs need: (count * M + L - 1) / L, truncated.
+ *
+ * @return 0 for a null resampler; 2^32 - 1 where the number does not fit.
+ */
+KZ_API uint32_t KZDSP_resampler_fixed_compute_raw_length(const KZDSP_resampler_fixed* resampler,
+                                                         uint32_t count) KZ_NOEXCEPT;
+
+/**
+ * Resamples one block.
+ *
+ * A stream may be cut into blocks of any length, with any capacities: no sample is lost or repeated
+ * and the number of outputs does not change. The words do not depend on the cuts at equal rates. At
+ * other rates an output is made by one of two rounding rules, depending on whether its window
+ * reaches into an earlier block:
+ *
+ * - across a cut each product is rounded down on its own, from all its bits;
+ * - inside a block products are formed from 16-bit halves without low times low, and at 22050 and
+ *   44100 Hz from the sum of the two samples that share a tap.
+ *
+ * So a cut may change an output by up to 2 units in the last place per tap: at most 2 * P, upwards
+ * only, for L > 1; 22 units either way at 22050 Hz and for halving, 62 at 44100 Hz. This holds as
+ * long as the 32-bit sum of the two cross products in the second rule does not wrap. It can wrap for
+ * down-mixed stereo near full scale at 8000, 16000, 22050 and 44100 Hz; an output then moves by a
+ * multiple of 2^17 (L > 1) or 2^16.
+ *
+ * Timing: the phase advances before the taps are read and the window moves after, which places each
+ * output up to one input sample beside its ideal time.
+ *
+ * Scaling:  22050 and 44100 Hz and halving leave at half level (-6 dB), 8000 Hz at 0.688 of full
+ *           level, other rates at full level. Sums wrap at 32 bits; nothing saturates.
+ * Cost:     one product per tap of a phase for each output. Never allocates.
+ *
+ * @param input           `input_count` mono samples, Q29 or Q30.
+ * @param output          Room for `output_capacity` samples, apart from `input`.
+ * @param[out] consumed   Samples taken, 0 .. `input_count`. Offer the rest again.
+ * @param[out] produced   Samples written, 0 .. `output_capacity`.
+ *
+ * A null resampler takes and writes nothing; a null array counts as one of no samples; a null count
+ * is not written.
+ */
+KZ_API void KZDSP_resampler_fixed_resample(KZDSP_resampler_fixed* resampler, const FxpType* input,
+                                           uint32_t input_count, FxpType* output,
+                                           uint32_t output_capacity, uint32_t* consumed,
+                                           uint32_t* produced) KZ_NOEXCEPT;
+
+/**
+ * Dot product of two runs of samples, both walked backwards, with one run of taps, walked forwards.
+ *
+ * Each product of a sample and a Q31 tap is exact; its bits from 32 - @p shift up are added, modulo
+ * 2^32. The result has the samples' scale for shift 1, half of it for shift 0.
+ *
+ * @param first         Newest sample of the first run, `first[0]`, `first[-1]`, ...
+ * @param second        Newest sample of the second run; read only when @p second_count is not 0.
+ * @param msb, lsb      Halves of the first tap.
+ * @param stride        Distance from one tap to the next.
+ * @param shift         0 .. 31; more gives products of 0.
+ * @return The sum; 0 when there are samples but a table or an array is null.
+ */
+KZ_API FxpType KZDSP_DualConvolveFixed(const FxpType* first, uint32_t first_count,
+                                       const FxpType* second, uint32_t second_count,
+                                       const int16_t* msb, const uint16_t* lsb, uint32_t stride,
+                                       int32_t shift) KZ_NOEXCEPT;
+
+/*
+ * The prototypes of the seven rates: high halves, low halves (tap i is msb[i] * 65536 + lsb[i], Q31)
+ * and number of taps. The tables are constants of the library.
+ */
+/** High halves of the taps for 8000 Hz. */
+KZ_API const int16_t* kzdsp_get_8000_11025_fixed_coeff_msb(void) KZ_NOEXCEPT;
+/** Low halves of the taps for 8000 Hz. */
+KZ_API const uint16_t* kzdsp_get_8000_11025_fixed_coeff_lsb(void) KZ_NOEXCEPT;
+/** Number of taps for 8000 Hz. */
+KZ_API uint32_t kzdsp_get_8000_11025_fixed_coeff_length(void) KZ_NOEXCEPT;
+/** High halves of the taps for 16000 Hz. */
+KZ_API const int16_t* kzdsp_get_16000_11025_fixed_coeff_msb(void) KZ_NOEXCEPT;
+/** Low halves of the taps for 16000 Hz. */
+KZ_API const uint16_t* kzdsp_get_16000_11025_fixed_coeff_lsb(void) KZ_NOEXCEPT;
+/** Number of taps for 16000 Hz. */
+KZ_API uint32_t kzdsp_get_16000_11025_fixed_coeff_length(void) KZ_NOEXCEPT;
+/** High halves of the taps for 22050 Hz. */
+KZ_API const int16_t* kzdsp_get_22050_11025_fixed_coeff_msb(void) KZ_NOEXCEPT;
+/** Low halves of the taps for 22050 Hz. */
+KZ_API const uint16_t* kzdsp_get_22050_11025_fixed_coeff_lsb(void) KZ_NOEXCEPT;
+/** Number of taps for 22050 Hz. */
+KZ_API uint32_t kzdsp_get_22050_11025_fixed_coeff_length(void) KZ_NOEXCEPT;
+/** High halves of the taps for 24000 Hz. */
+KZ_API const int16_t* kzdsp_get_24000_11025_fixed_coeff_msb(void) KZ_NOEXCEPT;
+/** Low halves of the taps for 24000 Hz. */
+KZ_API const uint16_t* kzdsp_get_24000_11025_fixed_coeff_lsb(void) KZ_NOEXCEPT;
+/** Number of taps for 24000 Hz. */
+KZ_API uint32_t kzdsp_get_24000_11025_fixed_coeff_length(void) KZ_NOEXCEPT;
+/** High halves of the taps for 32000 Hz. */
+KZ_API const int16_t* kzdsp_get_32000_11025_fixed_coeff_msb(void) KZ_NOEXCEPT;
+/** Low halves of the taps for 32000 Hz. */
+KZ_API const uint16_t* kzdsp_get_32000_11025_fixed_coeff_lsb(void) KZ_NOEXCEPT;
+/** Number of taps for 32000 Hz. */
+KZ_API uint32_t kzdsp_get_32000_11025_fixed_coeff_length(void) KZ_NOEXCEPT;
+/** High halves of the taps for 44100 Hz. */
+KZ_API const int16_t* kzdsp_get_44100_11025_fixed_coeff_msb(void) KZ_NOEXCEPT;
+/** Low halves of the taps for 44100 Hz. */
+KZ_API const uint16_t* kzdsp_get_44100_11025_fixed_coeff_lsb(void) KZ_NOEXCEPT;
+/** Number of taps for 44100 Hz. */
+KZ_API uint32_t kzdsp_get_44100_11025_fixed_coeff_length(void) KZ_NOEXCEPT;
+/** High halves of the taps for 48000 Hz. */
+KZ_API const int16_t* kzdsp_get_48000_11025_fixed_coeff_msb(void) KZ_NOEXCEPT;
+/** Low halves of the taps for 48000 Hz. */
+KZ_API const uint16_t* kzdsp_get_48000_11025_fixed_coeff_lsb(void) KZ_NOEXCEPT;
+/** Number of taps for 48000 Hz. */
+KZ_API uint32_t kzdsp_get_48000_11025_fixed_coeff_length(void) KZ_NOEXCEPT;
+
+KZ_C_END
+
+#endif

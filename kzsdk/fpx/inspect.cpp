@@ -1,0 +1,44 @@
+#include "kzsdk/fpx/inspect.hpp"
+
+#include "kzsdk/fpx/algorithm.hpp"
+#include "kzsdk/qv/frame_pump.hpp"
+#include "kzsdk/qvfixed/qvfixed.h"
+
+namespace kz::fpx
+{
+
+namespace
+{
+
+// Hands the handle's instance, as what it is, to `use`.
+template <class Use>
+auto visit(const kz_fpx_handle& handle, Use use) noexcept
+{
+    return use(*static_cast<const kzqvfixed_fingerprinter*>(handle.instance));
+}
+
+} // namespace
+
+uint32_t next_block_frames(const kz_fpx_handle& handle) noexcept
+{
+    return visit(handle, [](const auto& object) { return qv::next_step_frames(object); });
+}
+
+uint32_t signal_offset(const kz_fpx_handle& handle) noexcept
+{
+    return visit(handle, [](const auto& object) { return object.signal_offset; });
+}
+
+bool signal_found(const kz_fpx_handle& handle) noexcept
+{
+    return visit(handle, [](const auto& object) { return object.searching_for_signal == 0; });
+}
+
+uint32_t percent_progress(const kz_fpx_handle& handle) noexcept
+{
+    return visit(handle, [](const auto& object) {
+        return kzqvfixed_frame_manager_get_percent_progress(object.frame_manager);
+    });
+}
+
+} // namespace kz::fpx

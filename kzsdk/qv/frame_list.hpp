@@ -1,0 +1,88 @@
+/// @file
+/// The frame manager's list of feature records, and the rules by which frames are skipped and limited.
+/// A twin brings its manager and record, whose fields have the same names.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <new>
+#include <type_traits>
+
+#include "kzsdk/abs/owned.hpp"
+
+namespace kz::qv
+{
+
+template <class Manager>
+bool reached_limit(const Manager& manager) noexcept
+{
+    return manager.frame_limit != 0 && manager.frame_count >= manager.frame_limit;
+}
+
+/// Whether the next frame is to be analysed. Counts down the frames to skip.
+template <class Manager>
+bool admits_frame(Manager& manager) noexcept
+{
+    if (manager.skip_remaining != 0) {
+        --manager.skip_remaining;
+        return false;
+    }
+    return !reached_limit(manager);
+}
+
+/// Allocates a record with room for `bands` values of each kind, in one block.
+template <class Record>
+owned<Record> make_frame_record(uint32_t bands) noexcept
+{
+    using Energy = std::remove_pointer_t<decltype(Record::energy)>;
+    using Amplitude = std::remove_pointer_t<decltype(Record::amplitude)>;
+    static_assert(sizeof(Record) % alignof(Energy) == 0 &&
+                  sizeof(Energy) % alignof(Amplitude) == 0);
+    const uint64_t energies = uint64_t{bands} * sizeof(Energy);
+    auto block =
+        make_array<std::byte>(sizeof(Record) + energies + uint64_t{bands} * sizeof(Amplitude));
+    if (!block) {
+        return nullptr;
+    }
+    std::byte* const first = block.get();
+    auto* const record = new (block.release()) Record{};
+    record->energy = reinterpret_cast<Energy*>(first + sizeof(Record));
+    record->amplitude = reinterpret_cast<Amplitude*>(first + sizeof(Record) + energies);
+    return owned<Record>(record);
+}
+
+template <class Manager, class Record>
+void append_record(Manager& manager, owned<Record> record) noexcept
+{
+    record->next = nullptr;
+    *manager.records_tail = record.get();
+    manager.records_tail = &record->next;
+    static_cast<void>(record.release());
+    ++manager.frame_count;
+    manager.fingerprint_ready = 0;
+}
+
+/// Empties the list.
+template <class Manager>
+void drop_records(Manager& manager) noexcept
+{
+    for (auto* record = manager.records; record != nullptr;) {
+        auto* const next = record->next;
+        static_cast<void>(_kzmem_free(record));
+        record = next;
+    }
+    manager.records = nullptr;
+    manager.records_tail = &manager.records;
+    manager.frame_count = 0;
+    manager.fingerprint_ready = 0;
+}
+
+/// Back to the state after creation.
+template <class Manager>
+void reset_frames(Manager& manager) noexcept
+{
+    drop_records(manager);
+    manager.skip_remaining = manager.skip_frames;
+}
+
+} // namespace kz::qv

@@ -1,0 +1,205 @@
+/// @file
+/// The fingerprinters' feed loop: bytes -> mono samples -> working rate -> ring -> overlapping frames.
+///
+/// Both twins run this loop over their own object, whose fields have the same names. A twin brings a
+/// `Twin` type with
+///
+///     Object, Sample                                       its record and its sample type
+///     convert(object, bytes, frames)                       interleaved bytes to the object's buffer
+///     resample(object, input, output) -> {consumed, produced}
+///     signal_offset(object, samples) -> index              where the signal starts in a block
+///     restart_detector(object)
+///     append_frame(object, older, newer)                   one frame, in two pieces
+///     reached_limit(object) -> bool
+#pragma once
+
+#include <algorithm>
+#include <cstddef>
+#include <cstdint>
+#include <span>
+
+#include "kzsdk/abs/status.h"
+#include "kzsdk/dsp/polyphase_stream.hpp"
+
+namespace kz::qv
+{
+
+enum InputFormat : uint32_t { kPcm8 = 1, kPcm16 = 2, kALaw = 3, kULaw = 4 };
+
+constexpr bool is_input_format(uint32_t format) noexcept
+{
+    return format >= kPcm8 && format <= kULaw;
+}
+
+constexpr uint32_t bytes_per_sample(uint32_t format) noexcept
+{
+    return format == kPcm16 ? 2 : 1;
+}
+
+/// Where the ring is read and written. A frame is full when the writer has caught up with its start.
+struct RingPosition {
+    uint32_t frame_start;
+    uint32_t write;
+};
+
+/// Samples that can be stored before the frame is full or the ring's end is met.
+constexpr uint32_t ring_room(RingPosition at, uint32_t length) noexcept
+{
+    return (at.frame_start > at.write ? at.frame_start : length) - at.write;
+}
+
+/// Moves the writer on by what was stored.
+///
+/// @return Whether a frame is full.
+constexpr bool advance_writer(RingPosition& at, uint32_t stored, uint32_t length) noexcept
+{
+    at.write += stored;
+    const bool full = at.write == (at.frame_start != 0 ? at.frame_start : length);
+    if (at.write == length) {
+        at.write = 0;
+    }
+    return full;
+}
+
+constexpr uint32_t next_frame_start(uint32_t frame_start, uint32_t hop, uint32_t length) noexcept
+{
+    const uint32_t next = frame_start + hop;
+    return next >= length ? next - length : next;
+}
+
+struct StepCounts {
+    uint32_t bytes;   ///< consumed
+    uint32_t samples; ///< produced
+};
+
+/// Converts and resamples from `bytes` until `room` samples are made or the input is used up.
+template <class Twin>
+StepCounts convert_and_resample(typename Twin::Object& object, std::span<const uint8_t> bytes,
+                                std::span<typename Twin::Sample> room) noexcept
+{
+    const uint64_t wanted =
+        uint64_t{dsp::raw_length(*object.resampler, static_cast<uint32_t>(room.size()))} *
+        object.frame_bytes;
+    auto budget = bytes.first(std::min<uint64_t>(wanted, bytes.size()));
+    StepCounts done{0, 0};
+    while (!budget.empty()) {
+        const size_t frames =
+            std::min(budget.size() / object.frame_bytes, std::size(object.conversion_buffer));
+        if (frames == 0) {
+            break;
+        }
+        Twin::convert(object, budget.data(), static_cast<uint32_t>(frames));
+        budget = budget.subspan(frames * object.frame_bytes);
+        std::span<const typename Twin::Sample> chunk(object.conversion_buffer, frames);
+        while (!chunk.empty()) {
+            const auto counts = Twin::resample(object, chunk, room.subspan(done.samples));
+            done.bytes += counts.consumed * object.frame_bytes;
+            done.samples += counts.produced;
+            chunk = chunk.subspan(counts.consumed);
+            if (counts.consumed == 0 && counts.produced == 0) {
+                return done; // the room is used up: what is left of the chunk is offered again
+            }
+        }
+    }
+    return done;
+}
+
+/// Drops the samples before the signal from those just stored at the write position.
+///
+/// @return How many remain; none while there is only silence.
+template <class Twin>
+uint32_t drop_silence(typename Twin::Object& object, uint32_t produced) noexcept
+{
+    const std::span<typename Twin::Sample> block(object.ring + object.write_position, produced);
+    // A block without samples is searched too: it primes the detector.
+    const uint32_t offset = Twin::signal_offset(object, block);
+    object.signal_offset += offset;
+    const uint32_t remaining = produced - offset;
+    if (remaining != 0) {
+        object.searching_for_signal = 0;
+        if (offset != 0) {
+            std::copy(block.begin() + offset, block.end(), block.begin());
+        }
+        Twin::restart_detector(object);
+    }
+    return remaining;
+}
+
+/// Stores what was produced and hands over the frame if it is full.
+template <class Twin>
+void store(typename Twin::Object& object, uint32_t produced) noexcept
+{
+    RingPosition at{object.frame_start, object.write_position};
+    const bool full = advance_writer(at, produced, object.frame_length);
+    object.write_position = at.write;
+    if (full) {
+        const std::span<const typename Twin::Sample> ring(object.ring, object.frame_length);
+        Twin::append_frame(object, ring.subspan(object.frame_start),
+                           ring.first(object.frame_start));
+        object.frame_start = next_frame_start(object.frame_start, object.hop, object.frame_length);
+    }
+}
+
+/// Feeds whole frames of interleaved bytes.
+///
+/// @return 0 when all bytes are consumed; KZ_QV_FRAME_LIMIT_REACHED once the fingerprint is complete;
+///         KZ_QV_ERROR_INVALID_ARGUMENT for a byte count that is 0 or not a whole number of frames.
+template <class Twin>
+kz_status feed(typename Twin::Object& object, std::span<const uint8_t> bytes) noexcept
+{
+    if (bytes.empty() || object.frame_bytes == 0 || bytes.size() % object.frame_bytes != 0) {
+        return KZ_QV_ERROR_INVALID_ARGUMENT;
+    }
+    if (Twin::reached_limit(object)) {
+        return KZ_QV_FRAME_LIMIT_REACHED;
+    }
+    while (!bytes.empty()) {
+        const uint32_t room =
+            ring_room({object.frame_start, object.write_position}, object.frame_length);
+        const auto counts =
+            convert_and_resample<Twin>(object, bytes, {object.ring + object.write_position, room});
+        if (counts.bytes == 0 && counts.samples == 0) {
+            break;
+        }
+        bytes = bytes.subspan(counts.bytes);
+        uint32_t produced = counts.samples;
+        if (object.searching_for_signal != 0) {
+            produced = drop_silence<Twin>(object, produced);
+        }
+        store<Twin>(object, produced);
+        if (Twin::reached_limit(object)) {
+            return KZ_QV_FRAME_LIMIT_REACHED;
+        }
+    }
+    return KZ_OK;
+}
+
+/// Input frames that one step takes when it is offered plenty: what the resampler takes for `room`
+/// outputs, but never more than that many outputs need of a stream in full flow.
+template <class Resampler>
+uint32_t step_frames(const Resampler& resampler, uint32_t room) noexcept
+{
+    return std::min(dsp::input_for(resampler, room), dsp::raw_length(resampler, room));
+}
+
+/// Frames of input that the loop's next step takes when it is offered plenty. To feed exactly this
+/// many each time gives the same words as to feed everything at once.
+template <class Object>
+uint32_t next_step_frames(const Object& object) noexcept
+{
+    RingPosition at{object.frame_start, object.write_position};
+    const uint32_t room = ring_room(at, object.frame_length);
+    const uint32_t frames = step_frames(*object.resampler, room);
+    if (frames != 0) {
+        return frames;
+    }
+    // When upsampling, a last sample of room may need no new input: then it is the step after that.
+    auto resampler = *object.resampler; // only its numbers are used
+    resampler.phase = dsp::phase_after(resampler, room);
+    if (advance_writer(at, room, object.frame_length)) {
+        at.frame_start = next_frame_start(at.frame_start, object.hop, object.frame_length);
+    }
+    return step_frames(resampler, ring_room(at, object.frame_length));
+}
+
+} // namespace kz::qv

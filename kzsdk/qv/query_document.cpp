@@ -1,0 +1,167 @@
+#include "kzsdk/qv/query_document.hpp"
+
+#include <cstring>
+#include <memory>
+
+#include "kzsdk/abs/owned.hpp"
+#include "kzsdk/abs/text.h"
+
+namespace
+{
+
+constexpr char kDocumentVersion[] = "1.0";
+constexpr char kSeparator[] = " ";
+constexpr uint32_t kElementSize = sizeof(uint16_t);
+
+struct Dispose {
+    void operator()(XMLTag* tag) const noexcept { static_cast<void>(DisposeXMLTag(tag)); }
+};
+using OwnedTag = std::unique_ptr<XMLTag, Dispose>;
+
+struct FingerprintData {
+    kz::owned<uint8_t[]> bytes;
+    uint32_t size;
+    kz::qv::FingerprintTimes times;
+
+    uint32_t count() const noexcept { return size / kElementSize; }
+
+    uint16_t element(uint32_t i) const noexcept
+    {
+        uint16_t value = 0;
+        std::memcpy(&value, bytes.get() + size_t{i} * kElementSize, kElementSize);
+        return value;
+    }
+};
+
+// The values are declared signed and printed unsigned: -1 is written 65535.
+kz_status format_values(const FingerprintData& data, kz::owned<char[]>& out_text) noexcept
+{
+    constexpr uint64_t kLongestElement = 6; // five digits and a separator
+    const uint64_t room = data.count() * kLongestElement + 1;
+    auto text = kz::make_array<char>(room);
+    if (!text) {
+        return KZ_QV_ERROR_MEMORY;
+    }
+    uint32_t length = 0;
+    for (uint32_t i = 0; i < data.count(); ++i) {
+        const char* end = i + 1 == data.count() ? "\n" : kSeparator;
+        length += static_cast<uint32_t>(kz_snprintf(text.get() + length,
+                                                    static_cast<uint32_t>(room - length), "%hu%s",
+                                                    data.element(i), end));
+    }
+    if (length == 0) {
+        return KZ_QV_ERROR_EMPTY;
+    }
+    text[length - 1] = '\0'; // the line break behind the last value
+    out_text = std::move(text);
+    return KZ_OK;
+}
+
+kz_status describe_block(XMLTag* block, uint32_t count) noexcept
+{
+    kz_status status = SetXMLTagAttrFromStr(block, "TYPE", "SIGNED_INT_16");
+    if (status == KZ_OK) {
+        status = SetXMLTagAttrFromInt(block, "COUNT", static_cast<int32_t>(count));
+    }
+    if (status == KZ_OK) {
+        status = SetXMLTagAttrFromStr(block, "ENCODING", "ASCII");
+    }
+    if (status == KZ_OK) {
+        status = SetXMLTagAttrFromStr(block, "SEPARATOR", kSeparator);
+    }
+    return status;
+}
+
+kz_status add_block(XMLTag* blocks, const FingerprintData& data) noexcept
+{
+    kz::owned<char[]> text;
+    kz_status status = format_values(data, text);
+    if (status != KZ_OK) {
+        return status;
+    }
+    OwnedTag block(CreateXMLTagFromStr("FP_BLOCK", text.get()));
+    if (!block) {
+        return KZ_QV_ERROR_MEMORY;
+    }
+    status = describe_block(block.get(), data.count());
+    if (status == KZ_OK) {
+        static_cast<void>(AddXMLSubTag(blocks, block.release()));
+    }
+    return status;
+}
+
+kz_status build_blocks(const kz::qv::FingerprintSource& source, OwnedTag& out_blocks) noexcept
+{
+    OwnedTag blocks(CreateXMLTagFromStr("FP_BLOCKS", nullptr));
+    if (!blocks) {
+        return KZ_QV_ERROR_MEMORY;
+    }
+    FingerprintData data{kz::make_array<uint8_t>(source.size), source.size, {}};
+    if (!data.bytes) {
+        return KZ_QV_ERROR_MEMORY;
+    }
+    kz_status status = source.extract(source.object, data.bytes.get(), data.size, data.times);
+    if (status == KZ_OK) {
+        status = add_block(blocks.get(), data);
+    }
+    if (status == KZ_OK) {
+        out_blocks = std::move(blocks);
+    }
+    return status;
+}
+
+// The service's own query string: name, double quote, version.
+kz_status set_query(XMLTag* root, const kz::qv::FingerprintSource& source) noexcept
+{
+    const uint64_t room = uint64_t{kz_strlen(source.name)} + kz_strlen(source.version) + 2;
+    const auto text = kz::make_array<char>(room);
+    if (!text) {
+        return KZ_QV_ERROR_MEMORY;
+    }
+    static_cast<void>(kz_snprintf(text.get(), static_cast<uint32_t>(room), "%s\"%s", source.name,
+                                  source.version));
+    return SetXMLSubTagDataFromStr(root, "ALGORITHM/QUERY", text.get(), 1);
+}
+
+kz_status build_root(const kz::qv::FingerprintSource& source, OwnedTag& out_root) noexcept
+{
+    OwnedTag root(CreateXMLTagFromStr("KZFPX_FP_QUERY", nullptr));
+    if (!root) {
+        return KZ_QV_ERROR_MEMORY;
+    }
+    kz_status status = SetXMLTagAttrFromStr(root.get(), "VERSION", kDocumentVersion);
+    if (status == KZ_OK) {
+        status = SetXMLSubTagDataFromStr(root.get(), "ALGORITHM/NAME", source.name, 1);
+    }
+    if (status == KZ_OK) {
+        status = SetXMLSubTagDataFromStr(root.get(), "ALGORITHM/VERSION", source.version, 1);
+    }
+    // Deliberate: the query decides alone, so an earlier failure is forgotten when it succeeds.
+    status = set_query(root.get(), source);
+    if (status == KZ_OK) {
+        out_root = std::move(root);
+    }
+    return status;
+}
+
+} // namespace
+
+namespace kz::qv
+{
+
+kz_status build_query_document(const FingerprintSource& source, XMLTag** out_tree) noexcept
+{
+    OwnedTag blocks;
+    OwnedTag root;
+    kz_status status = build_blocks(source, blocks);
+    if (status == KZ_OK) {
+        status = build_root(source, root);
+    }
+    if (status == KZ_OK) {
+        static_cast<void>(AddXMLSubTag(root.get(), blocks.release()));
+        *out_tree = root.release();
+    }
+    return status;
+}
+
+} // namespace kz::qv

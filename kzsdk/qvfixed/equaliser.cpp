@@ -1,0 +1,150 @@
+#include <algorithm>
+#include <limits>
+#include <span>
+
+#include "kzsdk/abs/owned.hpp"
+#include "kzsdk/dsp/fxp.h"
+#include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/qvfixed/qvfixed.h"
+
+namespace
+{
+
+using namespace kz::fxp;
+
+using Samples = std::span<const FxpType>;
+
+// A frame whose halved range is no more than this is silent.
+constexpr int32_t kSilentRange = 8192;
+
+struct Extremes {
+    int32_t low = std::numeric_limits<int32_t>::max();
+    int32_t high = std::numeric_limits<int32_t>::min();
+
+    void take(Samples samples) noexcept
+    {
+        for (const FxpType sample : samples) {
+            low = std::min(low, sample);
+            high = std::max(high, sample);
+        }
+    }
+
+    // Halved before they are subtracted, so that the difference fits.
+    int32_t bottom() const noexcept { return low >> 1; }
+    int32_t range() const noexcept { return wrap_sub(high >> 1, low >> 1); }
+};
+
+// Maps halved samples to levels 0 .. K - 1 by a multiplication with (K - 1) / range.
+class Quantiser
+{
+public:
+    Quantiser(int32_t bottom, int32_t range, uint32_t levels) noexcept
+        : bottom_(bottom), top_level_(static_cast<int32_t>(levels - 1))
+    {
+        const int32_t zeros = leading_zeros(static_cast<uint32_t>(range));
+        const uint32_t normalised = shift_left(static_cast<uint32_t>(range), zeros);
+        const uint32_t inverse = KZDSP_Reciprocal(normalised);
+        const int32_t bits = 33 - leading_zeros(levels - 1);
+        scale_ = static_cast<int32_t>((levels - 1) * shift_right(inverse, bits));
+        shift_ = zeros > 22 ? 31 : 22 - zeros;
+    }
+
+    // The reciprocal can come out a little large, and a range of 0 has none: levels beyond the
+    // table are brought back into it.
+    int32_t level(FxpType sample) const noexcept
+    {
+        const int32_t level = smul_high(wrap_sub(sample >> 1, bottom_), scale_) >> shift_;
+        return std::clamp(level, 0, top_level_);
+    }
+
+private:
+    int32_t bottom_;
+    int32_t top_level_;
+    int32_t scale_ = 0;
+    int32_t shift_ = 0;
+};
+
+// Writes each sample's level to its place and counts the levels.
+void quantise(Samples samples, const Quantiser& quantiser, FxpType* output,
+              std::span<uint32_t> histogram) noexcept
+{
+    for (size_t i = 0; i < samples.size(); ++i) {
+        const int32_t level = quantiser.level(samples[i]);
+        ++histogram[static_cast<uint32_t>(level)];
+        output[i] = level;
+    }
+}
+
+// Cumulative counts, in units of 1/32768 and less their mean over a frame of 32768 samples.
+void rank_values(std::span<const uint32_t> histogram, std::span<uint32_t> ranks) noexcept
+{
+    uint32_t cumulative = 0;
+    uint32_t total = 0;
+    for (size_t i = 0; i < histogram.size(); ++i) {
+        cumulative += histogram[i];
+        total += histogram[i] * cumulative;
+        ranks[i] = cumulative;
+    }
+    for (uint32_t& rank : ranks) {
+        rank = (rank << 15) - total;
+    }
+}
+
+void equalise(Samples first, Samples second, const Extremes& extremes, FxpType* output,
+              std::span<uint32_t> histogram, std::span<uint32_t> ranks) noexcept
+{
+    const Quantiser quantiser(extremes.bottom(), extremes.range(),
+                              static_cast<uint32_t>(histogram.size()));
+    std::fill(histogram.begin(), histogram.end(), 0U);
+    quantise(first, quantiser, output, histogram);
+    quantise(second, quantiser, output + first.size(), histogram);
+    rank_values(histogram, ranks);
+    for (FxpType& value : std::span(output, first.size() + second.size())) {
+        value = static_cast<FxpType>(ranks[static_cast<uint32_t>(value)]);
+    }
+}
+
+} // namespace
+
+kz_status kzqvfixed_hist_eq_dual(const FxpType* first, uint32_t first_count, const FxpType* second,
+                                 uint32_t second_count, FxpType* output, uint32_t output_length,
+                                 uint32_t* histogram, uint32_t levels) noexcept
+{
+    if (output == nullptr || histogram == nullptr || levels == 0) {
+        return KZ_OK;
+    }
+    const Samples older(first, first == nullptr ? 0 : std::min(first_count, output_length));
+    const auto missing = output_length - static_cast<uint32_t>(older.size());
+    const Samples newer(second, second == nullptr ? 0 : std::min(second_count, missing));
+
+    Extremes extremes;
+    extremes.take(older);
+    extremes.take(newer);
+    const auto ranks = kz::make_array<uint32_t>(levels);
+    if (!ranks || extremes.range() <= kSilentRange) {
+        // The plain copy fills the frame from the second piece, whatever its count says.
+        std::copy(older.begin(), older.end(), output);
+        std::copy_n(second, second == nullptr ? 0 : missing, output + older.size());
+        return KZ_OK;
+    }
+    equalise(older, newer, extremes, output, {histogram, levels}, {ranks.get(), levels});
+    return KZ_OK;
+}
+
+kz_status kzqvfixed_hist_eq2(const FxpType* input, FxpType* output, uint32_t count,
+                             uint32_t* histogram, uint32_t levels) noexcept
+{
+    if (input == nullptr || output == nullptr || histogram == nullptr || levels == 0) {
+        return KZ_OK;
+    }
+    const Samples samples(input, count);
+    const auto ranks = kz::make_array<uint32_t>(levels);
+    if (!ranks) {
+        std::copy(samples.begin(), samples.end(), output);
+        return KZ_OK;
+    }
+    Extremes extremes;
+    extremes.take(samples);
+    equalise(samples, {}, extremes, output, {histogram, levels}, {ranks.get(), levels});
+    return KZ_OK;
+}

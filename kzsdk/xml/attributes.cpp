@@ -1,0 +1,176 @@
+#include "kzsdk/xml/attributes.hpp"
+
+#include "kzsdk/xml/text.hpp"
+
+namespace
+{
+
+using kz::owned;
+using kz::xml::Text;
+using kz::xml::text_of;
+
+constexpr uint32_t kNumberSize = 64;
+
+const XMLAttr* attribute_at(const XMLTag* tag, uint32_t index) noexcept
+{
+    const XMLAttr* attribute = tag != nullptr ? tag->attributes : nullptr;
+    while (attribute != nullptr && index != 0) {
+        attribute = attribute->next;
+        --index;
+    }
+    return attribute;
+}
+
+/// The link that leads to the first attribute of a name: the end of the list when there is none.
+XMLAttr** link_to(XMLTag& tag, Text name) noexcept
+{
+    XMLAttr** link = &tag.attributes;
+    while (*link != nullptr && !kz::xml::matches((*link)->name, name)) {
+        link = &(*link)->next;
+    }
+    return link;
+}
+
+XMLAttr** end_of(XMLAttr** link) noexcept
+{
+    while (*link != nullptr) {
+        link = &(*link)->next;
+    }
+    return link;
+}
+
+/// Frees one record that is in no list, or in no list any more.
+void dispose_attribute(XMLAttr* attribute) noexcept
+{
+    static_cast<void>(_kzmem_free(attribute->name));
+    static_cast<void>(_kzmem_free(attribute->value));
+    static_cast<void>(_kzmem_free(attribute));
+}
+
+XMLAttr* make_attribute(Text name, Text value) noexcept
+{
+    auto attribute = kz::make_record<XMLAttr>();
+    auto name_copy = kz::xml::copy_of(name);
+    auto value_copy = kz::xml::copy_of(value);
+    if (!attribute || !name_copy || !value_copy) {
+        return nullptr;
+    }
+    attribute->name = name_copy.release();
+    attribute->value = value_copy.release();
+    return attribute.release();
+}
+
+/// Takes the attribute out of the list when there is one. Returns the link at its place.
+XMLAttr** remove_attribute(XMLTag& tag, Text name) noexcept
+{
+    XMLAttr** link = link_to(tag, name);
+    if (XMLAttr* attribute = *link; attribute != nullptr) {
+        *link = attribute->next;
+        dispose_attribute(attribute);
+    }
+    return link;
+}
+
+kz_status set_attribute(XMLTag& tag, Text name, Text value) noexcept
+{
+    XMLAttr* attribute = make_attribute(name, value);
+    if (attribute == nullptr) {
+        return KZ_XML_ERROR_MEMORY;
+    }
+    *end_of(remove_attribute(tag, name)) = attribute;
+    return KZ_OK;
+}
+
+} // namespace
+
+void kz::xml::dispose_attributes(XMLAttr* first) noexcept
+{
+    while (first != nullptr) {
+        XMLAttr* next = first->next;
+        dispose_attribute(first);
+        first = next;
+    }
+}
+
+kz_status kz::xml::copy_attributes(XMLTag& destination, const XMLTag& source) noexcept
+{
+    kz_status status = KZ_OK;
+    for (const XMLAttr* attribute = source.attributes; attribute != nullptr && status == KZ_OK;
+         attribute = attribute->next) {
+        status = SetXMLTagAttrFromStr(&destination, attribute->name, attribute->value);
+    }
+    return status;
+}
+
+uint32_t GetXMLTagAttrCount(const XMLTag* tag) noexcept
+{
+    uint32_t count = 0;
+    for (const XMLAttr* attribute = attribute_at(tag, 0); attribute != nullptr;
+         attribute = attribute->next) {
+        ++count;
+    }
+    return count;
+}
+
+const char* GetXMLTagAttrName(const XMLTag* tag, uint32_t index) noexcept
+{
+    const XMLAttr* attribute = attribute_at(tag, index);
+    return attribute != nullptr ? attribute->name : nullptr;
+}
+
+const char* GetXMLTagAttrValue(const XMLTag* tag, uint32_t index) noexcept
+{
+    const XMLAttr* attribute = attribute_at(tag, index);
+    return attribute != nullptr ? attribute->value : nullptr;
+}
+
+const char* GetXMLTagAttrFromBuf(const XMLTag* tag, const char* name, uint32_t count) noexcept
+{
+    const Text wanted{name, count};
+    if (wanted.is_empty()) {
+        return nullptr;
+    }
+    const XMLAttr* attribute = attribute_at(tag, 0);
+    while (attribute != nullptr && !kz::xml::matches(attribute->name, wanted)) {
+        attribute = attribute->next;
+    }
+    return attribute != nullptr ? attribute->value : nullptr;
+}
+
+const char* GetXMLTagAttrFromStr(const XMLTag* tag, const char* name) noexcept
+{
+    return GetXMLTagAttrFromBuf(tag, name, text_of(name).count);
+}
+
+kz_status SetXMLTagAttrFromBuf(XMLTag* tag, const char* name, uint32_t name_count,
+                               const char* value, uint32_t value_count) noexcept
+{
+    const Text wanted{name, name_count};
+    if (tag == nullptr || wanted.is_empty()) {
+        return KZ_XML_ERROR_INVALID_ARGUMENT;
+    }
+    if (value != nullptr && value_count != 0) { // a first byte of NUL is a value here
+        return set_attribute(*tag, wanted, {value, value_count});
+    }
+    remove_attribute(*tag, wanted);
+    return KZ_OK;
+}
+
+kz_status SetXMLTagAttrFromStr(XMLTag* tag, const char* name, const char* value) noexcept
+{
+    return SetXMLTagAttrFromBuf(tag, name, text_of(name).count, value, text_of(value).count);
+}
+
+kz_status SetXMLTagAttrFromInt(XMLTag* tag, const char* name, int32_t value) noexcept
+{
+    char number[kNumberSize] = {};
+    static_cast<void>(kz_snprintf(number, kNumberSize, "%ld", static_cast<long>(value)));
+    return SetXMLTagAttrFromStr(tag, name, number);
+}
+
+kz_status SetXMLTagAttrFromUInt(XMLTag* tag, const char* name, uint32_t value) noexcept
+{
+    char number[kNumberSize] = {};
+    static_cast<void>(kz_snprintf(number, kNumberSize, "%lu", static_cast<unsigned long>(value)));
+    return SetXMLTagAttrFromStr(tag, name, number);
+}

@@ -1,0 +1,15 @@
+/// @file
+/// Whole attribute lists, for the functions that work on whole tags.
+#pragma once
+
+#include "kzsdk/xml/xml.h"
+
+namespace kz::xml
+{
+
+void dispose_attributes(XMLAttr* first) noexcept;
+
+/// Sets copies of the source's attributes, in order, up to the first that fails.
+kz_status copy_attributes(XMLTag& destination, const XMLTag& source) noexcept;
+
+} // namespace kz::xml

@@ -1,0 +1,238 @@
+#include "kzsdk/xml/xml.h"
+
+#include <memory>
+
+#include "kzsdk/abs/dyn_buf.h"
+#include "kzsdk/xml/level.hpp"
+#include "kzsdk/xml/open_tags.hpp"
+
+namespace
+{
+
+using kz::xml::deeper;
+using kz::xml::Level;
+using kz::xml::shallower;
+
+constexpr uint32_t kInitialCapacity = 256;
+constexpr uint32_t kGrowBy = 128;
+constexpr const char* kDeclaration = "<?xml version=\"1.0\" encoding=\"UTF-8\" ?>";
+
+struct DisposeBuffer {
+    void operator()(kz_dyn_buf* buffer) const noexcept
+    {
+        static_cast<void>(kz_dyn_buf_dispose(buffer));
+    }
+};
+using owned_buffer = std::unique_ptr<kz_dyn_buf, DisposeBuffer>;
+
+constexpr const char* entity_for(char byte) noexcept
+{
+    switch (byte) {
+    case '<':
+        return "&lt;";
+    case '>':
+        return "&gt;";
+    case '&':
+        return "&amp;";
+    case '\'':
+        return "&apos;";
+    case '"':
+        return "&quot;";
+    default:
+        return nullptr;
+    }
+}
+
+/// Writes a tree into a buffer. Appending goes on until something fails; the status then stays, and
+/// later appends do nothing, until an indentation that always runs puts its own status in the place.
+class Renderer
+{
+public:
+    Renderer(kz_dyn_buf& buffer, bool indent, bool newlines) noexcept
+        : buffer_(buffer), indent_(indent), newlines_(newlines)
+    {
+    }
+
+    bool is_well() const noexcept { return status_ == KZ_OK; }
+
+    void declaration() noexcept
+    {
+        append(kDeclaration);
+        newline();
+    }
+
+    /// False when the way back up could not be kept. That is a failure no indentation may hide: the
+    /// rest of the tree could not be reached.
+    bool tree(const XMLTag& root) noexcept
+    {
+        kz::xml::OpenTags<const XMLTag*> open;
+        const XMLTag* tag = &root;
+        for (Level level = 0;;) {
+            start(*tag, level);
+            if (is_well() && tag->sub_tags != nullptr) {
+                if (!open.push(tag)) {
+                    return false;
+                }
+                tag = tag->sub_tags;
+                level = deeper(level);
+                continue;
+            }
+            end(*tag, level);
+            // A failure ends the list of sub-tags, so it climbs until an indentation forgets it.
+            while (!open.is_empty() && (!is_well() || tag->next_sibling == nullptr)) {
+                tag = open.top();
+                open.pop();
+                level = shallower(level);
+                end(*tag, level);
+            }
+            if (open.is_empty()) {
+                return true;
+            }
+            tag = tag->next_sibling;
+        }
+    }
+
+    void terminator() noexcept { append("", 1); }
+
+private:
+    void append(const char* bytes, uint32_t count) noexcept
+    {
+        if (is_well()) {
+            status_ = kz_dyn_buf_append_buf(&buffer_, bytes, count);
+        }
+    }
+
+    void append(const char* text) noexcept
+    {
+        if (is_well()) {
+            status_ = kz_dyn_buf_append_str(&buffer_, text);
+        }
+    }
+
+    void newline() noexcept
+    {
+        if (newlines_) {
+            append("\n");
+        }
+    }
+
+    void indentation(Level level) noexcept
+    {
+        for (Level i = 0; i < level && is_well(); ++i) {
+            append("  ");
+        }
+    }
+
+    /// The two indentations inside an element with sub-tags run whatever happened before, and what
+    /// happened is forgotten.
+    void indentation_after_all(Level level) noexcept
+    {
+        status_ = KZ_OK;
+        indentation(level);
+    }
+
+    void escaped(const char* text) noexcept
+    {
+        if (text == nullptr) {
+            append(nullptr);
+            return;
+        }
+        // One byte at a time: where memory ends, as much of the text is there as fits.
+        for (; *text != '\0' && is_well(); ++text) {
+            if (const char* entity = entity_for(*text); entity != nullptr) {
+                append(entity);
+            } else {
+                append(text, 1);
+            }
+        }
+    }
+
+    void attribute(const XMLAttr& attribute) noexcept
+    {
+        append(" ");
+        append(attribute.name);
+        append("=\"");
+        escaped(attribute.value);
+        append("\"");
+    }
+
+    /// The start tag, and the data in the place where it belongs.
+    void start(const XMLTag& tag, Level level) noexcept
+    {
+        if (indent_) {
+            indentation(level);
+        }
+        append("<");
+        append(tag.name);
+        for (const XMLAttr* next = tag.attributes; next != nullptr && is_well();
+             next = next->next) {
+            attribute(*next);
+        }
+        append(">");
+        if (tag.sub_tags != nullptr) {
+            newline();
+            data_line(tag, level);
+        } else if (tag.data != nullptr) {
+            escaped(tag.data);
+        }
+    }
+
+    void data_line(const XMLTag& tag, Level level) noexcept
+    {
+        if (tag.data == nullptr) {
+            return;
+        }
+        if (indent_) {
+            indentation_after_all(deeper(level));
+        }
+        escaped(tag.data);
+        newline();
+    }
+
+    void end(const XMLTag& tag, Level level) noexcept
+    {
+        if (indent_ && tag.sub_tags != nullptr) {
+            indentation_after_all(level);
+        }
+        append("</");
+        append(tag.name);
+        append(">");
+        newline();
+    }
+
+    kz_dyn_buf& buffer_;
+    bool indent_;
+    bool newlines_;
+    kz_status status_ = KZ_OK;
+};
+
+} // namespace
+
+char* RenderXMLTagToStrEx(const XMLTag* tag, uint8_t header, uint8_t indent,
+                          uint8_t newlines) noexcept
+{
+    if (tag == nullptr) {
+        return nullptr;
+    }
+    owned_buffer buffer(kz_dyn_buf_create(kInitialCapacity, kGrowBy));
+    if (!buffer) {
+        return nullptr;
+    }
+    Renderer renderer(*buffer, indent != 0, newlines != 0);
+    if (header != 0) {
+        renderer.declaration();
+    }
+    if (!renderer.is_well() || !renderer.tree(*tag)) {
+        return nullptr;
+    }
+    renderer.terminator();
+    if (!renderer.is_well()) {
+        return nullptr;
+    }
+    return reinterpret_cast<char*>(kz_dyn_buf_dispose_and_return_buffer(buffer.release()));
+}
+
+char* RenderXMLTagToStr(const XMLTag* tag, uint8_t header) noexcept
+{
+    return RenderXMLTagToStrEx(tag, header, 1, 1);
+}

@@ -1,0 +1,57 @@
+#!/bin/sh
+# Checks the tree: format, clang-tidy, the man page, the scripts. Every check runs; any complaint
+# makes the whole fail.
+#
+#   scripts/lint.sh [build-directory]     where compile_commands.json is; default build/lint, made here
+set -u
+cd "$(dirname "$0")/.."
+
+jobs=${JOBS:-$(getconf _NPROCESSORS_ONLN)}
+build=${1:-build/lint}
+failed=
+
+check() {
+    name=$1
+    shift
+    echo "lint: $name"
+    if ! "$@"; then
+        echo "lint: $name FAILED" >&2
+        failed="$failed $name"
+    fi
+}
+
+format() {
+    scripts/sources.sh | xargs clang-format-14 --dry-run -Werror
+}
+
+tidy() {
+    if [ ! -f "$build/compile_commands.json" ]; then
+        cmake -S . -B "$build" -G Ninja -DKZ_BUILD_BENCH=ON >/dev/null || return 1
+    fi
+    scripts/sources.sh | grep '\.cpp$' | xargs -P "$jobs" -n 4 clang-tidy-14 -p "$build" --quiet --warnings-as-errors='*' 2>&1 |
+        { ! grep -v -e 'warnings generated' -e '^Suppressed ' -e '^Use -header-filter'; }
+}
+
+man_page() {
+    find tools docs -name '*.[1-8]' -print0 | xargs -0 -r mandoc -T lint -W warning
+}
+
+shell_scripts() {
+    for script in run .ci/run scripts/*.sh; do
+        case $(head -n 1 "$script") in
+        *bash*) bash -n "$script" ;;
+        *) sh -n "$script" ;;
+        esac || return 1
+    done
+}
+
+check clang-format format
+check "shell scripts" shell_scripts
+check "man page" man_page
+check clang-tidy tidy
+
+if [ -n "$failed" ]; then
+    echo "lint: failed:$failed" >&2
+    exit 1
+fi
+echo "lint: all clean"

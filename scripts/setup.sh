@@ -1,0 +1,79 @@
+#!/bin/sh
+# Installs what is missing to build and test the library on Debian 12.
+#
+#   scripts/setup.sh [build] [tools] [test] [clips] [bench] [lint] [clang]     default: all of them
+#
+# Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
+set -eu
+
+packages_of() {
+    case $1 in
+    build) echo "g++ cmake ninja-build make" ;;
+    tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev" ;;
+    test) echo "libgtest-dev libgmock-dev pkg-config binutils" ;;
+    clips) echo "sox libsox-fmt-all espeak-ng" ;; # the demo's music, and the tests' clips
+    bench) echo "libbenchmark-dev" ;;
+    lint) echo "clang-format-14 clang-tidy-14 mandoc" ;;
+    clang) echo "clang-14 libclang-rt-14-dev" ;;
+    *)
+        echo "setup: no such group: $1" >&2
+        exit 2
+        ;;
+    esac
+}
+
+installed() {
+    [ "$(dpkg-query -W -f '${db:Status-Status}' "$1" 2>/dev/null || true)" = installed ]
+}
+
+[ $# -gt 0 ] || set -- build tools test clips bench lint clang
+
+wanted=
+for group in "$@"; do
+    wanted="$wanted $(packages_of "$group")"
+done
+
+if ! command -v apt-get >/dev/null || ! command -v dpkg-query >/dev/null; then
+    echo "setup: not a Debian system; going on in the hope that these are there:$wanted" >&2
+    exit 0
+fi
+
+missing=
+for package in $wanted; do
+    if ! installed "$package"; then
+        missing="$missing $package"
+    fi
+done
+[ -n "$missing" ] || exit 0
+
+if [ "$(id -u)" -eq 0 ]; then
+    as_root=
+elif command -v sudo >/dev/null; then
+    as_root=sudo
+else
+    echo "setup: neither root nor sudo. Ask root for: apt-get install$missing" >&2
+    exit 1
+fi
+
+apt() {
+    $as_root env DEBIAN_FRONTEND=noninteractive apt-get -q -o DPkg::Lock::Timeout=300 "$@"
+}
+
+# A package list is fetched when there is none, or when the one at hand is too old to serve.
+known() {
+    for package in $missing; do
+        apt-cache show --no-all-versions "$package" >/dev/null 2>&1 || return 1
+    done
+}
+
+install_missing() {
+    # shellcheck disable=SC2086 # the names are meant to be split
+    apt install -y --no-install-recommends $missing
+}
+
+echo "setup: installing$missing"
+if known && install_missing; then
+    exit 0
+fi
+apt update
+install_missing

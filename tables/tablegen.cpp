@@ -1,0 +1,128 @@
+/// @file
+/// Writes the library's coefficient tables as C++ source: tablegen <output file>
+///
+/// The formulas stand where the library uses them, in kzsdk/dsp/filter_design.hpp and
+/// kzsdk/dsp/butterfly.hpp. tests/dsp/tables_test.cpp pins every word.
+
+#include <cmath>
+#include <cstdint>
+#include <cstdio>
+#include <fstream>
+#include <iostream>
+#include <string_view>
+#include <vector>
+
+#include "kzsdk/dsp/butterfly.hpp"
+#include "kzsdk/dsp/filter_design.hpp"
+#include "tables/short_filters.hpp"
+
+namespace
+{
+
+struct Polyphase {
+    uint32_t hertz, up, down;
+    double gain;
+};
+
+constexpr Polyphase kPolyphase[] = {
+    {.hertz = 8000,
+     .up = 441,
+     .down = 320,
+     .gain = 0.5}, // the centre tap, 441/320, would not fit Q31
+    {.hertz = 16000, .up = 441, .down = 640, .gain = 1.0},
+    {.hertz = 24000, .up = 147, .down = 320, .gain = 1.0},
+    {.hertz = 32000, .up = 441, .down = 1280, .gain = 1.0},
+    {.hertz = 48000, .up = 147, .down = 640, .gain = 1.0},
+};
+
+std::vector<int32_t> to_q31(const std::vector<float>& taps, double gain)
+{
+    std::vector<int32_t> words;
+    for (const float tap : taps) {
+        words.push_back(
+            static_cast<int32_t>(std::lround(static_cast<double>(tap) * gain * 0x1p31)));
+    }
+    return words;
+}
+
+template <class Word>
+void write_array(std::ostream& out, std::string_view type, std::string_view name,
+                 const std::vector<Word>& words)
+{
+    out << "const " << type << ' ' << name << '[' << words.size() << "] = {";
+    for (size_t i = 0; i < words.size(); ++i) {
+        out << (i % 12 == 0 ? "\n    " : " ") << words[i] << ',';
+    }
+    out << "\n};\n\n";
+}
+
+// The taps in two halves, which is how fixed-point inner loops multiply them, and their accessors.
+void write_filter(std::ostream& out, uint32_t hertz, const std::vector<int32_t>& words)
+{
+    std::vector<int16_t> msb;
+    std::vector<uint16_t> lsb;
+    for (const int32_t word : words) {
+        msb.push_back(static_cast<int16_t>(word >> 16));
+        lsb.push_back(static_cast<uint16_t>(word & 0xffff));
+    }
+    out << "namespace hertz_" << hertz << " {\n";
+    write_array(out, "int16_t", "msb", msb);
+    write_array(out, "uint16_t", "lsb", lsb);
+    out << "} // namespace hertz_" << hertz << "\n\n";
+    const auto accessor = [&](std::string_view type, std::string_view what) -> std::ostream& {
+        return out << type << " kzdsp_get_" << hertz << "_11025_fixed_coeff_" << what
+                   << "() noexcept";
+    };
+    accessor("const int16_t*", "msb") << " { return hertz_" << hertz << "::msb; }\n";
+    accessor("const uint16_t*", "lsb") << " { return hertz_" << hertz << "::lsb; }\n";
+    accessor("uint32_t", "length") << " { return " << words.size() << "; }\n\n";
+}
+
+void write_filters(std::ostream& out)
+{
+    for (const Polyphase& rate : kPolyphase) {
+        const auto layout = kz::dsp::filter_layout(rate.up, rate.down);
+        std::vector<float> taps(layout.length);
+        kz::dsp::design_windowed_sinc(layout, taps);
+        write_filter(out, rate.hertz, to_q31(taps, rate.gain));
+    }
+    write_filter(out, 22050, to_q31(kz::tables::design_short_filter(kz::tables::kHalfBand), 1.0));
+    write_filter(out, 44100,
+                 to_q31(kz::tables::design_short_filter(kz::tables::kQuarterBand), 1.0));
+}
+
+// Stage s, of half-width h = 2^(s-1), multiplies by a factor of 30 fraction bits over 2^(s-2): so the
+// largest factor of each stage, about h, fits a word.
+std::vector<int32_t> dct_coefficients(uint32_t length)
+{
+    std::vector<int32_t> words(length, 0);
+    for (uint32_t half_width = 1; half_width < length; half_width *= 2) {
+        for (uint32_t j = 0; j < half_width; ++j) {
+            const double factor = kz::dsp::butterfly_factor(half_width, j);
+            words[half_width + j] = static_cast<int32_t>(factor * 0x1p31 / half_width);
+        }
+    }
+    return words;
+}
+
+} // namespace
+
+int main(int argc, char** argv)
+{
+    if (argc != 2) {
+        std::cerr << "usage: tablegen <output file>\n";
+        return 2;
+    }
+    std::ofstream out(argv[1]);
+    out << "// Written by tables/tablegen.cpp.\n\n"
+           "#include \"kzsdk/dsp/resampler.h\"\n"
+           "#include \"kzsdk/dsp/tables.hpp\"\n\n";
+    write_filters(out);
+    write_array(out, "int32_t", "kz::dsp::kDctCoefficients", dct_coefficients(32768));
+    out.close();
+    if (!out) {
+        std::cerr << "tablegen: cannot write " << argv[1] << '\n';
+        return 1;
+    }
+    return 0;
+}

@@ -1,0 +1,22 @@
+#include "kzsdk/abs/version.h"
+
+#include <gtest/gtest.h>
+
+namespace
+{
+
+TEST(Version, TextsAreTheLiteralOnes)
+{
+    EXPECT_STREQ("common-5", kz_abs_get_common_version());
+    EXPECT_STREQ("zonqa-abs-linux-5", kz_abs_get_platspec_version());
+    EXPECT_STREQ("Device Software Version May 12 2011 00:44:31", kz_get_software_version());
+    EXPECT_STREQ("Device Hardware Version May 12 2011 00:44:31", kz_get_hardware_version());
+}
+
+TEST(Version, TextsAreConstants)
+{
+    EXPECT_EQ(kz_get_software_version(), kz_get_software_version());
+    EXPECT_EQ(kz_abs_get_common_version(), kz_abs_get_common_version());
+}
+
+} // namespace

@@ -1,0 +1,187 @@
+#include <string>
+#include <vector>
+
+#include "kzsdk/abs/owned.hpp"
+#include "kzsdk/fpx/algorithm.hpp"
+#include "kzsdk/fpx/fpx.h"
+#include "support/allocation.hpp"
+#include "support/signals.hpp"
+
+namespace kz::test
+{
+
+namespace
+{
+
+class Extraction : public MemoryOn
+{
+};
+
+kz_fpx_handle* create(uint32_t rate = 44100, uint32_t channels = 1)
+{
+    kz_fpx_handle* handle = nullptr;
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_create(1, KZ_FPX_FORMAT_PCM16, rate, channels, &handle));
+    return handle;
+}
+
+// A row whose operations only count.
+int frees = 0;
+int feeds = 0;
+kz_status free_result = KZ_OK;
+
+constexpr fpx::Algorithm kCountingRow = {
+    .id = 99,
+    .create = nullptr,
+    .free =
+        [](void*) noexcept {
+            ++frees;
+            return free_result;
+        },
+    .add_audio =
+        [](void*, const void*, uint32_t, uint8_t*) noexcept {
+            ++feeds;
+            return kz_status{0x90001234};
+        },
+    .get_result = nullptr,
+};
+
+kz_fpx_handle* counting_handle(void* instance)
+{
+    auto handle = make_record<kz_fpx_handle>();
+    handle->algorithm = &kCountingRow;
+    handle->instance = instance;
+    return handle.release();
+}
+
+} // namespace
+
+TEST_F(Extraction, AnUnknownAlgorithmIsRefusedWithoutAllocating)
+{
+    const uint64_t before = allocation_count();
+    kz_fpx_handle* handle = nullptr;
+    for (const uint32_t id : {0U, 2U, 3U, 0xFFFFFFFFU}) {
+        EXPECT_EQ(0x90080606U, kz_fpx_fingerprint_create(id, 2, 44100, 1, &handle)) << id;
+    }
+    EXPECT_EQ(before, allocation_count());
+    EXPECT_EQ(nullptr, handle);
+}
+
+TEST_F(Extraction, FormatComesBeforeTheRate)
+{
+    kz_fpx_handle* handle = nullptr;
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_create(1, 2, 8000, 1, &handle));
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
+}
+
+TEST_F(Extraction, AFailedCreateReturnsTheFingerprintersStatusAndKeepsTheHandle)
+{
+    int marker = 0;
+    auto* const untouched = reinterpret_cast<kz_fpx_handle*>(&marker);
+    kz_fpx_handle* handle = untouched;
+    EXPECT_EQ(0x900f0004U, kz_fpx_fingerprint_create(1, 5, 44100, 1, &handle));
+    EXPECT_EQ(0x900f0004U, kz_fpx_fingerprint_create(1, 2, 44100, 3, &handle));
+    EXPECT_EQ(0x900f0001U, kz_fpx_fingerprint_create(1, 2, 12345, 1, &handle));
+    EXPECT_EQ(untouched, handle);
+}
+
+TEST_F(Extraction, AddAudioRefusesNullsWithoutCallingTheFingerprinter)
+{
+    kz_fpx_handle* handle = counting_handle(&frees);
+    uint8_t complete = 0;
+    const int16_t sample = 0;
+    feeds = 0;
+    EXPECT_EQ(0x90080004U, kz_fpx_fingerprint_add_audio(nullptr, &sample, 2, &complete));
+    EXPECT_EQ(0x90080004U, kz_fpx_fingerprint_add_audio(handle, nullptr, 2, &complete));
+    EXPECT_EQ(0x90080004U, kz_fpx_fingerprint_add_audio(handle, &sample, 2, nullptr));
+    EXPECT_EQ(0, feeds);
+    EXPECT_EQ(0x90001234U, kz_fpx_fingerprint_add_audio(handle, &sample, 0, &complete));
+    EXPECT_EQ(1, feeds);
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
+}
+
+TEST_F(Extraction, FreeAlwaysLeavesNullAndReturnsTheFingerprintersStatus)
+{
+    EXPECT_EQ(0x90080004U, kz_fpx_fingerprint_free(nullptr));
+    kz_fpx_handle* handle = nullptr;
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
+    frees = 0;
+    free_result = 0x90005678;
+    handle = counting_handle(&frees);
+    EXPECT_EQ(0x90005678U, kz_fpx_fingerprint_free(&handle));
+    EXPECT_EQ(nullptr, handle);
+    EXPECT_EQ(1, frees);
+    free_result = KZ_OK;
+}
+
+// Neither row of the table makes such a handle. It is forgotten, not freed.
+TEST_F(Extraction, AHandleWithoutAnInstanceIsForgotten)
+{
+    kz_fpx_handle* const record = counting_handle(nullptr);
+    kz_fpx_handle* handle = record;
+    const int64_t before = live_blocks();
+    frees = 0;
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
+    EXPECT_EQ(nullptr, handle);
+    EXPECT_EQ(0, frees);
+    EXPECT_EQ(before, live_blocks());
+    _kzmem_free(record);
+}
+
+TEST_F(Extraction, CreateSurvivesEveryFailedAllocation)
+{
+    bool first = true;
+    for_every_failed_allocation([&first](auto fired) {
+        kz_fpx_handle* handle = nullptr;
+        const kz_status status = kz_fpx_fingerprint_create(1, 2, 44100, 2, &handle);
+        if (fired()) {
+            EXPECT_EQ(first ? KZ_FPX_ERROR_MEMORY : KZ_QV_ERROR_MEMORY, status & 0xFFFFFFFF);
+            EXPECT_EQ(nullptr, handle);
+        }
+        first = !fired(); // the next mode starts over with the handle itself
+        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
+    });
+}
+
+TEST_F(Extraction, NothingWorksBeforeTheLibraryIsStarted)
+{
+    kzmem_shutdown();
+    kz_fpx_handle* handle = nullptr;
+    EXPECT_EQ(0x90080001U, kz_fpx_fingerprint_create(1, 2, 44100, 1, &handle));
+    kzmem_initialize(0, 0);
+}
+
+TEST_F(Extraction, HandlesAreIndependent)
+{
+    const auto music = tune(11025, 1, 16);
+    const auto other = tune(11025, 1, 16, 0.5, 7);
+    const auto document = [](kz_fpx_handle* handle) {
+        char* text = nullptr;
+        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_serialize(handle, &text));
+        std::string copy = text;
+        kz_fpx_fingerprint_serialize_free(&text);
+        return copy;
+    };
+    const auto feed = [](kz_fpx_handle* handle, const std::vector<int16_t>& samples, size_t from,
+                         size_t count) {
+        uint8_t complete = 0;
+        kz_fpx_fingerprint_add_audio(handle, samples.data() + from,
+                                     static_cast<uint32_t>(count * 2), &complete);
+    };
+    kz_fpx_handle* alone = create(11025);
+    feed(alone, music, 0, music.size());
+    kz_fpx_handle* a = create(11025);
+    kz_fpx_handle* b = create(11025);
+    for (size_t at = 0; at + 32768 <= music.size(); at += 32768) {
+        feed(a, music, at, 32768);
+        feed(b, other, at, 32768);
+    }
+    feed(a, music, music.size() / 32768 * 32768, music.size() % 32768);
+    feed(b, other, music.size() / 32768 * 32768, music.size() % 32768);
+    EXPECT_EQ(document(alone), document(a));
+    EXPECT_NE(document(a), document(b));
+    for (kz_fpx_handle* handle : {alone, a, b}) {
+        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
+    }
+}
+
+} // namespace kz::test

@@ -1,0 +1,138 @@
+#include <algorithm>
+#include <cstring>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "kzsdk/fpx/fpx.h"
+#include "support/allocation.hpp"
+#include "support/signals.hpp"
+
+namespace kz::test
+{
+
+namespace
+{
+
+class Serialize : public MemoryOn
+{
+protected:
+    void SetUp() override
+    {
+        MemoryOn::SetUp();
+        ASSERT_EQ(KZ_OK, kz_fpx_fingerprint_create(1, KZ_FPX_FORMAT_PCM16, 11025, 1, &handle_));
+    }
+    void TearDown() override
+    {
+        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle_));
+        MemoryOn::TearDown();
+    }
+
+    void complete()
+    {
+        const auto music = tune(11025, 1, 16);
+        uint8_t complete = 0;
+        ASSERT_EQ(KZ_OK,
+                  kz_fpx_fingerprint_add_audio(handle_, music.data(),
+                                               static_cast<uint32_t>(music.size() * 2), &complete));
+        ASSERT_EQ(1, complete);
+    }
+
+    kz_fpx_handle* handle_ = nullptr;
+};
+
+} // namespace
+
+TEST_F(Serialize, ADocumentHasADeclarationIndentationAndThirtyValues)
+{
+    complete();
+    char* text = nullptr;
+    ASSERT_EQ(KZ_OK, kz_fpx_fingerprint_serialize(handle_, &text));
+    const std::string document = text;
+    EXPECT_EQ(0U, document.find("<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\n"
+                                "<KZFPX_FP_QUERY VERSION=\"1.0\">\n"
+                                "  <ALGORITHM>\n"
+                                "    <NAME>Quenvar</NAME>\n"
+                                "    <VERSION>1.1</VERSION>\n"
+                                "    <QUERY>Quenvar&quot;1.1</QUERY>\n"
+                                "  </ALGORITHM>\n"
+                                "  <FP_BLOCKS>\n"
+                                "    <FP_BLOCK TYPE=\"SIGNED_INT_16\" COUNT=\"30\" "
+                                "ENCODING=\"ASCII\" SEPARATOR=\" \">"));
+    const size_t open = document.find("SEPARATOR=\" \">") + 14;
+    const std::string values = document.substr(open, document.find('<', open) - open);
+    EXPECT_EQ(29, std::count(values.begin(), values.end(), ' '));
+    EXPECT_EQ("</FP_BLOCK>\n  </FP_BLOCKS>\n</KZFPX_FP_QUERY>\n",
+              document.substr(document.find("</FP_BLOCK>")));
+    // A buffer of 600 characters holds any such document.
+    EXPECT_LE(document.size() - values.size() + 30 * 6, 600U);
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_serialize_free(&text));
+    EXPECT_EQ(nullptr, text);
+}
+
+TEST_F(Serialize, AnIncompleteFingerprintIsRefusedWithoutAText)
+{
+    int marker = 0;
+    char* text = reinterpret_cast<char*>(&marker);
+    EXPECT_EQ(0x900f0961U, kz_fpx_fingerprint_serialize(handle_, &text));
+    EXPECT_EQ(nullptr, text);
+}
+
+TEST_F(Serialize, NullsAreRefused)
+{
+    char* text = nullptr;
+    EXPECT_EQ(0x90080004U, kz_fpx_fingerprint_serialize(nullptr, &text));
+    EXPECT_EQ(0x90080004U, kz_fpx_fingerprint_serialize(handle_, nullptr));
+    EXPECT_EQ(0x90080004U, kz_fpx_fingerprint_serialize_free(nullptr));
+}
+
+TEST_F(Serialize, FreeingANullTextDoesNothing)
+{
+    char* text = nullptr;
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_serialize_free(&text));
+    EXPECT_EQ(nullptr, text);
+}
+
+TEST_F(Serialize, TheSameFingerprintGivesTheSameText)
+{
+    complete();
+    char* a = nullptr;
+    char* b = nullptr;
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_serialize(handle_, &a));
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_serialize(handle_, &b));
+    EXPECT_STREQ(a, b);
+    kz_fpx_fingerprint_serialize_free(&a);
+    kz_fpx_fingerprint_serialize_free(&b);
+}
+
+// Short of memory a call fails with a status of the layer that ran out, or hands out a text. The
+// texts that then differ from the whole document are those of two deliberate maskings: a query that
+// succeeds after name or version failed, and an indentation that succeeds after a failure while
+// rendering.
+TEST_F(Serialize, EveryFailedAllocationIsReportedOrMaskedAsDocumented)
+{
+    complete();
+    char* whole = nullptr;
+    ASSERT_EQ(KZ_OK, kz_fpx_fingerprint_serialize(handle_, &whole));
+    int masked = 0;
+    for_every_failed_allocation([&](auto fired) {
+        char* text = nullptr;
+        const kz_status status = kz_fpx_fingerprint_serialize(handle_, &text);
+        EXPECT_EQ(status == KZ_OK, text != nullptr);
+        if (!fired()) {
+            EXPECT_STREQ(whole, text);
+        } else if (status == KZ_OK) {
+            EXPECT_STRNE(whole, text);
+            ++masked;
+        } else {
+            EXPECT_TRUE(status == KZ_QV_ERROR_MEMORY || status == KZ_XML_ERROR_MEMORY ||
+                        status == KZ_FPX_ERROR_RENDER || status == KZ_QV_ERROR_INCOMPLETE)
+                << std::hex << status;
+        }
+        kz_fpx_fingerprint_serialize_free(&text);
+    });
+    EXPECT_GT(masked, 0);
+    kz_fpx_fingerprint_serialize_free(&whole);
+}
+
+} // namespace kz::test

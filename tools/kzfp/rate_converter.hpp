@@ -1,0 +1,39 @@
+/// @file
+/// Rates that the library does not take, through the resampler library libsoxr.
+#pragma once
+
+#include <memory>
+#include <vector>
+
+#include <soxr.h>
+
+#include "audio_source.hpp"
+
+namespace kzfp
+{
+
+/// Gives 16-bit PCM of another rate, without dither: the same words every time.
+class RateConverter : public AudioSource
+{
+public:
+    /// `source` gives 16-bit PCM. Throws FileError.
+    RateConverter(std::unique_ptr<AudioSource> source, uint32_t rate);
+
+    StreamFormat format() const override;
+    size_t read(std::span<std::byte> bytes) override;
+    std::string trouble() const override { return source_->trouble(); }
+
+private:
+    struct Delete {
+        void operator()(soxr* converter) const { soxr_delete(converter); }
+    };
+
+    static size_t fetch(void* self, soxr_in_t* data, size_t frames);
+
+    std::unique_ptr<AudioSource> source_;
+    uint32_t rate_;
+    std::unique_ptr<soxr, Delete> converter_;
+    std::vector<std::byte> fetched_;
+};
+
+} // namespace kzfp

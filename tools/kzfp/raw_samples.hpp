@@ -1,0 +1,32 @@
+/// @file
+/// Headerless audio: bytes go to the library as they come.
+#pragma once
+
+#include "audio_source.hpp"
+
+namespace kzfp
+{
+
+/// What is wrong with a stream whose last frame has only `odd_bytes` bytes.
+std::string odd_bytes_text(uint64_t odd_bytes, const StreamFormat& format);
+
+/// Reads a descriptor to its end, or to the end of the section, without looking ahead.
+class RawSamples : public AudioSource
+{
+public:
+    /// Starts where the descriptor stands; it must outlive the object.
+    RawSamples(int file, bool seekable, const StreamFormat& format, const Section& section);
+
+    StreamFormat format() const override { return format_; }
+    size_t read(std::span<std::byte> bytes) override;
+
+private:
+    size_t read_bytes(std::span<std::byte> bytes);
+    void skip(uint64_t count);
+
+    int file_;
+    StreamFormat format_;
+    uint64_t frames_left_;
+};
+
+} // namespace kzfp

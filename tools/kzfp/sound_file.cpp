@@ -1,0 +1,236 @@
+#include "sound_file.hpp"
+
+#include <bit>
+#include <cerrno>
+#include <cmath>
+#include <cstring>
+#include <limits>
+
+#include <unistd.h>
+
+namespace kzfp
+{
+
+namespace
+{
+
+constexpr size_t kBlock = 4096; ///< frames read at a time
+constexpr int kLowestRate = 1000;
+constexpr int kHighestRate = 768000;
+
+/// Full scale is 32768, so that 16-bit samples come back unchanged from a file of floats. Rounded to
+/// the nearest, clipped at full scale; what is not a number is silence.
+int16_t to_16_bits(float sample)
+{
+    const float scaled = sample * 32768.0f;
+    if (std::isnan(scaled)) {
+        return 0;
+    }
+    return static_cast<int16_t>(std::lrint(std::clamp(scaled, -32768.0f, 32767.0f)));
+}
+
+std::string to_seconds(double seconds)
+{
+    char text[32];
+    std::snprintf(text, sizeof text, "%.1f s", seconds);
+    return text;
+}
+
+} // namespace
+
+SoundFile::SoundFile(int file)
+{
+    // The object gets a descriptor of its own, which libsndfile closes, also when it cannot open it.
+    const int own = ::dup(file);
+    if (own < 0 || ::lseek(own, 0, SEEK_SET) != 0) {
+        throw FileError(std::string("cannot be read (") + std::strerror(errno) + ")");
+    }
+    file_.reset(sf_open_fd(own, SFM_READ, &info_, SF_TRUE));
+    if (!file_) {
+        throw FileError("is not a sound file that can be read (WAV, FLAC, OGG, MP3, ...); "
+                        "headerless audio needs --raw");
+    }
+    check();
+    if (is_companded() && info_.channels <= 2 && is_supported_rate(file_rate())) {
+        const bool alaw = (info_.format & SF_FORMAT_SUBMASK) == SF_FORMAT_ALAW;
+        encoding_ = alaw ? Encoding::alaw : Encoding::ulaw;
+    }
+}
+
+void SoundFile::select(const Section& section)
+{
+    if (section.length) {
+        frames_left_ = static_cast<uint64_t>(std::llround(*section.length * file_rate()));
+    }
+    go_to(std::llround(section.start * file_rate()));
+}
+
+void SoundFile::check() const
+{
+    if (info_.channels < 1) {
+        throw FileError("has no channels, one or more are needed");
+    }
+    if (info_.samplerate < kLowestRate || info_.samplerate > kHighestRate) {
+        throw FileError("has a rate of " + std::to_string(info_.samplerate) + " Hz, " +
+                        std::to_string(kLowestRate) + " to " + std::to_string(kHighestRate) +
+                        " Hz can be used");
+    }
+}
+
+std::optional<double> SoundFile::duration() const
+{
+    if (info_.frames < 0 || info_.frames == std::numeric_limits<sf_count_t>::max()) {
+        return {};
+    }
+    return static_cast<double>(info_.frames) / info_.samplerate;
+}
+
+StreamFormat SoundFile::format() const
+{
+    return {file_rate(), info_.channels > 2 ? 1 : file_channels(), encoding_};
+}
+
+/// True for containers in which companded samples are one byte each, in one piece.
+bool SoundFile::is_companded() const
+{
+    const int coding = info_.format & SF_FORMAT_SUBMASK;
+    switch (info_.format & SF_FORMAT_TYPEMASK) {
+    case SF_FORMAT_WAV:
+    case SF_FORMAT_WAVEX:
+    case SF_FORMAT_W64:
+    case SF_FORMAT_RF64:
+    case SF_FORMAT_AU:
+    case SF_FORMAT_AIFF:
+    case SF_FORMAT_CAF:
+        return coding == SF_FORMAT_ALAW || coding == SF_FORMAT_ULAW;
+    default:
+        return false;
+    }
+}
+
+/// libsndfile's own conversion of these to 16 bits neither scales floats nor clips (or looks for the
+/// peak of the whole file first).
+bool SoundFile::is_decoded_to_float() const
+{
+    switch (info_.format & SF_FORMAT_SUBMASK) {
+    case SF_FORMAT_FLOAT:
+    case SF_FORMAT_DOUBLE:
+    case SF_FORMAT_VORBIS:
+    case SF_FORMAT_OPUS:
+    case SF_FORMAT_MPEG_LAYER_I:
+    case SF_FORMAT_MPEG_LAYER_II:
+    case SF_FORMAT_MPEG_LAYER_III:
+        return true;
+    default:
+        return false;
+    }
+}
+
+void SoundFile::go_to(sf_count_t start)
+{
+    if (start == 0 || (info_.seekable && sf_seek(file_.get(), start, SEEK_SET) == start)) {
+        return;
+    }
+    // Either the file ends before, or it can only be read forwards.
+    if (!info_.seekable) {
+        sf_count_t left = start;
+        while (left > 0) {
+            const sf_count_t got = read_samples(std::min<sf_count_t>(left, kBlock));
+            if (got <= 0) {
+                break;
+            }
+            left -= got;
+        }
+        if (left == 0) {
+            return;
+        }
+    }
+    throw FileError("ends at " + to_seconds(duration().value_or(0)) + ", before the start at " +
+                    to_seconds(static_cast<double>(start) / info_.samplerate));
+}
+
+size_t SoundFile::read(std::span<std::byte> bytes)
+{
+    const size_t frame_bytes = format().frame_bytes();
+    const size_t frames = std::min<uint64_t>(bytes.size() / frame_bytes, frames_left_);
+    const auto wanted = bytes.first(frames * frame_bytes);
+    size_t done = 0;
+    if (encoding_ == Encoding::s16) {
+        done = read_pcm16(wanted);
+    } else {
+        const auto size = static_cast<sf_count_t>(wanted.size());
+        const sf_count_t got = sf_read_raw(file_.get(), wanted.data(), size);
+        done = static_cast<size_t>(std::max<sf_count_t>(got, 0)) / frame_bytes;
+    }
+    frames_left_ -= done;
+    return done;
+}
+
+std::string SoundFile::trouble() const
+{
+    if (sf_error(file_.get()) == SF_ERR_NO_ERROR) {
+        return {};
+    }
+    std::string text = sf_strerror(file_.get());
+    if (text.starts_with("Error : ")) {
+        text.erase(0, 8);
+    }
+    if (text.ends_with('.')) {
+        text.pop_back();
+    }
+    return text;
+}
+
+size_t SoundFile::read_pcm16(std::span<std::byte> bytes)
+{
+    const size_t frame_bytes = format().frame_bytes();
+    size_t done = 0;
+    const size_t frames = bytes.size() / frame_bytes;
+    while (done < frames) {
+        const auto wanted = static_cast<sf_count_t>(std::min(kBlock, frames - done));
+        const auto got = static_cast<size_t>(std::max<sf_count_t>(read_samples(wanted), 0));
+        if (info_.channels > 2) {
+            mix_down(got);
+        }
+        std::memcpy(bytes.data() + done * frame_bytes, samples_.data(), got * frame_bytes);
+        done += got;
+        if (got == 0) {
+            break;
+        }
+    }
+    return done;
+}
+
+/// Reads frames of all channels into `samples_`.
+sf_count_t SoundFile::read_samples(sf_count_t frames)
+{
+    const auto count = static_cast<size_t>(frames) * file_channels();
+    samples_.resize(count);
+    if (!is_decoded_to_float()) {
+        return sf_readf_short(file_.get(), samples_.data(), frames);
+    }
+    floats_.resize(count);
+    const sf_count_t got = sf_readf_float(file_.get(), floats_.data(), frames);
+    const size_t filled = static_cast<size_t>(std::max<sf_count_t>(got, 0)) * file_channels();
+    std::transform(floats_.begin(), floats_.begin() + static_cast<std::ptrdiff_t>(filled),
+                   samples_.begin(), to_16_bits);
+    return got;
+}
+
+/// The library's rule for many channels: the sum divided by the smallest power of two that is not
+/// below their number, here rounded to the nearest 16-bit word.
+void SoundFile::mix_down(size_t frames)
+{
+    const size_t channels = file_channels();
+    const auto shift = static_cast<int>(std::bit_width(channels - 1));
+    const int32_t half = int32_t{1} << (shift - 1);
+    for (size_t i = 0; i < frames; ++i) {
+        int32_t sum = 0;
+        for (size_t c = 0; c < channels; ++c) {
+            sum += samples_[i * channels + c];
+        }
+        samples_[i] = static_cast<int16_t>((sum + half) >> shift);
+    }
+}
+
+} // namespace kzfp

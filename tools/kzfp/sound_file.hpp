@@ -1,0 +1,58 @@
+/// @file
+/// Sound files of all kinds, through libsndfile.
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <vector>
+
+#include <sndfile.h>
+
+#include "audio_source.hpp"
+
+namespace kzfp
+{
+
+/// Gives the samples of a sound file in one of these forms:
+/// - A-law and mu-law with one or two channels, at a supported rate: as they are in the file;
+/// - everything else: 16-bit PCM, in which more than two channels are mixed down to one.
+class SoundFile : public AudioSource
+{
+public:
+    /// `file` is a regular file that outlives the object. Throws FileError.
+    explicit SoundFile(int file);
+
+    /// Goes to the start of a section, beyond whose end read() gives nothing. Before the first
+    /// read(). Throws FileError.
+    void select(const Section& section);
+
+    uint32_t file_rate() const { return static_cast<uint32_t>(info_.samplerate); }
+    uint32_t file_channels() const { return static_cast<uint32_t>(info_.channels); }
+    std::optional<double> duration() const;
+
+    StreamFormat format() const override;
+    size_t read(std::span<std::byte> bytes) override;
+    std::string trouble() const override;
+
+private:
+    struct Close {
+        void operator()(SNDFILE* file) const { sf_close(file); }
+    };
+
+    void check() const;
+    bool is_companded() const;
+    bool is_decoded_to_float() const;
+    void go_to(sf_count_t start);
+    size_t read_pcm16(std::span<std::byte> bytes);
+    sf_count_t read_samples(sf_count_t frames);
+    void mix_down(size_t frames);
+
+    std::unique_ptr<SNDFILE, Close> file_;
+    SF_INFO info_ = {};
+    Encoding encoding_ = Encoding::s16;
+    uint64_t frames_left_ = UINT64_MAX;
+    std::vector<int16_t> samples_; ///< of all channels
+    std::vector<float> floats_;
+};
+
+} // namespace kzfp
