@@ -9,14 +9,12 @@
 #include "started.hpp"
 #include "support/signals.hpp"
 
-namespace
-{
+namespace {
 
 using namespace kz::bench;
 
 /// Owns a handle for one fingerprint.
-class Fingerprint
-{
+class Fingerprint {
 public:
     Fingerprint(uint32_t rate, uint32_t channels)
     {

@@ -10,8 +10,7 @@
 #include "started.hpp"
 #include "support/signals.hpp"
 
-namespace
-{
+namespace {
 
 using namespace kz::bench;
 

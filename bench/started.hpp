@@ -8,8 +8,7 @@
 
 #include "kzsdk/kzsdk.h"
 
-namespace kz::bench
-{
+namespace kz::bench {
 
 /// Switches the library on; every benchmark calls it first, and it stays on.
 inline void start_library()

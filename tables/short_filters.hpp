@@ -13,8 +13,7 @@
 #include <numbers>
 #include <vector>
 
-namespace kz::tables
-{
+namespace kz::tables {
 
 struct ShortFilter {
     uint32_t down;

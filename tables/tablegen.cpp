@@ -16,8 +16,7 @@
 #include "kzsdk/dsp/filter_design.hpp"
 #include "tables/short_filters.hpp"
 
-namespace
-{
+namespace {
 
 struct Polyphase {
     uint32_t hertz, up, down;

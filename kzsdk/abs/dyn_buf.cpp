@@ -7,15 +7,11 @@
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/abs/text.h"
 
-namespace
-{
+namespace {
 
 /// Sizes asked of the heap are never 0: what the heap then does (null, or a resize that frees)
 /// differs between systems.
-constexpr uint32_t block_size(uint32_t capacity) noexcept
-{
-    return std::max(capacity, 1u);
-}
+constexpr uint32_t block_size(uint32_t capacity) noexcept { return std::max(capacity, 1u); }
 
 /// Where `bytes` lies in the buffer's own block, or nowhere.
 constexpr uint32_t kOutside = std::numeric_limits<uint32_t>::max();

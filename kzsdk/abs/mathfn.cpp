@@ -3,47 +3,20 @@
 #include <algorithm>
 #include <cmath>
 
-double kz_fabs(double x) noexcept
-{
-    return std::fabs(x);
-}
+double kz_fabs(double x) noexcept { return std::fabs(x); }
 
-double kz_pow(double base, double exponent) noexcept
-{
-    return std::pow(base, exponent);
-}
+double kz_pow(double base, double exponent) noexcept { return std::pow(base, exponent); }
 
-double kz_exp(double x) noexcept
-{
-    return std::exp(x);
-}
+double kz_exp(double x) noexcept { return std::exp(x); }
 
-double kz_log(double x) noexcept
-{
-    return std::log(x);
-}
+double kz_log(double x) noexcept { return std::log(x); }
 
-double kz_floor(double x) noexcept
-{
-    return std::floor(x);
-}
+double kz_floor(double x) noexcept { return std::floor(x); }
 
-double kz_cos(double x) noexcept
-{
-    return std::cos(x);
-}
+double kz_cos(double x) noexcept { return std::cos(x); }
 
-double kz_sin(double x) noexcept
-{
-    return std::sin(x);
-}
+double kz_sin(double x) noexcept { return std::sin(x); }
 
-double kz_sqrt(double x) noexcept
-{
-    return std::sqrt(x);
-}
+double kz_sqrt(double x) noexcept { return std::sqrt(x); }
 
-int32_t kz_min(int32_t a, int32_t b) noexcept
-{
-    return std::min(a, b);
-}
+int32_t kz_min(int32_t a, int32_t b) noexcept { return std::min(a, b); }

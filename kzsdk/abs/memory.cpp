@@ -23,7 +23,10 @@ kz_status kzmem_shutdown() noexcept
     return memory_on.exchange(0, std::memory_order_relaxed) != 0 ? KZ_OK : KZ_MEM_NOT_ON;
 }
 
-kz_status kzmem_query_availability() noexcept { return is_on() ? KZ_MEM_ALREADY_ON : KZ_MEM_NOT_ON; }
+kz_status kzmem_query_availability() noexcept
+{
+    return is_on() ? KZ_MEM_ALREADY_ON : KZ_MEM_NOT_ON;
+}
 
 void* _kzmem_malloc(uint32_t size) noexcept { return is_on() ? std::malloc(size) : nullptr; }
 

@@ -24,8 +24,8 @@ using owned = std::unique_ptr<T, Release>;
 /// Allocates `count` values of plain type T, cleared to zero bytes. Null when the memory manager is
 /// off, the heap fails, or the size does not fit the allocator's 32 bits (nothing is tried then).
 template <class T>
-    requires std::is_trivial_v<T>
-owned<T[]> make_array(uint64_t count) noexcept
+requires std::is_trivial_v<T> owned<T[]> make_array(uint64_t count)
+noexcept
 {
     if (count > std::numeric_limits<uint32_t>::max() / sizeof(T)) {
         return nullptr;
@@ -40,11 +40,8 @@ owned<T[]> make_array(uint64_t count) noexcept
 
 /// Allocates one record of plain type T, cleared to zero bytes. Null on failure.
 template <class T>
-    requires std::is_trivial_v<T>
-owned<T> make_record() noexcept
-{
-    return owned<T>(make_array<T>(1).release());
-}
+requires std::is_trivial_v<T> owned<T> make_record()
+noexcept { return owned<T>(make_array<T>(1).release()); }
 
 /// Allocates a copy of `count` values. Null on failure.
 template <class T>

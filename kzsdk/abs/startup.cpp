@@ -3,13 +3,9 @@
 #include "kzsdk/abs/memory.h"
 #include "kzsdk/abs/text.h"
 
-namespace
-{
+namespace {
 
-constexpr uint32_t reason(kz_status status) noexcept
-{
-    return status & 0xffffu;
-}
+constexpr uint32_t reason(kz_status status) noexcept { return status & 0xffffu; }
 
 int32_t second_memory_argument(const kzconf_configuration& record) noexcept
 {

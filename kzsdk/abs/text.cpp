@@ -10,8 +10,7 @@
 
 #include "kzsdk/abs/memory.h"
 
-namespace
-{
+namespace {
 
 constexpr uint32_t kLongest = std::numeric_limits<uint32_t>::max();
 
@@ -25,18 +24,9 @@ constexpr bool is_between(uint8_t byte, char first, char last) noexcept
     return byte >= static_cast<uint8_t>(first) && byte <= static_cast<uint8_t>(last);
 }
 
-constexpr bool is_digit(uint8_t byte) noexcept
-{
-    return is_between(byte, '0', '9');
-}
-constexpr bool is_lower(uint8_t byte) noexcept
-{
-    return is_between(byte, 'a', 'z');
-}
-constexpr bool is_upper(uint8_t byte) noexcept
-{
-    return is_between(byte, 'A', 'Z');
-}
+constexpr bool is_digit(uint8_t byte) noexcept { return is_between(byte, '0', '9'); }
+constexpr bool is_lower(uint8_t byte) noexcept { return is_between(byte, 'a', 'z'); }
+constexpr bool is_upper(uint8_t byte) noexcept { return is_between(byte, 'A', 'Z'); }
 
 constexpr bool is_hex_letter(uint8_t byte) noexcept
 {
@@ -88,10 +78,7 @@ uint32_t kz_strlen(const char* text) noexcept
     return static_cast<uint32_t>(std::min<uint64_t>(std::strlen(text), kLongest));
 }
 
-int16_t kz_strcmp(const char* a, const char* b) noexcept
-{
-    return sign(std::strcmp(a, b));
-}
+int16_t kz_strcmp(const char* a, const char* b) noexcept { return sign(std::strcmp(a, b)); }
 
 int16_t kz_strncmp(const char* a, const char* b, uint32_t count) noexcept
 {
@@ -198,15 +185,9 @@ int32_t kz_strtol(const char* text, char** end, int32_t base) noexcept
     return static_cast<int32_t>(value);
 }
 
-uint32_t kz_atou32(const char* text) noexcept
-{
-    return kz_strtoul(text, nullptr, 10);
-}
+uint32_t kz_atou32(const char* text) noexcept { return kz_strtoul(text, nullptr, 10); }
 
-int32_t kz_atoi32(const char* text) noexcept
-{
-    return kz_strtol(text, nullptr, 10);
-}
+int32_t kz_atoi32(const char* text) noexcept { return kz_strtol(text, nullptr, 10); }
 
 int32_t kz_isalnum(int32_t character) noexcept
 {
@@ -232,20 +213,11 @@ int32_t kz_isxdigit(int32_t character) noexcept
                        [](uint8_t byte) noexcept { return is_digit(byte) || is_hex_letter(byte); });
 }
 
-int32_t kz_islower(int32_t character) noexcept
-{
-    return is_in_class(character, is_lower);
-}
+int32_t kz_islower(int32_t character) noexcept { return is_in_class(character, is_lower); }
 
-int32_t kz_isupper(int32_t character) noexcept
-{
-    return is_in_class(character, is_upper);
-}
+int32_t kz_isupper(int32_t character) noexcept { return is_in_class(character, is_upper); }
 
-int32_t kz_isspace(int32_t character) noexcept
-{
-    return is_in_class(character, is_space);
-}
+int32_t kz_isspace(int32_t character) noexcept { return is_in_class(character, is_space); }
 
 int32_t kz_tolower(int32_t character) noexcept
 {

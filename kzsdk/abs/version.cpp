@@ -2,15 +2,9 @@
 
 // The dates are fixed: services that log these texts know them, and builds stay reproducible.
 
-const char* kz_abs_get_common_version() noexcept
-{
-    return "common-5";
-}
+const char* kz_abs_get_common_version() noexcept { return "common-5"; }
 
-const char* kz_abs_get_platspec_version() noexcept
-{
-    return "zonqa-abs-linux-5";
-}
+const char* kz_abs_get_platspec_version() noexcept { return "zonqa-abs-linux-5"; }
 
 const char* kz_get_software_version() noexcept
 {

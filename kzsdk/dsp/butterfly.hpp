@@ -16,8 +16,7 @@
 
 #include "kzsdk/abs/mathfn.h"
 
-namespace kz::dsp
-{
+namespace kz::dsp {
 
 /// 1 / (2 cos((4j + 1) pi / (4h))), the factor of butterfly j in the stage of half-width h.
 inline float butterfly_factor(uint32_t half_width, uint32_t j) noexcept

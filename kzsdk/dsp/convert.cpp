@@ -10,8 +10,7 @@
 // A converter is an encoding (how a sample is read), a number of channels (known here or at run
 // time), a sum (cleared at every frame or never) and a rule that makes the output word of the sum.
 
-namespace
-{
+namespace {
 
 using kz::fxp::shift_left;
 using kz::fxp::wrap_add;
@@ -48,14 +47,8 @@ using Fixed = std::integral_constant<int32_t, Count>;
 constexpr Fixed<1> kMono;
 constexpr Fixed<2> kStereo;
 
-int32_t plus(int32_t sum, int32_t sample) noexcept
-{
-    return wrap_add(sum, sample);
-}
-float plus(float sum, int32_t sample) noexcept
-{
-    return sum + static_cast<float>(sample);
-}
+int32_t plus(int32_t sum, int32_t sample) noexcept { return wrap_add(sum, sample); }
+float plus(float sum, int32_t sample) noexcept { return sum + static_cast<float>(sample); }
 
 template <class Encoding, class Sum, class Channels>
 Sum add_frame(Sum sum, const uint8_t*& at, Channels channels) noexcept
@@ -110,18 +103,9 @@ auto averaged(int32_t channels, int32_t sample_bits) noexcept
     return shifted_by(kz::fxp::leading_zeros(divisor) - sample_bits);
 }
 
-float to_float(int32_t sum) noexcept
-{
-    return static_cast<float>(sum);
-}
-float to_float_times_256(int32_t sum) noexcept
-{
-    return to_float(shift_left(sum, 8));
-}
-float as_it_is(float sum) noexcept
-{
-    return sum;
-}
+float to_float(int32_t sum) noexcept { return static_cast<float>(sum); }
+float to_float_times_256(int32_t sum) noexcept { return to_float(shift_left(sum, 8)); }
+float as_it_is(float sum) noexcept { return sum; }
 
 } // namespace
 
@@ -264,12 +248,6 @@ void KZDSP_NChanneluLawToMonoFloat(int32_t channels, const void* input, float* o
     accumulate<ULaw>(channels, input, output, frame_count, to_float);
 }
 
-const int16_t* KZDSP_GetuLawTable() noexcept
-{
-    return kz::g711::kULaw.data();
-}
+const int16_t* KZDSP_GetuLawTable() noexcept { return kz::g711::kULaw.data(); }
 
-const int16_t* KZDSP_GetALawTable() noexcept
-{
-    return kz::g711::kALaw.data();
-}
+const int16_t* KZDSP_GetALawTable() noexcept { return kz::g711::kALaw.data(); }

@@ -7,8 +7,7 @@
 #include "kzsdk/dsp/fxp_ops.hpp"
 #include "kzsdk/dsp/tables.hpp"
 
-namespace
-{
+namespace {
 
 using namespace kz::fxp;
 

@@ -10,8 +10,7 @@
 
 #include "kzsdk/abs/mathfn.h"
 
-namespace kz::dsp
-{
+namespace kz::dsp {
 
 /// How a prototype for `up`/`down` lies in its array: zeros, taps, zeros. The array's length is a
 /// multiple of `up`, so that every phase has the same number of taps.

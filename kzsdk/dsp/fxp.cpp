@@ -7,8 +7,7 @@
 // The exported operations stay within 32-bit words and 16 by 16 bit products. Inner loops use the
 // inline forms of fxp_ops.hpp, which may take wider products and give the same words.
 
-namespace
-{
+namespace {
 
 using kz::fxp::leading_zeros;
 using kz::fxp::magnitude;
@@ -20,18 +19,9 @@ using kz::fxp::wrap_add;
 using kz::fxp::wrap_negate;
 using kz::fxp::wrap_sub;
 
-constexpr uint32_t high_half(uint32_t word) noexcept
-{
-    return word >> 16;
-}
-constexpr uint32_t low_half(uint32_t word) noexcept
-{
-    return word & 0xffff;
-}
-constexpr int32_t signed_half(uint32_t half) noexcept
-{
-    return static_cast<int16_t>(half);
-}
+constexpr uint32_t high_half(uint32_t word) noexcept { return word >> 16; }
+constexpr uint32_t low_half(uint32_t word) noexcept { return word & 0xffff; }
+constexpr int32_t signed_half(uint32_t half) noexcept { return static_cast<int16_t>(half); }
 
 /// floor(a * half / 2^16) for a half in the range of 16 bits.
 constexpr int32_t word_times_half(int32_t a, int32_t half) noexcept
@@ -77,10 +67,7 @@ constexpr FxpUTypeLong negated(FxpUTypeLong x) noexcept
     return {.hi = ~x.hi + (x.lo == 0 ? 1u : 0u), .lo = 0u - x.lo};
 }
 
-constexpr FxpUTypeLong widened(uint32_t word) noexcept
-{
-    return {.hi = 0, .lo = word};
-}
+constexpr FxpUTypeLong widened(uint32_t word) noexcept { return {.hi = 0, .lo = word}; }
 
 constexpr FxpTypeLong as_signed(FxpUTypeLong x) noexcept
 {
@@ -161,10 +148,7 @@ FxpType KZDSP_SmulWLo_SW_SL(FxpType a, FxpType b) noexcept
     return word_times_half(a, signed_half(low_half(static_cast<uint32_t>(b))));
 }
 
-FxpType KZDSP_SmulWHi_SW_SL(FxpType a, FxpType b) noexcept
-{
-    return word_times_half(a, b >> 16);
-}
+FxpType KZDSP_SmulWHi_SW_SL(FxpType a, FxpType b) noexcept { return word_times_half(a, b >> 16); }
 
 FxpType KZDSP_SmulAddWLo_SW_SL(FxpType a, FxpType b, FxpType acc) noexcept
 {
@@ -206,15 +190,9 @@ FxpUTypeLong KZDSP_SHFT_FxpUTypeLong(uint32_t hi, uint32_t lo, int32_t count) no
     return shifted(FxpUTypeLong{hi, lo}, count);
 }
 
-FxpType KZDSP_ADD_FxpType(FxpType a, FxpType b) noexcept
-{
-    return wrap_add(a, b);
-}
+FxpType KZDSP_ADD_FxpType(FxpType a, FxpType b) noexcept { return wrap_add(a, b); }
 
-FxpType KZDSP_SUB_FxpType(FxpType a, FxpType b) noexcept
-{
-    return wrap_sub(a, b);
-}
+FxpType KZDSP_SUB_FxpType(FxpType a, FxpType b) noexcept { return wrap_sub(a, b); }
 
 FxpTypeLong KZDSP_ADD_FxpTypeLong(int32_t hi1, uint32_t lo1, int32_t hi2, uint32_t lo2) noexcept
 {
@@ -234,10 +212,7 @@ FxpType KZDSP_ALIGNED_SUB_FxpType(FxpType m1, int32_t e1, FxpType m2, int32_t e2
     return wrap_sub(pairs.first, pairs.second);
 }
 
-FxpType KZDSP_MUL_POW2_FxpType(FxpType m, int32_t k) noexcept
-{
-    return shift_left(m, k);
-}
+FxpType KZDSP_MUL_POW2_FxpType(FxpType m, int32_t k) noexcept { return shift_left(m, k); }
 
 FxpTypeLong KZDSP_SMUL_FxpTypeLong(FxpType a, FxpType b) noexcept
 {
@@ -245,10 +220,7 @@ FxpTypeLong KZDSP_SMUL_FxpTypeLong(FxpType a, FxpType b) noexcept
     return as_signed((a ^ b) < 0 ? negated(size) : size);
 }
 
-FxpUTypeLong KZDSP_UMUL_FxpUTypeLong(FxpUType a, FxpUType b) noexcept
-{
-    return product(a, b);
-}
+FxpUTypeLong KZDSP_UMUL_FxpUTypeLong(FxpUType a, FxpUType b) noexcept { return product(a, b); }
 
 FxpUTypeLong KZDSP_UMUL_FxpUTypeLong2(uint32_t hi, uint32_t lo, FxpUType b) noexcept
 {
@@ -261,30 +233,15 @@ FxpType KZDSP_SMUL_HIGH_FxpType(FxpType a, FxpType b) noexcept
     return static_cast<FxpType>((a ^ b) < 0 ? 0u - high : high);
 }
 
-FxpUType KZDSP_UMUL_HIGH_FxpUType(FxpUType a, FxpUType b) noexcept
-{
-    return product_high(a, b);
-}
+FxpUType KZDSP_UMUL_HIGH_FxpUType(FxpUType a, FxpUType b) noexcept { return product_high(a, b); }
 
-FxpType KZDSP_SaturateAbsFxpType(FxpType x) noexcept
-{
-    return kz::fxp::saturate_abs(x);
-}
+FxpType KZDSP_SaturateAbsFxpType(FxpType x) noexcept { return kz::fxp::saturate_abs(x); }
 
-int32_t kz_abs(int32_t x) noexcept
-{
-    return static_cast<int32_t>(magnitude(x));
-}
+int32_t kz_abs(int32_t x) noexcept { return static_cast<int32_t>(magnitude(x)); }
 
-int32_t KZDSP_CountLeadingZeros(uint32_t x) noexcept
-{
-    return leading_zeros(x);
-}
+int32_t KZDSP_CountLeadingZeros(uint32_t x) noexcept { return leading_zeros(x); }
 
-uint32_t KZDSP_clp2(uint32_t x) noexcept
-{
-    return kz::fxp::next_power_of_two(x);
-}
+uint32_t KZDSP_clp2(uint32_t x) noexcept { return kz::fxp::next_power_of_two(x); }
 
 int32_t KZDSP_LESS_FxpType(FxpType m1, int32_t e1, FxpType m2, int32_t e2) noexcept
 {
@@ -316,10 +273,7 @@ int32_t KZDSP_LESS_FxpUType(FxpUType m1, int32_t e1, FxpUType m2, int32_t e2) no
     return apart < 0 ? lower(first) < second : first < lower(second);
 }
 
-FxpUType KZDSP_Reciprocal(FxpUType x) noexcept
-{
-    return reciprocal(x);
-}
+FxpUType KZDSP_Reciprocal(FxpUType x) noexcept { return reciprocal(x); }
 
 FxpUType KZDSP_ReciprocalWithScaling(FxpUType x, int32_t* shift) noexcept
 {

@@ -2,8 +2,7 @@
 #include "kzsdk/dsp/fxp_ops.hpp"
 #include "kzsdk/dsp/log_segments.hpp"
 
-namespace
-{
+namespace {
 
 using kz::fxp::LogSegment;
 using kz::fxp::normalised;

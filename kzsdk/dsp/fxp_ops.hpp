@@ -10,8 +10,7 @@
 #include <bit>
 #include <cstdint>
 
-namespace kz::fxp
-{
+namespace kz::fxp {
 
 constexpr int32_t wrap_add(int32_t a, int32_t b) noexcept
 {
@@ -28,10 +27,7 @@ constexpr int32_t wrap_mul(int32_t a, int32_t b) noexcept
     return static_cast<int32_t>(static_cast<uint32_t>(a) * static_cast<uint32_t>(b));
 }
 
-constexpr int32_t wrap_negate(int32_t a) noexcept
-{
-    return wrap_sub(0, a);
-}
+constexpr int32_t wrap_negate(int32_t a) noexcept { return wrap_sub(0, a); }
 
 /// |a| as an unsigned word; -2^31 gives 2^31.
 constexpr uint32_t magnitude(int32_t a) noexcept
@@ -66,16 +62,10 @@ constexpr int32_t shift_right(int32_t word, int32_t count) noexcept
     return word >> (n < 32 ? n : 31);
 }
 
-constexpr int32_t leading_zeros(uint32_t word) noexcept
-{
-    return std::countl_zero(word);
-}
+constexpr int32_t leading_zeros(uint32_t word) noexcept { return std::countl_zero(word); }
 
 /// Exact signed product.
-constexpr int64_t smul(int32_t a, int32_t b) noexcept
-{
-    return static_cast<int64_t>(a) * b;
-}
+constexpr int64_t smul(int32_t a, int32_t b) noexcept { return static_cast<int64_t>(a) * b; }
 
 /// floor(a * b / 2^32).
 constexpr uint32_t umul_high(uint32_t a, uint32_t b) noexcept

@@ -8,8 +8,7 @@
 #include <array>
 #include <cstdint>
 
-namespace kz::g711
-{
+namespace kz::g711 {
 
 struct Code {
     bool sign_bit;

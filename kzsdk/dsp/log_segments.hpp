@@ -11,8 +11,7 @@
 #include <array>
 #include <cstdint>
 
-namespace kz::fxp
-{
+namespace kz::fxp {
 
 /// Coefficients with 29 fraction bits: word / 2^29.
 struct LogSegment {

@@ -20,8 +20,7 @@
 #include <limits>
 #include <span>
 
-namespace kz::dsp
-{
+namespace kz::dsp {
 
 constexpr uint32_t saturated_to_word(uint64_t value) noexcept
 {

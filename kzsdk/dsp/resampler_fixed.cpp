@@ -6,8 +6,7 @@
 #include "kzsdk/dsp/fxp_ops.hpp"
 #include "kzsdk/dsp/polyphase_stream.hpp"
 
-namespace
-{
+namespace {
 
 using namespace kz::fxp;
 

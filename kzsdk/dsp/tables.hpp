@@ -4,8 +4,7 @@
 
 #include <cstdint>
 
-namespace kz::dsp
-{
+namespace kz::dsp {
 
 /// Butterfly factors of the 32768-point transform: entry h + j is 2^31 / h times
 /// butterfly_factor(h, j), truncated. The first half serves the 16384-point transform.

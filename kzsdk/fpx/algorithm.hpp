@@ -7,8 +7,7 @@
 #include "kzsdk/fpx/fpx.h"
 #include "kzsdk/xml/xml.h"
 
-namespace kz::fpx
-{
+namespace kz::fpx {
 
 /// One algorithm: its number and the four operations of its fingerprinter.
 struct Algorithm {

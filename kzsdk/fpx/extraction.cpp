@@ -6,8 +6,7 @@
 #include "kzsdk/fpx/algorithm.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
-namespace
-{
+namespace {
 
 using kz::fpx::Algorithm;
 

@@ -4,11 +4,9 @@
 #include "kzsdk/qv/frame_pump.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
-namespace kz::fpx
-{
+namespace kz::fpx {
 
-namespace
-{
+namespace {
 
 // Hands the handle's instance, as what it is, to `use`.
 template <class Use>

@@ -6,8 +6,7 @@
 
 #include "kzsdk/fpx/fpx.h"
 
-namespace kz::fpx
-{
+namespace kz::fpx {
 
 /// Frames of input that the feed loop's next step takes when it is offered plenty. Feeding exactly this
 /// many with each call gives the same document, to the bit, as feeding everything in one call: the

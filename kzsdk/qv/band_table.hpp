@@ -6,8 +6,7 @@
 
 #include "kzsdk/abs/owned.hpp"
 
-namespace kz::qv
-{
+namespace kz::qv {
 
 /// Hands out a copy of a table that belongs to the caller. Does nothing when a pointer is null. When
 /// memory is short the copy is null and its count 0; nothing is reported.

@@ -10,8 +10,7 @@
 
 #include "kzsdk/abs/owned.hpp"
 
-namespace kz::qv
-{
+namespace kz::qv {
 
 template <class Manager>
 bool reached_limit(const Manager& manager) noexcept

@@ -21,8 +21,7 @@
 #include "kzsdk/abs/status.h"
 #include "kzsdk/dsp/polyphase_stream.hpp"
 
-namespace kz::qv
-{
+namespace kz::qv {
 
 enum InputFormat : uint32_t { kPcm8 = 1, kPcm16 = 2, kALaw = 3, kULaw = 4 };
 
@@ -31,10 +30,7 @@ constexpr bool is_input_format(uint32_t format) noexcept
     return format >= kPcm8 && format <= kULaw;
 }
 
-constexpr uint32_t bytes_per_sample(uint32_t format) noexcept
-{
-    return format == kPcm16 ? 2 : 1;
-}
+constexpr uint32_t bytes_per_sample(uint32_t format) noexcept { return format == kPcm16 ? 2 : 1; }
 
 /// Where the ring is read and written. A frame is full when the writer has caught up with its start.
 struct RingPosition {

@@ -6,8 +6,7 @@
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/abs/text.h"
 
-namespace
-{
+namespace {
 
 constexpr char kDocumentVersion[] = "1.0";
 constexpr char kSeparator[] = " ";
@@ -146,8 +145,7 @@ kz_status build_root(const kz::qv::FingerprintSource& source, OwnedTag& out_root
 
 } // namespace
 
-namespace kz::qv
-{
+namespace kz::qv {
 
 kz_status build_query_document(const FingerprintSource& source, XMLTag** out_tree) noexcept
 {

@@ -7,8 +7,7 @@
 #include "kzsdk/abs/status.h"
 #include "kzsdk/xml/xml.h"
 
-namespace kz::qv
-{
+namespace kz::qv {
 
 /// Times of a fingerprint in milliseconds. They are not part of the document.
 struct FingerprintTimes {

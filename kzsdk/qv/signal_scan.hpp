@@ -10,8 +10,7 @@
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/dsp/fxp_ops.hpp"
 
-namespace kz::qv
-{
+namespace kz::qv {
 
 /// Makes a detector with both rings cleared. Null when memory is short, and for a window that is 0 or
 /// whose rings would not fit 32 bits of bytes.

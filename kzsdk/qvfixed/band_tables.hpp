@@ -5,8 +5,7 @@
 #include <array>
 #include <cstdint>
 
-namespace kz::qvfixed
-{
+namespace kz::qvfixed {
 
 /// Band edges as pairs of first and last bin of the 16384-point transform of a halved frame, both
 /// inclusive: floor(f * 65536 / 11025) of the edges in hertz, truncated on purpose.

@@ -7,8 +7,7 @@
 #include "kzsdk/dsp/fxp_ops.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
-namespace
-{
+namespace {
 
 using namespace kz::fxp;
 
@@ -35,8 +34,7 @@ struct Extremes {
 };
 
 // Maps halved samples to levels 0 .. K - 1 by a multiplication with (K - 1) / range.
-class Quantiser
-{
+class Quantiser {
 public:
     Quantiser(int32_t bottom, int32_t range, uint32_t levels) noexcept
         : bottom_(bottom), top_level_(static_cast<int32_t>(levels - 1))

@@ -8,8 +8,7 @@
 #include "kzsdk/qv/query_document.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
-namespace
-{
+namespace {
 
 using Object = kzqvfixed_fingerprinter;
 

@@ -10,8 +10,7 @@
 #include "kzsdk/qvfixed/band_tables.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
-namespace
-{
+namespace {
 
 using namespace kz::fxp;
 

@@ -4,8 +4,7 @@
 #include "kzsdk/qv/signal_scan.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
-namespace
-{
+namespace {
 
 constexpr int32_t shifted_towards_zero(int32_t sample, int32_t shift) noexcept
 {

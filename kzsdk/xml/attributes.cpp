@@ -2,8 +2,7 @@
 
 #include "kzsdk/xml/text.hpp"
 
-namespace
-{
+namespace {
 
 using kz::owned;
 using kz::xml::Text;

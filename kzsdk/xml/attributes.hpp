@@ -4,8 +4,7 @@
 
 #include "kzsdk/xml/xml.h"
 
-namespace kz::xml
-{
+namespace kz::xml {
 
 void dispose_attributes(XMLAttr* first) noexcept;
 

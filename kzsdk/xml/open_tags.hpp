@@ -12,13 +12,11 @@
 
 #include "kzsdk/abs/owned.hpp"
 
-namespace kz::xml
-{
+namespace kz::xml {
 
 template <class Entry>
 requires std::is_trivially_copyable_v<Entry>
-class OpenTags
-{
+class OpenTags {
 public:
     bool is_empty() const noexcept { return count_ == 0; }
 

@@ -2,8 +2,7 @@
 
 #include "kzsdk/xml/text.hpp"
 
-namespace
-{
+namespace {
 
 using kz::xml::Text;
 using kz::xml::text_of;
@@ -23,10 +22,7 @@ Cut cut(const char* path) noexcept
     return {{path, static_cast<uint32_t>(slash - path)}, slash + 1};
 }
 
-bool has_more(const char* path) noexcept
-{
-    return path != nullptr && path[0] != '\0';
-}
+bool has_more(const char* path) noexcept { return path != nullptr && path[0] != '\0'; }
 
 XMLTag* sub_tag(const XMLTag* tag, Text name) noexcept
 {

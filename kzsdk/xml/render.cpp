@@ -6,8 +6,7 @@
 #include "kzsdk/xml/level.hpp"
 #include "kzsdk/xml/open_tags.hpp"
 
-namespace
-{
+namespace {
 
 using kz::xml::deeper;
 using kz::xml::Level;
@@ -45,8 +44,7 @@ constexpr const char* entity_for(char byte) noexcept
 
 /// Writes a tree into a buffer. Appending goes on until something fails; the status then stays, and
 /// later appends do nothing, until an indentation that always runs puts its own status in the place.
-class Renderer
-{
+class Renderer {
 public:
     Renderer(kz_dyn_buf& buffer, bool indent, bool newlines) noexcept
         : buffer_(buffer), indent_(indent), newlines_(newlines)

@@ -8,8 +8,7 @@
 #include "kzsdk/xml/open_tags.hpp"
 #include "kzsdk/xml/text.hpp"
 
-namespace
-{
+namespace {
 
 using kz::owned;
 using kz::xml::copy_of;
@@ -140,10 +139,7 @@ XMLTag* at_cursor(const XMLTag& parent, uintptr_t cursor) noexcept
 
 } // namespace
 
-XMLTag* CreateEmptyXMLTag() noexcept
-{
-    return kz::make_record<XMLTag>().release();
-}
+XMLTag* CreateEmptyXMLTag() noexcept { return kz::make_record<XMLTag>().release(); }
 
 XMLTag* CreateXMLTagFromBuf(const char* name, uint32_t name_count, const char* data,
                             uint32_t data_count) noexcept

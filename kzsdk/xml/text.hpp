@@ -7,8 +7,7 @@
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/abs/text.h"
 
-namespace kz::xml
-{
+namespace kz::xml {
 
 struct Text {
     const char* bytes = nullptr;

@@ -18,8 +18,7 @@
 
 #include <gtest/gtest.h>
 
-namespace
-{
+namespace {
 
 using Names = std::set<std::string>;
 
@@ -33,8 +32,7 @@ std::string text_of(const std::string& path)
 }
 
 /// The little of an ELF file that is asked for here.
-class SharedLibrary
-{
+class SharedLibrary {
 public:
     explicit SharedLibrary(const std::string& path) : bytes_(text_of(path))
     {

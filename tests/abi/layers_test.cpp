@@ -13,8 +13,7 @@
 
 #include <gtest/gtest.h>
 
-namespace
-{
+namespace {
 
 namespace fs = std::filesystem;
 

@@ -11,8 +11,7 @@
 
 #include "kzsdk/kzsdk.h"
 
-namespace
-{
+namespace {
 
 struct Field {
     std::string name;
@@ -42,10 +41,7 @@ void expect_layout(const std::vector<Field>& fields)
 
 // A field's offset is only to be had from its name.
 #define FIELD(record, name)                                                                        \
-    Field                                                                                          \
-    {                                                                                              \
-#name, offsetof(record, name), sizeof(record::name), alignof(decltype(record::name))       \
-    }
+    Field { #name, offsetof(record, name), sizeof(record::name), alignof(decltype(record::name)) }
 
 TEST(RecordLayout, OfTheStartUpConfiguration)
 {

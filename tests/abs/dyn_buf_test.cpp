@@ -15,8 +15,7 @@
 
 using namespace kz::test;
 
-namespace
-{
+namespace {
 
 static_assert(offsetof(kz_dyn_buf, data) == 0);
 static_assert(offsetof(kz_dyn_buf, length) == sizeof(void*));
@@ -45,9 +44,7 @@ std::string contents(const kz_dyn_buf* buffer)
             kz_dyn_buf_get_length(buffer)};
 }
 
-class DynBuf : public MemoryOn
-{
-};
+class DynBuf : public MemoryOn {};
 
 TEST_F(DynBuf, StartsEmptyWithItsCapacity)
 {

@@ -11,13 +11,9 @@
 
 using kz::test::Random;
 
-namespace
-{
+namespace {
 
-uint64_t bits(double x)
-{
-    return std::bit_cast<uint64_t>(x);
-}
+uint64_t bits(double x) { return std::bit_cast<uint64_t>(x); }
 
 TEST(Math, ForwardsToTheMathLibrary)
 {

@@ -9,19 +9,15 @@
 
 using namespace kz::test;
 
-namespace
-{
+namespace {
 
-class MemoryOff : public ::testing::Test
-{
+class MemoryOff : public ::testing::Test {
 protected:
     void SetUp() override { ASSERT_EQ(KZ_MEM_NOT_ON, kzmem_query_availability()); }
     void TearDown() override { static_cast<void>(kzmem_shutdown()); }
 };
 
-class Memory : public MemoryOn
-{
-};
+class Memory : public MemoryOn {};
 
 TEST_F(MemoryOff, NothingIsAllocated)
 {
@@ -32,10 +28,7 @@ TEST_F(MemoryOff, NothingIsAllocated)
     EXPECT_EQ(before, allocation_count());
 }
 
-TEST_F(MemoryOff, FreeRefusesEvenNull)
-{
-    EXPECT_EQ(KZ_MEM_NOT_ON, _kzmem_free(nullptr));
-}
+TEST_F(MemoryOff, FreeRefusesEvenNull) { EXPECT_EQ(KZ_MEM_NOT_ON, _kzmem_free(nullptr)); }
 
 TEST_F(MemoryOff, TheSwitchReportsWhatItFound)
 {
@@ -120,10 +113,7 @@ TEST_F(Memory, AZeroSizeIsPassedToTheHeap)
     EXPECT_EQ(KZ_OK, _kzmem_free(b));
 }
 
-TEST_F(Memory, FreeingNullSucceeds)
-{
-    EXPECT_EQ(KZ_OK, _kzmem_free(nullptr));
-}
+TEST_F(Memory, FreeingNullSucceeds) { EXPECT_EQ(KZ_OK, _kzmem_free(nullptr)); }
 
 TEST_F(Memory, AFailedReallocLeavesTheOldBlock)
 {

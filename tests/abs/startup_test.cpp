@@ -6,8 +6,7 @@
 #include "kzsdk/abs/memory.h"
 #include "support/allocation.hpp"
 
-namespace
-{
+namespace {
 
 static_assert(offsetof(kzconf_configuration, memory_arg_text) == 0);
 static_assert(offsetof(kzconf_configuration, memory_arg) == sizeof(void*));
@@ -15,8 +14,7 @@ static_assert(offsetof(kzconf_configuration, memory_args_present) == sizeof(void
 static_assert(offsetof(kzconf_configuration, reserved) == sizeof(void*) + 8);
 static_assert(sizeof(kzconf_configuration) == (sizeof(void*) == 4 ? 17 * 4 : 72));
 
-class Startup : public ::testing::Test
-{
+class Startup : public ::testing::Test {
 protected:
     void SetUp() override
     {

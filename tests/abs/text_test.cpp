@@ -16,15 +16,11 @@
 
 using namespace kz::test;
 
-namespace
-{
+namespace {
 
 constexpr uint32_t kMax = std::numeric_limits<uint32_t>::max();
 
-int sign(int order)
-{
-    return (order > 0) - (order < 0);
-}
+int sign(int order) { return (order > 0) - (order < 0); }
 
 /// Few different bytes, so that equal beginnings are common.
 std::string random_text(Random& random, const std::string& bytes, uint32_t longest)
@@ -139,9 +135,7 @@ TEST(Text, ATerminatedCopyOfNothingStillWritesOneByte)
     EXPECT_EQ(0, std::memcmp(buffer, "\0y", 3));
 }
 
-class TextCopies : public MemoryOn
-{
-};
+class TextCopies : public MemoryOn {};
 
 TEST_F(TextCopies, ADuplicateIsAnotherBlock)
 {

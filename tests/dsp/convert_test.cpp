@@ -12,8 +12,7 @@
 
 #include "support/signals.hpp"
 
-namespace
-{
+namespace {
 
 using kz::test::Random;
 using Bytes = std::vector<uint8_t>;
@@ -82,10 +81,7 @@ TEST(Companding, ALawPolarityIsInverted)
 
 enum class Encoding { Pcm16, Pcm8, ALaw, ULaw };
 
-int32_t sample_bytes(Encoding encoding)
-{
-    return encoding == Encoding::Pcm16 ? 2 : 1;
-}
+int32_t sample_bytes(Encoding encoding) { return encoding == Encoding::Pcm16 ? 2 : 1; }
 
 int64_t sample_at(Encoding encoding, const Bytes& audio, size_t index)
 {
@@ -171,10 +167,7 @@ bool keeps_its_sum(int32_t converter_channels, Encoding encoding)
     return converter_channels == 0 && (encoding == Encoding::ALaw || encoding == Encoding::ULaw);
 }
 
-int32_t wrapped(int64_t value)
-{
-    return std::bit_cast<int32_t>(static_cast<uint32_t>(value));
-}
+int32_t wrapped(int64_t value) { return std::bit_cast<int32_t>(static_cast<uint32_t>(value)); }
 
 /// Sum << bits for one channel, halved in weight as often as the number of channels asks.
 int32_t averaged(int64_t sum, int32_t channels, int32_t bits)
@@ -283,15 +276,9 @@ void expect_the_model(const std::vector<Converter<Word>>& converters)
     }
 }
 
-TEST(Convert, ToFixedPointAgreesWithTheModel)
-{
-    expect_the_model(fixed_converters());
-}
+TEST(Convert, ToFixedPointAgreesWithTheModel) { expect_the_model(fixed_converters()); }
 
-TEST(Convert, ToFloatAgreesWithTheModel)
-{
-    expect_the_model(float_converters());
-}
+TEST(Convert, ToFloatAgreesWithTheModel) { expect_the_model(float_converters()); }
 
 TEST(Convert, AFullScaleSumOfManyChannelsAgreesWithTheModel)
 {

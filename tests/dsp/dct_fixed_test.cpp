@@ -12,11 +12,9 @@
 #include "support/allocation.hpp"
 #include "support/signals.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
 struct Destroy {
     void operator()(KZDSP_DCT_fixed* dct) const { KZDSP_DCT_fixed_destroy(dct); }
@@ -32,9 +30,7 @@ Words transform(int32_t order, Words data)
     return data;
 }
 
-class DctFixed : public MemoryOn
-{
-};
+class DctFixed : public MemoryOn {};
 
 } // namespace
 

@@ -12,8 +12,7 @@
 #include "kzsdk/dsp/log_segments.hpp"
 #include "support/signals.hpp"
 
-namespace
-{
+namespace {
 
 using kz::fxp::kLogSegments;
 using kz::fxp::LogSegment;
@@ -21,10 +20,7 @@ using kz::test::Random;
 
 constexpr long double kUnit = 0x1p-29L; // of a coefficient
 
-std::array<int32_t, 3> words(const LogSegment& row)
-{
-    return {row.a, row.b, row.c};
-}
+std::array<int32_t, 3> words(const LogSegment& row) { return {row.a, row.b, row.c}; }
 
 // ---- The table ------------------------------------------------------------------------------
 
@@ -111,14 +107,10 @@ long double true_log(uint32_t mantissa, int32_t exponent)
     return std::log(1.0L * mantissa) + (exponent - 32.0L) * std::numbers::ln2_v<long double>;
 }
 
-bool is_normalised(int32_t m)
-{
-    return m == 0 || (m < -0x40000000 || m >= 0x40000000);
-}
+bool is_normalised(int32_t m) { return m == 0 || (m < -0x40000000 || m >= 0x40000000); }
 
 /// The steps again, in 64-bit arithmetic and one shift at a time.
-class Model
-{
+class Model {
 public:
     static Log log(uint32_t m, int64_t e)
     {

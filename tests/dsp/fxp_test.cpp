@@ -10,8 +10,7 @@
 #include "kzsdk/dsp/fxp_ops.hpp"
 #include "support/signals.hpp"
 
-namespace
-{
+namespace {
 
 using kz::test::Random;
 
@@ -30,27 +29,15 @@ constexpr uint32_t kEdgeWords[] = {
 constexpr int32_t kEdgeExponents[] = {kLeast, kLeast + 1, -64, -33, -32, -31,       -30,  -1,
                                       0,      1,          30,  31,  32,  kMost - 1, kMost};
 
-int32_t as_signed(uint32_t word)
-{
-    return std::bit_cast<int32_t>(word);
-}
-uint32_t as_unsigned(int32_t word)
-{
-    return std::bit_cast<uint32_t>(word);
-}
-int32_t wrapped(int64_t value)
-{
-    return as_signed(static_cast<uint32_t>(value));
-}
+int32_t as_signed(uint32_t word) { return std::bit_cast<int32_t>(word); }
+uint32_t as_unsigned(int32_t word) { return std::bit_cast<uint32_t>(word); }
+int32_t wrapped(int64_t value) { return as_signed(static_cast<uint32_t>(value)); }
 
 int64_t value_of(FxpTypeLong x)
 {
     return std::bit_cast<int64_t>(uint64_t{as_unsigned(x.hi)} << 32 | x.lo);
 }
-uint64_t value_of(FxpUTypeLong x)
-{
-    return uint64_t{x.hi} << 32 | x.lo;
-}
+uint64_t value_of(FxpUTypeLong x) { return uint64_t{x.hi} << 32 | x.lo; }
 
 /// A word of random length, positive or with leading ones, so that small magnitudes occur as well.
 uint32_t any_word(Random& random)
@@ -171,10 +158,7 @@ TEST(FxpSums, OfDoubleWordsCarryAndWrap)
 
 // ---- Shifts ---------------------------------------------------------------------------------
 
-int32_t modulo_256(int64_t count)
-{
-    return static_cast<int32_t>(count & 0xff);
-}
+int32_t modulo_256(int64_t count) { return static_cast<int32_t>(count & 0xff); }
 
 /// Up to 32 a double word is shifted as a whole; beyond, nothing crosses the middle.
 int64_t model_right(int64_t x, int64_t count)

@@ -12,11 +12,9 @@
 #include "support/allocation.hpp"
 #include "support/signals.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
 constexpr uint32_t kWorkingRate = 11025;
 constexpr uint32_t kRates[] = {8000, 16000, 22050, 24000, 32000, 44100, 48000};
@@ -138,9 +136,7 @@ void expect_within_bounds(uint32_t rate, const Words& exact, const Words& output
     }
 }
 
-class ResamplerFixed : public MemoryOn
-{
-};
+class ResamplerFixed : public MemoryOn {};
 
 } // namespace
 
@@ -322,8 +318,7 @@ TEST_F(ResamplerFixed, LoudStereoWrapsTheCrossProducts)
     EXPECT_GT(wrapped, 0);
 }
 
-namespace
-{
+namespace {
 
 double rms(const Words& words, size_t from)
 {
@@ -433,8 +428,7 @@ TEST_F(ResamplerFixed, FailedAllocationsMakeNoResampler)
     }
 }
 
-namespace
-{
+namespace {
 
 int32_t dual(const Words& samples, size_t first_count, const std::vector<int16_t>& msb,
              const std::vector<uint16_t>& lsb, uint32_t stride, int32_t shift)

@@ -12,11 +12,9 @@
 #include "golden/table_digests.hpp"
 #include "kzsdk/dsp/resampler.h"
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
 // FNV-1a over the words, low byte first.
 template <class Word>

@@ -7,15 +7,11 @@
 #include "support/allocation.hpp"
 #include "support/signals.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
-class Extraction : public MemoryOn
-{
-};
+class Extraction : public MemoryOn {};
 
 kz_fpx_handle* create(uint32_t rate = 44100, uint32_t channels = 1)
 {

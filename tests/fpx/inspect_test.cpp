@@ -8,15 +8,11 @@
 #include "support/allocation.hpp"
 #include "support/signals.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
-class Inspect : public MemoryOn
-{
-};
+class Inspect : public MemoryOn {};
 
 constexpr uint32_t kRates[] = {8000, 11025, 16000, 22050, 24000, 32000, 44100, 48000};
 
@@ -25,8 +21,7 @@ const kzqvfixed_fingerprinter& fixed(const kz_fpx_handle& handle)
     return *static_cast<const kzqvfixed_fingerprinter*>(handle.instance);
 }
 
-class Handle
-{
+class Handle {
 public:
     Handle(uint32_t rate, uint32_t channels) : channels_(channels)
     {

@@ -8,14 +8,11 @@
 #include "support/allocation.hpp"
 #include "support/signals.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
-class Serialize : public MemoryOn
-{
+class Serialize : public MemoryOn {
 protected:
     void SetUp() override
     {

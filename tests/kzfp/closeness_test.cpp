@@ -11,8 +11,7 @@
 
 #include <gtest/gtest.h>
 
-namespace
-{
+namespace {
 
 using namespace kz::test;
 
@@ -168,9 +167,6 @@ TEST(Closeness, OtherSoundIsFurtherAway)
     }
 }
 
-TEST(Closeness, TableForTheDocumentation)
-{
-    print_table();
-}
+TEST(Closeness, TableForTheDocumentation) { print_table(); }
 
 } // namespace

@@ -12,11 +12,9 @@
 
 #include <gtest/gtest.h>
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
 void append_little_endian(std::string& bytes, uint32_t word, int count)
 {
@@ -27,10 +25,7 @@ void append_little_endian(std::string& bytes, uint32_t word, int count)
 
 } // namespace
 
-std::string clip(const std::string& name)
-{
-    return KZFP_CLIPS "/" + name;
-}
+std::string clip(const std::string& name) { return KZFP_CLIPS "/" + name; }
 
 ProcessResult kzfp(std::vector<std::string> arguments, const ProcessSetup& setup)
 {

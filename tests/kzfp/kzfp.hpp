@@ -8,8 +8,7 @@
 
 #include "support/process.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
 /// Path of a clip made by scripts/make_clips.sh.
 std::string clip(const std::string& name);
@@ -36,8 +35,7 @@ ProcessSetup fed_with(const std::string& text);
 std::string wav_header(uint32_t rate, uint32_t channels, uint32_t data_bytes);
 
 /// A directory of its own for a test, removed at the end.
-class ScratchDirectory
-{
+class ScratchDirectory {
 public:
     ScratchDirectory();
     ~ScratchDirectory();

@@ -11,8 +11,7 @@
 
 #include "support/signals.hpp"
 
-namespace
-{
+namespace {
 
 using namespace kz::test;
 using nlohmann::json;
@@ -447,10 +446,7 @@ TEST(KzfpStatus, WrongUsageIsTwo)
     }
 }
 
-TEST(KzfpProgress, IsForTerminalsOnly)
-{
-    EXPECT_EQ("", kzfp({kMusic, kMusic}).err);
-}
+TEST(KzfpProgress, IsForTerminalsOnly) { EXPECT_EQ("", kzfp({kMusic, kMusic}).err); }
 
 // `script` runs the program on a terminal of its own.
 TEST(KzfpProgress, IsShownOnATerminalAndClearedBeforeEachResult)

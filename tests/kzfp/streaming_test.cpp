@@ -15,8 +15,7 @@
 #include "kzsdk/fpx/fpx.h"
 #include "support/signals.hpp"
 
-namespace
-{
+namespace {
 
 using namespace kz::test;
 

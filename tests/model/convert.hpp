@@ -9,8 +9,7 @@
 
 #include "model/words.hpp"
 
-namespace kz::model
-{
+namespace kz::model {
 
 enum class Format : uint32_t { pcm8 = 1, pcm16 = 2, alaw = 3, ulaw = 4 };
 
@@ -38,10 +37,7 @@ static_assert(ulaw_value(0x80) == 32124 && ulaw_value(0xff) == 0);
 static_assert(inverted_alaw_value(0x2a) == 32256 && inverted_alaw_value(0x55) == 8);
 static_assert(inverted_alaw_value(0xaa) == -32256 && inverted_alaw_value(0xd5) == -8);
 
-constexpr size_t bytes_per_sample(Format format)
-{
-    return format == Format::pcm16 ? 2 : 1;
-}
+constexpr size_t bytes_per_sample(Format format) { return format == Format::pcm16 ? 2 : 1; }
 
 /// One sample as an integer; 8-bit samples below the middle come out as 128..255.
 constexpr int32_t sample_value(Format format, std::span<const uint8_t> bytes)

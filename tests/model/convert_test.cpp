@@ -8,8 +8,7 @@
 
 using namespace kz::model;
 
-namespace
-{
+namespace {
 
 using Converter = void (*)(const void*, FxpType*, int32_t);
 

@@ -12,8 +12,7 @@
 
 #include "model/words.hpp"
 
-namespace kz::model
-{
+namespace kz::model {
 
 inline constexpr int32_t kDcFactor = 185363; ///< of 2^32
 
@@ -47,8 +46,7 @@ inline void bit_reverse(std::span<int32_t> x)
     }
 }
 
-class Dct
-{
+class Dct {
 public:
     explicit Dct(int order) : order_(order), factors_(butterfly_factors(order)) {}
 

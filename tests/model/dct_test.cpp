@@ -13,8 +13,7 @@
 
 using namespace kz::model;
 
-namespace
-{
+namespace {
 
 struct Destroy {
     void operator()(KZDSP_DCT_fixed* dct) const { KZDSP_DCT_fixed_destroy(dct); }
@@ -42,9 +41,7 @@ long double defined_bin(std::span<const int32_t> x, size_t k)
 
 } // namespace
 
-class ModelDct : public kz::test::MemoryOn
-{
-};
+class ModelDct : public kz::test::MemoryOn {};
 
 TEST_F(ModelDct, FactorsAreThoseOfTheLibrary)
 {

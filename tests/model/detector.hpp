@@ -9,13 +9,11 @@
 #include <numeric>
 #include <span>
 
-namespace kz::model
-{
+namespace kz::model {
 
 /// Signal is where the mean absolute deviation from the moving mean, each deviation clamped, passes
 /// the threshold: half a window before that, but never before the block in which it happens.
-class Detector
-{
+class Detector {
 public:
     explicit Detector(uint32_t window = 128, uint32_t threshold = 100, int32_t max_deviation = 1000)
         : window_(window), threshold_(threshold), max_deviation_(max_deviation)

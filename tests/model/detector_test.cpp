@@ -11,8 +11,7 @@
 
 using namespace kz::model;
 
-namespace
-{
+namespace {
 
 struct Destroy {
     void operator()(kzqvfixed_signal_detector* detector) const
@@ -51,9 +50,7 @@ std::vector<int32_t> late_music(size_t quiet, double level)
 
 } // namespace
 
-class ModelDetector : public kz::test::MemoryOn
-{
-};
+class ModelDetector : public kz::test::MemoryOn {};
 
 TEST_F(ModelDetector, LibraryFindsTheSameStartInOneBlock)
 {

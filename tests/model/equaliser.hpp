@@ -9,8 +9,7 @@
 
 #include "model/words.hpp"
 
-namespace kz::model
-{
+namespace kz::model {
 
 /// The level of every sample, 0..levels - 1: a sample's share of the range, by a rounded reciprocal.
 inline std::vector<uint32_t> levels_of(std::span<const int32_t> samples, uint32_t levels)

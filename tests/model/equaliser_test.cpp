@@ -11,8 +11,7 @@
 
 using namespace kz::model;
 
-namespace
-{
+namespace {
 
 std::vector<int32_t> library_equalise2(std::span<const int32_t> samples, uint32_t levels)
 {
@@ -36,9 +35,7 @@ std::vector<int32_t> library_equalise_dual(std::span<const int32_t> samples, siz
 
 } // namespace
 
-class ModelEqualiser : public kz::test::MemoryOn
-{
-};
+class ModelEqualiser : public kz::test::MemoryOn {};
 
 TEST_F(ModelEqualiser, LibraryAgreesOnFramesOfEveryKind)
 {

@@ -13,8 +13,7 @@
 
 #include "model/resampler.hpp"
 
-namespace kz::model
-{
+namespace kz::model {
 
 /// Zero taps ahead of the filter, so that its centre lies where the preroll expects it.
 constexpr size_t leading_zero_taps(const Ratio& ratio)
@@ -107,10 +106,7 @@ inline std::vector<float> design(const Ratio& ratio)
 }
 
 /// The gain that the stored taps carry beside their design: a centre tap above 1 would not fit Q31.
-constexpr double storage_gain(const Ratio& ratio)
-{
-    return ratio.up > ratio.down ? 0.5 : 1.0;
-}
+constexpr double storage_gain(const Ratio& ratio) { return ratio.up > ratio.down ? 0.5 : 1.0; }
 
 /// The design in Q31, rounded to nearest.
 inline std::vector<int32_t> design_words(const Ratio& ratio)

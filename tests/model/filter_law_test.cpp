@@ -8,8 +8,7 @@
 
 using namespace kz::model;
 
-namespace
-{
+namespace {
 
 std::vector<Ratio> filtered_ratios()
 {
@@ -20,8 +19,7 @@ std::vector<Ratio> filtered_ratios()
 }
 
 /// A stored filter, its taps as fractions and its response in hertz of the input.
-class StoredFilter
-{
+class StoredFilter {
 public:
     explicit StoredFilter(const Ratio& ratio_of) : ratio(ratio_of)
     {

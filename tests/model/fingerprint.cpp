@@ -2,11 +2,9 @@
 
 #include <algorithm>
 
-namespace kz::model
-{
+namespace kz::model {
 
-namespace
-{
+namespace {
 
 constexpr size_t kChunk = 4096;
 constexpr uint32_t kDetectorShift = 13;

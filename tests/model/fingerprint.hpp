@@ -14,8 +14,7 @@
 #include "model/resampler.hpp"
 #include "model/statistics.hpp"
 
-namespace kz::model
-{
+namespace kz::model {
 
 /// The taps in Q31 that a model is to use: for the ratio itself and for the 2:1 decimator.
 struct Filters {
@@ -23,8 +22,7 @@ struct Filters {
     std::vector<int32_t> decimator;
 };
 
-class Fingerprint
-{
+class Fingerprint {
 public:
     Fingerprint(const Ratio& ratio, Format format, size_t channels, const Filters& filters);
 

@@ -14,8 +14,7 @@
 #include "model/resampler.hpp"
 #include "model/words.hpp"
 
-namespace kz::model
-{
+namespace kz::model {
 
 inline constexpr size_t kFrameLength = 32768;
 inline constexpr size_t kFrameHop = 11264;
@@ -51,8 +50,7 @@ struct Features {
     std::array<uint32_t, kBands> amplitude;
 };
 
-class FrameAnalyser
-{
+class FrameAnalyser {
 public:
     explicit FrameAnalyser(std::vector<int32_t> half_band_taps)
         : decimator_(kHalf, std::move(half_band_taps)), dct_(14)

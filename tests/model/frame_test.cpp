@@ -14,8 +14,7 @@
 
 using namespace kz::model;
 
-namespace
-{
+namespace {
 
 struct Destroy {
     void operator()(kzqvfixed_frame_manager* manager) const
@@ -70,9 +69,7 @@ std::vector<int32_t> frame_of(const Material& material, size_t start)
 
 } // namespace
 
-class ModelFrame : public kz::test::MemoryOn
-{
-};
+class ModelFrame : public kz::test::MemoryOn {};
 
 TEST_F(ModelFrame, LibraryFeaturesAgreeToTheWord)
 {

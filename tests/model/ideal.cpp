@@ -8,11 +8,9 @@
 
 #include "model/filter_design.hpp"
 
-namespace kz::model::ideal
-{
+namespace kz::model::ideal {
 
-namespace
-{
+namespace {
 
 constexpr double kFullRange = 16384;   // twice 8192: the peak-to-peak range of a silent frame
 constexpr double kDetectorUnit = 8192; // 2^13
@@ -42,10 +40,7 @@ void fourier_transform(std::span<std::complex<double>> x)
     }
 }
 
-double square(double value)
-{
-    return value * value;
-}
+double square(double value) { return value * value; }
 
 void store_shares(const std::array<double, kBands>& values, std::span<double, kBands> shares)
 {

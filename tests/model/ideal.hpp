@@ -14,8 +14,7 @@
 #include "model/frame.hpp"
 #include "model/resampler.hpp"
 
-namespace kz::model::ideal
-{
+namespace kz::model::ideal {
 
 using Signal = std::vector<double>;
 using Shares = std::array<double, 2 * kBands>;

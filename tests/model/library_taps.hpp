@@ -11,8 +11,7 @@
 #include "model/fingerprint.hpp"
 #include "model/resampler.hpp"
 
-namespace kz::model
-{
+namespace kz::model {
 
 struct StoredTaps {
     uint32_t hertz;

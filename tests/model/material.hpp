@@ -11,8 +11,7 @@
 
 #include "support/signals.hpp"
 
-namespace kz::model
-{
+namespace kz::model {
 
 struct Material {
     std::string name;

@@ -13,8 +13,7 @@
 #include <utility>
 #include <vector>
 
-namespace kz::model
-{
+namespace kz::model {
 
 struct Element {
     std::string name;
@@ -50,8 +49,7 @@ inline Element query_document(std::span<const int16_t> values)
 
 /// Reads just as much of XML as the document uses; throws std::runtime_error for anything else.
 /// Text that is only white space counts as none.
-class DocumentReader
-{
+class DocumentReader {
 public:
     static Element read(std::string_view text)
     {

@@ -19,8 +19,7 @@
 
 #include "model/words.hpp"
 
-namespace kz::model
-{
+namespace kz::model {
 
 struct Ratio {
     uint32_t hertz; ///< input rate; 2 for the 2:1 decimator
@@ -55,18 +54,11 @@ constexpr size_t preroll(const Ratio& ratio)
 }
 
 /// First sample of the window of output n, counted in the stream with its zeros.
-constexpr size_t window_start(const Ratio& ratio, size_t n)
-{
-    return n * ratio.down / ratio.up;
-}
+constexpr size_t window_start(const Ratio& ratio, size_t n) { return n * ratio.down / ratio.up; }
 
-constexpr size_t phase_of(const Ratio& ratio, size_t n)
-{
-    return (n + 1) * ratio.down % ratio.up;
-}
+constexpr size_t phase_of(const Ratio& ratio, size_t n) { return (n + 1) * ratio.down % ratio.up; }
 
-class Resampler
-{
+class Resampler {
 public:
     struct Counts {
         size_t consumed;

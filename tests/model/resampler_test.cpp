@@ -14,8 +14,7 @@
 
 using namespace kz::model;
 
-namespace
-{
+namespace {
 
 struct Destroy {
     void operator()(KZDSP_resampler_fixed* resampler) const
@@ -99,9 +98,7 @@ Tone tone_in(std::span<const int32_t> signal, double hertz)
 
 } // namespace
 
-class ModelResampler : public kz::test::MemoryOn
-{
-};
+class ModelResampler : public kz::test::MemoryOn {};
 
 TEST_F(ModelResampler, LibraryAgreesInOneCall)
 {

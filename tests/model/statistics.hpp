@@ -10,8 +10,7 @@
 #include "model/frame.hpp"
 #include "model/words.hpp"
 
-namespace kz::model
-{
+namespace kz::model {
 
 using Values = std::array<int16_t, 2 * kBands>;
 

@@ -14,15 +14,13 @@
 
 using namespace kz::model;
 
-namespace
-{
+namespace {
 
 struct Destroy {
     void operator()(kzqvfixed_fingerprinter* object) const { kzqvfixed_destructor(object); }
 };
 
-class Twins
-{
+class Twins {
 public:
     Twins(const Ratio& ratio, Format format, size_t channels)
         : model_(ratio, format, channels, library_filters(ratio))
@@ -73,10 +71,10 @@ private:
     std::unique_ptr<kzqvfixed_fingerprinter, Destroy> library_;
 };
 
-/// A low hum, then noise.
+/// A hum too low to count, then noise.
 std::vector<uint8_t> song(uint32_t rate, double hum, double seconds)
 {
-    std::vector<int16_t> samples = kz::test::sine(rate, 30, hum, 0.005);
+    std::vector<int16_t> samples = kz::test::sine(rate, 30, hum, 0.0012);
     const std::vector<int16_t> noise =
         kz::test::noise(static_cast<size_t>(seconds * rate), 0.7, rate);
     samples.insert(samples.end(), noise.begin(), noise.end());
@@ -85,9 +83,7 @@ std::vector<uint8_t> song(uint32_t rate, double hum, double seconds)
 
 } // namespace
 
-class Stream : public kz::test::MemoryOn
-{
-};
+class Stream : public kz::test::MemoryOn {};
 
 TEST_F(Stream, OneCallLeavesTheSameWords)
 {

@@ -9,19 +9,12 @@
 #include <bit>
 #include <cstdint>
 
-namespace kz::model
-{
+namespace kz::model {
 
 /// The low 32 bits of a value, read as signed: this is where sums and products wrap.
-constexpr int32_t word(int64_t value)
-{
-    return static_cast<int32_t>(static_cast<uint32_t>(value));
-}
+constexpr int32_t word(int64_t value) { return static_cast<int32_t>(static_cast<uint32_t>(value)); }
 
-constexpr uint32_t unsigned_word(int64_t value)
-{
-    return static_cast<uint32_t>(value);
-}
+constexpr uint32_t unsigned_word(int64_t value) { return static_cast<uint32_t>(value); }
 
 /// Upper half of the product of the magnitudes, with the sign of the product.
 constexpr int32_t high_product(int32_t a, int32_t b)
@@ -29,10 +22,7 @@ constexpr int32_t high_product(int32_t a, int32_t b)
     return word(int64_t{a} * b / (int64_t{1} << 32));
 }
 
-constexpr int leading_zeros(uint32_t value)
-{
-    return std::countl_zero(value);
-}
+constexpr int leading_zeros(uint32_t value) { return std::countl_zero(value); }
 
 /// A left shift whose count may be anything: outside 0..31 nothing is left.
 constexpr int32_t shifted_left(int32_t value, int count)

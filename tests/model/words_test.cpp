@@ -9,8 +9,7 @@
 
 using namespace kz::model;
 
-namespace
-{
+namespace {
 
 /// By how much the square root falls short of floor(sqrt(value * 2^30)).
 uint64_t shortfall(uint32_t value)

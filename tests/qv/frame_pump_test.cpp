@@ -4,8 +4,7 @@
 
 #include <gtest/gtest.h>
 
-namespace kz::test
-{
+namespace kz::test {
 
 TEST(RingPosition, FramesAreFullWhenTheWriterCatchesUpWithTheirStart)
 {

@@ -9,11 +9,9 @@
 #include "kzsdk/xml/xml.h"
 #include "support/allocation.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
 struct Fingerprint {
     std::vector<uint16_t> values;
@@ -65,9 +63,7 @@ std::string expected(const std::string& count, const std::string& values)
            "</FP_BLOCK></FP_BLOCKS></KZFPX_FP_QUERY>";
 }
 
-class QueryDocument : public MemoryOn
-{
-};
+class QueryDocument : public MemoryOn {};
 
 } // namespace
 
@@ -94,10 +90,7 @@ TEST_F(QueryDocument, TheCountIsThatOfTheValues)
     }
 }
 
-TEST_F(QueryDocument, AFingerprintWithoutValuesIsRefused)
-{
-    EXPECT_EQ("900f0009", text_of({{}}));
-}
+TEST_F(QueryDocument, AFingerprintWithoutValuesIsRefused) { EXPECT_EQ("900f0009", text_of({{}})); }
 
 TEST_F(QueryDocument, ARefusalPassesThroughUnchanged)
 {

@@ -5,15 +5,11 @@
 #include "support/allocation.hpp"
 #include "support/qvfixed_objects.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
-class Config : public MemoryOn
-{
-};
+class Config : public MemoryOn {};
 
 // floor(f * 65536 / 11025) of the band edges in hertz.
 constexpr int32_t kTable[] = {0,    593,  593,  1188,  1188,  1782,  1782,  2377,  2377,  3031,

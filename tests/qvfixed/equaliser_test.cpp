@@ -8,11 +8,9 @@
 #include "support/qvfixed_objects.hpp"
 #include "support/signals.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
 using Words = std::vector<int32_t>;
 
@@ -45,9 +43,7 @@ Words random_frame(size_t count, int bits, uint64_t seed)
     return frame;
 }
 
-class Equaliser : public MemoryOn
-{
-};
+class Equaliser : public MemoryOn {};
 
 } // namespace
 

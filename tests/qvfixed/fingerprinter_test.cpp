@@ -7,17 +7,13 @@
 #include "support/qvfixed_objects.hpp"
 #include "support/signals.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
 constexpr uint32_t kPcm8 = 1, kPcm16 = 2, kALaw = 3, kULaw = 4;
 
-class Fingerprinter : public MemoryOn
-{
-};
+class Fingerprinter : public MemoryOn {};
 
 kz_status construct(uint32_t rate, uint32_t format, uint32_t channels)
 {

@@ -10,11 +10,9 @@
 #include "support/qvfixed_objects.hpp"
 #include "support/signals.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
 constexpr uint32_t kFrame = 32768;
 
@@ -52,9 +50,7 @@ Manager unlimited()
     return make_manager([](kzqvfixed_config& config) { config.frame_limit = 0; });
 }
 
-class FrameManager : public MemoryOn
-{
-};
+class FrameManager : public MemoryOn {};
 
 } // namespace
 
@@ -257,8 +253,7 @@ TEST_F(FrameManager, NothingToDivideByStoresZeros)
 }
 
 // Puts records with these features, one band each, into an unlimited manager.
-namespace
-{
+namespace {
 
 struct Feature {
     int32_t energy;

@@ -8,11 +8,9 @@
 #include "support/qvfixed_objects.hpp"
 #include "support/signals.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
 using Words = std::vector<int32_t>;
 
@@ -30,8 +28,7 @@ uint32_t offset(kzqvfixed_signal_detector& detector, const Words& block, int32_t
 }
 
 // A moving mean and a moving mean of the clamped deviation, with the sums taken anew each time.
-class Model
-{
+class Model {
 public:
     Model(uint32_t window, uint32_t threshold, int32_t max_deviation)
         : window_(window), threshold_(threshold), max_deviation_(max_deviation)
@@ -78,9 +75,7 @@ private:
     std::deque<int64_t> deviations_;
 };
 
-class SignalDetector : public MemoryOn
-{
-};
+class SignalDetector : public MemoryOn {};
 
 } // namespace
 

@@ -6,11 +6,9 @@
 #include "kzsdk/qvfixed/qvfixed.h"
 #include "support/signals.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
 // floor(sqrt(value * 2^30)), by correction of an estimate.
 uint64_t exact_root(uint64_t value)

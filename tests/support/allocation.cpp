@@ -3,8 +3,7 @@
 #include <atomic>
 #include <cstddef>
 
-namespace
-{
+namespace {
 
 std::atomic<int64_t> blocks{0};
 std::atomic<uint64_t> allocations{0};
@@ -64,18 +63,11 @@ void __wrap_free(void* block)
 
 } // extern "C"
 
-namespace kz::test
-{
+namespace kz::test {
 
-int64_t live_blocks()
-{
-    return blocks;
-}
+int64_t live_blocks() { return blocks; }
 
-uint64_t allocation_count()
-{
-    return allocations;
-}
+uint64_t allocation_count() { return allocations; }
 
 AllocationFault::AllocationFault(uint64_t nth, Mode mode)
 {
@@ -84,14 +76,8 @@ AllocationFault::AllocationFault(uint64_t nth, Mode mode)
     fail_at = allocations + nth;
 }
 
-AllocationFault::~AllocationFault()
-{
-    fail_at = 0;
-}
+AllocationFault::~AllocationFault() { fail_at = 0; }
 
-bool AllocationFault::fired() const
-{
-    return has_fired;
-}
+bool AllocationFault::fired() const { return has_fired; }
 
 } // namespace kz::test

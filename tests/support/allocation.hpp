@@ -12,8 +12,7 @@
 
 #include "kzsdk/abs/memory.h"
 
-namespace kz::test
-{
+namespace kz::test {
 
 /// Blocks that were allocated and not yet freed.
 int64_t live_blocks();
@@ -23,8 +22,7 @@ uint64_t allocation_count();
 
 /// While it lives, the n-th allocation from now (1 is the next) fails: that one only, or with
 /// `FromThenOn` every later one too.
-class AllocationFault
-{
+class AllocationFault {
 public:
     enum Mode { Once, FromThenOn };
     explicit AllocationFault(uint64_t nth, Mode mode = Once);
@@ -60,8 +58,7 @@ void for_every_failed_allocation(Attempt attempt)
 }
 
 /// The memory manager is on during each test, and every block is back at its end.
-class MemoryOn : public ::testing::Test
-{
+class MemoryOn : public ::testing::Test {
 protected:
     void SetUp() override
     {

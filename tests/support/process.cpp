@@ -15,11 +15,9 @@
 
 extern char** environ;
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
 void check(bool good, const char* what)
 {
@@ -28,8 +26,7 @@ void check(bool good, const char* what)
     }
 }
 
-class Pipe
-{
+class Pipe {
 public:
     Pipe() { check(::pipe2(ends_.data(), O_CLOEXEC) == 0, "pipe"); }
     ~Pipe()
@@ -55,8 +52,7 @@ private:
     std::array<int, 2> ends_ = {-1, -1};
 };
 
-class Actions
-{
+class Actions {
 public:
     Actions() { ::posix_spawn_file_actions_init(&actions_); }
     ~Actions() { ::posix_spawn_file_actions_destroy(&actions_); }
@@ -93,8 +89,7 @@ std::vector<std::string> environment_with(const std::vector<std::string>& additi
 }
 
 /// Serves the three pipes of a running program until it has closed its outputs.
-class Conversation
-{
+class Conversation {
 public:
     Conversation(Pipe& in, Pipe& out, Pipe& err, const ProcessSetup& setup, ProcessResult& result)
         : in_(in), out_(out), err_(err), setup_(setup), result_(result)

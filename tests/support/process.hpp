@@ -8,8 +8,7 @@
 #include <string_view>
 #include <vector>
 
-namespace kz::test
-{
+namespace kz::test {
 
 struct ProcessResult {
     int status = -1;             ///< exit status; 128 + n when signal n ended the program

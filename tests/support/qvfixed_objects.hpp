@@ -7,8 +7,7 @@
 
 #include "kzsdk/qvfixed/qvfixed.h"
 
-namespace kz::test
-{
+namespace kz::test {
 
 struct DestroyQvfixed {
     void operator()(kzqvfixed_config* p) const { kzqvfixed_config_destroy(p); }

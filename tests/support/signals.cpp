@@ -4,11 +4,9 @@
 #include <cmath>
 #include <numbers>
 
-namespace kz::test
-{
+namespace kz::test {
 
-namespace
-{
+namespace {
 
 int16_t to_16_bits(double value)
 {

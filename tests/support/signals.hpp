@@ -6,12 +6,10 @@
 #include <cstdint>
 #include <vector>
 
-namespace kz::test
-{
+namespace kz::test {
 
 /// A small generator with stated output (splitmix64), so that seeds mean the same everywhere.
-class Random
-{
+class Random {
 public:
     explicit Random(uint64_t seed) : state_(seed) {}
     uint64_t next64();

@@ -9,13 +9,11 @@
 
 using namespace kz::test;
 
-namespace
-{
+namespace {
 
 using Pairs = std::vector<std::pair<std::string, std::string>>;
 
-class Attributes : public MemoryOn
-{
+class Attributes : public MemoryOn {
 protected:
     Pairs pairs() const { return model_of(tag_).attributes; }
     XMLTag* tag() const { return tag_.get(); }

@@ -14,8 +14,7 @@
 
 using namespace kz::test;
 
-namespace
-{
+namespace {
 
 constexpr size_t kStack = 256 * 1024;
 constexpr uint32_t kMillion = 1'000'000;
@@ -94,9 +93,7 @@ std::string repeated(const char* text, uint32_t times)
     return all;
 }
 
-class DeepTree : public MemoryOn
-{
-};
+class DeepTree : public MemoryOn {};
 
 TEST_F(DeepTree, AMillionLevelsAreClonedCopiedAndDisposedOf)
 {

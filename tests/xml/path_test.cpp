@@ -11,11 +11,9 @@
 
 using namespace kz::test;
 
-namespace
-{
+namespace {
 
-class Paths : public MemoryOn
-{
+class Paths : public MemoryOn {
 protected:
     XMLTag* root() const { return root_.get(); }
 

@@ -5,8 +5,7 @@
 
 using namespace kz::test;
 
-namespace
-{
+namespace {
 
 constexpr const char* kNames[] = {"A", "B", "AB", "a"};
 constexpr const char* kTexts[] = {"", "1", "2", "longer text"};
@@ -137,9 +136,7 @@ void check_queries(const Twin& at)
     }
 }
 
-class RandomTree : public MemoryOn
-{
-};
+class RandomTree : public MemoryOn {};
 
 TEST_F(RandomTree, AnySequenceOfCallsGivesTheModelsTree)
 {

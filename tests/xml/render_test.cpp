@@ -11,8 +11,7 @@
 
 using namespace kz::test;
 
-namespace
-{
+namespace {
 
 struct Flags {
     uint8_t header;
@@ -38,9 +37,7 @@ std::optional<std::string> render(const Tree& tree, Flags flags)
     return render(tree.get(), flags);
 }
 
-class Render : public MemoryOn
-{
-};
+class Render : public MemoryOn {};
 
 Tree small_document()
 {
@@ -209,8 +206,7 @@ TEST_F(Render, AMissingValueIsAFailureLikeAMissingName)
 // ---- Against a renderer of its own, on an output that runs full when it is told to
 
 /// The text buffer's rule of growth, with the n-th allocation failing (1 and 2 make the buffer).
-class Output
-{
+class Output {
 public:
     Output(uint64_t fail_at, bool from_then_on) : fail_at_(fail_at), from_then_on_(from_then_on) {}
 
@@ -243,8 +239,7 @@ private:
     std::string text_;
 };
 
-class Reference
-{
+class Reference {
 public:
     Reference(Output& out, Flags flags) : out_(out), flags_(flags) {}
 

@@ -10,8 +10,7 @@
 
 using namespace kz::test;
 
-namespace
-{
+namespace {
 
 static_assert(offsetof(XMLTag, name) == 0);
 static_assert(offsetof(XMLTag, data) == sizeof(void*));
@@ -24,9 +23,7 @@ static_assert(offsetof(XMLAttr, value) == sizeof(void*));
 static_assert(offsetof(XMLAttr, next) == 2 * sizeof(void*));
 static_assert(sizeof(XMLAttr) == 3 * sizeof(void*));
 
-class TagTree : public MemoryOn
-{
-};
+class TagTree : public MemoryOn {};
 
 /// R with data, two attributes and A, B (with a sub-tag C), A below it.
 Tree example()

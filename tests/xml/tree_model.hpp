@@ -16,8 +16,7 @@
 #include "kzsdk/xml/xml.h"
 #include "support/signals.hpp"
 
-namespace kz::test
-{
+namespace kz::test {
 
 struct Dispose {
     void operator()(XMLTag* tag) const { EXPECT_EQ(KZ_OK, DisposeXMLTag(tag)); }
@@ -97,10 +96,7 @@ inline ModelTag model_of(const XMLTag& tag)
     return model;
 }
 
-inline ModelTag model_of(const Tree& tree)
-{
-    return model_of(*tree);
-}
+inline ModelTag model_of(const Tree& tree) { return model_of(*tree); }
 
 /// For messages of failed comparisons.
 inline void PrintTo(const ModelTag& tag, std::ostream* out)

@@ -12,8 +12,7 @@
 
 #include "options.hpp"
 
-namespace kzfp
-{
+namespace kzfp {
 
 /// What is wrong with one file, and what would be right; without the name of the file.
 struct FileError : std::runtime_error {
@@ -29,8 +28,7 @@ constexpr bool is_supported_rate(uint32_t rate)
 }
 
 /// A stream of samples in a form that the library takes.
-class AudioSource
-{
+class AudioSource {
 public:
     virtual ~AudioSource() = default;
 

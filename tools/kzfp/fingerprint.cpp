@@ -10,11 +10,9 @@
 #include "kzsdk/fpx/fpx.h"
 #include "kzsdk/fpx/inspect.hpp"
 
-namespace kzfp
-{
+namespace kzfp {
 
-namespace
-{
+namespace {
 
 /// Twelve frames of 32768 samples, each 11264 after the one before.
 constexpr double kSecondsNeeded = (11.0 * 11264 + 32768) / kWorkingRate;
@@ -33,14 +31,8 @@ std::string printed(const char* format, double number)
 }
 
 /// Rounded so that what is too short never looks long enough.
-std::string had(double seconds)
-{
-    return printed("%.1f s", std::floor(seconds * 10) / 10);
-}
-std::string needed()
-{
-    return printed("%.1f s", std::ceil(kSecondsNeeded * 10) / 10);
-}
+std::string had(double seconds) { return printed("%.1f s", std::floor(seconds * 10) / 10); }
+std::string needed() { return printed("%.1f s", std::ceil(kSecondsNeeded * 10) / 10); }
 
 [[noreturn]] void fail(const char* step, kz_status status)
 {
@@ -176,10 +168,7 @@ Library::Library()
     }
 }
 
-Library::~Library()
-{
-    kzinit_shutdown_vesk();
-}
+Library::~Library() { kzinit_shutdown_vesk(); }
 
 Fingerprint take_fingerprint(AudioSource& source)
 {

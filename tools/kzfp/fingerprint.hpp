@@ -8,14 +8,12 @@
 
 #include "audio_source.hpp"
 
-namespace kzfp
-{
+namespace kzfp {
 
 constexpr uint32_t kWorkingRate = 11025; ///< hertz; what the library analyses at
 
 /// Starts the library for as long as it lives.
-class Library
-{
+class Library {
 public:
     Library();
     ~Library();

@@ -14,11 +14,9 @@
 #include "raw_samples.hpp"
 #include "sound_file.hpp"
 
-namespace kzfp
-{
+namespace kzfp {
 
-namespace
-{
+namespace {
 
 constexpr uint64_t kFirstFetch = uint64_t{1} << 20;
 /// Beginnings longer than this (large pictures in MP3 files are among the longest) are not waited for.

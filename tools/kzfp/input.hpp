@@ -9,8 +9,7 @@
 #include "audio_source.hpp"
 #include "options.hpp"
 
-namespace kzfp
-{
+namespace kzfp {
 
 /// What is known of an input before anything is read from it.
 struct InputFacts {
@@ -26,8 +25,7 @@ struct OpenedInput {
 };
 
 /// A file descriptor that is closed at the end, unless it was only borrowed.
-class Descriptor
-{
+class Descriptor {
 public:
     enum Ownership { borrowed, owned };
     Descriptor() = default;
@@ -46,8 +44,7 @@ private:
 /// It is copied into an unnamed temporary file, and what has arrived so far is read as if it were
 /// the whole file. When that is not enough, extend() doubles it and the reading starts anew. So no
 /// more of a pipe is taken than twice what is needed, and memory stays as it is.
-class Input
-{
+class Input {
 public:
     /// `name` is a path, or "-" for standard input. Throws FileError.
     Input(const std::string& name, const Options& options);

@@ -6,6 +6,7 @@
 #include <exception>
 #include <iostream>
 #include <new>
+#include <utility>
 
 #include <fcntl.h>
 #include <unistd.h>
@@ -16,8 +17,7 @@
 #include "options.hpp"
 #include "output.hpp"
 
-namespace
-{
+namespace {
 
 using namespace kzfp;
 
@@ -26,14 +26,18 @@ struct Result {
     Fingerprint fingerprint;
 };
 
-/// Tries with more and more of a pipe; a regular file is read once.
+/// Tries with more and more of a pipe; a regular file is read once. A decoder that met the end of
+/// what has arrived may have made up the last samples, so its complaint counts as "not enough" too.
 Result process(const std::string& name, const Options& options)
 {
     Input input(name, options);
     for (;;) {
         try {
             const OpenedInput opened = input.open();
-            return {opened.facts, take_fingerprint(*opened.source)};
+            Fingerprint fingerprint = take_fingerprint(*opened.source);
+            if (opened.source->trouble().empty() || !input.extend()) {
+                return {opened.facts, std::move(fingerprint)};
+            }
         } catch (const FileError&) {
             if (!input.extend()) {
                 throw;
@@ -42,10 +46,7 @@ Result process(const std::string& name, const Options& options)
     }
 }
 
-std::string shown_name(const std::string& name)
-{
-    return name == "-" ? "standard input" : name;
-}
+std::string shown_name(const std::string& name) { return name == "-" ? "standard input" : name; }
 
 /// True when the file's fingerprint was written.
 bool process_and_write(const std::string& name, const Options& options, Progress& progress)

@@ -11,11 +11,9 @@
 
 #include "audio_source.hpp"
 
-namespace kzfp
-{
+namespace kzfp {
 
-namespace
-{
+namespace {
 
 constexpr const char* kDescription =
     "Prints the fingerprint of each FILE: the query document that a recognition service is sent.\n"

@@ -8,8 +8,7 @@
 #include <variant>
 #include <vector>
 
-namespace kzfp
-{
+namespace kzfp {
 
 /// How samples are written.
 enum class Encoding { u8, s16, alaw, ulaw };

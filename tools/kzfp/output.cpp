@@ -10,16 +10,11 @@
 
 #include <nlohmann/json.hpp>
 
-namespace kzfp
-{
+namespace kzfp {
 
-namespace
-{
+namespace {
 
-double to_microseconds(double seconds)
-{
-    return std::round(seconds * 1e6) / 1e6;
-}
+double to_microseconds(double seconds) { return std::round(seconds * 1e6) / 1e6; }
 
 std::string to_json(const std::string& file, const InputFacts& facts,
                     const Fingerprint& fingerprint)

@@ -9,8 +9,7 @@
 #include "input.hpp"
 #include "options.hpp"
 
-namespace kzfp
-{
+namespace kzfp {
 
 /// Standard output cannot be written.
 struct OutputError : std::runtime_error {
@@ -32,8 +31,7 @@ void write_output(const std::string& text);
 void write_message(const std::string& line);
 
 /// A line on the terminal that tells how far the program is, when there are several files.
-class Progress
-{
+class Progress {
 public:
     explicit Progress(size_t files);
     ~Progress() { clear(); }

@@ -2,11 +2,9 @@
 
 #include <exception>
 
-namespace kzfp
-{
+namespace kzfp {
 
-namespace
-{
+namespace {
 
 constexpr size_t kFetch = 4096; ///< frames asked from the source at a time
 

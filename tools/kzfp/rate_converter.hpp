@@ -9,12 +9,10 @@
 
 #include "audio_source.hpp"
 
-namespace kzfp
-{
+namespace kzfp {
 
 /// Gives 16-bit PCM of another rate, without dither: the same words every time.
-class RateConverter : public AudioSource
-{
+class RateConverter : public AudioSource {
 public:
     /// `source` gives 16-bit PCM. Throws FileError.
     RateConverter(std::unique_ptr<AudioSource> source, uint32_t rate);

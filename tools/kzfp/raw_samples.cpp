@@ -10,11 +10,9 @@
 
 #include <unistd.h>
 
-namespace kzfp
-{
+namespace kzfp {
 
-namespace
-{
+namespace {
 
 uint64_t to_frames(double seconds, uint32_t rate)
 {

@@ -4,15 +4,13 @@
 
 #include "audio_source.hpp"
 
-namespace kzfp
-{
+namespace kzfp {
 
 /// What is wrong with a stream whose last frame has only `odd_bytes` bytes.
 std::string odd_bytes_text(uint64_t odd_bytes, const StreamFormat& format);
 
 /// Reads a descriptor to its end, or to the end of the section, without looking ahead.
-class RawSamples : public AudioSource
-{
+class RawSamples : public AudioSource {
 public:
     /// Starts where the descriptor stands; it must outlive the object.
     RawSamples(int file, bool seekable, const StreamFormat& format, const Section& section);

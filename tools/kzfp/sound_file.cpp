@@ -8,11 +8,9 @@
 
 #include <unistd.h>
 
-namespace kzfp
-{
+namespace kzfp {
 
-namespace
-{
+namespace {
 
 constexpr size_t kBlock = 4096; ///< frames read at a time
 constexpr int kLowestRate = 1000;

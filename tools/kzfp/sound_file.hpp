@@ -10,14 +10,12 @@
 
 #include "audio_source.hpp"
 
-namespace kzfp
-{
+namespace kzfp {
 
 /// Gives the samples of a sound file in one of these forms:
 /// - A-law and mu-law with one or two channels, at a supported rate: as they are in the file;
 /// - everything else: 16-bit PCM, in which more than two channels are mixed down to one.
-class SoundFile : public AudioSource
-{
+class SoundFile : public AudioSource {
 public:
     /// `file` is a regular file that outlives the object. Throws FileError.
     explicit SoundFile(int file);
