@@ -6,6 +6,7 @@
 #include "kzsdk/dsp/fxp_ops.hpp"
 #include "kzsdk/qv/frame_pump.hpp"
 #include "kzsdk/qv/query_document.hpp"
+#include "kzsdk/qvfixed/extract.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
 namespace {
@@ -159,12 +160,17 @@ void reset(Object& o) noexcept
 
 uint32_t milliseconds(const Object& o, uint32_t samples) noexcept
 {
-    return samples * 1000 / (o.working_rate >> 12); // wraps after 390 s: see the documentation
+    return samples * 1000 / (o.working_rate >> 12); // wraps
 }
 
-kz_status extract(const void* object, uint8_t* buffer, uint32_t size,
-                  kz::qv::FingerprintTimes& times) noexcept
+} // namespace
+
+kz_status kz::qvfixed::extract_fingerprint(const void* object, uint8_t* buffer, uint32_t size,
+                                           qv::FingerprintTimes& times) noexcept
 {
+    if (object == nullptr || buffer == nullptr) {
+        return KZ_QV_ERROR_INVALID_ARGUMENT;
+    }
     const Object& o = *static_cast<const Object*>(object);
     if (size < kzqvfixed_frame_manager_get_fingerprint_size(o.frame_manager)) {
         return KZ_QV_ERROR_INVALID_ARGUMENT;
@@ -178,8 +184,6 @@ kz_status extract(const void* object, uint8_t* buffer, uint32_t size,
     times.duration = frames == 0 ? 0 : milliseconds(o, (frames - 1) * o.hop + o.frame_length);
     return written != 0 ? KZ_OK : KZ_QV_ERROR_INCOMPLETE;
 }
-
-} // namespace
 
 kz_status kzqvfixed_constructor(uint32_t /*algorithm*/, uint32_t sample_rate, uint32_t format,
                                 uint32_t channels, kzqvfixed_fingerprinter** out_object) noexcept
@@ -250,7 +254,7 @@ kz_status kzqvfixed_get_result(kzqvfixed_fingerprinter* object, XMLTag** out_tre
         .version = kAlgorithmVersion,
         .size = kzqvfixed_frame_manager_get_fingerprint_size(object->frame_manager),
         .object = object,
-        .extract = extract};
+        .extract = kz::qvfixed::extract_fingerprint};
     return kz::qv::build_query_document(source, out_tree);
 }
 

@@ -3,6 +3,7 @@
 #include <string>
 #include <vector>
 
+#include "kzsdk/qvfixed/extract.hpp"
 #include "support/allocation.hpp"
 #include "support/qvfixed_objects.hpp"
 #include "support/signals.hpp"
@@ -246,6 +247,37 @@ TEST_F(Fingerprinter, TheResultIsRefusedUntilComplete)
     SmartDisposeXMLTag(&tree);
     EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, kzqvfixed_get_result(nullptr, &tree));
     EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, kzqvfixed_get_result(object.get(), nullptr));
+}
+
+// Times are for callers inside the library; the document does not hold them.
+TEST_F(Fingerprinter, TimesAreMillisecondsThatWrapAt32Bits)
+{
+    const auto object = make_fingerprinter(11025, kPcm16, 1);
+    EXPECT_TRUE(feed(*object, noise(11025 * 20, 0.5, 2)));
+    uint8_t bytes[60];
+    qv::FingerprintTimes times{};
+    object->signal_offset = 22050;
+    EXPECT_EQ(KZ_OK, qvfixed::extract_fingerprint(object.get(), bytes, 60, times));
+    EXPECT_EQ(2000U, times.start);
+    EXPECT_EQ(14210U, times.duration); // 32768 + 11 * 11264 samples
+    object->signal_offset = 11025 * 600;
+    EXPECT_EQ(KZ_OK, qvfixed::extract_fingerprint(object.get(), bytes, 60, times));
+    EXPECT_EQ(11025U * 600 * 1000 / 11025, times.start);
+    EXPECT_NE(600000U, times.start);
+}
+
+TEST_F(Fingerprinter, ExtractionRefusesNullsAndSmallBuffers)
+{
+    const auto object = make_fingerprinter(11025, kPcm16, 1);
+    uint8_t bytes[60];
+    qv::FingerprintTimes times{};
+    EXPECT_EQ(KZ_QV_ERROR_INCOMPLETE, qvfixed::extract_fingerprint(object.get(), bytes, 60, times));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT,
+              qvfixed::extract_fingerprint(object.get(), bytes, 59, times));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT,
+              qvfixed::extract_fingerprint(nullptr, bytes, 60, times));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT,
+              qvfixed::extract_fingerprint(object.get(), nullptr, 60, times));
 }
 
 TEST_F(Fingerprinter, NothingButTheEqualiserAndTheRecordsAllocatesWhileFeeding)

@@ -138,7 +138,7 @@ TEST_F(DeepTree, AMillionLevelsAreRendered)
 
 TEST_F(DeepTree, IndentedLevelsComeAndGo)
 {
-    constexpr uint32_t kDepth = 1500;
+    constexpr uint32_t kDepth = 300;
     const Tree root = deep_tree(kDepth, false);
     std::string text;
     on_a_small_stack([&] {
