@@ -3,8 +3,10 @@
 /// A twin brings its manager and record, whose fields have the same names.
 #pragma once
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
+#include <cstring>
 #include <new>
 #include <type_traits>
 
@@ -82,6 +84,41 @@ void reset_frames(Manager& manager) noexcept
 {
     drop_records(manager);
     manager.skip_remaining = manager.skip_frames;
+}
+
+/// Frames kept in percent of the limit; 0 without one.
+template <class Manager>
+uint32_t percent_progress(const Manager& manager) noexcept
+{
+    if (manager.frame_limit == 0) {
+        return 0;
+    }
+    return std::min(manager.frame_count * 100 / manager.frame_limit, 100U);
+}
+
+/// Bytes of the fingerprint: two 16-bit values per band.
+template <class Manager>
+uint32_t fingerprint_size(const Manager& manager) noexcept
+{
+    return manager.band_count * 4;
+}
+
+/// Copies the fingerprint out; `compute(manager)` makes it first when frames came since the last time.
+///
+/// @return Bytes written: 0 when it cannot be made or does not fit.
+template <class Manager, class Compute>
+uint32_t read_fingerprint(Manager& manager, void* destination, uint32_t capacity,
+                          Compute compute) noexcept
+{
+    if (manager.fingerprint_ready == 0) {
+        compute(manager);
+    }
+    const uint32_t size = fingerprint_size(manager);
+    if (manager.fingerprint_ready == 0 || capacity < size) {
+        return 0;
+    }
+    std::memcpy(destination, manager.fingerprint, size);
+    return size;
 }
 
 } // namespace kz::qv

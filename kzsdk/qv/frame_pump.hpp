@@ -5,11 +5,11 @@
 /// `Twin` type with
 ///
 ///     Object, Sample                                       its record and its sample type
-///     convert(object, bytes, frames)                       interleaved bytes to the object's buffer
+///     kConverters                                          by format, see converter_choice.hpp
 ///     resample(object, input, output) -> {consumed, produced}
 ///     signal_offset(object, samples) -> index              where the signal starts in a block
-///     restart_detector(object)
 ///     append_frame(object, older, newer)                   one frame, in two pieces
+///     reset_detector(detector)
 ///     reached_limit(object) -> bool
 #pragma once
 
@@ -20,17 +20,9 @@
 
 #include "kzsdk/abs/status.h"
 #include "kzsdk/dsp/polyphase_stream.hpp"
+#include "kzsdk/qv/converter_choice.hpp"
 
 namespace kz::qv {
-
-enum InputFormat : uint32_t { kPcm8 = 1, kPcm16 = 2, kALaw = 3, kULaw = 4 };
-
-constexpr bool is_input_format(uint32_t format) noexcept
-{
-    return format >= kPcm8 && format <= kULaw;
-}
-
-constexpr uint32_t bytes_per_sample(uint32_t format) noexcept { return format == kPcm16 ? 2 : 1; }
 
 /// Where the ring is read and written. A frame is full when the writer has caught up with its start.
 struct RingPosition {
@@ -84,7 +76,7 @@ StepCounts convert_and_resample(typename Twin::Object& object, std::span<const u
         if (frames == 0) {
             break;
         }
-        Twin::convert(object, budget.data(), static_cast<uint32_t>(frames));
+        convert_frames(object, Twin::kConverters, budget.data(), static_cast<uint32_t>(frames));
         budget = budget.subspan(frames * object.frame_bytes);
         std::span<const typename Twin::Sample> chunk(object.conversion_buffer, frames);
         while (!chunk.empty()) {
@@ -116,7 +108,7 @@ uint32_t drop_silence(typename Twin::Object& object, uint32_t produced) noexcept
         if (offset != 0) {
             std::copy(block.begin() + offset, block.end(), block.begin());
         }
-        Twin::restart_detector(object);
+        static_cast<void>(Twin::reset_detector(object.signal_detector));
     }
     return remaining;
 }

@@ -1,5 +1,4 @@
 #include <algorithm>
-#include <cstring>
 #include <span>
 #include <utility>
 
@@ -322,16 +321,13 @@ uint8_t kzqvfixed_frame_manager_reached_frame_limit(const kzqvfixed_frame_manage
 uint32_t
 kzqvfixed_frame_manager_get_percent_progress(const kzqvfixed_frame_manager* manager) noexcept
 {
-    if (manager == nullptr || manager->frame_limit == 0) {
-        return 0;
-    }
-    return std::min(manager->frame_count * 100 / manager->frame_limit, 100U);
+    return manager == nullptr ? 0 : kz::qv::percent_progress(*manager);
 }
 
 uint32_t
 kzqvfixed_frame_manager_get_fingerprint_size(const kzqvfixed_frame_manager* manager) noexcept
 {
-    return manager == nullptr ? 0 : manager->band_count * 4;
+    return manager == nullptr ? 0 : kz::qv::fingerprint_size(*manager);
 }
 
 uint32_t kzqvfixed_frame_manager_get_fingerprint(kzqvfixed_frame_manager* manager,
@@ -340,13 +336,5 @@ uint32_t kzqvfixed_frame_manager_get_fingerprint(kzqvfixed_frame_manager* manage
     if (manager == nullptr || destination == nullptr) {
         return 0;
     }
-    if (manager->fingerprint_ready == 0) {
-        compute_fingerprint(*manager);
-    }
-    const uint32_t size = kzqvfixed_frame_manager_get_fingerprint_size(manager);
-    if (manager->fingerprint_ready == 0 || capacity < size) {
-        return 0;
-    }
-    std::memcpy(destination, manager->fingerprint, size);
-    return size;
+    return kz::qv::read_fingerprint(*manager, destination, capacity, compute_fingerprint);
 }

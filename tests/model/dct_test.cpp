@@ -70,8 +70,9 @@ TEST_F(ModelDct, LibraryAgreesToTheWord)
         auto all = materials(11025, length);
         all.push_back({"small words", random_words(length, 7, 18)});
         all.push_back({"a constant", std::vector<int32_t>(length, 1 << 14)});
-        all.push_back({"a large constant", std::vector<int32_t>(length, (1 << 30) - 1)});
-        all.push_back({"a large negative constant", std::vector<int32_t>(length, 1 - (1 << 30))});
+        for (const int32_t level : {(1 << 30) - 1, 1 - (1 << 30), (1 << 30) - 19695}) {
+            all.push_back({"a large constant", std::vector<int32_t>(length, level)});
+        }
         all.push_back({"an impulse", std::vector<int32_t>(length, 0)});
         all.back().words[0] = 1 << 20;
         for (const Material& material : all) {

@@ -71,7 +71,7 @@ inline std::vector<Material> materials(uint32_t rate, size_t count)
     };
 }
 
-inline std::vector<uint8_t> as_bytes(std::span<const int16_t> samples)
+inline std::vector<uint8_t> to_bytes(std::span<const int16_t> samples)
 {
     std::vector<uint8_t> bytes(samples.size_bytes());
     std::memcpy(bytes.data(), samples.data(), bytes.size());

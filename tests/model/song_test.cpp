@@ -137,7 +137,7 @@ std::vector<uint8_t> encoded(Format format, std::span<const int16_t> samples)
         return bytes;
     }
     case Format::pcm16:
-        return as_bytes(samples);
+        return to_bytes(samples);
     case Format::alaw:
         return companded(samples, inverted_alaw_value);
     case Format::ulaw:
@@ -198,7 +198,7 @@ TEST_F(Song, LoudQuietAndNoisyOnesAgree)
             kz::test::noise(2 * samples, 0.05, ratio.hertz + 2),
         };
         for (const std::vector<int16_t>& song : songs) {
-            EXPECT_TRUE(compare(ratio, Format::pcm16, 2, as_bytes(song)));
+            EXPECT_TRUE(compare(ratio, Format::pcm16, 2, to_bytes(song)));
         }
     }
 }
@@ -225,7 +225,7 @@ TEST_F(Song, AClippedTuneAgrees)
     for (const size_t which : {0u, 1u, 3u, 6u}) {
         const Ratio& ratio = kRatios[which];
         const std::vector<int16_t> loud = kz::test::tune(ratio.hertz, 2, kSeconds, 30.0);
-        EXPECT_TRUE(compare(ratio, Format::pcm16, 2, as_bytes(loud)));
+        EXPECT_TRUE(compare(ratio, Format::pcm16, 2, to_bytes(loud)));
     }
 }
 
@@ -237,7 +237,7 @@ TEST_F(Song, LeadingSilenceIsSkippedAtTheSameSample)
         for (const double silence : {0.001, 2.9721, 7.0}) {
             std::vector<int16_t> song(static_cast<size_t>(silence * ratio.hertz), 0);
             song.insert(song.end(), music.begin(), music.end());
-            EXPECT_TRUE(compare(ratio, Format::pcm16, 1, as_bytes(song))) << silence;
+            EXPECT_TRUE(compare(ratio, Format::pcm16, 1, to_bytes(song))) << silence;
         }
     }
 }
@@ -250,7 +250,7 @@ TEST_F(Song, NearSilenceBeforeTheMusicIsJudgedAlike)
             std::vector<int16_t> song = kz::test::sine(ratio.hertz, 60, 4.0, level);
             const std::vector<int16_t> music = kz::test::noise(length, 0.6, 6);
             song.insert(song.end(), music.begin(), music.end());
-            EXPECT_TRUE(compare(ratio, Format::pcm16, 1, as_bytes(song))) << level;
+            EXPECT_TRUE(compare(ratio, Format::pcm16, 1, to_bytes(song))) << level;
         }
     }
 }
@@ -259,9 +259,9 @@ TEST_F(Song, SilenceAndSongsTooShortAreNotComplete)
 {
     for (const Ratio& ratio : kRatios) {
         const std::vector<int16_t> silence(static_cast<size_t>(20 * ratio.hertz), 0);
-        EXPECT_FALSE(compare(ratio, Format::pcm16, 1, as_bytes(silence)));
+        EXPECT_FALSE(compare(ratio, Format::pcm16, 1, to_bytes(silence)));
         const auto samples = static_cast<size_t>(14.1 * ratio.hertz);
-        EXPECT_FALSE(compare(ratio, Format::pcm16, 1, as_bytes(kz::test::noise(samples, 0.5, 7))));
+        EXPECT_FALSE(compare(ratio, Format::pcm16, 1, to_bytes(kz::test::noise(samples, 0.5, 7))));
     }
 }
 
@@ -272,7 +272,7 @@ TEST_F(Song, PiecesOfAnySizeAgreeWithTheModelFedAlike)
         const auto frames = static_cast<size_t>(kSeconds * ratio.hertz);
         const std::vector<int16_t> noise = kz::test::noise(2 * frames, 0.7, 8);
         samples.insert(samples.end(), noise.begin(), noise.end());
-        const std::vector<uint8_t> song = as_bytes(samples);
+        const std::vector<uint8_t> song = to_bytes(samples);
         for (const uint32_t largest : {3u, 500u, 20000u, 200000u}) {
             kz::test::Random random(largest + ratio.hertz);
             std::vector<Piece> pieces;

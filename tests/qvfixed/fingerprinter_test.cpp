@@ -3,7 +3,7 @@
 #include <string>
 #include <vector>
 
-#include "kzsdk/qvfixed/extract.hpp"
+#include "kzsdk/qvfixed/twin.hpp"
 #include "support/allocation.hpp"
 #include "support/qvfixed_objects.hpp"
 #include "support/signals.hpp"
@@ -257,11 +257,11 @@ TEST_F(Fingerprinter, TimesAreMillisecondsThatWrapAt32Bits)
     uint8_t bytes[60];
     qv::FingerprintTimes times{};
     object->signal_offset = 22050;
-    EXPECT_EQ(KZ_OK, qvfixed::extract_fingerprint(object.get(), bytes, 60, times));
+    EXPECT_EQ(KZ_OK, qvfixed::Fingerprinter::extract(object.get(), bytes, 60, times));
     EXPECT_EQ(2000U, times.start);
     EXPECT_EQ(14210U, times.duration); // 32768 + 11 * 11264 samples
     object->signal_offset = 11025 * 600;
-    EXPECT_EQ(KZ_OK, qvfixed::extract_fingerprint(object.get(), bytes, 60, times));
+    EXPECT_EQ(KZ_OK, qvfixed::Fingerprinter::extract(object.get(), bytes, 60, times));
     EXPECT_EQ(11025U * 600 * 1000 / 11025, times.start);
     EXPECT_NE(600000U, times.start);
 }
@@ -271,13 +271,14 @@ TEST_F(Fingerprinter, ExtractionRefusesNullsAndSmallBuffers)
     const auto object = make_fingerprinter(11025, kPcm16, 1);
     uint8_t bytes[60];
     qv::FingerprintTimes times{};
-    EXPECT_EQ(KZ_QV_ERROR_INCOMPLETE, qvfixed::extract_fingerprint(object.get(), bytes, 60, times));
+    EXPECT_EQ(KZ_QV_ERROR_INCOMPLETE,
+              qvfixed::Fingerprinter::extract(object.get(), bytes, 60, times));
     EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT,
-              qvfixed::extract_fingerprint(object.get(), bytes, 59, times));
+              qvfixed::Fingerprinter::extract(object.get(), bytes, 59, times));
     EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT,
-              qvfixed::extract_fingerprint(nullptr, bytes, 60, times));
+              qvfixed::Fingerprinter::extract(nullptr, bytes, 60, times));
     EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT,
-              qvfixed::extract_fingerprint(object.get(), nullptr, 60, times));
+              qvfixed::Fingerprinter::extract(object.get(), nullptr, 60, times));
 }
 
 TEST_F(Fingerprinter, NothingButTheEqualiserAndTheRecordsAllocatesWhileFeeding)
