@@ -52,9 +52,9 @@ provide_song() {
     (
         cd "$work"
         download || fail "the Debian package $package, which holds the music, cannot be downloaded:
-$(cat download.log)
-Put the package (from https://packages.debian.org/bookworm/$package) beside a network, or
-any copy of its music as $song with SHA-256 $song_digest."
+$(grep '^E:' download.log)
+Without a network, put usr/share/games/funnyboat/data/JDruid-Trip_on_the_Funny_Boat.ogg
+out of that package at $song and try again."
         dpkg-deb -x "$package"_*.deb .
         cp usr/share/games/funnyboat/data/JDruid-Trip_on_the_Funny_Boat.ogg song.ogg
         digest_is song.ogg || fail "the music in the package $package is not the one expected"

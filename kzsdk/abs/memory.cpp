@@ -56,17 +56,17 @@ kz_status _kzmem_free(void* block) noexcept
 
 void* kzmem_memset(void* destination, int32_t value, uint32_t size) noexcept
 {
-    return std::memset(destination, value, size);
+    return size == 0 ? destination : std::memset(destination, value, size);
 }
 
 void* kzmem_memmove(void* destination, const void* source, uint32_t size) noexcept
 {
-    return std::memmove(destination, source, size);
+    return size == 0 ? destination : std::memmove(destination, source, size);
 }
 
 void* kzmem_memcpy(void* destination, const void* source, uint32_t size) noexcept
 {
-    return std::memcpy(destination, source, size);
+    return size == 0 ? destination : std::memcpy(destination, source, size);
 }
 
 int16_t kzmem_memcmp(const void* a, const void* b, uint32_t length) noexcept

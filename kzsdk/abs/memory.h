@@ -77,7 +77,7 @@ KZ_API void* _kzmem_realloc(void* block, uint32_t size) KZ_NOEXCEPT;
  */
 KZ_API kz_status _kzmem_free(void* block) KZ_NOEXCEPT;
 
-/** `memset`, whether the manager is on or off. */
+/** `memset`, whether the manager is on or off. With a size of 0 pointers may be null. */
 KZ_API void* kzmem_memset(void* destination, int32_t value, uint32_t size) KZ_NOEXCEPT;
 
 /** `memmove`, whether the manager is on or off. The areas may overlap. */
