@@ -50,6 +50,7 @@
 
 /* Signal processing: fixed-point arithmetic, sample conversion, transform, resampling. */
 #include "kzsdk/dsp/convert.h"
+#include "kzsdk/dsp/convolve.h"
 #include "kzsdk/dsp/dct.h"
 #include "kzsdk/dsp/fxp.h"
 #include "kzsdk/dsp/resampler.h"

@@ -44,13 +44,20 @@ std::vector<int32_t> to_q31(const std::vector<float>& taps, double gain)
     return words;
 }
 
-template <class Word>
+void write_value(std::ostream& out, int32_t word) { out << word; }
+
+// Hexadecimal, which tells every bit.
+void write_value(std::ostream& out, float value) { out << std::hexfloat << value << 'F'; }
+
+template <class Value>
 void write_array(std::ostream& out, std::string_view type, std::string_view name,
-                 const std::vector<Word>& words)
+                 const std::vector<Value>& values)
 {
-    out << "const " << type << ' ' << name << '[' << words.size() << "] = {";
-    for (size_t i = 0; i < words.size(); ++i) {
-        out << (i % 12 == 0 ? "\n    " : " ") << words[i] << ',';
+    out << "const " << type << ' ' << name << '[' << values.size() << "] = {";
+    for (size_t i = 0; i < values.size(); ++i) {
+        out << (i % 12 == 0 ? "\n    " : " ");
+        write_value(out, values[i]);
+        out << ',';
     }
     out << "\n};\n\n";
 }
@@ -85,9 +92,12 @@ void write_filters(std::ostream& out)
         kz::dsp::design_windowed_sinc(layout, taps);
         write_filter(out, rate.hertz, to_q31(taps, rate.gain));
     }
-    write_filter(out, 22050, to_q31(kz::tables::design_short_filter(kz::tables::kHalfBand), 1.0));
-    write_filter(out, 44100,
-                 to_q31(kz::tables::design_short_filter(kz::tables::kQuarterBand), 1.0));
+    const auto half_band = kz::tables::design_short_filter(kz::tables::kHalfBand);
+    const auto quarter_band = kz::tables::design_short_filter(kz::tables::kQuarterBand);
+    write_filter(out, 22050, to_q31(half_band, 1.0));
+    write_filter(out, 44100, to_q31(quarter_band, 1.0));
+    write_array(out, "float", "kz::dsp::coefficients_2to1", half_band);
+    write_array(out, "float", "kz::dsp::coefficients_4to1", quarter_band);
 }
 
 // Stage s, of half-width h = 2^(s-1), multiplies by a factor of 30 fraction bits over 2^(s-2): so the

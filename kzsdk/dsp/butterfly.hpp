@@ -78,4 +78,19 @@ void add_recursively(std::span<T> x, int32_t rounds, Add add) noexcept
     }
 }
 
+/// The frame of both transforms, of 2^`order` points.
+///
+/// @param run_stage  stage -> nothing: the butterflies of half-width 2^(stage - 1).
+/// @param add        Adds two values.
+template <class T, class RunStage, class Add>
+void transform(std::span<T> x, int32_t order, RunStage run_stage, Add add) noexcept
+{
+    reorder_input(x);
+    for (int32_t stage = order; stage >= 1; --stage) {
+        run_stage(stage);
+    }
+    bit_reverse(x);
+    add_recursively(x, order, add);
+}
+
 } // namespace kz::dsp

@@ -50,6 +50,45 @@ KZ_API void KZDSP_DCT_fixed_destroy(KZDSP_DCT_fixed* dct) KZ_NOEXCEPT;
 KZ_API void KZDSP_DCT_fixed_compute(const KZDSP_DCT_fixed* dct, int32_t* data,
                                     int32_t mode) KZ_NOEXCEPT;
 
+/** A floating-point transform of one length. Read it, do not change it. */
+typedef struct KZDSP_DCT {
+    int32_t order;              /**< base-2 logarithm of the length */
+    uint32_t length;            /**< L */
+    const float* coefficients;  /**< L butterfly factors; entry 0 is 0 and not used */
+    uint32_t owns_coefficients; /**< always 1: the factors are computed at creation */
+} KZDSP_DCT;
+
+/**
+ * Makes a transform of 2^@p order points. Computes one cosine per point.
+ *
+ * @param order  1 .. 29; the factors take 4 * 2^order bytes.
+ * @return The transform, which the caller frees with KZDSP_DestroyDCT(); null for any other order
+ *         (from 30 on the factors would not fit a 32-bit size) or when memory is short.
+ */
+KZ_API KZDSP_DCT* KZDSP_CreateDCT(int32_t order) KZ_NOEXCEPT;
+
+/** Frees a transform; null is ignored. */
+KZ_API void KZDSP_DestroyDCT(KZDSP_DCT* dct) KZ_NOEXCEPT;
+
+/**
+ * Transforms the L values of @p data in place. Nothing happens when a pointer is null.
+ *
+ * With x the input, the output is
+ *
+ *     X[k] = sum over n of x[n] cos(pi (2n + 1) k / (2L))   for k >= 1
+ *     X[0] = (sum of x) / sqrt(2)
+ *
+ * in single precision, with one rounding per butterfly and addition.
+ *
+ * Scaling:  none but the above; with @p normalise every X[k] is multiplied by 2 / L. NaN and
+ *           infinities spread over the output.
+ * Threads:  a transform holds no state of a call and may be shared.
+ *
+ * @param data       L values.
+ * @param normalise  0, or anything else to normalise.
+ */
+KZ_API void KZDSP_ComputeDCT(const KZDSP_DCT* dct, float* data, int32_t normalise) KZ_NOEXCEPT;
+
 KZ_C_END
 
 #endif

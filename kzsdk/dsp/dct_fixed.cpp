@@ -91,11 +91,7 @@ void KZDSP_DCT_fixed_compute(const KZDSP_DCT_fixed* dct, int32_t* data, int32_t 
         return;
     }
     const std::span<int32_t> x(data, dct->length);
-    kz::dsp::reorder_input(x);
-    for (int32_t stage = dct->order; stage >= 1; --stage) {
-        run_stage(x, dct->coefficients, stage);
-    }
-    kz::dsp::bit_reverse(x);
-    kz::dsp::add_recursively(x, dct->order, wrap_add);
+    kz::dsp::transform(
+        x, dct->order, [&](int32_t stage) { run_stage(x, dct->coefficients, stage); }, wrap_add);
     x[0] = smul_high(x[0], kDcScale);
 }

@@ -19,6 +19,9 @@
 #include <cstdint>
 #include <limits>
 #include <span>
+#include <type_traits>
+
+#include "kzsdk/abs/owned.hpp"
 
 namespace kz::dsp {
 
@@ -45,15 +48,41 @@ bool copies(const Resampler& r) noexcept
     return r.up == 1 && r.down == 1;
 }
 
-/// Starts a stream over a history of `delay` zeros.
+/// Zeros before the first sample: half the filter in whole outputs, turned back into inputs. At most
+/// length / 2 / L rounded up, half a window, so they always fit the history.
 template <class Resampler>
-void restart(Resampler& r, uint32_t delay) noexcept
+uint32_t initial_delay(const Resampler& r) noexcept
 {
+    return raw_length(r, r.length / 2 / r.down);
+}
+
+/// Starts a stream.
+template <class Resampler>
+void restart(Resampler& r) noexcept
+{
+    const uint32_t delay = initial_delay(r);
     assert(delay <= r.taps_per_phase);
     r.phase = 0;
     r.history_start = 0;
     r.history_end = delay;
     std::fill_n(r.history, delay, 0);
+}
+
+/// Makes the history of a resampler whose factors and length are set, and starts a stream. False when
+/// memory is short. A resampler that copies has none.
+template <class Resampler>
+bool make_history(Resampler& r) noexcept
+{
+    using Sample = std::remove_pointer_t<decltype(r.history)>;
+    if (r.length != 0) {
+        r.taps_per_phase = static_cast<uint32_t>((uint64_t{r.length} + r.up - 1) / r.up);
+        r.history = make_array<Sample>(r.taps_per_phase).release();
+        if (r.history == nullptr) {
+            return false;
+        }
+    }
+    restart(r);
+    return true;
 }
 
 /// Input samples that are still missing for the next output.
@@ -84,6 +113,28 @@ struct BlockCounts {
     uint32_t consumed;
     uint32_t produced;
 };
+
+/// A caller's array; null counts as an array of no samples.
+template <class Sample>
+std::span<Sample> block(Sample* samples, uint32_t count) noexcept
+{
+    return {samples, samples == nullptr ? 0 : count};
+}
+
+/// The exported call of both twins: runs `resample` unless there is no resampler, and tells the counts
+/// to whoever asks.
+template <class Resampler, class Sample, class Resample>
+void resample_call(Resampler* r, std::span<const Sample> input, std::span<Sample> output,
+                   uint32_t* consumed, uint32_t* produced, Resample resample) noexcept
+{
+    const BlockCounts counts = r == nullptr ? BlockCounts{0, 0} : resample(*r, input, output);
+    if (consumed != nullptr) {
+        *consumed = counts.consumed;
+    }
+    if (produced != nullptr) {
+        *produced = counts.produced;
+    }
+}
 
 template <class Sample>
 BlockCounts copy_block(std::span<const Sample> input, std::span<Sample> output) noexcept
@@ -117,8 +168,8 @@ BlockCounts resample_block(Resampler& r, std::span<const Sample> input, std::spa
                            Inside inside, Across across) noexcept
 {
     const uint32_t window = r.taps_per_phase;
-    const auto available = static_cast<uint32_t>(input.size());
-    uint32_t needed = need(r);
+    const uint64_t available = input.size();
+    uint64_t needed = need(r);
     uint32_t oldest = 0; // first sample of the block that is still needed
     uint32_t produced = 0;
     while (produced < output.size() && needed <= available) {
@@ -144,7 +195,7 @@ BlockCounts resample_block(Resampler& r, std::span<const Sample> input, std::spa
         ++produced;
         needed += step;
     }
-    const uint32_t consumed = std::min(needed, available);
+    const auto consumed = static_cast<uint32_t>(std::min(needed, available));
     keep_tail(r, input.subspan(oldest, consumed - oldest));
     return {consumed, produced};
 }

@@ -123,6 +123,110 @@ KZ_API FxpType KZDSP_DualConvolveFixed(const FxpType* first, uint32_t first_coun
                                        const int16_t* msb, const uint16_t* lsb, uint32_t stride,
                                        int32_t shift) KZ_NOEXCEPT;
 
+/** A floating-point resampler. Read it, do not change it. */
+typedef struct KZDSP_resampler {
+    uint32_t up;             /**< L */
+    uint32_t down;           /**< M */
+    uint32_t taps_per_phase; /**< P; 0 when samples are only copied */
+    uint32_t length;         /**< taps of the prototype, a multiple of L; 0 when copying */
+    const float* taps;       /**< the prototype */
+    uint32_t owns_taps;      /**< 1 when it was designed for this resampler, 0 for a stored one */
+    uint32_t phase;          /**< 0 .. L - 1 */
+    float* history;          /**< owned; room for P samples */
+    uint32_t history_start;  /**< oldest sample still needed */
+    uint32_t history_end;    /**< samples stored */
+} KZDSP_resampler;
+
+/** The largest up or down factor for which KZDSP_CreateResampler() designs a filter. */
+#define KZDSP_LARGEST_FACTOR UINT32_C(0x100000)
+
+/**
+ * Makes a resampler between any two rates.
+ *
+ * The quotient of the rates, in single precision, becomes L / M by KZDSP_Rationalize() to one part
+ * in a million. Decimation by 2 and by 4 uses a stored filter; equal rates copy; for every other
+ * ratio a Hamming-windowed sinc of 20 max(L, M) + 1 taps is designed here, which takes a sine and a
+ * cosine for every second tap.
+ *
+ * @param input_rate   Hertz, finite and above 0.
+ * @param output_rate  Hertz, finite and above 0.
+ * @return The resampler, which the caller frees with KZDSP_DestroyResampler(). Null for any other
+ *         rate, for a quotient that single precision or KZDSP_Rationalize() cannot tell from 0 or
+ *         infinity, and when memory is short. A ratio with L or M above KZDSP_LARGEST_FACTOR counts
+ *         as short of memory: its filter would pass 22 million taps, 88 MB. Pairs of whole rates up to
+ *         20000 Hz or so come nowhere near; rates a few millionths apart come close.
+ */
+KZ_API KZDSP_resampler* KZDSP_CreateResampler(float input_rate, float output_rate) KZ_NOEXCEPT;
+
+/** Frees a resampler; null is ignored. */
+KZ_API void KZDSP_DestroyResampler(KZDSP_resampler* resampler) KZ_NOEXCEPT;
+
+/**
+ * Starts a new stream: phase 0, and a history of zeros half a filter long, so that the first outputs
+ * are centred on the first inputs. Null is ignored.
+ */
+KZ_API void KZDSP_ResetResampler(KZDSP_resampler* resampler) KZ_NOEXCEPT;
+
+/**
+ * The outputs that @p count more inputs yield at most: count * L / M, truncated.
+ *
+ * @return 0 for a null resampler; 2^32 - 1 where the number does not fit.
+ */
+KZ_API uint32_t KZDSP_ComputeResampledLength(const KZDSP_resampler* resampler,
+                                             uint32_t count) KZ_NOEXCEPT;
+
+/**
+ * The inputs that @p count outputs need: (count * M + L - 1) / L, truncated.
+ *
+ * @return 0 for a null resampler; 2^32 - 1 where the number does not fit.
+ */
+KZ_API uint32_t KZDSP_ComputeRawLength(const KZDSP_resampler* resampler,
+                                       uint32_t count) KZ_NOEXCEPT;
+
+/**
+ * Resamples one block.
+ *
+ * A stream may be cut into blocks of any length, with any capacities: the output is the same to the
+ * bit. Every output is one sum over P samples, newest first, rounded to single precision after each
+ * product and each addition.
+ *
+ * Timing: as in KZDSP_resampler_fixed_resample(), of which every call consumes and produces the same
+ * counts at the rates that it knows.
+ *
+ * Scaling:  full level at every rate, 22050 and 44100 Hz included; upsampling gains L / M, so 8000 Hz
+ *           comes out at 1.376 times full level.
+ * Cost:     one product per tap of a phase for each output. Never allocates.
+ *
+ * @param input           `input_count` mono samples. NaN and infinities reach the outputs whose
+ *                        windows hold them, no other.
+ * @param output          Room for `output_capacity` samples, apart from `input`.
+ * @param[out] consumed   Samples taken, 0 .. `input_count`. Offer the rest again.
+ * @param[out] produced   Samples written, 0 .. `output_capacity`.
+ *
+ * A null resampler takes and writes nothing; a null array counts as one of no samples; a null count
+ * is not written.
+ */
+KZ_API void KZDSP_Resample(KZDSP_resampler* resampler, const float* input, uint32_t input_count,
+                           float* output, uint32_t output_capacity, uint32_t* consumed,
+                           uint32_t* produced) KZ_NOEXCEPT;
+
+/**
+ * Finds a fraction near @p x: the first convergent of its continued fraction, with every term
+ * rounded to nearest, that is closer than the tolerance.
+ *
+ *     within the tolerance of 1 or -1    1 / 1 or -1 / 1
+ *     closer to 0 than the tolerance     0 / 0
+ *     nothing found in 64 terms          0 / 0 (NaN, infinities, a tolerance of 0 or NaN)
+ *
+ * A tolerance of 0 still finds a fraction whose continued fraction ends exactly, such as 0.25.
+ *
+ * @param[out] numerator    Carries the sign of @p x. Saturates at the ends of its range.
+ * @param[out] denominator  0 or more. Saturates. A null result is not written.
+ * @param tolerance         Largest distance, exclusive; its sign does not matter.
+ */
+KZ_API void KZDSP_Rationalize(double x, int32_t* numerator, int32_t* denominator,
+                              double tolerance) KZ_NOEXCEPT;
+
 /*
  * The prototypes of the seven rates: high halves, low halves (tap i is msb[i] * 65536 + lsb[i], Q31)
  * and number of taps. The tables are constants of the library.

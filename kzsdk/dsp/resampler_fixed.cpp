@@ -183,13 +183,6 @@ kz::dsp::BlockCounts resample(KZDSP_resampler_fixed& r, Samples input,
         across);
 }
 
-// Half the filter's length in output samples, turned back into input samples.
-uint32_t initial_delay(const KZDSP_resampler_fixed& r) noexcept
-{
-    const uint32_t half_in_outputs = ((r.length - 1) * 128 + 128) / r.down / 256;
-    return kz::dsp::raw_length(r, half_in_outputs);
-}
-
 } // namespace
 
 KZDSP_resampler_fixed* KZDSP_resampler_fixed_create(uint32_t input_rate,
@@ -209,14 +202,10 @@ KZDSP_resampler_fixed* KZDSP_resampler_fixed_create(uint32_t input_rate,
         resampler->length = conversion->length();
         resampler->msb = conversion->msb();
         resampler->lsb = conversion->lsb();
-        resampler->taps_per_phase = (resampler->length + resampler->up - 1) / resampler->up;
-        auto history = kz::make_array<FxpType>(resampler->taps_per_phase);
-        if (!history) {
-            return nullptr;
-        }
-        resampler->history = history.release();
     }
-    KZDSP_resampler_fixed_reset(resampler.get());
+    if (!kz::dsp::make_history(*resampler)) {
+        return nullptr;
+    }
     return resampler.release();
 }
 
@@ -231,7 +220,7 @@ void KZDSP_resampler_fixed_destroy(KZDSP_resampler_fixed* resampler) noexcept
 void KZDSP_resampler_fixed_reset(KZDSP_resampler_fixed* resampler) noexcept
 {
     if (resampler != nullptr) {
-        kz::dsp::restart(*resampler, resampler->length == 0 ? 0 : initial_delay(*resampler));
+        kz::dsp::restart(*resampler);
     }
 }
 
@@ -251,17 +240,8 @@ void KZDSP_resampler_fixed_resample(KZDSP_resampler_fixed* resampler, const FxpT
                                     uint32_t input_count, FxpType* output, uint32_t output_capacity,
                                     uint32_t* consumed, uint32_t* produced) noexcept
 {
-    kz::dsp::BlockCounts counts{0, 0};
-    if (resampler != nullptr) {
-        counts = resample(*resampler, {input, input == nullptr ? 0 : input_count},
-                          {output, output == nullptr ? 0 : output_capacity});
-    }
-    if (consumed != nullptr) {
-        *consumed = counts.consumed;
-    }
-    if (produced != nullptr) {
-        *produced = counts.produced;
-    }
+    kz::dsp::resample_call(resampler, kz::dsp::block(input, input_count),
+                           kz::dsp::block(output, output_capacity), consumed, produced, resample);
 }
 
 FxpType KZDSP_DualConvolveFixed(const FxpType* first, uint32_t first_count, const FxpType* second,

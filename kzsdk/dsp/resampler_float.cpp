@@ -1,0 +1,154 @@
+#include <limits>
+#include <memory>
+#include <span>
+
+#include "kzsdk/abs/owned.hpp"
+#include "kzsdk/dsp/convolve.h"
+#include "kzsdk/dsp/filter_design.hpp"
+#include "kzsdk/dsp/polyphase_stream.hpp"
+#include "kzsdk/dsp/resampler.h"
+#include "kzsdk/dsp/tables.hpp"
+
+namespace {
+
+constexpr double kTolerance = 1e-6; // relative
+
+bool is_rate(float hertz) noexcept
+{
+    return hertz > 0 && hertz <= std::numeric_limits<float>::max();
+}
+
+// False when the rates have no ratio that a filter could be designed for.
+bool set_ratio(KZDSP_resampler& r, float input_rate, float output_rate) noexcept
+{
+    const double ratio = output_rate / input_rate; // rounded to single precision first
+    int32_t up = 0;
+    int32_t down = 0;
+    KZDSP_Rationalize(ratio, &up, &down, ratio * kTolerance);
+    const auto usable = [](int32_t factor) {
+        return factor > 0 && static_cast<uint32_t>(factor) <= KZDSP_LARGEST_FACTOR;
+    };
+    if (!usable(up) || !usable(down)) {
+        return false;
+    }
+    r.up = static_cast<uint32_t>(up);
+    r.down = static_cast<uint32_t>(down);
+    return true;
+}
+
+template <size_t Length>
+bool use_stored(KZDSP_resampler& r, const float (&taps)[Length]) noexcept
+{
+    r.taps = taps;
+    r.length = Length;
+    return true;
+}
+
+bool design(KZDSP_resampler& r) noexcept
+{
+    const kz::dsp::FilterLayout layout = kz::dsp::filter_layout(r.up, r.down);
+    auto taps = kz::make_array<float>(layout.length);
+    if (!taps) {
+        return false;
+    }
+    kz::dsp::design_windowed_sinc(layout, {taps.get(), layout.length});
+    r.length = static_cast<uint32_t>(layout.length);
+    r.taps = taps.release();
+    r.owns_taps = 1;
+    return true;
+}
+
+bool choose_filter(KZDSP_resampler& r) noexcept
+{
+    if (kz::dsp::copies(r)) {
+        return true;
+    }
+    if (r.up == 1 && r.down == 4) {
+        return use_stored(r, kz::dsp::coefficients_4to1);
+    }
+    if (r.up == 1 && r.down == 2) {
+        return use_stored(r, kz::dsp::coefficients_2to1);
+    }
+    return design(r);
+}
+
+using Samples = std::span<const float>;
+
+const float* newest(Samples samples) noexcept
+{
+    return samples.empty() ? nullptr : &samples.back();
+}
+
+kz::dsp::BlockCounts resample(KZDSP_resampler& r, Samples input, std::span<float> output) noexcept
+{
+    if (kz::dsp::copies(r)) {
+        return kz::dsp::copy_block(input, output);
+    }
+    // Both sums run over the same products in the same order, so that a cut does not show.
+    return kz::dsp::resample_block(
+        r, input, output,
+        [&r](const float* window, uint32_t phase) {
+            return KZDSP_Convolve(window + r.taps_per_phase - 1, r.taps + phase, r.taps_per_phase,
+                                  r.up);
+        },
+        [&r](Samples newer, Samples older, uint32_t phase) {
+            return KZDSP_DualConvolve(newest(newer), static_cast<uint32_t>(newer.size()),
+                                      newest(older), static_cast<uint32_t>(older.size()),
+                                      r.taps + phase, r.up);
+        });
+}
+
+struct Destroy {
+    void operator()(KZDSP_resampler* r) const noexcept { KZDSP_DestroyResampler(r); }
+};
+
+} // namespace
+
+KZDSP_resampler* KZDSP_CreateResampler(float input_rate, float output_rate) noexcept
+{
+    if (!is_rate(input_rate) || !is_rate(output_rate)) {
+        return nullptr;
+    }
+    std::unique_ptr<KZDSP_resampler, Destroy> resampler(
+        kz::make_record<KZDSP_resampler>().release());
+    if (!resampler || !set_ratio(*resampler, input_rate, output_rate) ||
+        !choose_filter(*resampler) || !kz::dsp::make_history(*resampler)) {
+        return nullptr;
+    }
+    return resampler.release();
+}
+
+void KZDSP_DestroyResampler(KZDSP_resampler* resampler) noexcept
+{
+    if (resampler != nullptr) {
+        const kz::owned<float[]> taps(
+            resampler->owns_taps != 0 ? const_cast<float*>(resampler->taps) : nullptr);
+        const kz::owned<float[]> history(resampler->history);
+        const kz::owned<KZDSP_resampler> record(resampler);
+    }
+}
+
+void KZDSP_ResetResampler(KZDSP_resampler* resampler) noexcept
+{
+    if (resampler != nullptr) {
+        kz::dsp::restart(*resampler);
+    }
+}
+
+uint32_t KZDSP_ComputeResampledLength(const KZDSP_resampler* resampler, uint32_t count) noexcept
+{
+    return resampler == nullptr ? 0 : kz::dsp::resampled_length(*resampler, count);
+}
+
+uint32_t KZDSP_ComputeRawLength(const KZDSP_resampler* resampler, uint32_t count) noexcept
+{
+    return resampler == nullptr ? 0 : kz::dsp::raw_length(*resampler, count);
+}
+
+void KZDSP_Resample(KZDSP_resampler* resampler, const float* input, uint32_t input_count,
+                    float* output, uint32_t output_capacity, uint32_t* consumed,
+                    uint32_t* produced) noexcept
+{
+    kz::dsp::resample_call(resampler, kz::dsp::block(input, input_count),
+                           kz::dsp::block(output, output_capacity), consumed, produced, resample);
+}
