@@ -57,6 +57,7 @@
 
 /* The fixed-point fingerprinter and its parts. */
 #include "kzsdk/qvfixed/qvfixed.h"
+#include "kzsdk/qvfloat/qvfloat.h"
 
 /* The extraction interface: the door for most users. */
 #include "kzsdk/fpx/fpx.h"

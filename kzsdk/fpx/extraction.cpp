@@ -5,6 +5,7 @@
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/fpx/algorithm.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
+#include "kzsdk/qvfloat/qvfloat.h"
 
 namespace {
 
@@ -13,6 +14,8 @@ using kz::fpx::Algorithm;
 constexpr std::array kAlgorithms = {
     kz::fpx::algorithm_row<kzqvfixed_fingerprinter, kzqvfixed_constructor, kzqvfixed_destructor,
                            kzqvfixed_add_samples, kzqvfixed_get_result>(KZ_FPX_ALGORITHM_FIXED),
+    kz::fpx::algorithm_row<QVFP, QVFP_Constructor, QVFP_Destructor, QVFP_AddSamples,
+                           QVFP_GetResult>(KZ_FPX_ALGORITHM_FLOAT),
 };
 
 const Algorithm* find_algorithm(uint32_t id) noexcept

@@ -20,7 +20,9 @@ typedef struct kz_fpx_handle kz_fpx_handle;
 
 /** Algorithm numbers. */
 enum {
-    KZ_FPX_ALGORITHM_FIXED = 1 /**< fixed point: exact to the bit everywhere */
+    KZ_FPX_ALGORITHM_FIXED = 1, /**< fixed point: eight rates, exact to the bit everywhere */
+    KZ_FPX_ALGORITHM_FLOAT =
+        2 /**< floating point: any rate; values a little apart from the other's */
 };
 
 /** Input formats. Channels are interleaved. */
@@ -34,9 +36,10 @@ enum {
 /**
  * Makes a fingerprint in the making.
  *
- * @param algorithm    KZ_FPX_ALGORITHM_FIXED.
+ * @param algorithm    One of the algorithm numbers.
  * @param format       One of the input formats.
- * @param sample_rate  Hertz: 8000, 11025, 16000, 22050, 24000, 32000, 44100 or 48000.
+ * @param sample_rate  Hertz: 8000, 11025, 16000, 22050, 24000, 32000, 44100 or 48000; with
+ *                     KZ_FPX_ALGORITHM_FLOAT any rate that KZDSP_CreateResampler() takes.
  * @param channels     1 or 2.
  * @param[out] out_handle  The handle, which the caller frees with kz_fpx_fingerprint_free(). Left
  *                     untouched on failure: set it to null first. Must not be null.

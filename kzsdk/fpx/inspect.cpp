@@ -1,8 +1,10 @@
 #include "kzsdk/fpx/inspect.hpp"
 
 #include "kzsdk/fpx/algorithm.hpp"
+#include "kzsdk/qv/frame_list.hpp"
 #include "kzsdk/qv/frame_pump.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
+#include "kzsdk/qvfloat/qvfloat.h"
 
 namespace kz::fpx {
 
@@ -12,6 +14,9 @@ namespace {
 template <class Use>
 auto visit(const kz_fpx_handle& handle, Use use) noexcept
 {
+    if (handle.algorithm->id == KZ_FPX_ALGORITHM_FLOAT) {
+        return use(*static_cast<const QVFP*>(handle.instance));
+    }
     return use(*static_cast<const kzqvfixed_fingerprinter*>(handle.instance));
 }
 
@@ -34,9 +39,8 @@ bool signal_found(const kz_fpx_handle& handle) noexcept
 
 uint32_t percent_progress(const kz_fpx_handle& handle) noexcept
 {
-    return visit(handle, [](const auto& object) {
-        return kzqvfixed_frame_manager_get_percent_progress(object.frame_manager);
-    });
+    return visit(handle,
+                 [](const auto& object) { return qv::percent_progress(*object.frame_manager); });
 }
 
 } // namespace kz::fpx

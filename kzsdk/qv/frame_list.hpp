@@ -63,6 +63,20 @@ void append_record(Manager& manager, owned<Record> record) noexcept
     manager.fingerprint_ready = 0;
 }
 
+/// Moves all records of `more` to the end of the manager's list.
+template <class Manager, class List>
+void append_records(Manager& manager, List& more) noexcept
+{
+    if (more.records == nullptr) {
+        return;
+    }
+    *manager.records_tail = more.records;
+    manager.records_tail = more.records_tail;
+    manager.frame_count += more.frame_count;
+    manager.fingerprint_ready = 0;
+    more.records = nullptr;
+}
+
 /// Empties the list.
 template <class Manager>
 void drop_records(Manager& manager) noexcept
@@ -84,6 +98,16 @@ void reset_frames(Manager& manager) noexcept
 {
     drop_records(manager);
     manager.skip_remaining = manager.skip_frames;
+}
+
+/// Takes the limits of a configuration into a new, cleared manager.
+template <class Manager, class Config>
+void adopt_limits(Manager& manager, const Config& config) noexcept
+{
+    manager.skip_frames = config.skip_frames;
+    manager.frame_limit = config.frame_limit;
+    manager.fingerprint_scale = config.fingerprint_scale;
+    reset_frames(manager);
 }
 
 /// Frames kept in percent of the limit; 0 without one.

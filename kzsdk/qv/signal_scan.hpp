@@ -41,6 +41,15 @@ void free_detector(Detector* detector) noexcept
     }
 }
 
+template <class Detector>
+kz_status reset_detector(Detector* detector) noexcept
+{
+    if (detector != nullptr) {
+        detector->primed = 0;
+    }
+    return KZ_OK;
+}
+
 /// Fills the rings with the block's beginning; where that is shorter than the window, with zeros.
 template <class Detector, class Sample, class ToInteger>
 void prime(Detector& detector, std::span<const Sample> block, ToInteger to_integer) noexcept

@@ -5,6 +5,7 @@
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/dsp/fxp.h"
 #include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/qv/frame_pieces.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
 namespace {
@@ -12,6 +13,7 @@ namespace {
 using namespace kz::fxp;
 
 using Samples = std::span<const FxpType>;
+using Pieces = kz::qv::FramePieces<FxpType>;
 
 // A frame whose halved range is no more than this is silent.
 constexpr int32_t kSilentRange = 8192;
@@ -88,16 +90,16 @@ void rank_values(std::span<const uint32_t> histogram, std::span<uint32_t> ranks)
     }
 }
 
-void equalise(Samples first, Samples second, const Extremes& extremes, FxpType* output,
+void equalise(const Pieces& pieces, const Extremes& extremes, FxpType* output,
               std::span<uint32_t> histogram, std::span<uint32_t> ranks) noexcept
 {
     const Quantiser quantiser(extremes.bottom(), extremes.range(),
                               static_cast<uint32_t>(histogram.size()));
     std::fill(histogram.begin(), histogram.end(), 0U);
-    quantise(first, quantiser, output, histogram);
-    quantise(second, quantiser, output + first.size(), histogram);
+    quantise(pieces.older, quantiser, output, histogram);
+    quantise(pieces.newer, quantiser, output + pieces.older.size(), histogram);
     rank_values(histogram, ranks);
-    for (FxpType& value : std::span(output, first.size() + second.size())) {
+    for (FxpType& value : std::span(output, pieces.older.size() + pieces.newer.size())) {
         value = static_cast<FxpType>(ranks[static_cast<uint32_t>(value)]);
     }
 }
@@ -111,21 +113,17 @@ kz_status kzqvfixed_hist_eq_dual(const FxpType* first, uint32_t first_count, con
     if (output == nullptr || histogram == nullptr || levels == 0) {
         return KZ_OK;
     }
-    const Samples older(first, first == nullptr ? 0 : std::min(first_count, output_length));
-    const auto missing = output_length - static_cast<uint32_t>(older.size());
-    const Samples newer(second, second == nullptr ? 0 : std::min(second_count, missing));
-
+    const auto pieces =
+        kz::qv::cut_to_frame(first, first_count, second, second_count, output_length);
     Extremes extremes;
-    extremes.take(older);
-    extremes.take(newer);
+    extremes.take(pieces.older);
+    extremes.take(pieces.newer);
     const auto ranks = kz::make_array<uint32_t>(levels);
     if (!ranks || extremes.range() <= kSilentRange) {
-        // The plain copy fills the frame from the second piece, whatever its count says.
-        std::copy(older.begin(), older.end(), output);
-        std::copy_n(second, second == nullptr ? 0 : missing, output + older.size());
+        kz::qv::copy_whole_frame(pieces, second, output, output_length);
         return KZ_OK;
     }
-    equalise(older, newer, extremes, output, {histogram, levels}, {ranks.get(), levels});
+    equalise(pieces, extremes, output, {histogram, levels}, {ranks.get(), levels});
     return KZ_OK;
 }
 
@@ -143,6 +141,6 @@ kz_status kzqvfixed_hist_eq2(const FxpType* input, FxpType* output, uint32_t cou
     }
     Extremes extremes;
     extremes.take(samples);
-    equalise(samples, {}, extremes, output, {histogram, levels}, {ranks.get(), levels});
+    equalise({samples, {}}, extremes, output, {histogram, levels}, {ranks.get(), levels});
     return KZ_OK;
 }

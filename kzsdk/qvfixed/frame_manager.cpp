@@ -6,6 +6,7 @@
 #include "kzsdk/dsp/fxp.h"
 #include "kzsdk/dsp/fxp_ops.hpp"
 #include "kzsdk/qv/frame_list.hpp"
+#include "kzsdk/qv/frame_pieces.hpp"
 #include "kzsdk/qvfixed/band_tables.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
@@ -65,12 +66,9 @@ void fill_frame(Manager& m, const FxpType* first, uint32_t first_count, const Fx
                                                  m.histogram_levels));
         return;
     }
-    const uint32_t first_used = std::min(first_count, m.frame_length);
-    std::copy_n(first, first_used, m.frame_buffer);
-    if (second != nullptr) {
-        std::copy_n(second, std::min(second_count, m.frame_length - first_used),
-                    m.frame_buffer + first_used);
-    }
+    kz::qv::copy_pieces(
+        kz::qv::cut_to_frame(first, first_count, second, second_count, m.frame_length),
+        m.frame_buffer);
 }
 
 void decimate_frame(Manager& m) noexcept
@@ -256,10 +254,7 @@ kzqvfixed_frame_manager* kzqvfixed_frame_manager_create(const kzqvfixed_config* 
     if (!manager) {
         return nullptr;
     }
-    manager->skip_frames = config->skip_frames;
-    manager->frame_limit = config->frame_limit;
-    manager->fingerprint_scale = config->fingerprint_scale;
-    kz::qv::reset_frames(*manager);
+    kz::qv::adopt_limits(*manager, *config);
     make_parts(*manager, *config);
     if (!has_all_parts(*manager)) {
         static_cast<void>(kzqvfixed_frame_manager_destroy(manager.release()));

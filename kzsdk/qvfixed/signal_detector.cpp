@@ -28,10 +28,7 @@ void kzqvfixed_signal_detector_destroy(kzqvfixed_signal_detector* detector) noex
 
 kz_status kzqvfixed_signal_detector_reset(kzqvfixed_signal_detector* detector) noexcept
 {
-    if (detector != nullptr) {
-        detector->primed = 0;
-    }
-    return KZ_OK;
+    return kz::qv::reset_detector(detector);
 }
 
 uint32_t kzqvfixed_signal_detector_get_signal_offset(kzqvfixed_signal_detector* detector,

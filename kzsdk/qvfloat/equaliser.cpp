@@ -1,0 +1,152 @@
+#include <algorithm>
+#include <span>
+
+#include "kzsdk/abs/owned.hpp"
+#include "kzsdk/abs/saturate.hpp"
+#include "kzsdk/qv/frame_pieces.hpp"
+#include "kzsdk/qvfloat/qvfloat.h"
+
+namespace {
+
+using Samples = std::span<const float>;
+using Pieces = kz::qv::FramePieces<float>;
+
+// A frame whose range is no more than this is silent.
+constexpr float kSilentRange = 1.0F;
+
+// The search starts beyond any sample of 16 bits, not at the ends of the type.
+struct Extremes {
+    float low = 1e6F;
+    float high = -1e6F;
+
+    void take(Samples samples) noexcept
+    {
+        for (const float sample : samples) {
+            low = sample < low ? sample : low;
+            high = sample > high ? sample : high;
+        }
+    }
+
+    float range() const noexcept { return high - low; }
+};
+
+// Maps samples to levels 0 .. K - 1.
+class Quantiser {
+public:
+    Quantiser(const Extremes& extremes, uint32_t levels) noexcept
+        : bottom_(extremes.low), scale_(static_cast<float>(levels - 1) / extremes.range()),
+          top_level_(levels - 1)
+    {
+    }
+
+    // A constant frame has an infinite scale, and a sample need not be a number: no level may leave
+    // the table.
+    uint32_t level(float sample) const noexcept
+    {
+        return std::min(kz::to_uint32((sample - bottom_) * scale_), top_level_);
+    }
+
+private:
+    float bottom_;
+    float scale_;
+    uint32_t top_level_;
+};
+
+void count_levels(Samples samples, const Quantiser& quantiser,
+                  std::span<uint32_t> histogram) noexcept
+{
+    for (const float sample : samples) {
+        ++histogram[quantiser.level(sample)];
+    }
+}
+
+// Cumulative shares of `count` samples, less their mean.
+void rank_values(std::span<const uint32_t> histogram, float count, std::span<float> ranks) noexcept
+{
+    float cumulative = 0;
+    float total = 0;
+    for (size_t i = 0; i < histogram.size(); ++i) {
+        const auto here = static_cast<float>(histogram[i]);
+        cumulative = cumulative + here / count;
+        total = total + cumulative * here;
+        ranks[i] = cumulative;
+    }
+    const float mean = total / count;
+    for (float& rank : ranks) {
+        rank -= mean;
+    }
+}
+
+void map_levels(Samples samples, const Quantiser& quantiser, std::span<const float> ranks,
+                float* output) noexcept
+{
+    for (size_t i = 0; i < samples.size(); ++i) {
+        output[i] = ranks[quantiser.level(samples[i])];
+    }
+}
+
+void equalise(const Pieces& pieces, const Extremes& extremes, float* output,
+              std::span<uint32_t> histogram, std::span<float> ranks) noexcept
+{
+    const Quantiser quantiser(extremes, static_cast<uint32_t>(histogram.size()));
+    std::fill(histogram.begin(), histogram.end(), 0U);
+    count_levels(pieces.older, quantiser, histogram);
+    count_levels(pieces.newer, quantiser, histogram);
+    rank_values(histogram, static_cast<float>(pieces.older.size() + pieces.newer.size()), ranks);
+    map_levels(pieces.older, quantiser, ranks, output);
+    map_levels(pieces.newer, quantiser, ranks, output + pieces.older.size());
+}
+
+} // namespace
+
+kz_status hist_eq(const float* input, float* output, uint32_t count, uint32_t levels) noexcept
+{
+    if (input == nullptr || output == nullptr || levels == 0) {
+        return KZ_OK;
+    }
+    const auto histogram = kz::make_array<uint32_t>(levels);
+    if (!histogram) {
+        std::copy_n(input, count, output);
+        return KZ_OK;
+    }
+    return hist_eq2(input, output, count, histogram.get(), levels);
+}
+
+kz_status hist_eq2(const float* input, float* output, uint32_t count, uint32_t* histogram,
+                   uint32_t levels) noexcept
+{
+    if (input == nullptr || output == nullptr || histogram == nullptr || levels == 0) {
+        return KZ_OK;
+    }
+    const Samples samples(input, count);
+    const auto ranks = kz::make_array<float>(levels);
+    if (!ranks) {
+        std::copy(samples.begin(), samples.end(), output);
+        return KZ_OK;
+    }
+    Extremes extremes;
+    extremes.take(samples);
+    equalise({samples, {}}, extremes, output, {histogram, levels}, {ranks.get(), levels});
+    return KZ_OK;
+}
+
+kz_status hist_eq_dual(const float* first, uint32_t first_count, const float* second,
+                       uint32_t second_count, float* output, uint32_t output_length,
+                       uint32_t* histogram, uint32_t levels) noexcept
+{
+    if (output == nullptr || histogram == nullptr || levels == 0) {
+        return KZ_OK;
+    }
+    const auto pieces =
+        kz::qv::cut_to_frame(first, first_count, second, second_count, output_length);
+    Extremes extremes;
+    extremes.take(pieces.older);
+    extremes.take(pieces.newer);
+    const auto ranks = kz::make_array<float>(levels);
+    if (!ranks || extremes.range() <= kSilentRange) {
+        kz::qv::copy_whole_frame(pieces, second, output, output_length);
+        return KZ_OK;
+    }
+    equalise(pieces, extremes, output, {histogram, levels}, {ranks.get(), levels});
+    return KZ_OK;
+}

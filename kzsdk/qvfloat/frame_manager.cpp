@@ -1,0 +1,255 @@
+#include <algorithm>
+#include <span>
+#include <utility>
+
+#include "kzsdk/abs/mathfn.h"
+#include "kzsdk/abs/owned.hpp"
+#include "kzsdk/abs/saturate.hpp"
+#include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/qv/frame_list.hpp"
+#include "kzsdk/qv/frame_pieces.hpp"
+#include "kzsdk/qvfloat/qvfloat.h"
+
+namespace {
+
+// ---- creation
+
+bool has_all_parts(const QVFM& m) noexcept
+{
+    return m.frame_buffer != nullptr && m.dct != nullptr && m.band_table != nullptr &&
+           m.fingerprint != nullptr && (m.histogram_levels == 0 || m.histogram != nullptr);
+}
+
+void make_parts(QVFM& m, const QVConfig& config) noexcept
+{
+    m.frame_length = kz::fxp::shift_left(1U, static_cast<int32_t>(config.frame_length_log2));
+    m.dct = KZDSP_CreateDCT(static_cast<int32_t>(config.frame_length_log2));
+    if (m.dct == nullptr) {
+        return; // before a frame of an absurd length is allocated
+    }
+    // Cleared, so that a frame given in short pieces never shows what the heap held.
+    m.frame_buffer = kz::make_array<float>(m.frame_length).release();
+    m.bin_width = config.sample_rate / (2.0F * static_cast<float>(m.frame_length));
+    static_cast<void>(QVConfig_CopyFreqTable(&config, &m.band_table, &m.band_table_count));
+    m.band_count = m.band_table_count / 2;
+    m.histogram_levels = config.histogram_levels;
+    if (m.histogram_levels != 0) {
+        m.histogram = kz::make_array<uint32_t>(m.histogram_levels).release();
+    }
+    m.fingerprint = kz::make_array<int16_t>(uint64_t{m.band_count} * 2).release();
+}
+
+// ---- analysis of one frame
+
+void fill_frame(QVFM& m, const float* first, uint32_t first_count, const float* second,
+                uint32_t second_count) noexcept
+{
+    if (m.histogram_levels != 0) {
+        static_cast<void>(hist_eq_dual(first, first_count, second, second_count, m.frame_buffer,
+                                       m.frame_length, m.histogram, m.histogram_levels));
+        return;
+    }
+    kz::qv::copy_pieces(
+        kz::qv::cut_to_frame(first, first_count, second, second_count, m.frame_length),
+        m.frame_buffer);
+}
+
+void fill_frame(QVFM& m, const float* samples) noexcept
+{
+    if (m.histogram_levels != 0) {
+        static_cast<void>(
+            hist_eq2(samples, m.frame_buffer, m.frame_length, m.histogram, m.histogram_levels));
+        return;
+    }
+    std::copy_n(samples, m.frame_length, m.frame_buffer);
+}
+
+// The bins of a band, both edges included and cut to the spectrum.
+std::span<const float> band_bins(const QVFM& m, uint32_t band) noexcept
+{
+    const uint32_t first = kz::to_uint32(m.band_table[2 * band] / m.bin_width);
+    const uint32_t last =
+        std::min(kz::to_uint32(m.band_table[2 * band + 1] / m.bin_width), m.frame_length - 1);
+    if (first > last) {
+        return {};
+    }
+    return {m.frame_buffer + first, last - first + 1};
+}
+
+float band_energy(std::span<const float> bins) noexcept
+{
+    float sum = 0;
+    for (const float bin : bins) {
+        sum += bin * bin;
+    }
+    return sum;
+}
+
+float root(float value) noexcept { return static_cast<float>(kz_sqrt(static_cast<double>(value))); }
+
+void append_features(QVFM& m) noexcept
+{
+    auto record = kz::qv::make_frame_record<QVFrameRecord>(m.band_count);
+    if (!record) {
+        return; // the frame is lost; the fingerprint completes one frame later
+    }
+    for (uint32_t band = 0; band < m.band_count; ++band) {
+        const auto bins = band_bins(m, band);
+        const float energy = band_energy(bins);
+        record->energy[band] = energy;
+        record->amplitude[band] = bins.empty() ? 0 : root(energy / static_cast<float>(bins.size()));
+    }
+    kz::qv::append_record(m, std::move(record));
+}
+
+void analyse(QVFM& m) noexcept
+{
+    KZDSP_ComputeDCT(m.dct, m.frame_buffer, 0);
+    append_features(m);
+}
+
+// ---- the fingerprint
+
+float root_mean_energy(const QVFM& m, uint32_t band) noexcept
+{
+    float sum = 0;
+    for (const auto* r = m.records; r != nullptr; r = r->next) {
+        sum += r->energy[band];
+    }
+    return root(sum / static_cast<float>(m.frame_count));
+}
+
+float amplitude_spread(const QVFM& m, uint32_t band) noexcept
+{
+    float sum = 0;
+    for (const auto* r = m.records; r != nullptr; r = r->next) {
+        sum += r->amplitude[band];
+    }
+    const float average = sum / static_cast<float>(m.frame_count);
+    float squares = 0;
+    for (const auto* r = m.records; r != nullptr; r = r->next) {
+        const float deviation = r->amplitude[band] - average;
+        squares += deviation * deviation;
+    }
+    return root(squares / static_cast<float>(m.frame_count - 1));
+}
+
+// Each value as its share of their sum. 32768 is the whole, and wraps in 16 bits to -32768; a share that
+// is not a number, as of a sum of 0, is 0.
+void store_shares(std::span<const float> values, float scale, int16_t* destination) noexcept
+{
+    float sum = 0;
+    for (const float value : values) {
+        sum += value;
+    }
+    for (size_t i = 0; i < values.size(); ++i) {
+        destination[i] = static_cast<int16_t>(kz::to_int32(scale * (values[i] / sum)));
+    }
+}
+
+void compute_fingerprint(QVFM& m) noexcept
+{
+    const auto means = kz::make_array<float>(m.band_count);
+    const auto spreads = kz::make_array<float>(m.band_count);
+    if (!means || !spreads) {
+        return;
+    }
+    for (uint32_t band = 0; band < m.band_count; ++band) {
+        means[band] = root_mean_energy(m, band);
+        spreads[band] = m.frame_count == 1 ? 0 : amplitude_spread(m, band);
+    }
+    const auto scale = static_cast<float>(m.fingerprint_scale);
+    store_shares({means.get(), m.band_count}, scale, m.fingerprint);
+    store_shares({spreads.get(), m.band_count}, scale, m.fingerprint + m.band_count);
+    m.fingerprint_ready = 1;
+}
+
+} // namespace
+
+QVFM* QVFM_Create(const QVConfig* config) noexcept
+{
+    auto manager = config == nullptr ? nullptr : kz::make_record<QVFM>();
+    if (!manager) {
+        return nullptr;
+    }
+    kz::qv::adopt_limits(*manager, *config);
+    make_parts(*manager, *config);
+    if (!has_all_parts(*manager)) {
+        static_cast<void>(QVFM_Destroy(manager.release()));
+        return nullptr;
+    }
+    return manager.release();
+}
+
+kz_status QVFM_Destroy(QVFM* manager) noexcept
+{
+    if (manager != nullptr) {
+        static_cast<void>(_kzmem_free(manager->fingerprint));
+        static_cast<void>(_kzmem_free(manager->frame_buffer));
+        static_cast<void>(_kzmem_free(manager->band_table));
+        static_cast<void>(_kzmem_free(manager->histogram));
+        KZDSP_DestroyDCT(manager->dct);
+        kz::qv::drop_records(*manager);
+        static_cast<void>(_kzmem_free(manager));
+    }
+    return KZ_OK;
+}
+
+kz_status QVFM_Reset(QVFM* manager) noexcept
+{
+    if (manager != nullptr) {
+        kz::qv::reset_frames(*manager);
+    }
+    return KZ_OK;
+}
+
+kz_status QVFM_AppendDualPCMData(QVFM* manager, const float* first, uint32_t first_count,
+                                 const float* second, uint32_t second_count) noexcept
+{
+    if (manager == nullptr || (first == nullptr && second == nullptr) ||
+        !kz::qv::admits_frame(*manager)) {
+        return KZ_OK;
+    }
+    fill_frame(*manager, first, first_count, second, second_count);
+    analyse(*manager);
+    return KZ_OK;
+}
+
+kz_status QVFM_AppendPCMData(QVFM* manager, const float* samples, uint32_t count) noexcept
+{
+    if (manager == nullptr || samples == nullptr || count != manager->frame_length ||
+        !kz::qv::admits_frame(*manager)) {
+        return KZ_OK;
+    }
+    fill_frame(*manager, samples);
+    analyse(*manager);
+    return KZ_OK;
+}
+
+uint32_t QVFM_GetFrameCount(const QVFM* manager) noexcept
+{
+    return manager == nullptr ? 0 : manager->frame_count;
+}
+
+uint8_t QVFM_ReachedFrameLimit(const QVFM* manager) noexcept
+{
+    return manager != nullptr && kz::qv::reached_limit(*manager) ? 1 : 0;
+}
+
+uint32_t QVFM_GetPercentProgress(const QVFM* manager) noexcept
+{
+    return manager == nullptr ? 0 : kz::qv::percent_progress(*manager);
+}
+
+uint32_t QVFM_GetFingerprintSize(const QVFM* manager) noexcept
+{
+    return manager == nullptr ? 0 : kz::qv::fingerprint_size(*manager);
+}
+
+uint32_t QVFM_GetFingerprint(QVFM* manager, void* destination, uint32_t capacity) noexcept
+{
+    if (manager == nullptr || destination == nullptr) {
+        return 0;
+    }
+    return kz::qv::read_fingerprint(*manager, destination, capacity, compute_fingerprint);
+}

@@ -1,0 +1,23 @@
+#include <span>
+
+#include "kzsdk/abs/saturate.hpp"
+#include "kzsdk/qv/signal_scan.hpp"
+#include "kzsdk/qvfloat/qvfloat.h"
+
+QVSD* QVSD_Create(uint32_t window, uint32_t threshold, int32_t max_deviation) noexcept
+{
+    return kz::qv::make_detector<QVSD>(window, threshold, max_deviation);
+}
+
+void QVSD_Destroy(QVSD* detector) noexcept { kz::qv::free_detector(detector); }
+
+kz_status QVSD_Reset(QVSD* detector) noexcept { return kz::qv::reset_detector(detector); }
+
+uint32_t QVSD_GetSignalOffset(QVSD* detector, const float* samples, uint32_t count) noexcept
+{
+    if (detector == nullptr || (samples == nullptr && count != 0)) {
+        return count;
+    }
+    return kz::qv::signal_offset(*detector, std::span(samples, count),
+                                 [](float sample) { return kz::to_int32(sample); });
+}
