@@ -24,6 +24,7 @@ struct Audio {
     uint32_t rate = 0;
     uint32_t channels = 0;
     std::string bytes;
+    uint32_t algorithm = KZ_FPX_ALGORITHM_FIXED;
 };
 
 /// The document that the library gives for a whole buffer in one call; empty when it is incomplete.
@@ -33,7 +34,7 @@ std::string document_of_one_call(const Audio& audio)
     kzconf_initialize_configuration(&configuration);
     EXPECT_EQ(KZ_OK, kzinit_initialize_vesk(&configuration));
     kz_fpx_handle* handle = nullptr;
-    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_create(KZ_FPX_ALGORITHM_FIXED, audio.format, audio.rate,
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_create(audio.algorithm, audio.format, audio.rate,
                                                audio.channels, &handle));
     uint8_t complete = 0;
     EXPECT_EQ(KZ_OK,
@@ -123,6 +124,17 @@ TEST(KzfpStreaming, LeadingSilenceGivesTheDocumentOfOneCall)
             const std::string file = clip(std::string("late-") + rate + channels + ".wav");
             EXPECT_EQ(document_of_one_call(read_all(file)), output_of({file})) << file;
         }
+    }
+}
+
+TEST(KzfpStreaming, TheFloatingPointAlgorithmGivesTheDocumentOfOneCallAtAnyRate)
+{
+    for (const char* name : {"music-8000-mono-s16", "late-48000-stereo", "music-44100-stereo-ulaw",
+                             "music-96000", "music-37800"}) {
+        const std::string file = clip(std::string(name) + ".wav");
+        Audio audio = read_all(file);
+        audio.algorithm = KZ_FPX_ALGORITHM_FLOAT;
+        EXPECT_EQ(document_of_one_call(audio), output_of({"--algorithm", "float", file})) << file;
     }
 }
 

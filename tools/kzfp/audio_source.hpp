@@ -22,9 +22,18 @@ struct FileError : std::runtime_error {
 constexpr uint32_t kSupportedRates[] = {8000, 11025, 16000, 22050, 24000, 32000, 44100, 48000};
 constexpr uint32_t kConvertedRate = 44100; ///< what all other rates are converted to
 
-constexpr bool is_supported_rate(uint32_t rate)
+/// What a sound file may have at all, hertz.
+constexpr uint32_t kLowestRate = 1000;
+constexpr uint32_t kHighestRate = 768000;
+
+constexpr bool is_usual_rate(uint32_t rate) { return rate >= kLowestRate && rate <= kHighestRate; }
+
+/// Whether samples of a rate go to the library as they are.
+constexpr bool takes_rate(Algorithm algorithm, uint32_t rate)
 {
-    return std::ranges::find(kSupportedRates, rate) != std::end(kSupportedRates);
+    return algorithm == Algorithm::floating
+               ? is_usual_rate(rate)
+               : std::ranges::find(kSupportedRates, rate) != std::end(kSupportedRates);
 }
 
 /// A stream of samples in a form that the library takes.

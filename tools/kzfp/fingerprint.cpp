@@ -57,12 +57,12 @@ uint32_t to_library_format(Encoding encoding)
     return KZ_FPX_FORMAT_PCM16;
 }
 
-Handle create(const StreamFormat& format)
+Handle create(const StreamFormat& format, Algorithm algorithm)
 {
     kz_fpx_handle* handle = nullptr;
-    const kz_status status =
-        kz_fpx_fingerprint_create(KZ_FPX_ALGORITHM_FIXED, to_library_format(format.encoding),
-                                  format.rate, format.channels, &handle);
+    const kz_status status = kz_fpx_fingerprint_create(static_cast<uint32_t>(algorithm),
+                                                       to_library_format(format.encoding),
+                                                       format.rate, format.channels, &handle);
     if (status != KZ_OK) {
         fail("making a fingerprint", status);
     }
@@ -170,9 +170,9 @@ Library::Library()
 
 Library::~Library() { kzinit_shutdown_vesk(); }
 
-Fingerprint take_fingerprint(AudioSource& source)
+Fingerprint take_fingerprint(AudioSource& source, Algorithm algorithm)
 {
-    const Handle handle = create(source.format());
+    const Handle handle = create(source.format(), algorithm);
     feed(*handle, source);
     Fingerprint fingerprint;
     fingerprint.document = to_document(*handle);

@@ -29,6 +29,6 @@ struct Fingerprint {
 
 /// Reads no more of `source` than the fingerprint needs. The document is the one that a single call
 /// with the whole stream would give. Throws FileError, also when there is too little sound.
-Fingerprint take_fingerprint(AudioSource& source);
+Fingerprint take_fingerprint(AudioSource& source, Algorithm algorithm);
 
 } // namespace kzfp

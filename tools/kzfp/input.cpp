@@ -123,7 +123,7 @@ OpenedInput Input::open()
         return open_raw(*options_.raw);
     }
     const int file = is_regular_ ? file_.number() : spool_.number();
-    auto sound_file = std::make_unique<SoundFile>(file);
+    auto sound_file = std::make_unique<SoundFile>(file, options_.algorithm);
     recognised_ = true;
     sound_file->select(options_.section);
     InputFacts facts = {
@@ -131,7 +131,7 @@ OpenedInput Input::open()
     if (is_regular_ || spool_ended_) {
         facts.duration = sound_file->duration();
     }
-    if (is_supported_rate(facts.rate)) {
+    if (takes_rate(options_.algorithm, facts.rate)) {
         return {std::move(sound_file), facts};
     }
     return {std::make_unique<RateConverter>(std::move(sound_file), kConvertedRate), facts};

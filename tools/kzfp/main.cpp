@@ -34,7 +34,7 @@ Result process(const std::string& name, const Options& options)
     for (;;) {
         try {
             const OpenedInput opened = input.open();
-            Fingerprint fingerprint = take_fingerprint(*opened.source);
+            Fingerprint fingerprint = take_fingerprint(*opened.source, options.algorithm);
             if (opened.source->trouble().empty() || !input.extend()) {
                 return {opened.facts, std::move(fingerprint)};
             }
@@ -58,12 +58,12 @@ bool process_and_write(const std::string& name, const Options& options, Progress
     };
     try {
         const Result result = process(name, options);
-        if (!is_supported_rate(result.facts.rate)) {
+        if (!takes_rate(options.algorithm, result.facts.rate)) {
             report("the library does not take " + std::to_string(result.facts.rate) +
                    " Hz, converted to " + std::to_string(kConvertedRate) + " Hz");
         }
         progress.clear();
-        write_output(to_text(options.format, name, result.facts, result.fingerprint));
+        write_output(to_text(options, name, result.facts, result.fingerprint));
         return true;
     } catch (const FileError& error) {
         return report(error.what());

@@ -22,8 +22,9 @@ constexpr const char* kDescription =
 
 constexpr const char* kNotes =
     "Rates:     8000, 11025, 16000, 22050, 24000, 32000, 44100 and 48000 Hz go to the library as\n"
-    "           they are; any other rate of a sound file is converted to 44100 Hz and that is\n"
-    "           said on standard error.\n"
+    "           they are, and with --algorithm float all from 1000 to 768000 Hz; any other rate of "
+    "a\n"
+    "           sound file is converted to 44100 Hz and that is said on standard error.\n"
     "Channels:  one and two go to the library as they are; more are mixed down to one: their sum\n"
     "           divided by the smallest power of two that is not below their number.\n"
     "Encodings: A-law and mu-law files go to the library as they are, everything else as 16-bit\n"
@@ -55,7 +56,15 @@ std::optional<uint32_t> to_number(std::string_view text)
     return error == std::errc{} && stop == end ? std::optional(number) : std::nullopt;
 }
 
-StreamFormat to_raw_format(const std::string& text)
+/// "1000 to 768000" or "8000, 11025, ..., 48000".
+std::string rates_text(Algorithm algorithm)
+{
+    return algorithm == Algorithm::fixed
+               ? "one of " + supported_rates_text()
+               : std::to_string(kLowestRate) + " to " + std::to_string(kHighestRate);
+}
+
+StreamFormat to_raw_format(const std::string& text, Algorithm algorithm)
 {
     const std::vector<std::string> words = CLI::detail::split(text, ',');
     if (words.size() != 3) {
@@ -64,10 +73,10 @@ StreamFormat to_raw_format(const std::string& text)
                                                 "for example 44100,2,s16");
     }
     const auto rate = to_number(words[0]);
-    if (!rate || !is_supported_rate(*rate)) {
+    if (!rate || !takes_rate(algorithm, *rate)) {
         throw CLI::ValidationError("--raw", "a rate of '" + words[0] +
-                                                "' Hz is not supported; it is one of " +
-                                                supported_rates_text());
+                                                "' Hz is not supported; it is " +
+                                                rates_text(algorithm));
     }
     const auto channels = to_number(words[1]);
     if (!channels || *channels < 1 || *channels > 2) {
@@ -93,17 +102,6 @@ std::string check_seconds(const std::string& text)
     return "'" + text + "' is not a number of seconds from 0 to 1000000000";
 }
 
-std::string check_algorithm(const std::string& name)
-{
-    if (name == "fixed") {
-        return {};
-    }
-    if (name == "float") {
-        return "the floating-point algorithm is not in this version; only 'fixed' is";
-    }
-    return "'" + name + "' is not an algorithm; 'fixed' is";
-}
-
 } // namespace
 
 std::variant<Options, ExitStatus> parse_command_line(int argc, char** argv)
@@ -114,6 +112,8 @@ std::variant<Options, ExitStatus> parse_command_line(int argc, char** argv)
 
     Options options;
     std::string raw;
+    const std::map<std::string, Algorithm> algorithms = {{"fixed", Algorithm::fixed},
+                                                         {"float", Algorithm::floating}};
     std::string algorithm = "fixed";
     double length = 0;
     const std::map<std::string, OutputFormat> formats = {{"document", OutputFormat::document},
@@ -143,17 +143,23 @@ std::variant<Options, ExitStatus> parse_command_line(int argc, char** argv)
     CLI::Option* length_option = app.add_option("--length", length, "Listen to no more than this")
                                      ->type_name("SECONDS")
                                      ->check(check_seconds);
-    app.add_option("--algorithm", algorithm, "fixed (default): fixed point, the same everywhere")
+    app.add_option(
+           "--algorithm", algorithm,
+           "fixed (default): fixed point, the same everywhere; float: floating point, which "
+           "takes any rate as it is")
         ->type_name("NAME")
-        ->check(check_algorithm);
+        ->check([&algorithms](const std::string& name) {
+            return algorithms.contains(name)
+                       ? std::string()
+                       : "'" + name + "' is not an algorithm; it is one of fixed, float";
+        });
     app.set_version_flag("--version", "kzfp " KZFP_VERSION " (libkzsdk " KZFP_VERSION ")");
 
     try {
         app.parse(argc, argv);
-        if (!raw.empty()) {
-            options.raw = to_raw_format(raw);
-        } else if (app.count("--raw") != 0) {
-            to_raw_format(raw); // throws
+        options.algorithm = algorithms.at(algorithm);
+        if (app.count("--raw") != 0) {
+            options.raw = to_raw_format(raw, options.algorithm);
         }
     } catch (const CLI::ParseError& error) {
         return app.exit(error, std::cout, std::cerr) == 0 ? all_done : wrong_usage;

@@ -23,6 +23,9 @@ struct StreamFormat {
     size_t frame_bytes() const { return size_t{channels} * (encoding == Encoding::s16 ? 2 : 1); }
 };
 
+/// By their numbers in the extraction interface.
+enum class Algorithm : uint32_t { fixed = 1, floating = 2 };
+
 enum class OutputFormat { document, json, values };
 
 constexpr double kLongestSeconds = 1e9; ///< for --start and --length: no counter wraps below
@@ -36,6 +39,7 @@ struct Section {
 struct Options {
     std::vector<std::string> files;
     OutputFormat format = OutputFormat::document;
+    Algorithm algorithm = Algorithm::fixed;
     std::optional<StreamFormat> raw; ///< the files are headerless and look like this
     Section section;
 };

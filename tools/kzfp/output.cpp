@@ -16,12 +16,12 @@ namespace {
 
 double to_microseconds(double seconds) { return std::round(seconds * 1e6) / 1e6; }
 
-std::string to_json(const std::string& file, const InputFacts& facts,
+std::string to_json(const std::string& file, Algorithm algorithm, const InputFacts& facts,
                     const Fingerprint& fingerprint)
 {
     nlohmann::ordered_json object;
     object["file"] = file;
-    object["algorithm"] = "fixed";
+    object["algorithm"] = algorithm == Algorithm::fixed ? "fixed" : "float";
     object["duration"] = nullptr;
     if (facts.duration) {
         object["duration"] = to_microseconds(*facts.duration);
@@ -56,12 +56,12 @@ std::string without_control_characters(std::string text)
 
 } // namespace
 
-std::string to_text(OutputFormat format, const std::string& file, const InputFacts& facts,
+std::string to_text(const Options& options, const std::string& file, const InputFacts& facts,
                     const Fingerprint& fingerprint)
 {
-    switch (format) {
+    switch (options.format) {
     case OutputFormat::json:
-        return to_json(file, facts, fingerprint) + '\n';
+        return to_json(file, options.algorithm, facts, fingerprint) + '\n';
     case OutputFormat::values:
         return to_words(fingerprint.values) + '\n';
     case OutputFormat::document:

@@ -21,7 +21,7 @@ struct OutputError : std::runtime_error {
 };
 
 /// One result in the form asked for, with its line break.
-std::string to_text(OutputFormat format, const std::string& file, const InputFacts& facts,
+std::string to_text(const Options& options, const std::string& file, const InputFacts& facts,
                     const Fingerprint& fingerprint);
 
 /// Writes to standard output at once. Throws OutputError.

@@ -13,8 +13,6 @@ namespace kzfp {
 namespace {
 
 constexpr size_t kBlock = 4096; ///< frames read at a time
-constexpr int kLowestRate = 1000;
-constexpr int kHighestRate = 768000;
 
 /// Full scale is 32768, so that 16-bit samples come back unchanged from a file of floats. Rounded to
 /// the nearest, clipped at full scale; what is not a number is silence.
@@ -36,7 +34,7 @@ std::string to_seconds(double seconds)
 
 } // namespace
 
-SoundFile::SoundFile(int file)
+SoundFile::SoundFile(int file, Algorithm algorithm)
 {
     // The object gets a descriptor of its own, which libsndfile closes, also when it cannot open it.
     const int own = ::dup(file);
@@ -49,7 +47,7 @@ SoundFile::SoundFile(int file)
                         "headerless audio needs --raw");
     }
     check();
-    if (is_companded() && info_.channels <= 2 && is_supported_rate(file_rate())) {
+    if (is_companded() && info_.channels <= 2 && takes_rate(algorithm, file_rate())) {
         const bool alaw = (info_.format & SF_FORMAT_SUBMASK) == SF_FORMAT_ALAW;
         encoding_ = alaw ? Encoding::alaw : Encoding::ulaw;
     }
@@ -68,7 +66,7 @@ void SoundFile::check() const
     if (info_.channels < 1) {
         throw FileError("has no channels, one or more are needed");
     }
-    if (info_.samplerate < kLowestRate || info_.samplerate > kHighestRate) {
+    if (info_.samplerate < 0 || !is_usual_rate(file_rate())) {
         throw FileError("has a rate of " + std::to_string(info_.samplerate) + " Hz, " +
                         std::to_string(kLowestRate) + " to " + std::to_string(kHighestRate) +
                         " Hz can be used");

@@ -17,8 +17,9 @@ namespace kzfp {
 /// - everything else: 16-bit PCM, in which more than two channels are mixed down to one.
 class SoundFile : public AudioSource {
 public:
-    /// `file` is a regular file that outlives the object. Throws FileError.
-    explicit SoundFile(int file);
+    /// `file` is a regular file that outlives the object; `algorithm` decides in which encoding its
+    /// samples are given. Throws FileError.
+    SoundFile(int file, Algorithm algorithm);
 
     /// Goes to the start of a section, beyond whose end read() gives nothing. Before the first
     /// read(). Throws FileError.
