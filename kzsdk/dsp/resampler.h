@@ -151,10 +151,10 @@ typedef struct KZDSP_resampler {
  * @param input_rate   Hertz, finite and above 0.
  * @param output_rate  Hertz, finite and above 0.
  * @return The resampler, which the caller frees with KZDSP_DestroyResampler(). Null for any other
- *         rate, for a quotient that single precision or KZDSP_Rationalize() cannot tell from 0 or
- *         infinity, and when memory is short. A ratio with L or M above KZDSP_LARGEST_FACTOR counts
- *         as short of memory: its filter would pass 22 million taps, 88 MB. Pairs of whole rates up to
- *         20000 Hz or so come nowhere near; rates a few millionths apart come close.
+ *         rate, for a quotient that is 0 or infinite in single precision, and when memory is short. A
+ *         ratio with L or M above KZDSP_LARGEST_FACTOR counts as short of memory: its filter would
+ *         take more than 88 MB. The tolerance keeps both below a million or so, whatever the rates,
+ *         unless one is about a million times the other.
  */
 KZ_API KZDSP_resampler* KZDSP_CreateResampler(float input_rate, float output_rate) KZ_NOEXCEPT;
 

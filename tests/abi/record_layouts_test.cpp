@@ -117,6 +117,18 @@ TEST(RecordLayout, OfTheTransform)
     static_assert(std::is_same_v<int32_t, decltype(Record::order)>);
 }
 
+TEST(RecordLayout, OfTheFloatTransform)
+{
+    using Record = KZDSP_DCT;
+    expect_layout<Record>({
+        FIELD(Record, order),
+        FIELD(Record, length),
+        FIELD(Record, coefficients),
+        FIELD(Record, owns_coefficients),
+    });
+    static_assert(std::is_same_v<const float*, decltype(Record::coefficients)>);
+}
+
 TEST(RecordLayout, OfTheResampler)
 {
     using Record = KZDSP_resampler_fixed;
@@ -132,6 +144,25 @@ TEST(RecordLayout, OfTheResampler)
         FIELD(Record, history_start),
         FIELD(Record, history_end),
     });
+}
+
+TEST(RecordLayout, OfTheFloatResampler)
+{
+    using Record = KZDSP_resampler;
+    expect_layout<Record>({
+        FIELD(Record, up),
+        FIELD(Record, down),
+        FIELD(Record, taps_per_phase),
+        FIELD(Record, length),
+        FIELD(Record, taps),
+        FIELD(Record, owns_taps),
+        FIELD(Record, phase),
+        FIELD(Record, history),
+        FIELD(Record, history_start),
+        FIELD(Record, history_end),
+    });
+    static_assert(std::is_same_v<const float*, decltype(Record::taps)>);
+    static_assert(std::is_same_v<uint32_t, decltype(Record::owns_taps)>);
 }
 
 TEST(RecordLayout, OfTheFingerprinterConfiguration)

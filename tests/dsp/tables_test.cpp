@@ -3,9 +3,11 @@
 
 #include "kzsdk/dsp/tables.hpp"
 
+#include <bit>
 #include <cmath>
 #include <numbers>
 #include <span>
+#include <vector>
 
 #include <gtest/gtest.h>
 
@@ -27,6 +29,15 @@ uint64_t digest(std::span<const Word> words, uint64_t hash = 0xcbf29ce484222325u
         }
     }
     return hash;
+}
+
+uint64_t digest_of_floats(std::span<const float> values)
+{
+    std::vector<uint32_t> bits;
+    for (const float value : values) {
+        bits.push_back(std::bit_cast<uint32_t>(value));
+    }
+    return digest(std::span<const uint32_t>(bits));
 }
 
 struct Filter {
@@ -98,6 +109,12 @@ TEST(Tables, FilterTapsAreTheKnownWords)
             << std::hex << "0x" << filter.digest_of_halves() << " over " << std::dec
             << filter.length() << " taps";
     }
+}
+
+TEST(Tables, DecimatorTapsAreTheKnownFloats)
+{
+    EXPECT_EQ(kDigest2to1, digest_of_floats(dsp::coefficients_2to1));
+    EXPECT_EQ(kDigest4to1, digest_of_floats(dsp::coefficients_4to1));
 }
 
 } // namespace kz::test

@@ -15,5 +15,7 @@ constexpr uint64_t kDigest24000 = 0xdb34ab57bb223747;
 constexpr uint64_t kDigest32000 = 0xd44be068ff1519eb;
 constexpr uint64_t kDigest44100 = 0x6977d5e5fdbe1651;
 constexpr uint64_t kDigest48000 = 0xd1c2786e48e0424a;
+constexpr uint64_t kDigest2to1 = 0x2475fa1404a4362c;
+constexpr uint64_t kDigest4to1 = 0xdbf35cedf975e3c7;
 
 } // namespace kz::test
