@@ -1,24 +1,19 @@
 #include "kzsdk/xml/xml.h"
 
 #include <cassert>
-#include <memory>
 #include <utility>
 
 #include "kzsdk/xml/attributes.hpp"
-#include "kzsdk/xml/open_tags.hpp"
+#include "kzsdk/xml/copy_tree.hpp"
 #include "kzsdk/xml/text.hpp"
 
 namespace {
 
 using kz::owned;
 using kz::xml::copy_of;
+using kz::xml::owned_tree;
 using kz::xml::Text;
 using kz::xml::text_of;
-
-struct DisposeTree {
-    void operator()(XMLTag* tag) const noexcept { static_cast<void>(DisposeXMLTag(tag)); }
-};
-using owned_tree = std::unique_ptr<XMLTag, DisposeTree>;
 
 void dispose_list(XMLTag* first) noexcept
 {
@@ -65,38 +60,9 @@ owned_tree clone_without_sub_tags(const XMLTag& source) noexcept
     return clone;
 }
 
-/// A clone whose sub-tags are being made: where the next goes, and what it will be a clone of.
-struct OpenClone {
-    XMLTag** end;
-    const XMLTag* next;
-};
-
 owned_tree clone_tree(const XMLTag& source) noexcept
 {
-    owned_tree root = clone_without_sub_tags(source);
-    kz::xml::OpenTags<OpenClone> open;
-    if (!root || !open.push({&root->sub_tags, source.sub_tags})) {
-        return nullptr;
-    }
-    while (!open.is_empty()) {
-        OpenClone& parent = open.top();
-        const XMLTag* tag = parent.next;
-        if (tag == nullptr) {
-            open.pop();
-            continue;
-        }
-        XMLTag* clone = clone_without_sub_tags(*tag).release();
-        if (clone == nullptr) {
-            return nullptr;
-        }
-        *parent.end = clone;
-        parent.end = &clone->next_sibling;
-        parent.next = tag->next_sibling;
-        if (tag->sub_tags != nullptr && !open.push({&clone->sub_tags, tag->sub_tags})) {
-            return nullptr;
-        }
-    }
-    return root;
+    return kz::xml::copy_tree(source, kz::xml::IfRefused::fails_as_a_whole, clone_without_sub_tags);
 }
 
 /// Gives a tag without sub-tags copies of the source's, in order, up to the first that fails.

@@ -110,6 +110,25 @@ TEST_F(DeepTree, AMillionLevelsAreClonedCopiedAndDisposedOf)
     });
 }
 
+TEST_F(DeepTree, AMillionLevelsAreComparedAndMutated)
+{
+    Tree root = deep_tree(kMillion, false);
+    on_a_small_stack([&] {
+        Tree clone(CloneAndMutateXMLTag(root.get(), 1));
+        ASSERT_TRUE(clone);
+        expect_same_shape(root.get(), clone.get());
+        EXPECT_EQ(1u, EqualXMLTags(root.get(), clone.get()));
+        XMLTag* last = clone.get();
+        while (last->sub_tags != nullptr) {
+            last = last->sub_tags;
+        }
+        EXPECT_EQ(KZ_OK, SetXMLTagDataFromStr(last, "different"));
+        EXPECT_EQ(0u, EqualXMLTags(root.get(), clone.get()));
+        clone.reset();
+        root.reset();
+    });
+}
+
 TEST_F(DeepTree, SideBranchesAreNotLost)
 {
     Tree root = deep_tree(100'000, true);
@@ -117,6 +136,9 @@ TEST_F(DeepTree, SideBranchesAreNotLost)
         const Tree clone(CloneXMLTag(root.get(), 1));
         ASSERT_TRUE(clone);
         expect_same_shape(root.get(), clone.get());
+        EXPECT_EQ(1u, EqualXMLTags(root.get(), clone.get()));
+        const Tree mutated(CloneAndMutateXMLTag(root.get(), 1));
+        EXPECT_EQ(1u, EqualXMLTags(root.get(), mutated.get()));
         root.reset();
     });
 }
@@ -189,6 +211,9 @@ TEST_F(DeepTree, ALongListIsClonedInOnePass)
     }
     const Tree clone(CloneXMLTag(root.get(), 1));
     EXPECT_EQ(300'000u, GetXMLSubTagCount(clone.get()));
+    const Tree mutated(CloneAndMutateXMLTag(root.get(), 1));
+    EXPECT_EQ(300'000u, GetXMLSubTagCount(mutated.get()));
+    EXPECT_EQ(1u, EqualXMLTags(clone.get(), mutated.get()));
     const Tree copy = make_tag("X");
     EXPECT_EQ(KZ_OK, CopyXMLTag(copy.get(), root.get()));
     EXPECT_EQ(300'000u, GetXMLSubTagCount(copy.get()));
