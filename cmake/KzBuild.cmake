@@ -54,13 +54,14 @@ function(kz_room name)
   set_property(GLOBAL APPEND PROPERTY KZ_PUBLIC_HEADERS ${room_HEADERS})
 endfunction()
 
-# kz_test(<room>/<file>_test [ROOMS <room>...] [LIBS <target>...])
+# kz_test(<room>/<file>_test [ROOMS <room>...] [LIBS <target>...] [FIXTURE <name>])
 #
 # Builds tests/<room>/<file>_test.cpp over the room's objects and everything below, with the
 # allocator wrapped so that tests can count blocks and make the n-th allocation fail, and registers
-# each of its test cases with CTest. ROOMS replaces the room taken from the path.
+# each of its test cases with CTest. ROOMS replaces the room taken from the path; FIXTURE names what
+# has to be set up first.
 function(kz_test path)
-  cmake_parse_arguments(PARSE_ARGV 1 test "" "" "ROOMS;LIBS;SOURCES")
+  cmake_parse_arguments(PARSE_ARGV 1 test "" "FIXTURE" "ROOMS;LIBS;SOURCES")
   get_filename_component(room "${path}" DIRECTORY)
   get_filename_component(file "${path}" NAME)
   string(REPLACE "/" "_" target "${room}/${file}")
@@ -76,7 +77,7 @@ function(kz_test path)
   list(TRANSFORM objects PREPEND "kz_")
   add_executable(${target} "${PROJECT_SOURCE_DIR}/tests/${path}.cpp" ${test_SOURCES})
   target_link_libraries(${target} PRIVATE kz_settings ${objects} kz_test_support ${test_LIBS})
-  kz_register_test(${target})
+  kz_register_test(${target} ${test_FIXTURE})
 endfunction()
 
 # kz_public_test(<dir>/<file>_test [LIBS <target>...] [SOURCES <file>...])
@@ -91,6 +92,12 @@ function(kz_public_test path)
   kz_register_test(${target})
 endfunction()
 
+# Any further argument is a fixture.
 function(kz_register_test target)
-  gtest_discover_tests(${target} TEST_PREFIX "${target}." DISCOVERY_TIMEOUT 60 PROPERTIES TIMEOUT 600)
+  set(fixture "")
+  if(ARGN)
+    set(fixture FIXTURES_REQUIRED ${ARGN})
+  endif()
+  gtest_discover_tests(${target} TEST_PREFIX "${target}." DISCOVERY_TIMEOUT 60 PROPERTIES TIMEOUT 600
+                                                                                          ${fixture})
 endfunction()

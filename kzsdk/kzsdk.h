@@ -62,4 +62,7 @@
 /* The extraction interface: the door for most users. */
 #include "kzsdk/fpx/fpx.h"
 
+/* The files and labels of optical discs; works without start-up. */
+#include "kzsdk/disc/disc.h"
+
 #endif

@@ -10,7 +10,7 @@ packages_of() {
     case $1 in
     build) echo "g++ cmake ninja-build make" ;;
     tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev" ;;
-    test) echo "libgtest-dev libgmock-dev pkg-config binutils" ;;
+    test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso" ;;
     clips) echo "sox libsox-fmt-all espeak-ng" ;; # the demo's music, and the tests' clips
     bench) echo "libbenchmark-dev" ;;
     lint) echo "clang-format-14 clang-tidy-14 mandoc" ;;

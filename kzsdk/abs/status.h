@@ -31,6 +31,20 @@ typedef uint32_t kz_status;
 /* Library start-up (module 0x05). */
 #define KZ_INIT_ERROR_NO_RECORD UINT32_C(0x90050990)
 
+/* Disc helpers, both families (module 0x06). */
+/** Also: a directory cannot be opened; a name does not fit. */
+#define KZ_DISC_ERROR_MEMORY UINT32_C(0x90060001)
+#define KZ_DISC_ERROR_INVALID_ARGUMENT UINT32_C(0x90060004)
+#define KZ_DISC_ALREADY_ON UINT32_C(0x90060005)
+#define KZ_DISC_NOT_ON UINT32_C(0x90060006)
+/** Any failure of the system that has no code of its own below. */
+#define KZ_DISC_ERROR_SYSTEM UINT32_C(0x90060009)
+#define KZ_DISC_ERROR_ACCESS_DENIED UINT32_C(0x90060047)
+#define KZ_DISC_ERROR_NOT_FOUND UINT32_C(0x90060048)
+#define KZ_DISC_ERROR_NO_SPACE UINT32_C(0x9006004a)
+#define KZ_DISC_ERROR_TOO_MANY_FILES UINT32_C(0x9006004b)
+#define KZ_DISC_ERROR_BAD_DESCRIPTOR UINT32_C(0x9006004c)
+
 /* Extraction interface (module 0x08). */
 #define KZ_FPX_ERROR_MEMORY UINT32_C(0x90080001)
 #define KZ_FPX_ERROR_INVALID_ARGUMENT UINT32_C(0x90080004)

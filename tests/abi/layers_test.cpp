@@ -24,6 +24,7 @@ const std::map<std::string, std::set<std::string>> kBelow = {
     {"abs", {}},
     {"xml", {"abs"}},
     {"dsp", {"abs"}},
+    {"disc", {"abs"}},
     {"qv", {"abs", "xml", "dsp"}},
     {"qvfixed", {"abs", "xml", "dsp", "qv"}},
     {"fpx", {"abs", "xml", "dsp", "qv", "qvfixed"}},

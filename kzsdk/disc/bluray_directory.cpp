@@ -1,0 +1,141 @@
+#include <cstdlib>
+#include <memory>
+
+#include <sys/stat.h>
+
+#include "kzsdk/disc/bluray.hpp"
+
+// The records here live on the system heap: directories can be listed before the library is started
+// and after it was shut down.
+
+namespace {
+
+using kz::disc::bluray;
+
+struct FreeRecord {
+    void operator()(kzbdfs_dir* dir) const noexcept { kzbdfs_close_dir(dir); }
+    void operator()(kzbdfs_dirent* entry) const noexcept { kzbdfs_free_dirent(entry); }
+};
+template <class Record>
+using heap_owned = std::unique_ptr<Record, FreeRecord>;
+
+template <class Record>
+heap_owned<Record> make_on_heap() noexcept
+{
+    return heap_owned<Record>(static_cast<Record*>(std::calloc(1, sizeof(Record))));
+}
+
+/// "path/name", of any length. Null when memory is short.
+char* joined(const char* path, const char* name) noexcept
+{
+    const size_t path_length = std::strlen(path);
+    const size_t name_size = std::strlen(name) + 1;
+    auto* text = static_cast<char*>(std::malloc(path_length + 1 + name_size));
+    if (text != nullptr) {
+        std::memcpy(text, path, path_length);
+        text[path_length] = '/';
+        std::memcpy(text + path_length + 1, name, name_size);
+    }
+    return text;
+}
+
+/// True when what the entry itself is, not what it may link to, is of this type.
+bool is_of_type(const kzbdfs_dirent* entry, mode_t type) noexcept
+{
+    if (entry == nullptr) {
+        return false;
+    }
+    struct stat facts {};
+    if (::lstat(entry->path, &facts) != 0) {
+        bluray.keep_errno();
+        return false;
+    }
+    return (facts.st_mode & S_IFMT) == type;
+}
+
+bool is_named(const kzbdfs_dirent* entry, const char* name) noexcept
+{
+    return entry != nullptr && std::strcmp(entry->record->d_name, name) == 0;
+}
+
+} // namespace
+
+char kzbdfs_dir_get_delim() noexcept { return '/'; }
+
+kz_status kzbdfs_open_dir(const char* path, kzbdfs_dir** handle) noexcept
+{
+    if (path == nullptr || handle == nullptr) {
+        return KZ_DISC_ERROR_INVALID_ARGUMENT;
+    }
+    auto dir = make_on_heap<kzbdfs_dir>();
+    if (!dir) {
+        return KZ_DISC_ERROR_MEMORY;
+    }
+    dir->path = joined(path, "");
+    dir->stream = dir->path != nullptr ? ::opendir(path) : nullptr;
+    if (dir->stream == nullptr) {
+        return KZ_DISC_ERROR_MEMORY;
+    }
+    *handle = dir.release();
+    return bluray.take_error();
+}
+
+kzbdfs_dirent* kzbdfs_readdir(kzbdfs_dir* handle) noexcept
+{
+    const dirent* record = handle != nullptr ? ::readdir(handle->stream) : nullptr;
+    if (record == nullptr) {
+        return nullptr;
+    }
+    auto entry = make_on_heap<kzbdfs_dirent>();
+    if (!entry) {
+        return nullptr;
+    }
+    entry->record = record;
+    entry->path = joined(handle->path, record->d_name);
+    return entry->path != nullptr ? entry.release() : nullptr;
+}
+
+const char* kzbdfs_dirent_get_name(const kzbdfs_dirent* entry) noexcept
+{
+    return entry != nullptr ? entry->record->d_name : nullptr;
+}
+
+int32_t kzbdfs_dirent_is_current_dir(const kzbdfs_dirent* entry) noexcept
+{
+    return is_named(entry, ".") ? 1 : 0;
+}
+
+int32_t kzbdfs_dirent_is_parent_dir(const kzbdfs_dirent* entry) noexcept
+{
+    return is_named(entry, "..") ? 1 : 0;
+}
+
+int32_t kzbdfs_dirent_is_file(const kzbdfs_dirent* entry) noexcept
+{
+    return is_of_type(entry, S_IFREG) ? 1 : 0;
+}
+
+int32_t bnbdfs_dirent_is_dir(const kzbdfs_dirent* entry) noexcept
+{
+    return is_of_type(entry, S_IFDIR) ? 1 : 0;
+}
+
+void kzbdfs_free_dirent(kzbdfs_dirent* entry) noexcept
+{
+    if (entry != nullptr) {
+        std::free(entry->path);
+        std::free(entry);
+    }
+}
+
+void kzbdfs_close_dir(kzbdfs_dir* handle) noexcept
+{
+    if (handle == nullptr) {
+        return;
+    }
+    if (handle->stream != nullptr) {
+        ::closedir(handle->stream);
+    }
+    std::free(handle->path);
+    std::free(handle);
+}
