@@ -1,14 +1,8 @@
 #include "kzfp.hpp"
 
-#include <cerrno>
-#include <filesystem>
 #include <fstream>
 #include <iterator>
-#include <memory>
 #include <sstream>
-#include <system_error>
-
-#include <stdlib.h>
 
 #include <gtest/gtest.h>
 
@@ -88,27 +82,6 @@ std::string wav_header(uint32_t rate, uint32_t channels, uint32_t data_bytes)
     bytes += "data";
     append_little_endian(bytes, data_bytes, 4);
     return bytes;
-}
-
-ScratchDirectory::ScratchDirectory()
-{
-    std::string name = std::filesystem::temp_directory_path() / "kzfp-test-XXXXXX";
-    if (::mkdtemp(name.data()) == nullptr) {
-        throw std::system_error(errno, std::generic_category(), name);
-    }
-    directory_ = name;
-}
-
-ScratchDirectory::~ScratchDirectory()
-{
-    std::error_code ignored;
-    std::filesystem::remove_all(directory_, ignored);
-}
-
-std::string ScratchDirectory::write(const std::string& name, const std::string& bytes) const
-{
-    std::ofstream(path(name), std::ios::binary) << bytes;
-    return path(name);
 }
 
 } // namespace kz::test

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "support/process.hpp"
+#include "support/scratch_directory.hpp"
 
 namespace kz::test {
 
@@ -33,20 +34,5 @@ ProcessSetup fed_with(const std::string& text);
 
 /// The header of a 16-bit WAV file; the samples follow it.
 std::string wav_header(uint32_t rate, uint32_t channels, uint32_t data_bytes);
-
-/// A directory of its own for a test, removed at the end.
-class ScratchDirectory {
-public:
-    ScratchDirectory();
-    ~ScratchDirectory();
-    ScratchDirectory(const ScratchDirectory&) = delete;
-    ScratchDirectory& operator=(const ScratchDirectory&) = delete;
-    std::string path(const std::string& name) const { return directory_ + "/" + name; }
-    /// Writes a file and gives its path.
-    std::string write(const std::string& name, const std::string& bytes) const;
-
-private:
-    std::string directory_;
-};
 
 } // namespace kz::test

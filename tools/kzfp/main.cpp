@@ -12,6 +12,7 @@
 #include <unistd.h>
 
 #include "audio_source.hpp"
+#include "disc_command.hpp"
 #include "fingerprint.hpp"
 #include "input.hpp"
 #include "options.hpp"
@@ -107,11 +108,14 @@ int main(int argc, char** argv)
         return some_file_failed;
     }
     std::signal(SIGPIPE, SIG_IGN); // a closed pipe is met as an error of write()
-    const auto parsed = parse_command_line(argc, argv);
-    if (const auto* status = std::get_if<ExitStatus>(&parsed)) {
-        return *status == all_done && !std::cout.flush() ? some_file_failed : *status;
-    }
     try {
+        if (is_disc_command(argc, argv)) {
+            return run_disc_command(argc, argv);
+        }
+        const auto parsed = parse_command_line(argc, argv);
+        if (const auto* status = std::get_if<ExitStatus>(&parsed)) {
+            return *status == all_done && !std::cout.flush() ? some_file_failed : *status;
+        }
         return process_all(std::get<Options>(parsed));
     } catch (const OutputError& error) {
         if (!error.reader_left) { // who closes a pipe has seen enough, and wants no message

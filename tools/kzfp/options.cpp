@@ -30,6 +30,8 @@ constexpr const char* kNotes =
     "Encodings: A-law and mu-law files go to the library as they are, everything else as 16-bit\n"
     "           PCM. That includes 8-bit files, since the library's own 8-bit input makes\n"
     "           fingerprints that match no other encoding; --raw RATE,CHANNELS,u8 asks for it.\n"
+    "Discs:     kzfp disc PATH tells what is on a Blu-ray disc or a DVD; see kzfp disc --help.\n"
+    "           A sound file of that name is ./disc.\n"
     "Exit:      0 all done, 1 some file failed (one line each on standard error), 2 wrong usage.";
 
 const std::map<std::string_view, Encoding> kEncodings = {{"u8", Encoding::u8},

@@ -47,14 +47,14 @@ std::string to_words(const std::vector<int16_t>& values)
     return text;
 }
 
+} // namespace
+
 std::string without_control_characters(std::string text)
 {
     std::ranges::replace_if(
         text, [](char c) { return static_cast<unsigned char>(c) < 0x20 || c == 0x7f; }, '?');
     return text;
 }
-
-} // namespace
 
 std::string to_text(const Options& options, const std::string& file, const InputFacts& facts,
                     const Fingerprint& fingerprint)

@@ -30,6 +30,9 @@ void write_output(const std::string& text);
 /// Writes one line to standard error; control characters in it are shown as question marks.
 void write_message(const std::string& line);
 
+/// Control characters become question marks.
+std::string without_control_characters(std::string text);
+
 /// A line on the terminal that tells how far the program is, when there are several files.
 class Progress {
 public:
