@@ -147,10 +147,15 @@ TEST_F(ResamplerFloat, AFilterOfMoreThanTheLargestFactorCountsAsShortOfMemory)
 
 TEST_F(ResamplerFloat, RatesAMillionthApartArePassedThrough)
 {
-    EXPECT_EQ(0U, make(11025.005F)->length);
-    EXPECT_EQ(1U, make(44100.02F)->up);
-    EXPECT_EQ(4U, make(44100.02F)->down);
-    EXPECT_NE(1U, make(44101.0F)->up);
+    const auto copy = make(11025.005F);
+    ASSERT_TRUE(copy);
+    EXPECT_EQ(0U, copy->length);
+    const auto quarter = make(44100.02F);
+    ASSERT_TRUE(quarter);
+    EXPECT_EQ(dsp::coefficients_4to1, quarter->taps);
+    const auto other = make(44101);
+    ASSERT_TRUE(other);
+    EXPECT_NE(1U, other->up);
 }
 
 namespace {
