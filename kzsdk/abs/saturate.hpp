@@ -18,7 +18,7 @@ constexpr Integer saturated(Real x) noexcept
     using Limits = std::numeric_limits<Integer>;
     // Both are powers of two (or zero), so every floating-point type holds them exactly.
     constexpr auto lowest = static_cast<Real>(Limits::min());
-    constexpr auto beyond = static_cast<Real>(Limits::max() / 2 + 1) * 2;
+    constexpr auto beyond = static_cast<Real>(uint64_t{1} << Limits::digits);
     if (x >= beyond) {
         return Limits::max();
     }

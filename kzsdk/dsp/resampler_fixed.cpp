@@ -167,7 +167,7 @@ kz::dsp::BlockCounts resample(KZDSP_resampler_fixed& r, Samples input,
     const auto across = [&r](Samples newer, Samples older, uint32_t phase) {
         return dual_convolve(newer, older, {r.msb + phase, r.lsb + phase, r.up}, r.up == 1 ? 0 : 1);
     };
-    if (r.up > 1) {
+    if (r.up != 1) {
         return kz::dsp::resample_block(
             r, input, output,
             [&r](const int32_t* window, uint32_t phase) { return polyphase(r, window, phase); },

@@ -18,22 +18,14 @@ bool is_rate(float hertz) noexcept
     return hertz > 0 && hertz <= std::numeric_limits<float>::max();
 }
 
-// False when the rates have no ratio that a filter could be designed for.
-bool set_ratio(KZDSP_resampler& r, float input_rate, float output_rate) noexcept
+void set_ratio(KZDSP_resampler& r, float input_rate, float output_rate) noexcept
 {
     const double ratio = output_rate / input_rate; // rounded to single precision first
     int32_t up = 0;
     int32_t down = 0;
     KZDSP_Rationalize(ratio, &up, &down, ratio * kTolerance);
-    const auto usable = [](int32_t factor) {
-        return factor > 0 && static_cast<uint32_t>(factor) <= KZDSP_LARGEST_FACTOR;
-    };
-    if (!usable(up) || !usable(down)) {
-        return false;
-    }
     r.up = static_cast<uint32_t>(up);
     r.down = static_cast<uint32_t>(down);
-    return true;
 }
 
 template <size_t Length>
@@ -44,8 +36,17 @@ bool use_stored(KZDSP_resampler& r, const float (&taps)[Length]) noexcept
     return true;
 }
 
+// A factor of 0 says that the rates have no ratio.
+bool is_designable(uint32_t factor) noexcept
+{
+    return factor != 0 && factor <= KZDSP_LARGEST_FACTOR;
+}
+
 bool design(KZDSP_resampler& r) noexcept
 {
+    if (!is_designable(r.up) || !is_designable(r.down)) {
+        return false;
+    }
     const kz::dsp::FilterLayout layout = kz::dsp::filter_layout(r.up, r.down);
     auto taps = kz::make_array<float>(layout.length);
     if (!taps) {
@@ -111,8 +112,11 @@ KZDSP_resampler* KZDSP_CreateResampler(float input_rate, float output_rate) noex
     }
     std::unique_ptr<KZDSP_resampler, Destroy> resampler(
         kz::make_record<KZDSP_resampler>().release());
-    if (!resampler || !set_ratio(*resampler, input_rate, output_rate) ||
-        !choose_filter(*resampler) || !kz::dsp::make_history(*resampler)) {
+    if (!resampler) {
+        return nullptr;
+    }
+    set_ratio(*resampler, input_rate, output_rate);
+    if (!choose_filter(*resampler) || !kz::dsp::make_history(*resampler)) {
         return nullptr;
     }
     return resampler.release();
