@@ -126,9 +126,9 @@ KZ_API uint32_t QVSD_GetSignalOffset(QVSD* detector, const float* samples,
  *
  * Each sample is quantised to one of @p levels levels between the frame's minimum and maximum, and each
  * level becomes its cumulative share of the samples, less the mean over the frame: a signal between -1 and
- * 1, 2^30 times smaller than that of kzqvfixed_hist_eq2(). Samples above 10^6 or below -10^6 count
- * towards the ends of the range only as far as that. A constant frame is all level 0, and so is a sample
- * that is not a number. When memory is short the samples are copied.
+ * 1, 2^30 times smaller than that of kzqvfixed_hist_eq2(). The range always reaches down to 10^6 and up
+ * to -10^6, which matters only to frames that lie beyond as a whole. A constant frame is all level 0, and
+ * so is a sample that is not a number. When memory is short the samples are copied.
  *
  * @param input   @p count samples.
  * @param output  Room for @p count samples, apart from @p input.
