@@ -1,7 +1,8 @@
 #!/bin/sh
 # Installs what is missing to build and test the library on Debian 12.
 #
-#   scripts/setup.sh [build] [tools] [test] [clips] [bench] [lint] [clang]     default: all of them
+#   scripts/setup.sh [build] [tools] [test] [clips] [bench] [lint] [clang] [arch]
+#                                                  default: all of them but arch, the cross compilers
 #
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
 set -eu
@@ -15,6 +16,7 @@ packages_of() {
     bench) echo "libbenchmark-dev" ;;
     lint) echo "clang-format-14 clang-tidy-14 mandoc" ;;
     clang) echo "clang-14 libclang-rt-14-dev" ;;
+    arch) echo "g++-aarch64-linux-gnu g++-arm-linux-gnueabihf g++-i686-linux-gnu qemu-user" ;;
     *)
         echo "setup: no such group: $1" >&2
         exit 2

@@ -55,7 +55,7 @@ TEST_F(Extraction, AnUnknownAlgorithmIsRefusedWithoutAllocating)
 {
     const uint64_t before = allocation_count();
     kz_fpx_handle* handle = nullptr;
-    for (const uint32_t id : {0U, 3U, 0xFFFFFFFFU}) {
+    for (const uint32_t id : {0U, 3U, 4U, 0xFFFFFFFFU}) {
         EXPECT_EQ(0x90080606U, kz_fpx_fingerprint_create(id, 2, 44100, 1, &handle)) << id;
     }
     EXPECT_EQ(before, allocation_count());

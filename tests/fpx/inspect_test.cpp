@@ -4,28 +4,24 @@
 #include <vector>
 
 #include "kzsdk/fpx/algorithm.hpp"
-#include "kzsdk/qvfixed/qvfixed.h"
-#include "support/allocation.hpp"
 #include "support/signals.hpp"
+#include "support/twins.hpp"
 
 namespace kz::test {
 
 namespace {
 
-class Inspect : public MemoryOn {};
-
 constexpr uint32_t kRates[] = {8000, 11025, 16000, 22050, 24000, 32000, 44100, 48000};
+// What only the floating-point algorithm takes: near-copies, rates with large terms, a multiple.
+constexpr uint32_t kOddRates[] = {11024, 12345, 44056, 96000};
 
-const kzqvfixed_fingerprinter& fixed(const kz_fpx_handle& handle)
-{
-    return *static_cast<const kzqvfixed_fingerprinter*>(handle.instance);
-}
-
+// A handle of one of the algorithms, its fingerprinter in view.
+template <class Twin>
 class Handle {
 public:
     Handle(uint32_t rate, uint32_t channels) : channels_(channels)
     {
-        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_create(1, 2, rate, channels, &handle_));
+        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_create(Twin::kAlgorithm, 2, rate, channels, &handle_));
     }
     ~Handle() { kz_fpx_fingerprint_free(&handle_); }
     Handle(const Handle&) = delete;
@@ -41,79 +37,109 @@ public:
     }
     const kz_fpx_handle& operator*() const { return *handle_; }
 
+    typename Twin::Object& object() const
+    {
+        return *static_cast<typename Twin::Object*>(handle_->instance);
+    }
+
 private:
     uint32_t channels_;
     kz_fpx_handle* handle_ = nullptr;
 };
 
+// Every working-rate sample and every feature is the same word.
+template <class Object>
+void expect_same_words(const Object& a, const Object& b, uint32_t rate)
+{
+    EXPECT_EQ(a.signal_offset, b.signal_offset) << rate;
+    EXPECT_EQ(a.frame_start, b.frame_start) << rate;
+    EXPECT_EQ(a.write_position, b.write_position) << rate;
+    EXPECT_TRUE(std::equal(a.ring, a.ring + a.frame_length, b.ring)) << rate;
+    const auto* ra = a.frame_manager->records;
+    const auto* rb = b.frame_manager->records;
+    for (; ra != nullptr && rb != nullptr; ra = ra->next, rb = rb->next) {
+        EXPECT_TRUE(std::equal(ra->energy, ra->energy + 15, rb->energy)) << rate;
+        EXPECT_TRUE(std::equal(ra->amplitude, ra->amplitude + 15, rb->amplitude)) << rate;
+    }
+    EXPECT_EQ(ra == nullptr, rb == nullptr) << rate;
+}
+
+// Feeds what the interface asks for, block by block, up to the end of the music or of the fingerprint.
+template <class Twin>
+bool feed_blocks(Handle<Twin>& handle, const std::vector<int16_t>& music, size_t from,
+                 size_t frames)
+{
+    bool complete = false;
+    for (size_t at = from; !complete && at < frames;) {
+        const uint32_t next = fpx::next_block_frames(*handle);
+        EXPECT_GT(next, 0U);
+        EXPECT_LT(next, handle.object().input_rate > 48000 ? 300000U : 150000U);
+        if (next == 0) {
+            break;
+        }
+        const size_t count = std::min<size_t>(next, frames - at);
+        complete = handle.feed(music, at, count);
+        at += count;
+    }
+    return complete;
+}
+
+template <class Twin>
+std::vector<uint32_t> rates()
+{
+    std::vector<uint32_t> all(std::begin(kRates), std::end(kRates));
+    if (Twin::kAlgorithm == KZ_FPX_ALGORITHM_FLOAT) {
+        all.insert(all.end(), std::begin(kOddRates), std::end(kOddRates));
+    }
+    return all;
+}
+
 } // namespace
+
+template <class T>
+class Inspect : public TwinTest<T> {
+};
+TYPED_TEST_SUITE(Inspect, Twins, TwinNames);
 
 // The promise that lets a file be streamed: not only the document, every working-rate sample and every
 // feature must be the same word as from one call.
-TEST_F(Inspect, FeedingBlockByBlockGivesTheSameWordsAsOneCall)
+TYPED_TEST(Inspect, FeedingBlockByBlockGivesTheSameWordsAsOneCall)
 {
-    for (const uint32_t rate : kRates) {
+    for (const uint32_t rate : rates<TypeParam>()) {
         for (const double silence : {0.0, 0.01, 2.9, 7.3}) {
             const uint32_t channels = 1 + rate % 7 % 2;
             auto music = noise(static_cast<size_t>((16.0 + silence) * rate) * channels, 0.9, rate);
             std::fill_n(music.begin(), static_cast<size_t>(silence * rate) * channels, int16_t{0});
             const size_t frames = music.size() / channels;
-
-            Handle whole(rate, channels);
+            Handle<TypeParam> whole(rate, channels);
+            Handle<TypeParam> pieces(rate, channels);
             EXPECT_TRUE(whole.feed(music, 0, frames));
-            Handle pieces(rate, channels);
-            bool complete = false;
-            for (size_t at = 0; !complete && at < frames;) {
-                const uint32_t next = fpx::next_block_frames(*pieces);
-                ASSERT_GT(next, 0U);
-                ASSERT_LT(next, 150000U);
-                const size_t count = std::min<size_t>(next, frames - at);
-                complete = pieces.feed(music, at, count);
-                at += count;
-            }
-            EXPECT_TRUE(complete);
-
-            const auto& a = fixed(*whole);
-            const auto& b = fixed(*pieces);
-            EXPECT_EQ(a.signal_offset, b.signal_offset);
-            EXPECT_EQ(a.frame_start, b.frame_start);
-            EXPECT_EQ(a.write_position, b.write_position);
-            EXPECT_TRUE(std::equal(a.ring, a.ring + a.frame_length, b.ring)) << rate;
-            const auto* ra = a.frame_manager->records;
-            const auto* rb = b.frame_manager->records;
-            for (; ra != nullptr && rb != nullptr; ra = ra->next, rb = rb->next) {
-                EXPECT_TRUE(std::equal(ra->energy, ra->energy + 15, rb->energy)) << rate;
-                EXPECT_TRUE(std::equal(ra->amplitude, ra->amplitude + 15, rb->amplitude)) << rate;
-            }
-            EXPECT_EQ(ra == nullptr, rb == nullptr);
+            EXPECT_TRUE(feed_blocks(pieces, music, 0, frames));
+            expect_same_words(whole.object(), pieces.object(), rate);
         }
     }
 }
 
 // The same from any state that odd pieces leave behind, the states included in which the last sample of
 // room needs no input of its own.
-TEST_F(Inspect, TheNextBlockIsExactFromAnyState)
+TYPED_TEST(Inspect, TheNextBlockIsExactFromAnyState)
 {
-    for (const uint32_t rate : {8000U, 48000U, 22050U, 11025U}) {
+    std::vector<uint32_t> some{8000, 48000, 22050, 11025};
+    if (TypeParam::kAlgorithm == KZ_FPX_ALGORITHM_FLOAT) {
+        some.insert(some.end(), {11024, 12345});
+    }
+    for (const uint32_t rate : some) {
         const auto music = noise(size_t{rate} * 14, 0.9, rate);
         for (uint64_t seed = 0; seed < 10; ++seed) {
             Random random(seed + rate);
-            const size_t odd = 1 + random.below(static_cast<uint32_t>(rate * 3));
-            Handle whole(rate, 1);
-            Handle pieces(rate, 1);
+            const size_t odd = 1 + random.below(rate * 3);
+            Handle<TypeParam> whole(rate, 1);
+            Handle<TypeParam> pieces(rate, 1);
             whole.feed(music, 0, odd);
             pieces.feed(music, 0, odd);
             whole.feed(music, odd, music.size() - odd);
-            for (size_t at = odd; at < music.size();) {
-                const size_t count =
-                    std::min<size_t>(fpx::next_block_frames(*pieces), music.size() - at);
-                pieces.feed(music, at, count);
-                at += count;
-            }
-            EXPECT_EQ(fixed(*whole).write_position, fixed(*pieces).write_position);
-            EXPECT_TRUE(
-                std::equal(fixed(*whole).ring, fixed(*whole).ring + 32768, fixed(*pieces).ring))
-                << rate << " Hz after " << odd;
+            feed_blocks(pieces, music, odd, music.size());
+            expect_same_words(whole.object(), pieces.object(), rate);
         }
     }
 }
@@ -121,44 +147,35 @@ TEST_F(Inspect, TheNextBlockIsExactFromAnyState)
 // When upsampling, a step can make a sample without taking any input: when one sample of room is left just
 // after the room before was filled. (A signal found one sample into a full ring gets there.) The feed
 // must go on, not end, and the block to feed next is that of the step after.
-TEST_F(Inspect, AStepThatOnlyProducesDoesNotEndTheFeed)
+TYPED_TEST(Inspect, AStepThatOnlyProducesDoesNotEndTheFeed)
 {
     const auto music = noise(8000 * 15, 0.5, 1);
     const std::vector<int16_t> silence(8000 * 30, 0);
     uint32_t met = 0;
     for (uint32_t blocks = 2; blocks < 8; ++blocks) {
-        Handle whole(8000, 1);
-        Handle pieces(8000, 1);
-        for (Handle* handle : {&whole, &pieces}) {
+        Handle<TypeParam> whole(8000, 1);
+        Handle<TypeParam> pieces(8000, 1);
+        for (Handle<TypeParam>* handle : {&whole, &pieces}) {
             for (uint32_t i = 0; i < blocks; ++i) {
                 handle->feed(silence, 0, fpx::next_block_frames(**handle));
             }
-            auto& object = const_cast<kzqvfixed_fingerprinter&>(fixed(**handle));
-            object.searching_for_signal = 0;
-            object.write_position = 32767;
+            handle->object().searching_for_signal = 0;
+            handle->object().write_position = 32767;
         }
-        const auto& r = *fixed(*whole).resampler;
+        const auto& r = *whole.object().resampler;
         met += r.history_end - r.history_start == r.taps_per_phase && r.phase + r.down < r.up;
         EXPECT_TRUE(whole.feed(music, 0, music.size())) << blocks;
-        bool complete = false;
-        for (size_t at = 0; !complete && at < music.size();) {
-            const size_t count =
-                std::min<size_t>(fpx::next_block_frames(*pieces), music.size() - at);
-            ASSERT_GT(count, 0U);
-            complete = pieces.feed(music, at, count);
-            at += count;
-        }
-        EXPECT_TRUE(
-            std::equal(fixed(*whole).ring, fixed(*whole).ring + 32768, fixed(*pieces).ring));
+        EXPECT_TRUE(feed_blocks(pieces, music, 0, music.size())) << blocks;
+        expect_same_words(whole.object(), pieces.object(), 8000);
     }
     EXPECT_GT(met, 0U);
 }
 
-TEST_F(Inspect, TellsSilenceAndProgress)
+TYPED_TEST(Inspect, TellsSilenceAndProgress)
 {
     auto music = noise(11025 * 20, 0.5, 3);
     std::fill_n(music.begin(), 11025, int16_t{0});
-    Handle handle(11025, 1);
+    Handle<TypeParam> handle(11025, 1);
     EXPECT_FALSE(fpx::signal_found(*handle));
     EXPECT_EQ(0U, fpx::percent_progress(*handle));
     handle.feed(music, 0, 5000);

@@ -1,0 +1,302 @@
+// Prints one line for each piece of sound, rate, format and algorithm: what it is, and a digest of its
+// document. Given a file of such lines, prints the lines that differ instead, and fails if there are any.
+//
+// The sound is made with integers only and the digests are of text, so a difference comes from the
+// library. Two kinds of lines stand for what rests on the C library's sine and cosine: the factors of the
+// floating-point transform and the taps of designed filters.
+
+#include <algorithm>
+#include <array>
+#include <cinttypes>
+#include <cstdint>
+#include <cstdio>
+#include <cstring>
+#include <fstream>
+#include <functional>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "kzsdk/kzsdk.h"
+
+namespace {
+
+constexpr uint32_t kSeconds = 15; // 12 frames take 14.21 s
+
+// ---- digests
+
+class Digest { // FNV-1a, 64 bits
+public:
+    void take(uint8_t byte) { value_ = (value_ ^ byte) * 0x100000001b3U; }
+    void take(std::string_view text)
+    {
+        for (const char c : text) {
+            take(static_cast<uint8_t>(c));
+        }
+    }
+    void take(std::span<const float> numbers)
+    {
+        for (const float number : numbers) {
+            uint32_t bits = 0;
+            std::memcpy(&bits, &number, sizeof bits);
+            for (const int shift : {0, 8, 16, 24}) {
+                take(static_cast<uint8_t>(bits >> shift));
+            }
+        }
+    }
+    std::string text() const
+    {
+        std::array<char, 17> digits{};
+        std::snprintf(digits.data(), digits.size(), "%016" PRIx64, value_);
+        return digits.data();
+    }
+
+private:
+    uint64_t value_ = 0xcbf29ce484222325U;
+};
+
+// ---- sound
+
+class Random { // a linear congruential generator with 64 bits of state
+public:
+    explicit Random(uint64_t seed) : state_(seed) {}
+    uint32_t next()
+    {
+        state_ = state_ * 6364136223846793005U + 1442695040888963407U;
+        return static_cast<uint32_t>(state_ >> 32);
+    }
+    uint32_t below(uint32_t bound)
+    {
+        return static_cast<uint32_t>((uint64_t{next()} * bound) >> 32);
+    }
+
+private:
+    uint64_t state_;
+};
+
+// An arch for each half of the turn: near a sine, with some odd harmonics. Q15 from a phase of 32 bits.
+int32_t arch_wave(uint32_t phase)
+{
+    const auto x = static_cast<int64_t>(phase >> 16) - 32768;
+    return static_cast<int32_t>((x * (32768 - (x < 0 ? -x : x))) >> 13);
+}
+
+using Sound = std::vector<int16_t>;
+
+int16_t clipped(int64_t value)
+{
+    return static_cast<int16_t>(std::clamp<int64_t>(value, INT16_MIN, INT16_MAX));
+}
+
+// Three voices that take a new note every fifth of a second and fade; `gain` in 1/256.
+Sound melody(uint32_t rate, uint32_t channels, int64_t gain)
+{
+    struct Voice {
+        uint32_t phase = 0;
+        uint32_t step = 0;
+        int64_t level = 0;
+    };
+    constexpr uint32_t kHertz[] = {55, 82, 110, 165, 220, 247, 330, 370, 440, 494, 659, 880, 1320};
+    std::array<Voice, 3> voices;
+    Random random(7);
+    Sound sound(size_t{rate} * kSeconds * channels);
+    for (size_t frame = 0; frame < sound.size() / channels; ++frame) {
+        if (frame % (rate / 5) == 0) {
+            Voice& voice = voices[frame / (rate / 5) % voices.size()];
+            const uint64_t hertz = kHertz[random.below(13)];
+            voice.step = static_cast<uint32_t>((hertz << 32) / rate);
+            voice.level = 1 << 24;
+        }
+        int64_t sum = 0;
+        for (Voice& voice : voices) {
+            voice.phase += voice.step;
+            voice.level -= voice.level / (rate / 4);
+            sum += (arch_wave(voice.phase) * voice.level) >> 26;
+        }
+        for (uint32_t channel = 0; channel < channels; ++channel) {
+            const int64_t side = channel == 0 ? 256 : 224;
+            sound[frame * channels + channel] = clipped((sum * gain * side) >> 16);
+        }
+    }
+    return sound;
+}
+
+Sound noise(uint32_t rate, uint32_t channels, int32_t shift)
+{
+    Random random(rate + channels);
+    Sound sound(size_t{rate} * kSeconds * channels);
+    for (int16_t& sample : sound) {
+        sample = static_cast<int16_t>(static_cast<int32_t>(random.next()) >> (16 + shift));
+    }
+    return sound;
+}
+
+Sound late(uint32_t rate, uint32_t channels)
+{
+    Sound sound(size_t{rate} * channels * 4, 0);
+    const Sound music = melody(rate, channels, 256);
+    sound.insert(sound.end(), music.begin(), music.end());
+    return sound;
+}
+
+struct Piece {
+    const char* name;
+    std::function<Sound(uint32_t rate, uint32_t channels)> make;
+};
+
+const Piece kMusic{"music", [](uint32_t r, uint32_t c) { return melody(r, c, 256); }};
+const Piece kClipped{"clipped", [](uint32_t r, uint32_t c) { return melody(r, c, 8192); }};
+const Piece kQuiet{"quiet", [](uint32_t r, uint32_t c) { return melody(r, c, 8); }};
+const Piece kNoise{"noise", [](uint32_t r, uint32_t c) { return noise(r, c, 1); }};
+const Piece kLate{"late", late};
+const Piece kSilence{"silence",
+                     [](uint32_t r, uint32_t c) { return Sound(size_t{r} * c * kSeconds, 0); }};
+
+// ---- documents
+
+constexpr const char* kFormatNames[] = {"", "u8", "s16", "alaw", "ulaw"};
+
+// Of formats of one byte, any byte is a sample: the high bytes serve.
+std::vector<uint8_t> encode(uint32_t format, const Sound& sound)
+{
+    std::vector<uint8_t> bytes;
+    for (const int16_t sample : sound) {
+        const auto bits = static_cast<uint16_t>(sample);
+        if (format == KZ_FPX_FORMAT_PCM16) {
+            bytes.push_back(static_cast<uint8_t>(bits));
+        }
+        bytes.push_back(static_cast<uint8_t>(bits >> 8));
+    }
+    return bytes;
+}
+
+std::string status_text(kz_status status)
+{
+    std::array<char, 9> digits{};
+    std::snprintf(digits.data(), digits.size(), "%08" PRIx32, status);
+    return digits.data();
+}
+
+std::string outcome(uint32_t algorithm, uint32_t format, uint32_t rate, uint32_t channels,
+                    const std::vector<uint8_t>& bytes)
+{
+    kz_fpx_handle* handle = nullptr;
+    kz_status status = kz_fpx_fingerprint_create(algorithm, format, rate, channels, &handle);
+    if (status != KZ_OK) {
+        return status_text(status);
+    }
+    uint8_t complete = 0;
+    status = kz_fpx_fingerprint_add_audio(handle, bytes.data(), static_cast<uint32_t>(bytes.size()),
+                                          &complete);
+    char* text = nullptr;
+    if (status == KZ_OK) {
+        status = kz_fpx_fingerprint_serialize(handle, &text);
+    }
+    Digest digest;
+    if (status == KZ_OK) {
+        digest.take(text);
+    }
+    kz_fpx_fingerprint_serialize_free(&text);
+    kz_fpx_fingerprint_free(&handle);
+    return status == KZ_OK ? digest.text() : status_text(status);
+}
+
+using Lines = std::vector<std::string>;
+
+void add_document(Lines& lines, const Piece& piece, uint32_t format, uint32_t rate,
+                  uint32_t channels)
+{
+    const auto bytes = encode(format, piece.make(rate, channels));
+    for (const uint32_t algorithm : {KZ_FPX_ALGORITHM_FIXED, KZ_FPX_ALGORITHM_FLOAT}) {
+        lines.push_back(std::string(algorithm == KZ_FPX_ALGORITHM_FIXED ? "fixed " : "float ") +
+                        std::to_string(rate) + ' ' + std::to_string(channels) + ' ' +
+                        kFormatNames[format] + ' ' + piece.name + ' ' +
+                        outcome(algorithm, format, rate, channels, bytes));
+    }
+}
+
+void add_documents(Lines& lines)
+{
+    for (const uint32_t rate : {8000U, 11025U, 16000U, 22050U, 24000U, 32000U, 44100U, 48000U}) {
+        add_document(lines, kMusic, KZ_FPX_FORMAT_PCM16, rate, 2);
+        add_document(lines, kNoise, KZ_FPX_FORMAT_PCM16, rate, 1);
+    }
+    for (const uint32_t rate : {12345U, 11024U, 44056U, 96000U}) { // only one algorithm takes these
+        add_document(lines, kMusic, KZ_FPX_FORMAT_PCM16, rate, 1);
+    }
+    for (const Piece& piece : {kClipped, kQuiet, kLate, kSilence}) {
+        add_document(lines, piece, KZ_FPX_FORMAT_PCM16, 16000, 1);
+        add_document(lines, piece, KZ_FPX_FORMAT_PCM16, 22050, 1);
+    }
+    for (const uint32_t format : {KZ_FPX_FORMAT_PCM8, KZ_FPX_FORMAT_ALAW, KZ_FPX_FORMAT_ULAW}) {
+        add_document(lines, kMusic, format, 8000, 1);
+        add_document(lines, kMusic, format, 22050, 2);
+    }
+}
+
+// ---- what rests on sine and cosine
+
+void add_factors(Lines& lines)
+{
+    for (const int32_t order : {5, 15}) {
+        KZDSP_DCT* const dct = KZDSP_CreateDCT(order);
+        Digest digest;
+        digest.take({dct->coefficients, dct->length});
+        lines.push_back("factors " + std::to_string(order) + ' ' + digest.text());
+        KZDSP_DestroyDCT(dct);
+    }
+}
+
+void add_filters(Lines& lines)
+{
+    for (const float rate : {8000.0F, 12345.0F, 16000.0F, 44056.0F, 48000.0F, 96000.0F}) {
+        KZDSP_resampler* const resampler = KZDSP_CreateResampler(rate, 11025.0F);
+        Digest digest;
+        digest.take({resampler->taps, resampler->length});
+        lines.push_back("filter " + std::to_string(static_cast<int>(rate)) + ' ' + digest.text());
+        KZDSP_DestroyResampler(resampler);
+    }
+}
+
+int compare(const Lines& lines, const char* path)
+{
+    std::ifstream file(path);
+    Lines expected;
+    for (std::string line; std::getline(file, line);) {
+        expected.push_back(line);
+    }
+    size_t differences = 0;
+    for (size_t i = 0; i < std::max(lines.size(), expected.size()); ++i) {
+        const std::string is = i < lines.size() ? lines[i] : "(nothing)";
+        const std::string was = i < expected.size() ? expected[i] : "(nothing)";
+        if (is != was) {
+            std::printf("is  %s\nwas %s\n", is.c_str(), was.c_str());
+            ++differences;
+        }
+    }
+    std::printf("%zu of %zu differ\n", differences, lines.size());
+    return differences == 0 ? 0 : 1;
+}
+
+} // namespace
+
+int main(int argc, char** argv)
+{
+    if (kzmem_initialize(0, 0) != KZ_OK) {
+        return 2;
+    }
+    Lines lines;
+    add_factors(lines);
+    add_filters(lines);
+    add_documents(lines);
+    int result = 0;
+    if (argc > 1) {
+        result = compare(lines, argv[1]);
+    } else {
+        for (const std::string& line : lines) {
+            std::printf("%s\n", line.c_str());
+        }
+    }
+    static_cast<void>(kzmem_shutdown());
+    return result;
+}
