@@ -52,8 +52,8 @@ std::vector<FxpType> mono_music(uint32_t rate, double seconds)
     return mono;
 }
 
-// A second of mono words to the working rate, chunk by chunk. 44100 and 22050 Hz take every fourth or
-// second window of a short filter; the others step through the phases of a long one.
+// A second of mono words to the working rate, chunk by chunk. 44100 and 22050 Hz take every fourth
+// or second window of a short filter; the others step through the phases of a long one.
 void BM_Resample(benchmark::State& state)
 {
     start_library();
@@ -204,8 +204,8 @@ void BM_AppendFrame(benchmark::State& state)
 }
 BENCHMARK(BM_AppendFrame)->Unit(benchmark::kMicrosecond);
 
-// Twelve frames' features condensed into the 30 values. Each append makes the last result stale; it is
-// not timed.
+// Twelve frames' features condensed into the 30 values. Each append makes the last result stale; it
+// is not timed.
 void BM_CondenseFrames(benchmark::State& state)
 {
     start_library();

@@ -50,3 +50,5 @@ configure_file("${CMAKE_CURRENT_LIST_DIR}/kzsdk.pc.in" "${PROJECT_BINARY_DIR}/kz
 install(FILES "${PROJECT_BINARY_DIR}/kzsdk.pc" DESTINATION "${pkgconfig_dir}")
 
 install(FILES "${PROJECT_SOURCE_DIR}/LICENSE" DESTINATION "${CMAKE_INSTALL_DOCDIR}")
+install(FILES "${PROJECT_SOURCE_DIR}/examples/fingerprint_tune.c"
+        DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples")

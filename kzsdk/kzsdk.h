@@ -1,7 +1,7 @@
 /**
  * @file
- * libkzsdk condenses about 14 seconds of audio into 30 numbers, written as a short XML document that
- * a recognition service can be asked with. Eight calls do it:
+ * libkzsdk condenses about 14 seconds of audio into 30 numbers, written as a short XML document
+ * that a recognition service can be asked with. Eight calls do it:
  *
  *     kzconf_configuration configuration;
  *     kzconf_initialize_configuration(&configuration);      clears the start-up record

@@ -2,8 +2,10 @@
 /// Writes the library's coefficient tables as C++ source: tablegen <output file>
 ///
 /// The formulas stand where the library uses them, in kzsdk/dsp/filter_design.hpp and
-/// kzsdk/dsp/butterfly.hpp. tests/dsp/tables_test.cpp pins every word.
+/// kzsdk/dsp/butterfly.hpp. A machine whose mathematics rounds otherwise must not make another
+/// library: the words are compared with a digest, and a difference fails the build.
 
+#include <bit>
 #include <cmath>
 #include <cstdint>
 #include <cstdio>
@@ -49,21 +51,47 @@ void write_value(std::ostream& out, int32_t word) { out << word; }
 // Hexadecimal, which tells every bit.
 void write_value(std::ostream& out, float value) { out << std::hexfloat << value << 'F'; }
 
+// FNV-1a over the bits of every value, low byte first.
+class Digest {
+public:
+    void take(uint32_t bits)
+    {
+        for (int byte = 0; byte < 4; ++byte) {
+            hash_ = (hash_ ^ ((bits >> (8 * byte)) & 0xffU)) * 0x100000001b3U;
+        }
+    }
+    void take(int32_t word) { take(static_cast<uint32_t>(word)); }
+    void take(float value) { take(std::bit_cast<uint32_t>(value)); }
+    uint64_t value() const { return hash_; }
+
+private:
+    uint64_t hash_ = 0xcbf29ce484222325U;
+};
+
+constexpr uint64_t kKnownDigest = 0xbc47314ee591dfe9U;
+
+// The source file that is written, and the digest of what is in it.
+struct Source {
+    std::ostream& text;
+    Digest digest;
+};
+
 template <class Value>
-void write_array(std::ostream& out, std::string_view type, std::string_view name,
+void write_array(Source& out, std::string_view type, std::string_view name,
                  const std::vector<Value>& values)
 {
-    out << "const " << type << ' ' << name << '[' << values.size() << "] = {";
+    out.text << "const " << type << ' ' << name << '[' << values.size() << "] = {";
     for (size_t i = 0; i < values.size(); ++i) {
-        out << (i % 12 == 0 ? "\n    " : " ");
-        write_value(out, values[i]);
-        out << ',';
+        out.text << (i % 12 == 0 ? "\n    " : " ");
+        write_value(out.text, values[i]);
+        out.text << ',';
+        out.digest.take(values[i]);
     }
-    out << "\n};\n\n";
+    out.text << "\n};\n\n";
 }
 
 // The taps in two halves, which is how fixed-point inner loops multiply them, and their accessors.
-void write_filter(std::ostream& out, uint32_t hertz, const std::vector<int32_t>& words)
+void write_filter(Source& out, uint32_t hertz, const std::vector<int32_t>& words)
 {
     std::vector<int16_t> msb;
     std::vector<uint16_t> lsb;
@@ -71,20 +99,20 @@ void write_filter(std::ostream& out, uint32_t hertz, const std::vector<int32_t>&
         msb.push_back(static_cast<int16_t>(word >> 16));
         lsb.push_back(static_cast<uint16_t>(word & 0xffff));
     }
-    out << "namespace hertz_" << hertz << " {\n";
+    out.text << "namespace hertz_" << hertz << " {\n";
     write_array(out, "int16_t", "msb", msb);
     write_array(out, "uint16_t", "lsb", lsb);
-    out << "} // namespace hertz_" << hertz << "\n\n";
+    out.text << "} // namespace hertz_" << hertz << "\n\n";
     const auto accessor = [&](std::string_view type, std::string_view what) -> std::ostream& {
-        return out << type << " kzdsp_get_" << hertz << "_11025_fixed_coeff_" << what
-                   << "() noexcept";
+        return out.text << type << " kzdsp_get_" << hertz << "_11025_fixed_coeff_" << what
+                        << "() noexcept";
     };
     accessor("const int16_t*", "msb") << " { return hertz_" << hertz << "::msb; }\n";
     accessor("const uint16_t*", "lsb") << " { return hertz_" << hertz << "::lsb; }\n";
     accessor("uint32_t", "length") << " { return " << words.size() << "; }\n\n";
 }
 
-void write_filters(std::ostream& out)
+void write_filters(Source& out)
 {
     for (const Polyphase& rate : kPolyphase) {
         const auto layout = kz::dsp::filter_layout(rate.up, rate.down);
@@ -100,8 +128,8 @@ void write_filters(std::ostream& out)
     write_array(out, "float", "kz::dsp::coefficients_4to1", quarter_band);
 }
 
-// Stage s, of half-width h = 2^(s-1), multiplies by a factor of 30 fraction bits over 2^(s-2): so the
-// largest factor of each stage, about h, fits a word.
+// Stage s, of half-width h = 2^(s-1), multiplies by a factor of 30 fraction bits over 2^(s-2): so
+// the largest factor of each stage, about h, fits a word.
 std::vector<int32_t> dct_coefficients(uint32_t length)
 {
     std::vector<int32_t> words(length, 0);
@@ -122,15 +150,22 @@ int main(int argc, char** argv)
         std::cerr << "usage: tablegen <output file>\n";
         return 2;
     }
-    std::ofstream out(argv[1]);
-    out << "// Written by tables/tablegen.cpp.\n\n"
-           "#include \"kzsdk/dsp/resampler.h\"\n"
-           "#include \"kzsdk/dsp/tables.hpp\"\n\n";
+    std::ofstream file(argv[1]);
+    file << "// Written by tables/tablegen.cpp.\n\n"
+            "#include \"kzsdk/dsp/resampler.h\"\n"
+            "#include \"kzsdk/dsp/tables.hpp\"\n\n";
+    Source out{file, {}};
     write_filters(out);
     write_array(out, "int32_t", "kz::dsp::kDctCoefficients", dct_coefficients(32768));
-    out.close();
-    if (!out) {
+    file.close();
+    if (!file) {
         std::cerr << "tablegen: cannot write " << argv[1] << '\n';
+        return 1;
+    }
+    if (out.digest.value() != kKnownDigest) {
+        std::cerr << "tablegen: this machine's mathematics makes other tables (digest 0x"
+                  << std::hex << out.digest.value() << ", 0x" << kKnownDigest
+                  << " is known): fingerprints would match no others\n";
         return 1;
     }
     return 0;

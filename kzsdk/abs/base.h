@@ -1,6 +1,7 @@
 /**
  * @file
- * What every public header of libkzsdk needs: fixed-width types and the marks of an exported function.
+ * What every public header of libkzsdk needs: fixed-width types and the marks of an exported
+ * function.
  */
 #ifndef KZSDK_ABS_BASE_H
 #define KZSDK_ABS_BASE_H

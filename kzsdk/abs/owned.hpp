@@ -24,14 +24,15 @@ using owned = std::unique_ptr<T, Release>;
 /// Allocates `count` values of plain type T, cleared to zero bytes. Null when the memory manager is
 /// off, the heap fails, or the size does not fit the allocator's 32 bits (nothing is tried then).
 template <class T>
-requires std::is_trivial_v<T> owned<T[]> make_array(uint64_t count)
-noexcept
+owned<T[]> make_array(uint64_t count) noexcept
 {
+    static_assert(std::is_trivial_v<T>);
     if (count > std::numeric_limits<uint32_t>::max() / sizeof(T)) {
         return nullptr;
     }
     const auto bytes = static_cast<uint32_t>(count * sizeof(T));
-    void* block = _kzmem_malloc(bytes);
+    // An empty array is a block all the same: null means failure, and a heap may answer 0 with it.
+    void* block = _kzmem_malloc(bytes == 0 ? 1 : bytes);
     if (block != nullptr) {
         std::memset(block, 0, bytes);
     }
@@ -40,8 +41,10 @@ noexcept
 
 /// Allocates one record of plain type T, cleared to zero bytes. Null on failure.
 template <class T>
-requires std::is_trivial_v<T> owned<T> make_record()
-noexcept { return owned<T>(make_array<T>(1).release()); }
+owned<T> make_record() noexcept
+{
+    return owned<T>(make_array<T>(1).release());
+}
 
 /// Allocates a copy of `count` values. Null on failure.
 template <class T>

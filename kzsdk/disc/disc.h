@@ -9,8 +9,8 @@
  * Each family has a switch, off at first, and a last error. Both are the process's, atomic and
  * without a lock: another thread's failure may be the one that get_error tells, so look at what a
  * call returns. While a family is off, open, seek, read, read_at, close, read_vol_label and
- * kzdvdfs_exists() do nothing but fail with 0x90060006. The names are built, and directories listed,
- * whether it is on or off.
+ * kzdvdfs_exists() do nothing but fail with 0x90060006. The names are built, and directories
+ * listed, whether it is on or off.
  *
  * Status codes. A failed system call gives, by its `errno`:
  *
@@ -19,8 +19,8 @@
  *
  * and there are 0x90060001 (memory is short; a directory cannot be opened; a name does not fit),
  * 0x90060004 (invalid argument), 0x90060005 (already on) and 0x90060006 (not on). Every failure
- * becomes the family's last error, unless a function says otherwise; a success leaves the last error
- * as it was, unless a function says otherwise.
+ * becomes the family's last error, unless a function says otherwise; a success leaves the last
+ * error as it was, unless a function says otherwise.
  *
  * Not a security boundary: a link may take a file's place between a look and the opening, links are
  * followed wherever `open` follows them, and opening a pipe waits for its other end.
@@ -33,7 +33,8 @@
 
 KZ_C_BEGIN
 
-/* ---- Blu-ray: switch and last error ----------------------------------------------------------- */
+/* ---- Blu-ray: switch and last error -----------------------------------------------------------
+ */
 
 /** Switches the family on. @return 0, and no last error is left; 0x90060005 when it was on. */
 KZ_API kz_status kzbdfs_initialize(void) KZ_NOEXCEPT;
@@ -41,13 +42,15 @@ KZ_API kz_status kzbdfs_initialize(void) KZ_NOEXCEPT;
 /** Switches the family off; what is open stays so. @return 0; 0x90060006 when it was off. */
 KZ_API kz_status kzbdfs_shutdown(void) KZ_NOEXCEPT;
 
-/** @return 0x90060005 when the family is on, 0x90060006 when it is off; never 0. Neither is kept. */
+/** @return 0x90060005 when the family is on, 0x90060006 when it is off; never 0. Neither is kept.
+ */
 KZ_API kz_status kzbdfs_query_availability(void) KZ_NOEXCEPT;
 
 /** Takes the last error: the next call returns 0. */
 KZ_API kz_status kzbdfs_get_error(void) KZ_NOEXCEPT;
 
-/* ---- Blu-ray: files --------------------------------------------------------------------------- */
+/* ---- Blu-ray: files ---------------------------------------------------------------------------
+ */
 
 /**
  * Opens a file for reading, following links.
@@ -97,9 +100,9 @@ KZ_API kz_status kzbdfs_close(int32_t descriptor) KZ_NOEXCEPT;
  * more. (A program that is started does not inherit it.)
  *
  * What is read is not checked: other bytes than a label come out where sector 32 does not hold the
- * volume descriptor, and none where the device ends earlier. A label of 30 characters, the most that
- * UDF has, is followed by one or two more bytes: its length, and a number. A label stored with 16
- * bits a character mostly comes out empty.
+ * volume descriptor, and none where the device ends earlier. A label of 30 characters, the most
+ * that UDF has, is followed by one or two more bytes: its length, and a number. A label stored with
+ * 16 bits a character mostly comes out empty.
  *
  * @param root         Must not be null and is not used otherwise: the device is always /dev/dvd, or
  *                     whatever that links to.
@@ -135,9 +138,9 @@ KZ_API char kzbdfs_dir_get_delim(void) KZ_NOEXCEPT;
  * kzbdfs_get_error() first.
  *
  * @param[out] handle  Takes the directory, which the caller closes; not touched on failure.
- * @return The pending last error, normally 0, when @p handle was set. Else 0x90060004 when a pointer
- *         is null, or 0x90060001 when memory is short or the directory cannot be opened, for
- *         whatever reason; these do not become the last error.
+ * @return The pending last error, normally 0, when @p handle was set. Else 0x90060004 when a
+ *         pointer is null, or 0x90060001 when memory is short or the directory cannot be opened,
+ *         for whatever reason; these do not become the last error.
  */
 KZ_API kz_status kzbdfs_open_dir(const char* path, kzbdfs_dir** handle) KZ_NOEXCEPT;
 
@@ -187,12 +190,12 @@ KZ_API void kzbdfs_close_dir(kzbdfs_dir* handle) KZ_NOEXCEPT;
  *
  * Each writes a text, NUL-terminated, into `destination`, which has room for `size` bytes: a text
  * that does not fit is cut. The byte at `size - 1` becomes NUL, however short the text. `root` is
- * where the disc is mounted, with or without a "/" at its end; the root "/" gives "//BDMV/..." and an
- * empty one "/BDMV/...". The two must not overlap.
+ * where the disc is mounted, with or without a "/" at its end; the root "/" gives "//BDMV/..." and
+ * an empty one "/BDMV/...". The two must not overlap.
  *
- * They return 0, and no last error is left; 0x90060004 when a pointer is null or `size` is 0. A text
- * that was cut names another file, and only kzbdfs_get_cert_dirname() may tell: give more room than
- * the root's length and 64 bytes.
+ * They return 0, and no last error is left; 0x90060004 when a pointer is null or `size` is 0. A
+ * text that was cut names another file, and only kzbdfs_get_cert_dirname() may tell: give more room
+ * than the root's length and 64 bytes.
  */
 
 /** "Content003.cer" for the number 3. At least three digits; no directory. */

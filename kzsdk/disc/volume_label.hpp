@@ -8,8 +8,8 @@ namespace kz::disc {
 
 constexpr int64_t kSector = 2048;
 
-/// The volume identifier of the UDF primary volume descriptor, behind its compression identifier, on
-/// a disc whose volume descriptors begin in sector 32.
+/// The volume identifier of the UDF primary volume descriptor, behind its compression identifier,
+/// on a disc whose volume descriptors begin in sector 32.
 constexpr int64_t kUdfLabel = 32 * kSector + 25;
 
 /// The volume identifier of the ISO 9660 primary volume descriptor.
@@ -22,8 +22,9 @@ struct VolumeLabel {
     uint32_t length;
 };
 
-/// Reads the label at an offset of an open disc, up to its first white space. What lies there is not
-/// checked; where the disc ends earlier, the label does. False when reading fails, with `errno` set.
+/// Reads the label at an offset of an open disc, up to its first white space. What lies there is
+/// not checked; where the disc ends earlier, the label does. False when reading fails, with `errno`
+/// set.
 bool read_label(int descriptor, int64_t offset, VolumeLabel& label) noexcept;
 
 } // namespace kz::disc

@@ -2,10 +2,9 @@
 /// What the fixed-point and the floating-point DCT share: the factor of a butterfly, the order of
 /// the samples and the recursive additions.
 ///
-/// The transform is the fast DCT-II by inverse-cosine butterflies: reorder the input, run one stage of
-/// butterflies per bit of the length, undo the bit reversal, and add recursively.
-/// Source: B. G. Lee, "A new algorithm to compute the discrete cosine transform", IEEE Trans. ASSP 32
-/// (1984).
+/// The transform is the fast DCT-II by inverse-cosine butterflies: reorder the input, run one stage
+/// of butterflies per bit of the length, undo the bit reversal, and add recursively. Source: B. G.
+/// Lee, "A new algorithm to compute the discrete cosine transform", IEEE Trans. ASSP 32 (1984).
 #pragma once
 
 #include <bit>
@@ -21,7 +20,7 @@ namespace kz::dsp {
 /// 1 / (2 cos((4j + 1) pi / (4h))), the factor of butterfly j in the stage of half-width h.
 inline float butterfly_factor(uint32_t half_width, uint32_t j) noexcept
 {
-    constexpr double kPi = 3.14159265358979;
+    constexpr double kPi = 3.14159265358979; // with these digits: the tables are made of it
     const double angle = (4.0 * j + 1.0) * kPi / (4.0 * half_width);
     return static_cast<float>(1.0 / (2.0 * kz_cos(angle)));
 }
@@ -42,8 +41,8 @@ void bit_reverse(std::span<T> x) noexcept
     }
 }
 
-/// Brings the even samples, in order, into the first half and the odd ones, reversed, into the second:
-/// a bit reversal of the whole, then of each half, then a reversal of the second half.
+/// Brings the even samples, in order, into the first half and the odd ones, reversed, into the
+/// second: a bit reversal of the whole, then of each half, then a reversal of the second half.
 template <class T>
 void reorder_input(std::span<T> x) noexcept
 {

@@ -31,7 +31,8 @@ KZ_API float KZDSP_Convolve(const float* samples, const float* taps, uint32_t co
 KZ_API float KZDSP_ConvolveSimple(const float* samples, const float* taps,
                                   uint32_t count) KZ_NOEXCEPT;
 
-/** KZDSP_Convolve() that begins with @p sum in place of 0 and adds its products to it one by one. */
+/** KZDSP_Convolve() that begins with @p sum in place of 0 and adds its products to it one by one.
+ */
 KZ_API float KZDSP_ConvolveMore(const float* samples, const float* taps, uint32_t count,
                                 uint32_t stride, float sum) KZ_NOEXCEPT;
 

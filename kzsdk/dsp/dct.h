@@ -38,7 +38,8 @@ KZ_API void KZDSP_DCT_fixed_destroy(KZDSP_DCT_fixed* dct) KZ_NOEXCEPT;
  *     X[0] = (sum of x / L) * 185363 / 2^32
  *
  * less the roundings of log2(L) stages. Products are rounded towards minus infinity and sums
- * gather that: low bins carry a bias of up to about L/2 (bin 1 the most), which is part of the result.
+ * gather that: low bins carry a bias of up to about L/2 (bin 1 the most), which is part of the
+ * result.
  *
  * Scaling:  no headroom is taken: the sum of any L / 2^s inputs that a stage adds must fit 32 bits,
  *           else it wraps. Inputs below 2^31 / L in magnitude never wrap.

@@ -122,7 +122,10 @@ KZ_API FxpUTypeLong KZDSP_ADD_FxpUTypeLong(uint32_t hi1, uint32_t lo1, uint32_t 
 KZ_API FxpType KZDSP_ALIGNED_SUB_FxpType(FxpType m1, int32_t e1, FxpType m2, int32_t e2,
                                          int32_t* exponent) KZ_NOEXCEPT;
 
-/** m << k: bits shifted out are lost, no saturation; k of 32 or more, or negative, gives 0. */
+/**
+ * m << k: bits shifted out are lost, no saturation. k is taken modulo 256; 32 and more give 0, and
+ * so do small negative counts.
+ */
 KZ_API FxpType KZDSP_MUL_POW2_FxpType(FxpType m, int32_t k) KZ_NOEXCEPT;
 
 /* ---- Products ------------------------------------------------------------------------------- */

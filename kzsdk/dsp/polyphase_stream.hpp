@@ -48,8 +48,8 @@ bool copies(const Resampler& r) noexcept
     return r.up == 1 && r.down == 1;
 }
 
-/// Zeros before the first sample: half the filter in whole outputs, turned back into inputs. At most
-/// length / 2 / L rounded up, half a window, so they always fit the history.
+/// Zeros before the first sample: half the filter in whole outputs, turned back into inputs. At
+/// most length / 2 / L rounded up, half a window, so they always fit the history.
 template <class Resampler>
 uint32_t initial_delay(const Resampler& r) noexcept
 {
@@ -68,8 +68,8 @@ void restart(Resampler& r) noexcept
     std::fill_n(r.history, delay, 0);
 }
 
-/// Makes the history of a resampler whose factors and length are set, and starts a stream. False when
-/// memory is short. A resampler that copies has none.
+/// Makes the history of a resampler whose factors and length are set, and starts a stream. False
+/// when memory is short. A resampler that copies has none.
 template <class Resampler>
 bool make_history(Resampler& r) noexcept
 {
@@ -121,8 +121,8 @@ std::span<Sample> block(Sample* samples, uint32_t count) noexcept
     return {samples, samples == nullptr ? 0 : count};
 }
 
-/// The exported call of both twins: runs `resample` unless there is no resampler, and tells the counts
-/// to whoever asks.
+/// The exported call of both twins: runs `resample` unless there is no resampler, and tells the
+/// counts to whoever asks.
 template <class Resampler, class Sample, class Resample>
 void resample_call(Resampler* r, std::span<const Sample> input, std::span<Sample> output,
                    uint32_t* consumed, uint32_t* produced, Resample resample) noexcept
@@ -161,8 +161,8 @@ void keep_tail(Resampler& r, std::span<const Sample> tail) noexcept
 /// Resamples one block.
 ///
 /// @param inside  (oldest sample of the window, phase) -> output, for a window inside the block.
-/// @param across  (newer samples, older samples, phase) -> output, for a window that reaches into the
-///                history; both spans run forwards in time, and the newer one may be empty.
+/// @param across  (newer samples, older samples, phase) -> output, for a window that reaches into
+///                the history; both spans run forwards in time, and the newer one may be empty.
 template <class Resampler, class Sample, class Inside, class Across>
 BlockCounts resample_block(Resampler& r, std::span<const Sample> input, std::span<Sample> output,
                            Inside inside, Across across) noexcept

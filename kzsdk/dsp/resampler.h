@@ -3,8 +3,8 @@
  * Sample-rate conversion to the working rate.
  *
  * A resampler takes a mono stream block by block and keeps the tail of the input that later outputs
- * still need. It is a polyphase filter: with L the up and M the down factor of the ratio, each output
- * is one dot product of the newest P samples with every L-th tap of a low-pass prototype.
+ * still need. It is a polyphase filter: with L the up and M the down factor of the ratio, each
+ * output is one dot product of the newest P samples with every L-th tap of a low-pass prototype.
  *
  * Threads: one thread per resampler at a time; the tables are constants and shared.
  */
@@ -46,8 +46,8 @@ KZ_API KZDSP_resampler_fixed* KZDSP_resampler_fixed_create(uint32_t input_rate,
 KZ_API void KZDSP_resampler_fixed_destroy(KZDSP_resampler_fixed* resampler) KZ_NOEXCEPT;
 
 /**
- * Starts a new stream: phase 0, and a history of zeros half a filter long, so that the first outputs
- * are centred on the first inputs. Null is ignored.
+ * Starts a new stream: phase 0, and a history of zeros half a filter long, so that the first
+ * outputs are centred on the first inputs. Null is ignored.
  */
 KZ_API void KZDSP_resampler_fixed_reset(KZDSP_resampler_fixed* resampler) KZ_NOEXCEPT;
 
@@ -81,9 +81,9 @@ KZ_API uint32_t KZDSP_resampler_fixed_compute_raw_length(const KZDSP_resampler_f
  *
  * So a cut may change an output by up to 2 units in the last place per tap: at most 2 * P, upwards
  * only, for L > 1; 22 units either way at 22050 Hz and for halving, 62 at 44100 Hz. This holds as
- * long as the 32-bit sum of the two cross products in the second rule does not wrap. It can wrap for
- * down-mixed stereo near full scale at 8000, 16000, 22050 and 44100 Hz; an output then moves by a
- * multiple of 2^17 (L > 1) or 2^16.
+ * long as the 32-bit sum of the two cross products in the second rule does not wrap. It can wrap
+ * for down-mixed stereo near full scale at 8000, 16000, 22050 and 44100 Hz; an output then moves by
+ * a multiple of 2^17 (L > 1) or 2^16.
  *
  * Timing: the phase advances before the taps are read and the window moves after, which places each
  * output up to one input sample beside its ideal time.
@@ -115,7 +115,7 @@ KZ_API void KZDSP_resampler_fixed_resample(KZDSP_resampler_fixed* resampler, con
  * @param second        Newest sample of the second run; read only when @p second_count is not 0.
  * @param msb, lsb      Halves of the first tap.
  * @param stride        Distance from one tap to the next.
- * @param shift         0 .. 31; more gives products of 0.
+ * @param shift         0 .. 31, taken modulo 256. (32 adds the low words; more adds nothing.)
  * @return The sum; 0 when there are samples but a table or an array is null.
  */
 KZ_API FxpType KZDSP_DualConvolveFixed(const FxpType* first, uint32_t first_count,
@@ -151,10 +151,10 @@ typedef struct KZDSP_resampler {
  * @param input_rate   Hertz, finite and above 0.
  * @param output_rate  Hertz, finite and above 0.
  * @return The resampler, which the caller frees with KZDSP_DestroyResampler(). Null for any other
- *         rate, for a quotient that is 0 or infinite in single precision, and when memory is short. A
- *         ratio with L or M above KZDSP_LARGEST_FACTOR counts as short of memory: its filter would
- *         take more than 88 MB. The tolerance keeps both below a million or so, whatever the rates,
- *         unless one is about a million times the other.
+ *         rate, for a quotient that is 0 or infinite in single precision, and when memory is short.
+ *         A ratio with L or M above KZDSP_LARGEST_FACTOR counts as short of memory: its filter
+ *         would take more than 88 MB. The tolerance keeps both below a million or so, whatever the
+ *         rates, unless one is about a million times the other.
  */
 KZ_API KZDSP_resampler* KZDSP_CreateResampler(float input_rate, float output_rate) KZ_NOEXCEPT;
 
@@ -162,8 +162,8 @@ KZ_API KZDSP_resampler* KZDSP_CreateResampler(float input_rate, float output_rat
 KZ_API void KZDSP_DestroyResampler(KZDSP_resampler* resampler) KZ_NOEXCEPT;
 
 /**
- * Starts a new stream: phase 0, and a history of zeros half a filter long, so that the first outputs
- * are centred on the first inputs. Null is ignored.
+ * Starts a new stream: phase 0, and a history of zeros half a filter long, so that the first
+ * outputs are centred on the first inputs. Null is ignored.
  */
 KZ_API void KZDSP_ResetResampler(KZDSP_resampler* resampler) KZ_NOEXCEPT;
 
@@ -190,12 +190,12 @@ KZ_API uint32_t KZDSP_ComputeRawLength(const KZDSP_resampler* resampler,
  * bit. Every output is one sum over P samples, newest first, rounded to single precision after each
  * product and each addition.
  *
- * Timing: as in KZDSP_resampler_fixed_resample(), of which every call consumes and produces the same
- * counts at the rates that it knows.
+ * Timing: as in KZDSP_resampler_fixed_resample(), of which every call consumes and produces the
+ * same counts at the rates that it knows.
  *
- * Scaling:  full level at every rate, 22050 and 44100 Hz included; upsampling gains L / M, so 8000 Hz
- *           comes out at 1.376 times full level.
- * Cost:     one product per tap of a phase for each output. Never allocates.
+ * Scaling:  full level at every rate, 22050 and 44100 Hz included; upsampling gains L / M, so 8000
+ * Hz comes out at 1.376 times full level. Cost:     one product per tap of a phase for each output.
+ * Never allocates.
  *
  * @param input           `input_count` mono samples. NaN and infinities reach the outputs whose
  *                        windows hold them, no other.
@@ -228,8 +228,8 @@ KZ_API void KZDSP_Rationalize(double x, int32_t* numerator, int32_t* denominator
                               double tolerance) KZ_NOEXCEPT;
 
 /*
- * The prototypes of the seven rates: high halves, low halves (tap i is msb[i] * 65536 + lsb[i], Q31)
- * and number of taps. The tables are constants of the library.
+ * The prototypes of the seven rates: high halves, low halves (tap i is msb[i] * 65536 + lsb[i],
+ * Q31) and number of taps. The tables are constants of the library.
  */
 /** High halves of the taps for 8000 Hz. */
 KZ_API const int16_t* kzdsp_get_8000_11025_fixed_coeff_msb(void) KZ_NOEXCEPT;

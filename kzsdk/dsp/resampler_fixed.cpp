@@ -87,9 +87,9 @@ int32_t polyphase(const KZDSP_resampler_fixed& r, const int32_t* window, uint32_
     return sum;
 }
 
-// The symmetric filters of the integer decimators: a pair of samples is added before it is multiplied,
-// and the product counts in units of 2^-32. (Polyphase filters count in 2^-31: so 22050 and 44100 Hz
-// come out at half level, which later stages level out.)
+// The symmetric filters of the integer decimators: a pair of samples is added before it is
+// multiplied, and the product counts in units of 2^-32. (Polyphase filters count in 2^-31: so 22050
+// and 44100 Hz come out at half level, which later stages level out.)
 int32_t tap_product(const KZDSP_resampler_fixed& r, uint32_t tap, int32_t sample) noexcept
 {
     const Halves s = halves(sample);

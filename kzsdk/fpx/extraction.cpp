@@ -42,7 +42,8 @@ kz_status kz_fpx_fingerprint_create(uint32_t algorithm, uint32_t format, uint32_
         return KZ_FPX_ERROR_MEMORY;
     }
     handle->algorithm = row;
-    // The interface takes the format before the rate, the fingerprinters the rate before the format.
+    // The interface takes the format before the rate, the fingerprinters the rate before the
+    // format.
     const kz_status status =
         row->create(algorithm, sample_rate, format, channels, &handle->instance);
     if (status == KZ_OK) {

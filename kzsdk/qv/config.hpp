@@ -10,8 +10,8 @@
 
 namespace kz::qv {
 
-/// Hands out a copy of a table that belongs to the caller. Does nothing when a pointer is null. When
-/// memory is short the copy is null and its count 0; nothing is reported.
+/// Hands out a copy of a table that belongs to the caller. Does nothing when a pointer is null.
+/// When memory is short the copy is null and its count 0; nothing is reported.
 template <class Entry>
 void copy_table(const Entry* source, uint32_t count, Entry** out_table,
                 uint32_t* out_count) noexcept

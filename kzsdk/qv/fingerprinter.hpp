@@ -104,8 +104,9 @@ public:
 
     /// Copies the fingerprint and computes its times.
     ///
-    /// @return 0; KZ_QV_ERROR_INVALID_ARGUMENT for a null pointer or a buffer below the fingerprint's
-    ///         size; KZ_QV_ERROR_INCOMPLETE before the frame limit is reached, or when memory is short.
+    /// @return 0; KZ_QV_ERROR_INVALID_ARGUMENT for a null pointer or a buffer below the
+    ///         fingerprint's size; KZ_QV_ERROR_INCOMPLETE before the frame limit is reached, or
+    ///         when memory is short.
     static kz_status extract(const void* object, uint8_t* buffer, uint32_t size,
                              FingerprintTimes& times) noexcept
     {

@@ -1,6 +1,6 @@
 /// @file
-/// The frame manager's list of feature records, and the rules by which frames are skipped and limited.
-/// A twin brings its manager and record, whose fields have the same names.
+/// The frame manager's list of feature records, and the rules by which frames are skipped and
+/// limited. A twin brings its manager and record, whose fields have the same names.
 #pragma once
 
 #include <algorithm>
@@ -127,7 +127,8 @@ uint32_t fingerprint_size(const Manager& manager) noexcept
     return manager.band_count * 4;
 }
 
-/// Copies the fingerprint out; `compute(manager)` makes it first when frames came since the last time.
+/// Copies the fingerprint out; `compute(manager)` makes it first when frames came since the last
+/// time.
 ///
 /// @return Bytes written: 0 when it cannot be made or does not fit.
 template <class Manager, class Compute>

@@ -1,8 +1,9 @@
 /// @file
-/// The fingerprinters' feed loop: bytes -> mono samples -> working rate -> ring -> overlapping frames.
+/// The fingerprinters' feed loop: bytes -> mono samples -> working rate -> ring -> overlapping
+/// frames.
 ///
-/// Both twins run this loop over their own object, whose fields have the same names. A twin brings a
-/// `Twin` type with
+/// Both twins run this loop over their own object, whose fields have the same names. A twin brings
+/// a `Twin` type with
 ///
 ///     Object, Sample                                       its record and its sample type
 ///     kConverters                                          by format, see converter_choice.hpp
@@ -24,7 +25,8 @@
 
 namespace kz::qv {
 
-/// Where the ring is read and written. A frame is full when the writer has caught up with its start.
+/// Where the ring is read and written. A frame is full when the writer has caught up with its
+/// start.
 struct RingPosition {
     uint32_t frame_start;
     uint32_t write;
@@ -130,8 +132,9 @@ void store(typename Twin::Object& object, uint32_t produced) noexcept
 
 /// Feeds whole frames of interleaved bytes.
 ///
-/// @return 0 when all bytes are consumed; KZ_QV_FRAME_LIMIT_REACHED once the fingerprint is complete;
-///         KZ_QV_ERROR_INVALID_ARGUMENT for a byte count that is 0 or not a whole number of frames.
+/// @return 0 when all bytes are consumed; KZ_QV_FRAME_LIMIT_REACHED once the fingerprint is
+///         complete; KZ_QV_ERROR_INVALID_ARGUMENT for a byte count that is 0 or not a whole number
+///         of frames.
 template <class Twin>
 kz_status feed(typename Twin::Object& object, std::span<const uint8_t> bytes) noexcept
 {

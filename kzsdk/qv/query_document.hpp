@@ -30,8 +30,8 @@ struct FingerprintSource {
 /// Builds the document.
 ///
 /// @param[out] out_tree  The root, which the caller disposes; untouched on failure.
-/// @return 0, KZ_QV_ERROR_MEMORY, KZ_QV_ERROR_EMPTY for a fingerprint without values, or the status of
-///         `extract`.
+/// @return 0, KZ_QV_ERROR_MEMORY, KZ_QV_ERROR_EMPTY for a fingerprint without values, or the status
+///         of `extract`.
 kz_status build_query_document(const FingerprintSource& source, XMLTag** out_tree) noexcept;
 
 } // namespace kz::qv

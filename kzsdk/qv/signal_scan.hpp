@@ -12,8 +12,8 @@
 
 namespace kz::qv {
 
-/// Makes a detector with both rings cleared. Null when memory is short, and for a window that is 0 or
-/// whose rings would not fit 32 bits of bytes.
+/// Makes a detector with both rings cleared. Null when memory is short, and for a window that is 0
+/// or whose rings would not fit 32 bits of bytes.
 template <class Detector>
 Detector* make_detector(uint32_t window, uint32_t threshold, int32_t max_deviation) noexcept
 {

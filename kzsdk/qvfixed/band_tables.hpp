@@ -14,8 +14,8 @@ inline constexpr std::array<int32_t, 30> kFrequencyTable = {
     5468, 5468, 6419, 6419, 7548, 7548, 8797, 8797, 10223, 10223, 11888, 11888, 13790, 13790, 16049,
 };
 
-/// Factors of a band's energy before the square root, in units of 2^-32: about 256 / bins, which makes
-/// the root 8 times the band's root-mean-square coefficient.
+/// Factors of a band's energy before the square root, in units of 2^-32: about 256 / bins, which
+/// makes the root 8 times the band's root-mean-square coefficient.
 inline constexpr std::array<int32_t, 15> kBandWeights = {
     1851029675, 1844818166, 1847918701, 1844818166, 1678643705, 1539932251, 1319941929, 1231256021,
     1154949188, 973019139,  879609301,  770505695,  659970964,  577778049,  486509569,
@@ -28,8 +28,8 @@ struct GainSegment {
     int32_t step;     ///< per bin
 };
 
-/// Gains that make up for the decimator's roll-off in the top band. The last bins of that band, from
-/// 15811 on, keep their level.
+/// Gains that make up for the decimator's roll-off in the top band. The last bins of that band,
+/// from 15811 on, keep their level.
 inline constexpr std::array<GainSegment, 8> kGainRamp = {{
     {13790, 14147, 1073741824, 32483},
     {14147, 14385, 1085338235, 73087},

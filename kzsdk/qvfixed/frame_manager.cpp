@@ -144,8 +144,10 @@ void append_features(Manager& m) noexcept
 
 // ---- the fingerprint
 
-// 1 / count as a 32-bit fraction, normalised to [0.5, 1): off by a power of two unless the count is 4
-// to 7 times one, which all bands have in common and the final division cancels.
+// 1 / count as a 32-bit fraction, normalised to [0.5, 1). With the quarters and eighths that are
+// summed this is the average of 8 to 15 frames exactly, twelve among them. Other counts are off by
+// a power of two: that cancels among the means, but moves the centre from which deviations are
+// taken.
 int32_t normalised_reciprocal(uint32_t count) noexcept
 {
     int32_t shift = 0;
@@ -195,8 +197,8 @@ void take_means(const Manager& m, Statistics& s) noexcept
     }
 }
 
-// Bits by which deviations are raised before they are squared. The count is -1 or -2 for the largest
-// of deviations, and a shift by that gives 0.
+// Bits by which deviations are raised before they are squared. The count is -1 or -2 for the
+// largest of deviations, and a shift by that gives 0.
 int32_t deviation_shift(int32_t largest) noexcept
 {
     const int32_t zeros = leading_zeros(magnitude(largest));
@@ -220,8 +222,8 @@ void take_spreads(const Manager& m, Statistics& s) noexcept
     }
 }
 
-// Each value as its share of the total, which was summed from quarters: 32768 is the whole, and wraps
-// in 16 bits to -32768. A total too small to divide by leaves nothing to share.
+// Each value as its share of the total, which was summed from quarters: 32768 is the whole, and
+// wraps in 16 bits to -32768. A total too small to divide by leaves nothing to share.
 void store_shares(std::span<const int32_t> values, int32_t total, int16_t* destination) noexcept
 {
     const int32_t divisor = total >> 16;

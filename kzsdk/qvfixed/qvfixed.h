@@ -2,15 +2,15 @@
  * @file
  * The fixed-point fingerprinter and its parts.
  *
- * Most users reach it through the extraction interface (kzsdk/fpx/fpx.h), as algorithm 1. Its parts are
- * public too: configuration, frame manager, signal detector and equaliser.
+ * Most users reach it through the extraction interface (kzsdk/fpx/fpx.h), as algorithm 1. Its parts
+ * are public too: configuration, frame manager, signal detector and equaliser.
  *
- * The road of the samples: interleaved bytes -> mono Q29 or Q30 -> 11025 Hz -> leading silence dropped ->
- * frames of 32768 samples, one every 11264 -> equalised, decimated by two, transformed -> 15 bands.
- * Twelve frames make a fingerprint of 30 values.
+ * The road of the samples: interleaved bytes -> mono Q29 or Q30 -> 11025 Hz -> leading silence
+ * dropped -> frames of 32768 samples, one every 11264 -> equalised, decimated by two, transformed
+ * -> 15 bands. Twelve frames make a fingerprint of 30 values.
  *
- * Threads: none of these objects may be used by two threads at once; different objects are independent.
- * Arithmetic: integer, modulo 2^32; the same input gives the same words everywhere.
+ * Threads: none of these objects may be used by two threads at once; different objects are
+ * independent. Arithmetic: integer, modulo 2^32; the same input gives the same words everywhere.
  */
 #ifndef KZSDK_QVFIXED_QVFIXED_H
 #define KZSDK_QVFIXED_QVFIXED_H
@@ -24,7 +24,7 @@
 
 KZ_C_BEGIN
 
-/* ---- Configuration ------------------------------------------------------------------------------- */
+/* ---- Configuration --------------------------------------------------------------------------- */
 
 /** Every tuning value of the algorithm. */
 typedef struct kzqvfixed_config {
@@ -57,8 +57,8 @@ KZ_API kz_status kzqvfixed_config_destroy(kzqvfixed_config* config) KZ_NOEXCEPT;
 /**
  * Copies the band table.
  *
- * @param[out] out_table  A new array, which the caller frees with _kzmem_free(). Null when memory is
- *                        short.
+ * @param[out] out_table  A new array, which the caller frees with _kzmem_free(). Null when memory
+ *                        is short.
  * @param[out] out_count  Its number of entries; 0 when memory is short.
  * @return 0 in every case. Both outputs are untouched when the table or any pointer is null.
  */
@@ -69,14 +69,14 @@ KZ_API kz_status kzqvfixed_config_copy_freq_table(const kzqvfixed_config* config
 /**
  * Replaces the band table by a copy of @p table.
  *
- * @param table  @p count bins, in pairs; a last odd one is ignored. Null leaves no table. May be the
- *               record's own. Bins outside the spectrum are cut to it when a frame is analysed.
+ * @param table  @p count bins, in pairs; a last odd one is ignored. Null leaves no table. May be
+ *               the record's own. Bins outside the spectrum are cut to it when a frame is analysed.
  * @return 0 in every case; when memory is short the record is left without a table.
  */
 KZ_API kz_status kzqvfixed_config_set_freq_table(kzqvfixed_config* config, const int32_t* table,
                                                  uint32_t count) KZ_NOEXCEPT;
 
-/* ---- Signal detector ----------------------------------------------------------------------------- */
+/* ---- Signal detector ------------------------------------------------------------------------- */
 
 /** Finds the end of leading silence: a moving mean, and a moving mean of the deviation from it. */
 typedef struct kzqvfixed_signal_detector {
@@ -94,7 +94,9 @@ typedef struct kzqvfixed_signal_detector {
 /**
  * Makes a detector.
  *
- * @param window  1 .. 2^30 - 1 samples.
+ * @param window         1 .. 2^30 - 1 samples.
+ * @param threshold      Of the mean deviation, in units of the shifted samples, compared unsigned.
+ * @param max_deviation  Clamp of one deviation, in the same units, compared signed.
  * @return The detector, which the caller frees with kzqvfixed_signal_detector_destroy(); null when
  *         the window is out of range or memory is short.
  */
@@ -116,7 +118,7 @@ KZ_API kz_status kzqvfixed_signal_detector_reset(kzqvfixed_signal_detector* dete
  *
  * @param samples  @p count samples.
  * @param shift    Samples are shifted right by this, towards zero, before they are judged; 13 is
- *                 what the fingerprinter uses. 32 and more make every sample 0.
+ *                 what the fingerprinter uses. Taken modulo 256; 32 and more make every sample 0.
  * @return Half a window before the sample at which the mean deviation exceeds the threshold, 0 when
  *         that lies before the block; @p count when there is no signal, the detector is null, or
  *         @p samples is null.
@@ -125,16 +127,16 @@ KZ_API uint32_t kzqvfixed_signal_detector_get_signal_offset(kzqvfixed_signal_det
                                                             const FxpType* samples, uint32_t count,
                                                             int32_t shift) KZ_NOEXCEPT;
 
-/* ---- Histogram equalisation ---------------------------------------------------------------------- */
+/* ---- Histogram equalisation ------------------------------------------------------------------ */
 
 /**
  * Replaces each sample of a frame by its rank in the frame's own distribution.
  *
- * The samples are the first @p output_length of the two pieces laid end to end. Each is quantised to one
- * of @p levels levels between the frame's minimum and maximum, and each level becomes 32768 times its
- * cumulative count, less the mean over the frame. A frame of 32768 samples comes out as a zero-mean
- * signal of roughly +-2^29; the factor 32768 does not follow the frame's length, so longer frames
- * wrap.
+ * The samples are the first @p output_length of the two pieces laid end to end. Each is quantised
+ * to one of @p levels levels between the frame's minimum and maximum, and each level becomes 32768
+ * times its cumulative count, less the mean over the frame. A frame of 32768 samples comes out as a
+ * zero-mean signal of roughly +-2^29; the factor 32768 does not follow the frame's length, so
+ * longer frames wrap.
  *
  * A frame whose halved range is 8192 or less counts as silent and is copied. The copy, which also
  * serves when memory is short, takes from @p second all samples that are missing, whatever
@@ -154,17 +156,19 @@ KZ_API kz_status kzqvfixed_hist_eq_dual(const FxpType* first, uint32_t first_cou
                                         uint32_t* histogram, uint32_t levels) KZ_NOEXCEPT;
 
 /**
- * The same for one piece, without the test for silence: a constant frame is all level 0. When memory is
- * short the samples are copied.
+ * The same for one piece, without the test for silence: a constant frame is all level 0. When
+ * memory is short the samples are copied.
  *
- * @param input   @p count samples.
- * @param output  Room for @p count samples, apart from @p input.
+ * @param input      @p count samples.
+ * @param output     Room for @p count samples, apart from @p input.
+ * @param histogram  @p levels + 1 counters, scratch.
+ * @param levels     K, 1 or more; 0, or a null array, does nothing.
  * @return 0.
  */
 KZ_API kz_status kzqvfixed_hist_eq2(const FxpType* input, FxpType* output, uint32_t count,
                                     uint32_t* histogram, uint32_t levels) KZ_NOEXCEPT;
 
-/* ---- Frame manager ------------------------------------------------------------------------------- */
+/* ---- Frame manager --------------------------------------------------------------------------- */
 
 /**
  * Square root of a Q30 value or any other: floor(sqrt(value * 2^30)) for a value up to 2^30. Above,
@@ -181,26 +185,26 @@ typedef struct kzqvfixed_frame_record {
 
 /** Turns frames into band features and these into the fingerprint. Read it, do not change it. */
 typedef struct kzqvfixed_frame_manager {
-    uint32_t skip_frames;
-    uint32_t frame_limit; /**< 0 for no limit */
-    uint32_t fingerprint_scale;
-    uint32_t skip_remaining;
-    uint32_t frame_count;            /**< records in the list */
-    kzqvfixed_frame_record* records; /**< owned list, oldest first */
-    kzqvfixed_frame_record** records_tail;
-    uint32_t frame_length;            /**< N */
-    FxpType* frame_buffer;            /**< owned; N samples */
-    KZDSP_resampler_fixed* decimator; /**< owned; halves the rate */
-    uint32_t half_length;             /**< N / 2 */
-    FxpType* spectrum;                /**< owned; N / 2 words */
-    KZDSP_DCT_fixed* dct;             /**< owned; N / 2 points */
-    uint32_t band_table_count;
-    int32_t* band_table; /**< owned; pairs of first and last bin */
-    uint32_t band_count;
-    uint32_t histogram_levels; /**< K; 0 for no equalisation */
-    uint32_t* histogram;       /**< owned; K + 1 counters, or null */
-    int16_t* fingerprint;      /**< owned; two values per band */
-    uint8_t fingerprint_ready; /**< `fingerprint` matches the list */
+    uint32_t skip_frames;                  /**< as configured */
+    uint32_t frame_limit;                  /**< as configured; 0 for no limit */
+    uint32_t fingerprint_scale;            /**< as configured; not read */
+    uint32_t skip_remaining;               /**< frames that are still to be dropped */
+    uint32_t frame_count;                  /**< records in the list */
+    kzqvfixed_frame_record* records;       /**< owned list, oldest first */
+    kzqvfixed_frame_record** records_tail; /**< the link that the next record goes into */
+    uint32_t frame_length;                 /**< N, in samples */
+    FxpType* frame_buffer;                 /**< owned; N samples */
+    KZDSP_resampler_fixed* decimator;      /**< owned; halves the rate */
+    uint32_t half_length;                  /**< N / 2 */
+    FxpType* spectrum;                     /**< owned; N / 2 words */
+    KZDSP_DCT_fixed* dct;                  /**< owned; N / 2 points */
+    uint32_t band_table_count;             /**< entries of band_table */
+    int32_t* band_table;                   /**< owned; pairs of first and last bin */
+    uint32_t band_count;                   /**< pairs in band_table */
+    uint32_t histogram_levels;             /**< K; 0 for no equalisation */
+    uint32_t* histogram;                   /**< owned; K + 1 counters, or null */
+    int16_t* fingerprint;                  /**< owned; two values per band */
+    uint8_t fingerprint_ready;             /**< `fingerprint` matches the list */
 } kzqvfixed_frame_manager;
 
 /**
@@ -217,18 +221,19 @@ kzqvfixed_frame_manager_create(const kzqvfixed_config* config) KZ_NOEXCEPT;
 /** Frees a manager with all it owns; null is ignored. Returns 0. */
 KZ_API kz_status kzqvfixed_frame_manager_destroy(kzqvfixed_frame_manager* manager) KZ_NOEXCEPT;
 
-/** Drops all records and starts anew, with the configured frames to skip. Null is ignored. Returns 0. */
+/** Drops all records and starts anew, with the configured frames to skip. Null is ignored. Returns
+ * 0. */
 KZ_API kz_status kzqvfixed_frame_manager_reset(kzqvfixed_frame_manager* manager) KZ_NOEXCEPT;
 
 /**
  * Analyses one frame, given in two pieces: the end of a ring buffer and its beginning.
  *
- * The frame is dropped while frames are to be skipped, when the limit is reached, and when memory for
- * its record is short. Pieces longer than a frame are cut. Pieces shorter than a frame leave the rest
- * of the frame as the previous one left it (zeros at first).
+ * The frame is dropped while frames are to be skipped, when the limit is reached, and when memory
+ * for its record is short. Pieces longer than a frame are cut. Pieces shorter than a frame leave
+ * the rest of the frame as the previous one left it (zeros at first).
  *
- * Precondition: with equalisation on, @p second holds all samples of a frame that @p first does not,
- * whatever @p second_count says (see kzqvfixed_hist_eq_dual()).
+ * Precondition: with equalisation on, @p second holds all samples of a frame that @p first does
+ * not, whatever @p second_count says (see kzqvfixed_hist_eq_dual()).
  *
  * @param first   Oldest samples; null drops the frame.
  * @param second  The samples that follow; null counts as none.
@@ -257,10 +262,14 @@ KZ_API uint32_t kzqvfixed_frame_manager_get_fingerprint_size(const kzqvfixed_fra
     KZ_NOEXCEPT;
 
 /**
- * Condenses all frames into the fingerprint: per band the root of the mean energy, then per band the
- * standard deviation of the amplitude, each set as shares of its own total in units of 1 / 32768,
- * truncated, in 16 bits. (A share of the whole, 32768, is therefore stored as -32768.) A set whose
- * total is too small to divide by, as from silence or a single frame, is all 0.
+ * Condenses all frames into the fingerprint: per band the root of the mean energy, then per band
+ * the standard deviation of the amplitude, each set as shares of its own total in units of 1 /
+ * 32768, truncated, in 16 bits. (A share of the whole, 32768, is therefore stored as -32768.) A set
+ * whose total is too small to divide by, as from silence or a single frame, is all 0.
+ *
+ * The deviations are from the average for 8 to 15 frames. For other numbers of frames they are
+ * from a point that a power of two lies between it and the average, and from 16 on their sums can
+ * wrap.
  *
  * @param destination  Room for @p capacity bytes, at any address.
  * @return Bytes written: the size, or 0 when a pointer is null, @p capacity is below the size, or
@@ -270,31 +279,31 @@ KZ_API uint32_t kzqvfixed_frame_manager_get_fingerprint(kzqvfixed_frame_manager*
                                                         void* destination,
                                                         uint32_t capacity) KZ_NOEXCEPT;
 
-/* ---- Fingerprinter ------------------------------------------------------------------------------- */
+/* ---- Fingerprinter --------------------------------------------------------------------------- */
 
 /** Samples that are converted at a time. */
 #define KZQVFIXED_CONVERSION_SAMPLES 4096
 
 /** A fingerprint in the making: row 1 of the extraction interface. Read it, do not change it. */
 typedef struct kzqvfixed_fingerprinter {
-    uint32_t channel_count;
+    uint32_t channel_count;                 /**< 1 or 2 */
     uint32_t input_rate;                    /**< hertz */
     uint32_t input_format;                  /**< 1 8-bit PCM, 2 16-bit PCM, 3 A-law, 4 mu-law */
     uint32_t frame_bytes;                   /**< of one sample of every channel */
     uint32_t working_rate;                  /**< hertz with 12 fraction bits */
     KZDSP_resampler_fixed* resampler;       /**< owned */
     kzqvfixed_frame_manager* frame_manager; /**< owned */
-    uint32_t frame_limit; /**< while not 0, only a complete fingerprint is given out */
-    uint8_t searching_for_signal;
-    uint8_t signal_search_enabled;
-    uint32_t signal_offset; /**< working-rate samples dropped as leading silence */
+    uint32_t frame_limit;          /**< while not 0, only a complete fingerprint is given out */
+    uint8_t searching_for_signal;  /**< 1 while leading silence is being skipped */
+    uint8_t signal_search_enabled; /**< as configured */
+    uint32_t signal_offset;        /**< working-rate samples dropped as leading silence */
     kzqvfixed_signal_detector* signal_detector;              /**< owned */
     FxpType conversion_buffer[KZQVFIXED_CONVERSION_SAMPLES]; /**< one chunk, mono */
-    uint32_t frame_length;
+    uint32_t frame_length;                                   /**< in samples */
     uint32_t frame_start;    /**< ring index of the next frame's first sample */
     uint32_t write_position; /**< ring index of the next sample to store */
     FxpType* ring;           /**< owned; frame_length samples */
-    uint32_t hop;
+    uint32_t hop;            /**< samples from one frame start to the next */
 } kzqvfixed_fingerprinter;
 
 /**
@@ -330,8 +339,8 @@ KZ_API kz_status kzqvfixed_add_samples(kzqvfixed_fingerprinter* object, const vo
 /**
  * Builds the query document of a complete fingerprint.
  *
- * @param[out] out_tree  The document's root, which the caller frees with DisposeXMLTag(); untouched on
- *                       failure.
+ * @param[out] out_tree  The document's root, which the caller frees with DisposeXMLTag(); untouched
+ *                       on failure.
  * @return 0; 0x900f0004 for a null pointer; 0x900f0961 when the fingerprint is not complete;
  *         0x900f0001 when memory is short.
  */

@@ -134,8 +134,8 @@ float amplitude_spread(const QVFM& m, uint32_t band) noexcept
     return root(squares / static_cast<float>(m.frame_count - 1));
 }
 
-// Each value as its share of their sum. 32768 is the whole, and wraps in 16 bits to -32768; a share that
-// is not a number, as of a sum of 0, is 0.
+// Each value as its share of their sum. 32768 is the whole, and wraps in 16 bits to -32768; a share
+// that is not a number, as of a sum of 0, is 0.
 void store_shares(std::span<const float> values, float scale, int16_t* destination) noexcept
 {
     float sum = 0;

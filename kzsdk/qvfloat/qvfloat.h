@@ -2,17 +2,19 @@
  * @file
  * The floating-point fingerprinter and its parts.
  *
- * The same algorithm as the fixed-point fingerprinter (kzsdk/qvfixed/qvfixed.h), in single precision: the
- * same frames, bands and statistics, and a fingerprint on the same scale. It takes any sample rate, and
- * the features of its frames can be exported and appended elsewhere. Most users reach it through the
- * extraction interface (kzsdk/fpx/fpx.h), as algorithm 2.
+ * The same algorithm as the fixed-point fingerprinter (kzsdk/qvfixed/qvfixed.h), in single
+ * precision: the same frames, bands and statistics, and a fingerprint on the same scale. It takes
+ * any sample rate, and the features of its frames can be exported and appended elsewhere. Most
+ * users reach it through the extraction interface (kzsdk/fpx/fpx.h), as algorithm 2.
  *
- * The road of the samples: interleaved bytes -> mono floats, full scale +-32768 -> 11025 Hz -> leading
- * silence dropped -> frames of 32768 samples, one every 11264 -> equalised, transformed -> 15 bands.
+ * The road of the samples: interleaved bytes -> mono floats, full scale +-32768 -> 11025 Hz ->
+ * leading silence dropped -> frames of 32768 samples, one every 11264 -> equalised, transformed ->
+ * 15 bands.
  *
- * Threads: none of these objects may be used by two threads at once; different objects are independent.
- * Arithmetic: sums accumulate in single precision in the stated order, without contraction. Results are
- * the same on every processor whose C library has the same sine and cosine.
+ * Threads: none of these objects may be used by two threads at once; different objects are
+ * independent. Arithmetic: sums accumulate in single precision in the stated order, without
+ * contraction. Results are the same on every processor whose C library has the same sine and
+ * cosine.
  */
 #ifndef KZSDK_QVFLOAT_QVFLOAT_H
 #define KZSDK_QVFLOAT_QVFLOAT_H
@@ -25,7 +27,7 @@
 
 KZ_C_BEGIN
 
-/* ---- Configuration ------------------------------------------------------------------------------- */
+/* ---- Configuration --------------------------------------------------------------------------- */
 
 /** Every tuning value of the algorithm; defaults as in kzqvfixed_config. */
 typedef struct QVConfig {
@@ -58,8 +60,8 @@ KZ_API kz_status QVConfig_Destroy(QVConfig* config) KZ_NOEXCEPT;
 /**
  * Copies the band table.
  *
- * @param[out] out_table  A new array, which the caller frees with _kzmem_free(). Null when memory is
- *                        short.
+ * @param[out] out_table  A new array, which the caller frees with _kzmem_free(). Null when memory
+ *                        is short.
  * @param[out] out_count  Its number of entries; 0 when memory is short.
  * @return 0 in every case. Both outputs are untouched when the table or any pointer is null.
  */
@@ -69,14 +71,15 @@ KZ_API kz_status QVConfig_CopyFreqTable(const QVConfig* config, float** out_tabl
 /**
  * Replaces the band table by a copy of @p table.
  *
- * @param table  @p count edges in hertz, in pairs; a last odd one is ignored. Null leaves no table. May
- *               be the record's own. Edges outside the spectrum are cut to it when a frame is analysed.
+ * @param table  @p count edges in hertz, in pairs; a last odd one is ignored. Null leaves no table.
+ *               May be the record's own. Edges outside the spectrum are cut to it when a frame is
+ *               analysed.
  * @return 0 in every case; when memory is short the record is left without a table.
  */
 KZ_API kz_status QVConfig_SetFreqTable(QVConfig* config, const float* table,
                                        uint32_t count) KZ_NOEXCEPT;
 
-/* ---- Signal detector ----------------------------------------------------------------------------- */
+/* ---- Signal detector ------------------------------------------------------------------------- */
 
 /** Finds the end of leading silence: a moving mean, and a moving mean of the deviation from it. */
 typedef struct QVSD {
@@ -110,8 +113,8 @@ KZ_API kz_status QVSD_Reset(QVSD* detector) KZ_NOEXCEPT;
  * Looks for the start of the signal in the next block of a stream, as
  * kzqvfixed_signal_detector_get_signal_offset() does.
  *
- * @param samples  @p count samples, judged by their whole parts; NaN counts as 0, and what does not fit
- *                 32 bits as the nearest that does.
+ * @param samples  @p count samples, judged by their whole parts; NaN counts as 0, and what does not
+ *                 fit 32 bits as the nearest that does.
  * @return Half a window before the sample at which the mean deviation exceeds the threshold, 0 when
  *         that lies before the block; @p count when there is no signal, the detector is null, or
  *         @p samples is null.
@@ -119,16 +122,17 @@ KZ_API kz_status QVSD_Reset(QVSD* detector) KZ_NOEXCEPT;
 KZ_API uint32_t QVSD_GetSignalOffset(QVSD* detector, const float* samples,
                                      uint32_t count) KZ_NOEXCEPT;
 
-/* ---- Histogram equalisation ---------------------------------------------------------------------- */
+/* ---- Histogram equalisation ------------------------------------------------------------------ */
 
 /**
  * Replaces each sample of a frame by its rank in the frame's own distribution.
  *
- * Each sample is quantised to one of @p levels levels between the frame's minimum and maximum, and each
- * level becomes its cumulative share of the samples, less the mean over the frame: a signal between -1 and
- * 1, 2^30 times smaller than that of kzqvfixed_hist_eq2(). The range always reaches down to 10^6 and up
- * to -10^6, which matters only to frames that lie beyond as a whole. A constant frame is all level 0, and
- * so is a sample that is not a number. When memory is short the samples are copied.
+ * Each sample is quantised to one of @p levels levels between the frame's minimum and maximum, and
+ * each level becomes its cumulative share of the samples, less the mean over the frame: a signal
+ * between -1 and 1, 2^30 times smaller than that of kzqvfixed_hist_eq2(). The range always reaches
+ * down to 10^6 and up to -10^6, which matters only to frames that lie beyond as a whole. A constant
+ * frame is all level 0, and so is a sample that is not a number. When memory is short the samples
+ * are copied.
  *
  * @param input   @p count samples.
  * @param output  Room for @p count samples, apart from @p input.
@@ -149,8 +153,9 @@ KZ_API kz_status hist_eq2(const float* input, float* output, uint32_t count, uin
 /**
  * The same for the first @p output_length samples of two pieces laid end to end.
  *
- * A frame whose range is 1.0 or less counts as silent and is copied. The copy, which also serves when memory
- * is short, takes from @p second all samples that are missing, whatever @p second_count says: unless
+ * A frame whose range is 1.0 or less counts as silent and is copied. The copy, which also serves
+ * when memory is short, takes from @p second all samples that are missing, whatever @p second_count
+ * says: unless
  * @p second is null it must then hold @p output_length less those used of @p first.
  *
  * @param first, second  Pieces, oldest first. A null piece counts as no samples.
@@ -163,7 +168,7 @@ KZ_API kz_status hist_eq_dual(const float* first, uint32_t first_count, const fl
                               uint32_t second_count, float* output, uint32_t output_length,
                               uint32_t* histogram, uint32_t levels) KZ_NOEXCEPT;
 
-/* ---- Frame manager ------------------------------------------------------------------------------- */
+/* ---- Frame manager --------------------------------------------------------------------------- */
 
 /** What is kept of one frame. */
 typedef struct QVFrameRecord {
@@ -174,52 +179,54 @@ typedef struct QVFrameRecord {
 
 /** Turns frames into band features and these into the fingerprint. Read it, do not change it. */
 typedef struct QVFM {
-    uint32_t skip_frames;
-    uint32_t frame_limit; /**< 0 for no limit */
-    uint32_t fingerprint_scale;
-    uint32_t skip_remaining;
-    uint32_t frame_count;   /**< records in the list */
-    QVFrameRecord* records; /**< owned list, oldest first */
-    QVFrameRecord** records_tail;
-    uint32_t frame_length; /**< N */
-    float* frame_buffer;   /**< owned; N samples, then their transform */
-    KZDSP_DCT* dct;        /**< owned; N points */
-    float bin_width;       /**< hertz */
-    uint32_t band_table_count;
-    float* band_table; /**< owned; pairs of band edges in hertz */
-    uint32_t band_count;
-    uint32_t histogram_levels;  /**< K; 0 for no equalisation */
-    uint32_t* histogram;        /**< owned; K counters, or null */
-    int16_t* fingerprint;       /**< owned; two values per band */
-    uint32_t fingerprint_ready; /**< `fingerprint` matches the list */
+    uint32_t skip_frames;         /**< as configured */
+    uint32_t frame_limit;         /**< as configured; 0 for no limit */
+    uint32_t fingerprint_scale;   /**< as configured */
+    uint32_t skip_remaining;      /**< frames that are still to be dropped */
+    uint32_t frame_count;         /**< records in the list */
+    QVFrameRecord* records;       /**< owned list, oldest first */
+    QVFrameRecord** records_tail; /**< the link that the next record goes into */
+    uint32_t frame_length;        /**< N, in samples */
+    float* frame_buffer;          /**< owned; N samples, then their transform */
+    KZDSP_DCT* dct;               /**< owned; N points */
+    float bin_width;              /**< hertz */
+    uint32_t band_table_count;    /**< entries of band_table */
+    float* band_table;            /**< owned; pairs of band edges in hertz */
+    uint32_t band_count;          /**< pairs in band_table */
+    uint32_t histogram_levels;    /**< K; 0 for no equalisation */
+    uint32_t* histogram;          /**< owned; K counters, or null */
+    int16_t* fingerprint;         /**< owned; two values per band */
+    uint32_t fingerprint_ready;   /**< `fingerprint` matches the list */
 } QVFM;
 
 /**
  * Makes a frame manager.
  *
  * @param config  Only read during the call. frame_length_log2 may be 1 to 29.
- * @return The manager, which the caller frees with QVFM_Destroy(); null when @p config is null, any part
- *         cannot be made or memory is short.
+ * @return The manager, which the caller frees with QVFM_Destroy(); null when @p config is null, any
+ *         part cannot be made or memory is short.
  */
 KZ_API QVFM* QVFM_Create(const QVConfig* config) KZ_NOEXCEPT;
 
 /** Frees a manager with all it owns; null is ignored. Returns 0. */
 KZ_API kz_status QVFM_Destroy(QVFM* manager) KZ_NOEXCEPT;
 
-/** Drops all records and starts anew, with the configured frames to skip. Null is ignored. Returns 0. */
+/** Drops all records and starts anew, with the configured frames to skip. Null is ignored. Returns
+ * 0. */
 KZ_API kz_status QVFM_Reset(QVFM* manager) KZ_NOEXCEPT;
 
 /**
  * Analyses one frame, given in two pieces: the end of a ring buffer and its beginning.
  *
- * The frame is dropped while frames are to be skipped, when the limit is reached, and when memory for
- * its record is short. Pieces longer than a frame are cut. Pieces shorter than a frame leave the rest
- * of the buffer as it was.
+ * The frame is dropped while frames are to be skipped, when the limit is reached, and when memory
+ * for its record is short. Pieces longer than a frame are cut. Pieces shorter than a frame leave
+ * the rest of the buffer as it was.
  *
- * Precondition: with equalisation on, @p second holds all samples of a frame that @p first does not,
- * whatever @p second_count says (see hist_eq_dual()).
+ * Precondition: with equalisation on, @p second holds all samples of a frame that @p first does
+ * not, whatever @p second_count says (see hist_eq_dual()).
  *
- * @param first, second  Pieces, oldest first. A null piece counts as none; two null pieces are no frame.
+ * @param first, second  Pieces, oldest first. A null piece counts as none; two null pieces are no
+ *                       frame.
  * @return 0 in every case.
  */
 KZ_API kz_status QVFM_AppendDualPCMData(QVFM* manager, const float* first, uint32_t first_count,
@@ -246,8 +253,8 @@ KZ_API uint32_t QVFM_GetPercentProgress(const QVFM* manager) KZ_NOEXCEPT;
 KZ_API uint32_t QVFM_GetFingerprintSize(const QVFM* manager) KZ_NOEXCEPT;
 
 /**
- * Condenses all frames into the fingerprint, as kzqvfixed_frame_manager_get_fingerprint() does. Shares
- * that are not numbers, as from silence, a single frame or foreign data, are 0.
+ * Condenses all frames into the fingerprint, as kzqvfixed_frame_manager_get_fingerprint() does.
+ * Shares that are not numbers, as from silence, a single frame or foreign data, are 0.
  *
  * @param destination  Room for @p capacity bytes, at any address.
  * @return Bytes written: the size, or 0 when a pointer is null, @p capacity is below the size, or
@@ -277,50 +284,50 @@ KZ_API uint32_t QVFM_GetFrameDataSize(const QVFM* manager) KZ_NOEXCEPT;
  * Writes the frame data of the current frames.
  *
  * @param destination  Room for @p capacity bytes, at any address.
- * @return Bytes written; 0 when a pointer is null, @p capacity is below the size, or the size does not
- *         fit 32 bits.
+ * @return Bytes written; 0 when a pointer is null, @p capacity is below the size, or the size does
+ *         not fit 32 bits.
  */
 KZ_API uint32_t QVFM_GetFrameData(const QVFM* manager, void* destination,
                                   uint32_t capacity) KZ_NOEXCEPT;
 
 /**
- * Appends frames given as frame data. Frames are skipped and limited as if they had been analysed here;
- * their numbers are taken as they are, whatever they are.
+ * Appends frames given as frame data. Frames are skipped and limited as if they had been analysed
+ * here; their numbers are taken as they are, whatever they are.
  *
  * Note the sense of the result, against that of the other functions.
  *
  * @param data  @p size bytes, at any address.
- * @return 1 when the data was accepted, even if every frame was then dropped. 0, and nothing appended, when
- *         a pointer is null, the data is not exactly one such block for this number of bands, it has
- *         frames without bands, or memory is short.
+ * @return 1 when the data was accepted, even if every frame was then dropped. 0, and nothing
+ *         appended, when a pointer is null, the data is not exactly one such block for this number
+ *         of bands, it has frames without bands, or memory is short.
  */
 KZ_API uint32_t QVFM_AppendFrameData(QVFM* manager, const void* data, uint32_t size) KZ_NOEXCEPT;
 
-/* ---- Fingerprinter ------------------------------------------------------------------------------- */
+/* ---- Fingerprinter --------------------------------------------------------------------------- */
 
 /** Samples that are converted at a time. */
 #define QVFP_CONVERSION_SAMPLES 4096
 
 /** A fingerprint in the making: row 2 of the extraction interface. Read it, do not change it. */
 typedef struct QVFP {
-    uint32_t channel_count;
-    uint32_t input_rate;        /**< hertz */
-    uint32_t input_format;      /**< 1 8-bit PCM, 2 16-bit PCM, 3 A-law, 4 mu-law */
-    uint32_t frame_bytes;       /**< of one sample of every channel */
-    float working_rate;         /**< hertz */
-    KZDSP_resampler* resampler; /**< owned */
-    QVFM* frame_manager;        /**< owned */
-    uint32_t frame_limit;       /**< while not 0, only a complete fingerprint is given out */
-    uint8_t searching_for_signal;
-    uint32_t signal_search_enabled;
-    uint32_t signal_offset; /**< working-rate samples dropped as leading silence */
-    QVSD* signal_detector;  /**< owned */
+    uint32_t channel_count;         /**< 1 or 2 */
+    uint32_t input_rate;            /**< hertz */
+    uint32_t input_format;          /**< 1 8-bit PCM, 2 16-bit PCM, 3 A-law, 4 mu-law */
+    uint32_t frame_bytes;           /**< of one sample of every channel */
+    float working_rate;             /**< hertz */
+    KZDSP_resampler* resampler;     /**< owned */
+    QVFM* frame_manager;            /**< owned */
+    uint32_t frame_limit;           /**< while not 0, only a complete fingerprint is given out */
+    uint8_t searching_for_signal;   /**< 1 while leading silence is being skipped */
+    uint32_t signal_search_enabled; /**< as configured */
+    uint32_t signal_offset;         /**< working-rate samples dropped as leading silence */
+    QVSD* signal_detector;          /**< owned */
     float conversion_buffer[QVFP_CONVERSION_SAMPLES]; /**< one chunk, mono */
-    uint32_t frame_length;
+    uint32_t frame_length;                            /**< in samples */
     uint32_t frame_start;    /**< ring index of the next frame's first sample */
     uint32_t write_position; /**< ring index of the next sample to store */
     float* ring;             /**< owned; frame_length samples */
-    uint32_t hop;
+    uint32_t hop;            /**< samples from one frame start to the next */
 } QVFP;
 
 /**
@@ -330,8 +337,8 @@ typedef struct QVFP {
  * @param sample_rate  Hertz: any whose ratio to 11025 KZDSP_CreateResampler() takes.
  * @param format       1 8-bit PCM, 2 16-bit PCM, 3 A-law, 4 mu-law.
  * @param channels     1 or 2.
- * @param[out] out_object  The fingerprinter, which the caller frees with QVFP_Destructor(); untouched
- *                     on failure.
+ * @param[out] out_object  The fingerprinter, which the caller frees with QVFP_Destructor();
+ *                         untouched on failure.
  * @return 0; 0x900f0004 for a rate of 0, a bad format or channel count, or a null pointer;
  *         0x900f0001 for a rate that the resampler refuses or when memory is short.
  */
@@ -355,8 +362,8 @@ KZ_API kz_status QVFP_AddSamples(QVFP* object, const void* bytes, uint32_t byte_
 /**
  * Builds the query document of a complete fingerprint.
  *
- * @param[out] out_tree  The document's root, which the caller frees with DisposeXMLTag(); untouched on
- *                       failure.
+ * @param[out] out_tree  The document's root, which the caller frees with DisposeXMLTag(); untouched
+ *                       on failure.
  * @return 0; 0x900f0004 for a null pointer; 0x900f0961 when the fingerprint is not complete;
  *         0x900f0001 when memory is short.
  */

@@ -43,7 +43,8 @@ constexpr const char* entity_for(char byte) noexcept
 }
 
 /// Writes a tree into a buffer. Appending goes on until something fails; the status then stays, and
-/// later appends do nothing, until an indentation that always runs puts its own status in the place.
+/// later appends do nothing, until an indentation that always runs puts its own status in the
+/// place.
 class Renderer {
 public:
     Renderer(kz_dyn_buf& buffer, bool indent, bool newlines) noexcept

@@ -33,8 +33,8 @@ inline owned<char> copy_of(Text text) noexcept
     return owned<char>(kz_makestr(text.bytes, text.count));
 }
 
-/// Stores a text, or none, in the place of an owned one. The copy was made before the old text goes,
-/// so it may have been made of it.
+/// Stores a text, or none, in the place of an owned one. The copy was made before the old text
+/// goes, so it may have been made of it.
 inline void replace(char*& stored, owned<char> text) noexcept
 {
     const owned<char> old(stored);

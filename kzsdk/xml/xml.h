@@ -31,8 +31,8 @@
  *
  *   - disposing of, cloning, mutating, copying, comparing and rendering visit each tag once (a copy
  *     of a tag with n attributes takes n squared steps for these);
- *   - counting, finding by name, index or path, adding, removing and setting an attribute take up to
- *     n steps each. Building n sub-tags with AddXMLSubTag(), or going through them by index, takes n
+ *   - counting, finding by name, index or path, adding, removing and setting an attribute take up
+ * to n steps each. Building n sub-tags with AddXMLSubTag(), or going through them by index, takes n
  *     squared: go on with GetXMLSiblingTag(), which takes one.
  *
  * Status codes: 0x90020001 memory is short, 0x90020002 not found, 0x90020004 invalid argument. A
@@ -65,7 +65,8 @@ typedef struct XMLTag {
     struct XMLTag* next_sibling; /**< next under the same parent, whose list owns it */
 } XMLTag;
 
-/* ---- Making, copying and disposing ------------------------------------------------------------ */
+/* ---- Making, copying and disposing ------------------------------------------------------------
+ */
 
 /** Makes a tag with nothing in it, no name either. The caller disposes of it. */
 KZ_API XMLTag* CreateEmptyXMLTag(void) KZ_NOEXCEPT;
@@ -124,7 +125,8 @@ KZ_API kz_status DisposeXMLTag(XMLTag* tag) KZ_NOEXCEPT;
  */
 KZ_API kz_status SmartDisposeXMLTag(XMLTag** tag) KZ_NOEXCEPT;
 
-/* ---- Attributes ------------------------------------------------------------------------------- */
+/* ---- Attributes -------------------------------------------------------------------------------
+ */
 
 /** Number of attributes; 0 for null. */
 KZ_API uint32_t GetXMLTagAttrCount(const XMLTag* tag) KZ_NOEXCEPT;
@@ -164,7 +166,8 @@ KZ_API kz_status SetXMLTagAttrFromInt(XMLTag* tag, const char* name, int32_t val
 /** SetXMLTagAttrFromStr() with a number in decimal. */
 KZ_API kz_status SetXMLTagAttrFromUInt(XMLTag* tag, const char* name, uint32_t value) KZ_NOEXCEPT;
 
-/* ---- Sub-tags --------------------------------------------------------------------------------- */
+/* ---- Sub-tags ---------------------------------------------------------------------------------
+ */
 
 /** Number of sub-tags; 0 for null. */
 KZ_API uint32_t GetXMLSubTagCount(const XMLTag* tag) KZ_NOEXCEPT;
@@ -220,7 +223,8 @@ KZ_API kz_status AddXMLSubTag(XMLTag* parent, XMLTag* child) KZ_NOEXCEPT;
  */
 KZ_API kz_status RemoveXMLSubTag(XMLTag* parent, XMLTag* child, uint8_t dispose) KZ_NOEXCEPT;
 
-/* ---- Name and data ---------------------------------------------------------------------------- */
+/* ---- Name and data ----------------------------------------------------------------------------
+ */
 
 /** Data of a tag; null when it has none, or for null. */
 KZ_API const char* GetXMLTagData(const XMLTag* tag) KZ_NOEXCEPT;
@@ -257,8 +261,9 @@ KZ_API kz_status SetXMLTagNameFromStr(XMLTag* tag, const char* name) KZ_NOEXCEPT
  *   GetXMLSubTagFromPath     a sub-tag of the tag    matches nothing      a sub-tag
  *   GetXMLSubTagData         a sub-tag of the tag    matches nothing      a sub-tag
  *   SetXMLSubTagDataFromStr  a sub-tag of the tag    is refused           a sub-tag
- *   XMLGetDataAtPath         the tag's own name      any number skipped   an attribute, else a sub-tag
- *   XMLSetValueAtPath        a sub-tag of the tag    one skipped          what the resolver says
+ *   XMLGetDataAtPath         the tag's own name      any number skipped   an attribute, else a
+ * sub-tag XMLSetValueAtPath        a sub-tag of the tag    one skipped          what the resolver
+ * says
  */
 
 /**
@@ -343,12 +348,13 @@ typedef int32_t (*XMLPathResolver)(XMLTag* tag, const char* segment, uint32_t le
 KZ_API int32_t XMLSetValueAtPath(XMLTag* tag, const char* path, const char* value,
                                  uintptr_t context, XMLPathResolver resolver) KZ_NOEXCEPT;
 
-/* ---- Comparing and mapping -------------------------------------------------------------------- */
+/* ---- Comparing and mapping --------------------------------------------------------------------
+ */
 
 /**
- * Tells whether two trees are the same: name, data, attributes in their order, and sub-tags in their
- * order, all the way down. What is missing (a name, data) equals only what is missing too. The
- * siblings of the two tags do not count.
+ * Tells whether two trees are the same: name, data, attributes in their order, and sub-tags in
+ * their order, all the way down. What is missing (a name, data) equals only what is missing too.
+ * The siblings of the two tags do not count.
  *
  * @return 1 when they are equal, or both null; else 0. 0 also when memory for the way back up runs
  *         out, which can happen only with more than 32 levels that are equal so far.
@@ -395,8 +401,8 @@ typedef const char* (*XMLMapAttrValue)(const char* tag_name, const char* attr_na
 /**
  * Copies a tag as the three maps say.
  *
- * Attributes are set one by one, in order: of two that get the same name the later stays, at the end
- * of the list, and if that has no value, neither stays.
+ * Attributes are set one by one, in order: of two that get the same name the later stays, at the
+ * end of the list, and if that has no value, neither stays.
  *
  * A sub-tag that is refused, or for which memory is short, is left out with all below it and does
  * not fail the copy. So a copy that is there may be incomplete: CloneXMLTag() fails as a whole.
@@ -416,14 +422,15 @@ KZ_API kz_status SetMapXMLAttrName(XMLMapAttrName function) KZ_NOEXCEPT;
 /** Installs a map for the process. Null is ignored. @return 0. */
 KZ_API kz_status SetMapXMLAttrValue(XMLMapAttrValue function) KZ_NOEXCEPT;
 
-/* ---- Rendering -------------------------------------------------------------------------------- */
+/* ---- Rendering --------------------------------------------------------------------------------
+ */
 
 /**
  * Renders a tag and all below it as text.
  *
  * Every element has a start tag and an end tag; attributes stand in double quotes, in list order. A
- * tag with data and no sub-tags takes one line; with sub-tags its data comes first, on a line of its
- * own. In data and values `<`, `>`, `&`, `'` and `"` are written as entities.
+ * tag with data and no sub-tags takes one line; with sub-tags its data comes first, on a line of
+ * its own. In data and values `<`, `>`, `&`, `'` and `"` are written as entities.
  *
  * With @p indent on, a failure inside an element (memory, or a sub-tag without a name) is forgotten
  * when the element's own end tag is indented: the text is then malformed but not null. Where that

@@ -1,5 +1,5 @@
-// Callers compiled long ago read these records in place: the fields stay in their order, each at the
-// next offset that its type allows, with nothing in between and nothing behind.
+// Callers compiled long ago read these records in place: the fields stay in their order, each at
+// the next offset that its type allows, with nothing in between and nothing behind.
 
 #include <cstddef>
 #include <cstdint>

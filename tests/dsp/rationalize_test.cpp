@@ -175,8 +175,8 @@ TEST(Rationalize, RandomFractionsAreMetToTheTolerance)
     }
 }
 
-// The nearest-integer terms, in whole numbers: the convergents of p / q by Euclid's division with the
-// remainder of least magnitude. The first that meets the tolerance is the answer.
+// The nearest-integer terms, in whole numbers: the convergents of p / q by Euclid's division with
+// the remainder of least magnitude. The first that meets the tolerance is the answer.
 TEST(Rationalize, AgreesWithConvergentsInExactArithmetic)
 {
     Random random(3);
@@ -224,8 +224,8 @@ TEST(Rationalize, AgreesWithConvergentsInExactArithmetic)
     EXPECT_GT(compared, 50000);
 }
 
-// Whatever the rates, the tolerance of a millionth keeps both factors below a million or so: filters
-// stay within some 90 MB.
+// Whatever the rates, the tolerance of a millionth keeps both factors below a million or so:
+// filters stay within some 90 MB.
 TEST(Rationalize, WholeRatesUpToAGigahertzHaveFactorsWithinTheBound)
 {
     const auto check = [](uint32_t rate) {

@@ -42,8 +42,8 @@ Words random_words(size_t count, int bits, uint64_t seed)
     return words;
 }
 
-// Every output computed on its own from the whole stream, with exact products rounded one by one: the
-// rule for windows that reach across a cut.
+// Every output computed on its own from the whole stream, with exact products rounded one by one:
+// the rule for windows that reach across a cut.
 Words exact_outputs(uint32_t rate, const Words& input)
 {
     const auto r = make(rate);
@@ -155,7 +155,8 @@ TEST_F(ResamplerFixed, AcrossCutsProductsAreExact)
     }
 }
 
-// Loud down-mixed stereo leaves 32 bits in the sum of cross products. The wrap is part of the output.
+// Loud down-mixed stereo leaves 32 bits in the sum of cross products. The wrap is part of the
+// output.
 TEST_F(ResamplerFixed, LoudStereoWrapsTheCrossProducts)
 {
     const auto tone = sine(44100, 60, 1.0, 1.0);
@@ -225,6 +226,26 @@ TEST(DualConvolveFixed, AddsBitsOfExactProducts)
                       dual(samples, first_count, msb, lsb, stride, shift));
         }
     }
+}
+
+// The shift follows the rule of all fixed-point shifts: 32 exchanges high word for low word, more
+// loses both, and counts are taken modulo 256.
+TEST(DualConvolveFixed, ShiftsBeyond31FollowTheShiftRule)
+{
+    const Words samples = {0x12345678, 0x76543210};
+    const std::vector<int16_t> msb = {0x1357, -0x2468};
+    const std::vector<uint16_t> lsb = {0x9bdf, 0xace0};
+    const auto at = [&](int32_t shift) { return dual(samples, 1, msb, lsb, 1, shift); };
+    uint32_t low_words = 0;
+    for (size_t k = 0; k < 2; ++k) {
+        const int64_t tap = msb[k] * 65536LL + lsb[k];
+        low_words += static_cast<uint32_t>(static_cast<uint64_t>(tap * samples[1 - k]));
+    }
+    EXPECT_EQ(static_cast<int32_t>(low_words), at(32));
+    EXPECT_EQ(0, at(33));
+    EXPECT_EQ(0, at(100));
+    EXPECT_EQ(at(0), at(256));
+    EXPECT_EQ(at(1), at(257));
 }
 
 TEST(DualConvolveFixed, WhereTheRunsMeetDoesNotShow)

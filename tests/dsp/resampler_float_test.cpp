@@ -238,8 +238,8 @@ constexpr float kManyRates[][2] = {
     {11025.5F, 11025},
 };
 
-// Counted anew from the words of the header: zeros so that the centre of the filter falls on a sample
-// of the output, or as many as there are steps too many.
+// Counted anew from the words of the header: zeros so that the centre of the filter falls on a
+// sample of the output, or as many as there are steps too many.
 uint64_t expected_leading(uint64_t up, uint64_t down)
 {
     if (down > up) {
@@ -417,7 +417,8 @@ TEST_F(ResamplerFloat, NansPassThroughWithTheirWindow)
     }
 }
 
-// Half a filter in whole outputs is half a window at most, so a history of one window always holds it.
+// Half a filter in whole outputs is half a window at most, so a history of one window always holds
+// it.
 TEST_F(ResamplerFloat, TheZerosAtTheStartFitTheHistoryAtAnyRatio)
 {
     for (uint32_t up = 1; up < 130; ++up) {
@@ -434,8 +435,8 @@ TEST_F(ResamplerFloat, TheZerosAtTheStartFitTheHistoryAtAnyRatio)
     }
 }
 
-// Any two rates, in any blocks: nothing is read or written beyond its array (the sanitizers look on),
-// and every output is the stated sum.
+// Any two rates, in any blocks: nothing is read or written beyond its array (the sanitizers look
+// on), and every output is the stated sum.
 TEST_F(ResamplerFloat, RandomRatesAreSafeAndExact)
 {
     Random random(5);

@@ -88,8 +88,8 @@ size_t expected_outputs(const typename Twin::Record& r, size_t inputs)
 }
 
 /// Resamples a stream in blocks and capacities that `next_block` and `next_capacity` choose. Every
-/// block is handed over in arrays of its own, just as long as they are said to be, so that an access
-/// beyond them is seen.
+/// block is handed over in arrays of its own, just as long as they are said to be, so that an
+/// access beyond them is seen.
 template <class Twin, class NextBlock, class NextCapacity>
 Stream<Twin> resample_in_pieces(typename Twin::Record& r, const Stream<Twin>& input,
                                 NextBlock next_block, NextCapacity next_capacity)

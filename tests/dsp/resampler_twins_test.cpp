@@ -193,8 +193,8 @@ TYPED_TEST(Resampler, NeverAllocatesAfterItsCreation)
     }
 }
 
-// The phase advances before the taps are read and the window moves after, which shakes the time of an
-// output by up to one input sample. What that costs, at 1 kHz:
+// The phase advances before the taps are read and the window moves after, which shakes the time of
+// an output by up to one input sample. What that costs, at 1 kHz:
 TYPED_TEST(Resampler, PolyphaseOutputsAreUpToOneInputSampleOff)
 {
     const auto residue = [](uint32_t rate) {

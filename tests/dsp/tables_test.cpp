@@ -1,5 +1,5 @@
-/// Every word of the generated tables, pinned. The tables must not depend on the machine that builds
-/// them; the laws that they obey are tested where they are used.
+/// Every word of the generated tables, pinned. The tables must not depend on the machine that
+/// builds them; the laws that they obey are tested where they are used.
 
 #include "kzsdk/dsp/tables.hpp"
 

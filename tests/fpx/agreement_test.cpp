@@ -1,5 +1,5 @@
-/// How far the two algorithms' fingerprints of the same sound lie apart. docs/numbers.md holds the table
-/// that this program prints.
+/// How far the two algorithms' fingerprints of the same sound lie apart. docs/numbers.md holds the
+/// table that this program prints.
 
 #include <algorithm>
 #include <array>
@@ -98,7 +98,8 @@ struct Bound {
     int largest;
 };
 constexpr Bound kMusic{8, 120};
-// Noise reaches beyond 2660 Hz, where the fixed-point path does not make up for its decimator's loss.
+// Noise reaches beyond 2660 Hz, where the fixed-point path does not make up for its decimator's
+// loss.
 constexpr Bound kNoise{30, 470};
 
 void expect_within(const Bound& bound, const Distance& distance, uint32_t rate)

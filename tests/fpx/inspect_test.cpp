@@ -64,7 +64,8 @@ void expect_same_words(const Object& a, const Object& b, uint32_t rate)
     EXPECT_EQ(ra == nullptr, rb == nullptr) << rate;
 }
 
-// Feeds what the interface asks for, block by block, up to the end of the music or of the fingerprint.
+// Feeds what the interface asks for, block by block, up to the end of the music or of the
+// fingerprint.
 template <class Twin>
 bool feed_blocks(Handle<Twin>& handle, const std::vector<int16_t>& music, size_t from,
                  size_t frames)
@@ -101,8 +102,8 @@ class Inspect : public TwinTest<T> {
 };
 TYPED_TEST_SUITE(Inspect, Twins, TwinNames);
 
-// The promise that lets a file be streamed: not only the document, every working-rate sample and every
-// feature must be the same word as from one call.
+// The promise that lets a file be streamed: not only the document, every working-rate sample and
+// every feature must be the same word as from one call.
 TYPED_TEST(Inspect, FeedingBlockByBlockGivesTheSameWordsAsOneCall)
 {
     for (const uint32_t rate : rates<TypeParam>()) {
@@ -120,8 +121,8 @@ TYPED_TEST(Inspect, FeedingBlockByBlockGivesTheSameWordsAsOneCall)
     }
 }
 
-// The same from any state that odd pieces leave behind, the states included in which the last sample of
-// room needs no input of its own.
+// The same from any state that odd pieces leave behind, the states included in which the last
+// sample of room needs no input of its own.
 TYPED_TEST(Inspect, TheNextBlockIsExactFromAnyState)
 {
     std::vector<uint32_t> some{8000, 48000, 22050, 11025};
@@ -144,9 +145,9 @@ TYPED_TEST(Inspect, TheNextBlockIsExactFromAnyState)
     }
 }
 
-// When upsampling, a step can make a sample without taking any input: when one sample of room is left just
-// after the room before was filled. (A signal found one sample into a full ring gets there.) The feed
-// must go on, not end, and the block to feed next is that of the step after.
+// When upsampling, a step can make a sample without taking any input: when one sample of room is
+// left just after the room before was filled. (A signal found one sample into a full ring gets
+// there.) The feed must go on, not end, and the block to feed next is that of the step after.
 TYPED_TEST(Inspect, AStepThatOnlyProducesDoesNotEndTheFeed)
 {
     const auto music = noise(8000 * 15, 0.5, 1);

@@ -1,9 +1,10 @@
-// Prints one line for each piece of sound, rate, format and algorithm: what it is, and a digest of its
-// document. Given a file of such lines, prints the lines that differ instead, and fails if there are any.
+// Prints one line for each piece of sound, rate, format and algorithm: what it is, and a digest of
+// its document. Given a file of such lines, prints the lines that differ instead, and fails if
+// there are any.
 //
 // The sound is made with integers only and the digests are of text, so a difference comes from the
-// library. Two kinds of lines stand for what rests on the C library's sine and cosine: the factors of the
-// floating-point transform and the taps of designed filters.
+// library. Two kinds of lines stand for what rests on the C library's sine and cosine: the factors
+// of the floating-point transform and the taps of designed filters.
 
 #include <algorithm>
 #include <array>
@@ -74,7 +75,8 @@ private:
     uint64_t state_;
 };
 
-// An arch for each half of the turn: near a sine, with some odd harmonics. Q15 from a phase of 32 bits.
+// An arch for each half of the turn: near a sine, with some odd harmonics. Q15 from a phase of 32
+// bits.
 int32_t arch_wave(uint32_t phase)
 {
     const auto x = static_cast<int64_t>(phase >> 16) - 32768;

@@ -243,7 +243,8 @@ TEST(KzfpInput, TheFloatingPointAlgorithmTakesAnyRateAsItIs)
         EXPECT_EQ("float", object["algorithm"]);
         const auto values = object["values"].get<std::vector<int>>();
         for (size_t i = 0; i < reference.size(); ++i) {
-            // Polyphase outputs lie up to one input sample beside their time: as far apart as 48000 Hz.
+            // Polyphase outputs lie up to one input sample beside their time: as far apart as 48000
+            // Hz.
             EXPECT_NEAR(reference[i], values.at(i), 90) << file << ", value " << i;
         }
     }
@@ -254,6 +255,14 @@ TEST(KzfpInput, HeaderlessSamplesGiveTheDocumentOfTheirFile)
 {
     EXPECT_EQ(output_of({clip("music-44100-mono-s16.wav")}),
               output_of({"--raw", "44100,1,s16", clip("music-44100-mono.s16")}));
+}
+
+TEST(KzfpInput, AStartBeyondTheEndOfHeaderlessSamplesIsTold)
+{
+    const std::string file = clip("music-44100-mono.s16");
+    const ProcessResult result = kzfp({"--raw", "44100,1,s16", "--start", "500", file});
+    EXPECT_EQ(1, result.status);
+    EXPECT_TRUE(contains(result.err, ", before the start at 500.0 s")) << result.err;
 }
 
 TEST(KzfpInput, StandardInputIsReadAsAFileIs)

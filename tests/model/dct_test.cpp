@@ -93,8 +93,8 @@ TEST_F(ModelDct, DoubleTransformIsTheDefinition)
     }
 }
 
-// Products are rounded down, and the recursive additions gather that: bin 1 ends up low by L/2, bins
-// 2, 4 and 8 by half as much each. Upwards only the factors' single precision counts.
+// Products are rounded down, and the recursive additions gather that: bin 1 ends up low by L/2,
+// bins 2, 4 and 8 by half as much each. Upwards only the factors' single precision counts.
 TEST_F(ModelDct, LibraryStaysWithinItsRoundingOfTheDefinition)
 {
     for (const int order : {14, 15}) {

@@ -22,8 +22,8 @@ public:
 
     void reset() { primed_ = false; }
 
-    /// Index in `block` at which signal begins, or its size. Samples are scaled by 2^-shift, towards
-    /// zero.
+    /// Index in `block` at which signal begins, or its size. Samples are scaled by 2^-shift,
+    /// towards zero.
     size_t offset_in(std::span<const int32_t> block, uint32_t shift)
     {
         const auto scaled = [shift](int32_t sample) {

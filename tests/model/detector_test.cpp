@@ -94,7 +94,8 @@ TEST_F(ModelDetector, LibraryAgreesAtEveryShift)
     }
 }
 
-// Levels of a few units and low thresholds: here it shows that samples and means are cut towards zero.
+// Levels of a few units and low thresholds: here it shows that samples and means are cut towards
+// zero.
 TEST_F(ModelDetector, LibraryAgreesOnTheSmallestLevels)
 {
     kz::test::Random random(2);

@@ -11,7 +11,8 @@
 
 namespace kz::model {
 
-/// The level of every sample, 0..levels - 1: a sample's share of the range, by a rounded reciprocal.
+/// The level of every sample, 0..levels - 1: a sample's share of the range, by a rounded
+/// reciprocal.
 inline std::vector<uint32_t> levels_of(std::span<const int32_t> samples, uint32_t levels)
 {
     const auto [lowest, highest] = std::minmax_element(samples.begin(), samples.end());

@@ -27,7 +27,8 @@ Signal resample(const Ratio& ratio, std::span<const double> signal);
 /// The size of the signal when it is silent.
 size_t signal_start(std::span<const double> signal);
 
-/// Every sample becomes 32768 times the number of samples of its own and lower levels, less the mean.
+/// Every sample becomes 32768 times the number of samples of its own and lower levels, less the
+/// mean.
 Signal equalise(std::span<const double> frame);
 
 /// Half the samples; the filter sees zeros on either side of the frame.

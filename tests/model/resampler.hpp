@@ -1,12 +1,12 @@
 /// @file
 /// Rational resampling as one formula over the whole stream.
 ///
-/// The stream is everything fed so far behind `preroll` zeros. Output n is formed from the P samples
-/// that start at floor(n * down / up) and the taps of phase ((n + 1) * down) mod up: the phase is
-/// one step ahead of the window. Nothing else of the past counts, except one thing: which samples
-/// arrived in earlier calls. A window that reaches back to them is summed with exact products, a
-/// window inside the samples of the present call with products of 16-bit halves that leave out the
-/// product of the low halves.
+/// The stream is everything fed so far behind `preroll` zeros. Output n is formed from the P
+/// samples that start at floor(n * down / up) and the taps of phase ((n + 1) * down) mod up: the
+/// phase is one step ahead of the window. Nothing else of the past counts, except one thing: which
+/// samples arrived in earlier calls. A window that reaches back to them is summed with exact
+/// products, a window inside the samples of the present call with products of 16-bit halves that
+/// leave out the product of the low halves.
 #pragma once
 
 #include <algorithm>

@@ -14,7 +14,8 @@ namespace kz::model {
 
 using Values = std::array<int16_t, 2 * kBands>;
 
-/// Each value's share of the sum of all, 32768 for the whole; 0 for every one when the sum is small.
+/// Each value's share of the sum of all, 32768 for the whole; 0 for every one when the sum is
+/// small.
 inline void store_shares(std::span<const uint32_t, kBands> values,
                          std::span<int16_t, kBands> shares)
 {

@@ -1,5 +1,5 @@
-// The stream inside the fingerprinter, to the word: the ring of resampled samples, its positions and
-// the features of every frame, however the bytes are cut.
+// The stream inside the fingerprinter, to the word: the ring of resampled samples, its positions
+// and the features of every frame, however the bytes are cut.
 #include "model/fingerprint.hpp"
 
 #include <algorithm>

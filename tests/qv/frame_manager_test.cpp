@@ -254,8 +254,8 @@ TYPED_TEST(FrameManager, CreateSurvivesEveryFailedAllocation)
     });
 }
 
-// Short of memory a frame is lost when its record cannot be made, and copied instead of equalised when
-// the equaliser's table cannot.
+// Short of memory a frame is lost when its record cannot be made, and copied instead of equalised
+// when the equaliser's table cannot.
 TYPED_TEST(FrameManager, AppendSurvivesEveryFailedAllocation)
 {
     const auto frame = tune_frame<TypeParam>(0);

@@ -97,8 +97,8 @@ TEST_F(QueryDocument, ARefusalPassesThroughUnchanged)
     EXPECT_EQ("900f0961", text_of({{1, 2}, KZ_QV_ERROR_INCOMPLETE}));
 }
 
-// A failure while name or version are set is forgotten when the query succeeds: then a document without
-// one of them is handed out as good. Every other failure is reported.
+// A failure while name or version are set is forgotten when the query succeeds: then a document
+// without one of them is handed out as good. Every other failure is reported.
 TEST_F(QueryDocument, EveryFailedAllocationIsReportedButTwo)
 {
     const Fingerprint fingerprint{{1, 2, 3}};

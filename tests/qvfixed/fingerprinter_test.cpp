@@ -40,8 +40,8 @@ TEST_F(FixedFingerprinter, KeepsTheWorkingRateWithTwelveFractionBits)
     EXPECT_EQ(45158400U, make_fingerprinter<Fixed>(44100, kPcm16, 2)->working_rate);
 }
 
-// At rates other than 11025 Hz a cut may move a working-rate sample by the resampler's bound, never drop
-// or repeat one: every rate reaches the same number of samples, and they stay that close.
+// At rates other than 11025 Hz a cut may move a working-rate sample by the resampler's bound, never
+// drop or repeat one: every rate reaches the same number of samples, and they stay that close.
 TEST_F(FixedFingerprinter, CutsLoseNoSampleAtAnyRate)
 {
     for (const uint32_t rate : {8000U, 16000U, 22050U, 24000U, 32000U, 44100U, 48000U}) {

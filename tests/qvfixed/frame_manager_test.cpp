@@ -112,8 +112,8 @@ TEST_F(FixedFrameManager, AShareOfTheWholeIsStoredAsMinus32768)
 
 TEST_F(FixedFrameManager, TwelveFramesAreAveragedExactly)
 {
-    // The mean of the energies e_i, quartered, times four, is exact for twelve frames, so a constant
-    // energy comes back as its own root: equal energies in all bands give equal shares.
+    // The mean of the energies e_i, quartered, times four, is exact for twelve frames, so a
+    // constant energy comes back as its own root: equal energies in all bands give equal shares.
     const auto manager = with_features(12, [](size_t, size_t) { return Feature{3 << 26, 0}; });
     const auto values = fingerprint(*manager);
     // 15 equal roots r; the total is 15 (r >> 2); r / (total >> 16) >> 3.
@@ -122,6 +122,46 @@ TEST_F(FixedFrameManager, TwelveFramesAreAveragedExactly)
     const int32_t divisor = (15 * (root >> 2)) >> 16;
     for (size_t band = 0; band < 15; ++band) {
         EXPECT_EQ((root / divisor) >> 3, values[band]);
+    }
+}
+
+// The dropped shift of the reciprocal: averages are exact for 8 to 15 frames. Beyond, deviations
+// are taken from a wrong centre, so the spreads are not the standard deviations.
+TEST_F(FixedFrameManager, SpreadsAreStandardDeviationsForEightToFifteenFrames)
+{
+    const auto amplitude = [](size_t frame, size_t band) {
+        const auto b = static_cast<uint32_t>(band);
+        const uint32_t movement = (static_cast<uint32_t>(frame) * 7 + b * 3) % 8;
+        return ((40 + b) << 20) + (movement << 20) / (1 + b % 3);
+    };
+    for (size_t frames = 2; frames <= 20; ++frames) {
+        std::array<double, 15> spreads{};
+        for (size_t band = 0; band < 15; ++band) {
+            double sum = 0, squares = 0;
+            for (size_t i = 0; i < frames; ++i) {
+                sum += amplitude(i, band);
+            }
+            for (size_t i = 0; i < frames; ++i) {
+                const double d = amplitude(i, band) - sum / static_cast<double>(frames);
+                squares += d * d;
+            }
+            spreads[band] = std::sqrt(squares / static_cast<double>(frames - 1));
+        }
+        const double total = std::accumulate(spreads.begin(), spreads.end(), 0.0);
+        const auto manager = with_features(frames, [&](size_t frame, size_t band) {
+            return Feature{1 << 20, amplitude(frame, band)};
+        });
+        const auto values = fingerprint(*manager);
+        double furthest = 0;
+        for (size_t band = 0; band < 15; ++band) {
+            const double expected = 32768 * spreads[band] / total;
+            furthest = std::max(furthest, std::abs(values[15 + band] - expected));
+        }
+        if (frames >= 8 && frames <= 15) {
+            EXPECT_LT(furthest, 32) << frames;
+        } else {
+            EXPECT_GT(furthest, 100) << frames;
+        }
     }
 }
 

@@ -153,8 +153,8 @@ TEST_F(FloatEqualiser, NoLevelFallsOutsideForAnySamples)
     }
 }
 
-// The scale and the product are rounded, so the greatest sample may come out one level lower; K - 1 beyond
-// 24 bits is rounded too, and then it would come out one level above the last.
+// The scale and the product are rounded, so the greatest sample may come out one level lower; K - 1
+// beyond 24 bits is rounded too, and then it would come out one level above the last.
 TEST_F(FloatEqualiser, TheGreatestSampleIsOnTheLastLevelOrOneBelow)
 {
     Random random(2);

@@ -112,7 +112,8 @@ TEST_F(FloatFingerprinter, CutsDoNotShowAtAnyRate)
     }
 }
 
-// The product that wraps in the fixed twin beyond 4.29 million samples is taken in single precision.
+// The product that wraps in the fixed twin beyond 4.29 million samples is taken in single
+// precision.
 TEST_F(FloatFingerprinter, TimesStayRightBeyondTheWrapOfThirtyTwoBits)
 {
     const auto object = make_fingerprinter<Float>(11025, kPcm16, 1);

@@ -391,8 +391,8 @@ TEST_F(FrameExchange, FramesThatAreDroppedAreNotAllocated)
     EXPECT_EQ((Numbers{99}), numbers(manager));
 }
 
-// Blocks that were changed anywhere are refused or taken, never read beyond their end: each is copied into
-// a block of the heap of exactly its size, which the address sanitizer watches.
+// Blocks that were changed anywhere are refused or taken, never read beyond their end: each is
+// copied into a block of the heap of exactly its size, which the address sanitizer watches.
 TEST_F(FrameExchange, MutatedBlocksAreReadWithinTheirBounds)
 {
     Random random(77);

@@ -257,7 +257,8 @@ TEST_F(FloatFrameManager, AShareOfTheWholeIsStoredAsMinus32768)
 
 TEST_F(FloatFrameManager, MeansAndSpreadsAreSharesOfTheirSums)
 {
-    // Mean energies 1, 4, 9, ...: roots 1, 2, 3, ... of 120. Amplitudes band * {-1, 0, 1}: spreads 0, 1, 2,
+    // Mean energies 1, 4, 9, ...: roots 1, 2, 3, ... of 120. Amplitudes band * {-1, 0, 1}: spreads
+    // 0, 1, 2,
     // ... of 105.
     const auto manager = with_features(3, [](size_t frame, size_t band) {
         const auto number = static_cast<float>(band + 1);
@@ -285,8 +286,8 @@ TEST_F(FloatFrameManager, TheScaleIsTheConfigurations)
     }
 }
 
-// Foreign features may be anything. A share that is no number is 0; one beyond a whole saturates as a
-// 32-bit number and keeps its low 16 bits.
+// Foreign features may be anything. A share that is no number is 0; one beyond a whole saturates as
+// a 32-bit number and keeps its low 16 bits.
 TEST_F(FloatFrameManager, SharesThatAreNoNumbersAreZero)
 {
     const std::array<int16_t, 30> zeros{};

@@ -1,9 +1,9 @@
 /// @file
 /// Counts the blocks that the library holds and makes its n-th allocation fail.
 ///
-/// Test programs are linked with the heap functions wrapped (`ld --wrap`), so the library's own code
-/// is tested as it is shipped. Only calls from objects of the test program itself are seen: the
-/// library's, not those of the C++ run-time library.
+/// Test programs are linked with the heap functions wrapped (`ld --wrap`), so the library's own
+/// code is tested as it is shipped. Only calls from objects of the test program itself are seen:
+/// the library's, not those of the C++ run-time library.
 #pragma once
 
 #include <cstdint>
@@ -35,8 +35,8 @@ public:
 };
 
 /// Runs `attempt` with the first allocation failing, then only the second, and so on until a run
-/// meets no failure, then the same with all later ones failing too. `attempt(fired)` gets a function
-/// that tells whether the failure has struck. After each run no block may be left over.
+/// meets no failure, then the same with all later ones failing too. `attempt(fired)` gets a
+/// function that tells whether the failure has struck. After each run no block may be left over.
 template <class Attempt>
 void for_every_failed_allocation(Attempt attempt)
 {

@@ -26,9 +26,9 @@ private:
     uint64_t state_;
 };
 
-/// A melody of decaying harmonic notes over a bass, the same music at every rate: interleaved 16-bit
-/// samples, `channels` of them per frame, with a little difference between left and right. `level`
-/// is the peak in units of full scale; above 1 it clips.
+/// A melody of decaying harmonic notes over a bass, the same music at every rate: interleaved
+/// 16-bit samples, `channels` of them per frame, with a little difference between left and right.
+/// `level` is the peak in units of full scale; above 1 it clips.
 std::vector<int16_t> tune(uint32_t rate, uint32_t channels, double seconds, double level = 0.5,
                           uint64_t seed = 1);
 

@@ -19,6 +19,9 @@ struct FileError : std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
+/// The file ends before the section that was asked for begins; both in seconds.
+FileError start_beyond_end(double end, double start);
+
 constexpr uint32_t kSupportedRates[] = {8000, 11025, 16000, 22050, 24000, 32000, 44100, 48000};
 constexpr uint32_t kConvertedRate = 44100; ///< what all other rates are converted to
 

@@ -19,7 +19,8 @@ namespace kzfp {
 namespace {
 
 constexpr uint64_t kFirstFetch = uint64_t{1} << 20;
-/// Beginnings longer than this (large pictures in MP3 files are among the longest) are not waited for.
+/// Beginnings longer than this (large pictures in MP3 files are among the longest) are not waited
+/// for.
 constexpr uint64_t kLongestBeginning = uint64_t{1} << 26;
 constexpr uint64_t kLongestSpool = uint64_t{1} << 32;
 
@@ -93,6 +94,16 @@ Descriptor::~Descriptor()
     }
 }
 
+FileError start_beyond_end(double end, double start)
+{
+    const auto to_seconds = [](double seconds) -> std::string {
+        char text[32];
+        std::snprintf(text, sizeof text, "%.1f s", seconds);
+        return text;
+    };
+    return FileError("ends at " + to_seconds(end) + ", before the start at " + to_seconds(start));
+}
+
 Input::Input(const std::string& name, const Options& options)
     : options_(options), file_(open_input(name))
 {
@@ -146,6 +157,9 @@ OpenedInput Input::open_raw(const StreamFormat& format) const
             throw FileError(odd_bytes_text(size_ % frame_bytes, format));
         }
         facts.duration = static_cast<double>(size_ / frame_bytes) / format.rate;
+        if (*facts.duration < options_.section.start) {
+            throw start_beyond_end(*facts.duration, options_.section.start);
+        }
     }
     return {std::make_unique<RawSamples>(file_.number(), is_regular_, format, options_.section),
             facts};

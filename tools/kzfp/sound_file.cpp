@@ -14,8 +14,8 @@ namespace {
 
 constexpr size_t kBlock = 4096; ///< frames read at a time
 
-/// Full scale is 32768, so that 16-bit samples come back unchanged from a file of floats. Rounded to
-/// the nearest, clipped at full scale; what is not a number is silence.
+/// Full scale is 32768, so that 16-bit samples come back unchanged from a file of floats. Rounded
+/// to the nearest, clipped at full scale; what is not a number is silence.
 int16_t to_16_bits(float sample)
 {
     const float scaled = sample * 32768.0f;
@@ -25,18 +25,12 @@ int16_t to_16_bits(float sample)
     return static_cast<int16_t>(std::lrint(std::clamp(scaled, -32768.0f, 32767.0f)));
 }
 
-std::string to_seconds(double seconds)
-{
-    char text[32];
-    std::snprintf(text, sizeof text, "%.1f s", seconds);
-    return text;
-}
-
 } // namespace
 
 SoundFile::SoundFile(int file, Algorithm algorithm)
 {
-    // The object gets a descriptor of its own, which libsndfile closes, also when it cannot open it.
+    // The object gets a descriptor of its own, which libsndfile closes, also when it cannot open
+    // it.
     const int own = ::dup(file);
     if (own < 0 || ::lseek(own, 0, SEEK_SET) != 0) {
         throw FileError(std::string("cannot be read (") + std::strerror(errno) + ")");
@@ -104,8 +98,8 @@ bool SoundFile::is_companded() const
     }
 }
 
-/// libsndfile's own conversion of these to 16 bits neither scales floats nor clips (or looks for the
-/// peak of the whole file first).
+/// libsndfile's own conversion of these to 16 bits neither scales floats nor clips (or looks for
+/// the peak of the whole file first).
 bool SoundFile::is_decoded_to_float() const
 {
     switch (info_.format & SF_FORMAT_SUBMASK) {
@@ -141,8 +135,7 @@ void SoundFile::go_to(sf_count_t start)
             return;
         }
     }
-    throw FileError("ends at " + to_seconds(duration().value_or(0)) + ", before the start at " +
-                    to_seconds(static_cast<double>(start) / info_.samplerate));
+    throw start_beyond_end(duration().value_or(0), static_cast<double>(start) / info_.samplerate);
 }
 
 size_t SoundFile::read(std::span<std::byte> bytes)
