@@ -27,7 +27,8 @@ const std::map<std::string, std::set<std::string>> kBelow = {
     {"disc", {"abs"}},
     {"qv", {"abs", "xml", "dsp"}},
     {"qvfixed", {"abs", "xml", "dsp", "qv"}},
-    {"fpx", {"abs", "xml", "dsp", "qv", "qvfixed"}},
+    {"qvfloat", {"abs", "xml", "dsp", "qv"}},
+    {"fpx", {"abs", "xml", "dsp", "qv", "qvfixed", "qvfloat"}},
 };
 
 struct Include {
