@@ -39,6 +39,7 @@ uint32_t resampled_length(const Resampler& r, uint32_t count) noexcept
 template <class Resampler>
 uint32_t raw_length(const Resampler& r, uint32_t count) noexcept
 {
+    assert(r.up != 0);
     return saturated_to_word((uint64_t{count} * r.down + r.up - 1) / r.up);
 }
 

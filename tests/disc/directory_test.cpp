@@ -267,7 +267,8 @@ std::string make_deep(const ScratchDirectory& scratch, size_t length)
 {
     std::string path = scratch.path();
     while (path.size() + 1 < length) {
-        path += "/" + std::string(std::min<size_t>(200, length - path.size() - 1), 'd');
+        path += '/';
+        path.append(std::min<size_t>(200, length - path.size()), 'd');
         fs::create_directory(path);
     }
     return path;

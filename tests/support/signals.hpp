@@ -34,6 +34,6 @@ std::vector<int16_t> tune(uint32_t rate, uint32_t channels, double seconds, doub
 
 std::vector<int16_t> sine(uint32_t rate, double hertz, double seconds, double level);
 
-std::vector<int16_t> noise(size_t samples, double level, uint64_t seed);
+std::vector<int16_t> noise(size_t count, double level, uint64_t seed);
 
 } // namespace kz::test

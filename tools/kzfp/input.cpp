@@ -156,7 +156,8 @@ OpenedInput Input::open_raw(const StreamFormat& format) const
         if (size_ % frame_bytes != 0) {
             throw FileError(odd_bytes_text(size_ % frame_bytes, format));
         }
-        facts.duration = static_cast<double>(size_ / frame_bytes) / format.rate;
+        const uint64_t frames = size_ / frame_bytes;
+        facts.duration = static_cast<double>(frames) / format.rate;
         if (*facts.duration < options_.section.start) {
             throw start_beyond_end(*facts.duration, options_.section.start);
         }
