@@ -1,3 +1,4 @@
+#include <cstdio>
 #include <cstdlib>
 #include <memory>
 
@@ -28,13 +29,10 @@ heap_owned<Record> make_on_heap() noexcept
 /// "path/name", of any length. Null when memory is short.
 char* joined(const char* path, const char* name) noexcept
 {
-    const size_t path_length = std::strlen(path);
-    const size_t name_size = std::strlen(name) + 1;
-    auto* text = static_cast<char*>(std::malloc(path_length + 1 + name_size));
+    const size_t size = std::strlen(path) + 1 + std::strlen(name) + 1;
+    auto* text = static_cast<char*>(std::malloc(size));
     if (text != nullptr) {
-        std::memcpy(text, path, path_length);
-        text[path_length] = '/';
-        std::memcpy(text + path_length + 1, name, name_size);
+        std::snprintf(text, size, "%s/%s", path, name);
     }
     return text;
 }
