@@ -23,6 +23,8 @@ using namespace kz::test;
 
 namespace {
 
+constexpr const char* kNoFilter = "system calls cannot be filtered here: no seccomp";
+
 /// From here on the calling thread's `lseek` fails as told. There is no way back for the thread.
 bool make_seeking_fail(int error)
 {
@@ -304,12 +306,32 @@ TEST_P(DiscFamily, AFullDiskIsTold)
     }).join();
     EXPECT_EQ(0u, family().close(file));
     if (!filtered) {
-        GTEST_SKIP() << "system calls cannot be filtered here: no seccomp";
+        GTEST_SKIP() << kNoFilter;
     }
     EXPECT_EQ(-1, sought);
     EXPECT_EQ(0x9006004au, after_seek);
     EXPECT_EQ(-1, read);
     expect_error(0x9006004a);
+}
+
+// What an earlier call has left in `errno` must not be taken for the reason.
+TEST_P(DiscFamily, AnArrivalElsewhereIsNotBlamedOnAnEarlierError)
+{
+    const int32_t file = family().open("/");
+    bool filtered = false;
+    int32_t read = 0;
+    char buffer[4];
+    std::thread([&] {
+        filtered = make_seeking_fail(0); // "arrived at 0"
+        errno = ENOENT;
+        read = family().read_at(file, 5, buffer, 4);
+    }).join();
+    EXPECT_EQ(0u, family().close(file));
+    if (!filtered) {
+        GTEST_SKIP() << kNoFilter;
+    }
+    EXPECT_EQ(-1, read);
+    expect_error(0x90060009);
 }
 
 TEST_P(DiscFamily, EveryOtherFailureIsOneOfTheSystem)
