@@ -21,13 +21,13 @@ constexpr uint32_t kMillion = 1'000'000;
 
 // A sanitizer's heap moves a block at each growth, so the text's linear growth shows there.
 #if defined(__has_feature)
-#if __has_feature(address_sanitizer)
-#define KZ_TEST_ADDRESS_SANITIZER
+#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
+#define KZ_TEST_SANITIZER_HEAP
 #endif
-#elif defined(__SANITIZE_ADDRESS__)
-#define KZ_TEST_ADDRESS_SANITIZER
+#elif defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+#define KZ_TEST_SANITIZER_HEAP
 #endif
-#if defined(KZ_TEST_ADDRESS_SANITIZER)
+#if defined(KZ_TEST_SANITIZER_HEAP)
 constexpr uint32_t kRenderedDepth = 60'000;
 #else
 constexpr uint32_t kRenderedDepth = kMillion;
