@@ -2,6 +2,7 @@
 /// Ownership over the library's own allocator.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <cstring>
 #include <limits>
@@ -52,7 +53,7 @@ owned<T[]> copy_array(const T* source, uint64_t count) noexcept
 {
     auto copy = make_array<T>(count);
     if (copy && count != 0) {
-        std::memcpy(copy.get(), source, count * sizeof(T));
+        std::memcpy(copy.get(), source, static_cast<size_t>(count * sizeof(T)));
     }
     return copy;
 }

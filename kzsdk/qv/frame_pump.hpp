@@ -70,7 +70,7 @@ StepCounts convert_and_resample(typename Twin::Object& object, std::span<const u
     const uint64_t wanted =
         uint64_t{dsp::raw_length(*object.resampler, static_cast<uint32_t>(room.size()))} *
         object.frame_bytes;
-    auto budget = bytes.first(std::min<uint64_t>(wanted, bytes.size()));
+    auto budget = bytes.first(static_cast<size_t>(std::min<uint64_t>(wanted, bytes.size())));
     StepCounts done{0, 0};
     while (!budget.empty()) {
         const size_t frames =
@@ -108,7 +108,8 @@ uint32_t drop_silence(typename Twin::Object& object, uint32_t produced) noexcept
     if (remaining != 0) {
         object.searching_for_signal = 0;
         if (offset != 0) {
-            std::copy(block.begin() + offset, block.end(), block.begin());
+            const auto sounding = block.subspan(offset);
+            std::copy(sounding.begin(), sounding.end(), block.begin());
         }
         static_cast<void>(Twin::reset_detector(object.signal_detector));
     }

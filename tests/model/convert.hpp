@@ -1,7 +1,8 @@
 /// @file
-/// Audio bytes to mono words: Q29 from one channel, Q30 (the average) from two.
+/// Audio bytes to mono words, Q29 from one channel, Q30 (the average) from two, or to mono floats.
 #pragma once
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <span>
@@ -55,19 +56,40 @@ constexpr int32_t sample_value(Format format, std::span<const uint8_t> bytes)
     return 0;
 }
 
-/// Whole frames only: a rest of bytes at the end is left out.
+/// The sum of each frame's samples. Whole frames only: a rest of bytes at the end is left out.
+inline std::vector<int64_t> frame_sums(Format format, size_t channels,
+                                       std::span<const uint8_t> bytes)
+{
+    const size_t sample_bytes = bytes_per_sample(format);
+    std::vector<int64_t> sums(bytes.size() / (sample_bytes * channels), 0);
+    for (size_t frame = 0; frame < sums.size(); ++frame) {
+        for (size_t channel = 0; channel < channels; ++channel) {
+            sums[frame] +=
+                sample_value(format, bytes.subspan((frame * channels + channel) * sample_bytes));
+        }
+    }
+    return sums;
+}
+
 inline std::vector<int32_t> to_mono(Format format, size_t channels, std::span<const uint8_t> bytes)
 {
     const int64_t unit = int64_t{1} << (format == Format::pcm8 ? 22 : 14);
-    const size_t sample_bytes = bytes_per_sample(format);
-    std::vector<int32_t> mono(bytes.size() / (sample_bytes * channels));
-    for (size_t frame = 0; frame < mono.size(); ++frame) {
-        int64_t sum = 0;
-        for (size_t channel = 0; channel < channels; ++channel) {
-            sum += sample_value(format, bytes.subspan((frame * channels + channel) * sample_bytes));
-        }
-        mono[frame] = word(sum * unit);
-    }
+    const std::vector<int64_t> sums = frame_sums(format, channels, bytes);
+    std::vector<int32_t> mono(sums.size());
+    std::transform(sums.begin(), sums.end(), mono.begin(),
+                   [unit](int64_t sum) { return word(sum * unit); });
+    return mono;
+}
+
+/// Without the average: two full channels give twice the level of one.
+inline std::vector<float> to_mono_float(Format format, size_t channels,
+                                        std::span<const uint8_t> bytes)
+{
+    const int64_t unit = format == Format::pcm8 ? 256 : 1;
+    const std::vector<int64_t> sums = frame_sums(format, channels, bytes);
+    std::vector<float> mono(sums.size());
+    std::transform(sums.begin(), sums.end(), mono.begin(),
+                   [unit](int64_t sum) { return static_cast<float>(sum * unit); });
     return mono;
 }
 

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <algorithm>
+#include <concepts>
 #include <cstddef>
 #include <cstdint>
 #include <deque>
@@ -26,9 +27,16 @@ public:
     /// towards zero.
     size_t offset_in(std::span<const int32_t> block, uint32_t shift)
     {
-        const auto scaled = [shift](int32_t sample) {
+        return offset_in(block, [shift](int32_t sample) {
             return static_cast<int32_t>(sample / (int64_t{1} << shift));
-        };
+        });
+    }
+
+    /// The same of samples of any type; `scaled` makes a level of one.
+    template <class Sample, class Scaled>
+    requires std::invocable<Scaled, Sample> size_t offset_in(std::span<const Sample> block,
+                                                             Scaled scaled)
+    {
         if (!primed_) {
             levels_.assign(window_, 0);
             deviations_.assign(window_, 0);

@@ -7,17 +7,19 @@ namespace kz::model {
 namespace {
 
 constexpr size_t kChunk = 4096;
-constexpr uint32_t kDetectorShift = 13;
 
 } // namespace
 
-Fingerprint::Fingerprint(const Ratio& ratio, Format format, size_t channels, const Filters& filters)
-    : format_(format), channels_(channels), resampler_(ratio, filters.resampler),
-      analyser_(filters.decimator), ring_(kFrameLength, 0)
+template <class Stages>
+Road<Stages>::Road(const Ratio& ratio, Format format, size_t channels,
+                   const typename Stages::Filters& filters)
+    : format_(format), channels_(channels), resampler_(Stages::make_resampler(ratio, filters)),
+      analyser_(Stages::make_analyser(filters)), ring_(kFrameLength, 0)
 {
 }
 
-bool Fingerprint::feed(std::span<const uint8_t> bytes)
+template <class Stages>
+bool Road<Stages>::feed(std::span<const uint8_t> bytes)
 {
     while (!bytes.empty() && !complete()) {
         const auto fresh = std::span(ring_).subspan(write_position_, room());
@@ -33,19 +35,21 @@ bool Fingerprint::feed(std::span<const uint8_t> bytes)
     return complete();
 }
 
-std::optional<Values> Fingerprint::values() const
+template <class Stages>
+std::optional<Values> Road<Stages>::values() const
 {
-    return complete() ? std::optional(condense(features_)) : std::nullopt;
+    return complete() ? std::optional(Stages::condense(features_)) : std::nullopt;
 }
 
-size_t Fingerprint::room() const
+template <class Stages>
+size_t Road<Stages>::room() const
 {
     return (frame_start_ > write_position_ ? frame_start_ : ring_.size()) - write_position_;
 }
 
 /// Converts no more than the room can need, chunk by chunk, and resamples each chunk.
-Fingerprint::Counts Fingerprint::fill(std::span<const uint8_t> bytes,
-                                      std::span<int32_t> destination)
+template <class Stages>
+auto Road<Stages>::fill(std::span<const uint8_t> bytes, std::span<Sample> destination) -> Counts
 {
     const size_t frame_bytes = bytes_per_sample(format_) * channels_;
     const size_t budget = raw_length(resampler_.ratio(), destination.size()) * frame_bytes;
@@ -57,9 +61,9 @@ Fingerprint::Counts Fingerprint::fill(std::span<const uint8_t> bytes,
         if (taken == 0) {
             break;
         }
-        const std::vector<int32_t> chunk = to_mono(format_, channels_, bytes.first(taken));
+        const std::vector<Sample> chunk = Stages::to_mono(format_, channels_, bytes.first(taken));
         bytes = bytes.subspan(taken);
-        for (std::span<const int32_t> rest = chunk; !rest.empty();) {
+        for (std::span<const Sample> rest = chunk; !rest.empty();) {
             const auto [consumed, produced] =
                 resampler_.resample(rest, destination.subspan(done.samples));
             if (consumed == 0 && produced == 0) {
@@ -74,12 +78,13 @@ Fingerprint::Counts Fingerprint::fill(std::span<const uint8_t> bytes,
 }
 
 /// While no signal was found the samples are dropped; the block in which it is found is moved down.
-size_t Fingerprint::without_silence(std::span<int32_t> fresh)
+template <class Stages>
+size_t Road<Stages>::without_silence(std::span<Sample> fresh)
 {
     if (!searching_) {
         return fresh.size();
     }
-    const size_t offset = detector_.offset_in(fresh, kDetectorShift);
+    const size_t offset = detector_.offset_in(std::span<const Sample>(fresh), Stages::level);
     signal_offset_ += offset;
     if (offset < fresh.size()) {
         searching_ = false;
@@ -90,7 +95,8 @@ size_t Fingerprint::without_silence(std::span<int32_t> fresh)
 }
 
 /// True when the ring holds a whole frame.
-bool Fingerprint::store(size_t produced)
+template <class Stages>
+bool Road<Stages>::store(size_t produced)
 {
     write_position_ += produced;
     const bool ready = write_position_ == (frame_start_ != 0 ? frame_start_ : ring_.size());
@@ -98,12 +104,16 @@ bool Fingerprint::store(size_t produced)
     return ready;
 }
 
-void Fingerprint::analyse()
+template <class Stages>
+void Road<Stages>::analyse()
 {
-    std::vector<int32_t> frame(ring_);
+    std::vector<Sample> frame(ring_);
     std::rotate(frame.begin(), frame.begin() + static_cast<ptrdiff_t>(frame_start_), frame.end());
     features_.push_back(analyser_(frame));
     frame_start_ = (frame_start_ + kFrameHop) % ring_.size();
 }
+
+template class Road<FixedStages>;
+template class Road<FloatStages>;
 
 } // namespace kz::model

@@ -10,6 +10,7 @@
 
 #include "model/convert.hpp"
 #include "model/detector.hpp"
+#include "model/float_frame.hpp"
 #include "model/frame.hpp"
 #include "model/resampler.hpp"
 #include "model/statistics.hpp"
@@ -22,9 +23,61 @@ struct Filters {
     std::vector<int32_t> decimator;
 };
 
-class Fingerprint {
+/// What the fixed-point path does at each stage.
+struct FixedStages {
+    using Sample = int32_t;
+    using Filters = model::Filters;
+    using Resampler = model::Resampler;
+    using Analyser = FrameAnalyser;
+    using Features = model::Features;
+
+    static Resampler make_resampler(const Ratio& ratio, const Filters& filters)
+    {
+        return {ratio, filters.resampler};
+    }
+    static Analyser make_analyser(const Filters& filters) { return Analyser(filters.decimator); }
+    static std::vector<Sample> to_mono(Format format, size_t channels,
+                                       std::span<const uint8_t> bytes)
+    {
+        return model::to_mono(format, channels, bytes);
+    }
+    static int32_t level(Sample sample) { return sample / 8192; } ///< for the detector
+    static Values condense(std::span<const Features> frames) { return model::condense(frames); }
+};
+
+/// And the floating-point path; its filter is the ratio's.
+struct FloatStages {
+    using Sample = float;
+    using Filters = std::vector<float>;
+    using Resampler = FloatResampler;
+    using Analyser = FloatFrameAnalyser;
+    using Features = FloatFeatures;
+
+    static Resampler make_resampler(const Ratio& ratio, const Filters& taps)
+    {
+        return {ratio, taps};
+    }
+    static Analyser make_analyser(const Filters& /*taps*/) { return {}; }
+    static std::vector<Sample> to_mono(Format format, size_t channels,
+                                       std::span<const uint8_t> bytes)
+    {
+        return to_mono_float(format, channels, bytes);
+    }
+    static int32_t level(Sample sample) { return static_cast<int32_t>(sample); }
+    static Values condense(std::span<const Features> frames)
+    {
+        return model::condense_float(frames);
+    }
+};
+
+template <class Stages>
+class Road {
 public:
-    Fingerprint(const Ratio& ratio, Format format, size_t channels, const Filters& filters);
+    using Sample = typename Stages::Sample;
+    using Features = typename Stages::Features;
+
+    Road(const Ratio& ratio, Format format, size_t channels,
+         const typename Stages::Filters& filters);
 
     /// Feeds whole frames of bytes, as one call. True once the fingerprint is complete.
     bool feed(std::span<const uint8_t> bytes);
@@ -36,7 +89,7 @@ public:
     size_t signal_offset() const { return signal_offset_; }
 
     /// The samples that wait for the next frame, and where in them it starts and the next one goes.
-    std::span<const int32_t> ring() const { return ring_; }
+    std::span<const Sample> ring() const { return ring_; }
     size_t frame_start() const { return frame_start_; }
     size_t write_position() const { return write_position_; }
 
@@ -51,22 +104,25 @@ private:
 
     bool complete() const { return features_.size() == kFrameLimit; }
     size_t room() const;
-    Counts fill(std::span<const uint8_t> bytes, std::span<int32_t> destination);
-    size_t without_silence(std::span<int32_t> fresh);
+    Counts fill(std::span<const uint8_t> bytes, std::span<Sample> destination);
+    size_t without_silence(std::span<Sample> fresh);
     bool store(size_t produced);
     void analyse();
 
     Format format_;
     size_t channels_;
-    Resampler resampler_;
-    FrameAnalyser analyser_;
+    typename Stages::Resampler resampler_;
+    typename Stages::Analyser analyser_;
     Detector detector_;
     bool searching_ = true;
     size_t signal_offset_ = 0;
-    std::vector<int32_t> ring_;
+    std::vector<Sample> ring_;
     size_t frame_start_ = 0;
     size_t write_position_ = 0;
     std::vector<Features> features_;
 };
+
+using Fingerprint = Road<FixedStages>;
+using FloatFingerprint = Road<FloatStages>;
 
 } // namespace kz::model

@@ -12,8 +12,7 @@ namespace kz::model::ideal {
 
 namespace {
 
-constexpr double kFullRange = 16384;   // twice 8192: the peak-to-peak range of a silent frame
-constexpr double kDetectorUnit = 8192; // 2^13
+constexpr double kFullRange = 16384; // twice 8192: the peak-to-peak range of a silent frame
 constexpr size_t kDetectorWindow = 128;
 constexpr double kMaxDeviation = 1000;
 constexpr double kThreshold = 101; // an integer quotient passes 100 when it reaches 101
@@ -74,16 +73,16 @@ Signal resample(const Ratio& ratio, std::span<const double> signal)
     return result;
 }
 
-size_t signal_start(std::span<const double> signal)
+size_t signal_start(std::span<const double> signal, double unit)
 {
     std::vector<double> levels(kDetectorWindow, 0.0);
     std::vector<double> deviations(kDetectorWindow, 0.0);
     std::transform(signal.begin(), signal.begin() + kDetectorWindow, levels.begin(),
-                   [](double sample) { return sample / kDetectorUnit; });
+                   [unit](double sample) { return sample / unit; });
     double level_sum = std::accumulate(levels.begin(), levels.end(), 0.0);
     double deviation_sum = 0;
     for (size_t i = 0; i < signal.size(); ++i) {
-        const double level = signal[i] / kDetectorUnit;
+        const double level = signal[i] / unit;
         level_sum += level - std::exchange(levels[i % kDetectorWindow], level);
         const double deviation =
             std::min(std::abs(level - level_sum / kDetectorWindow), kMaxDeviation);
@@ -145,6 +144,43 @@ Signal cosine_transform(std::span<const double> x)
     return result;
 }
 
+namespace {
+
+/// `weight(band)` is what an energy is multiplied by to become the square of an amplitude.
+template <class Weight>
+Features features_of(std::span<const double> spectrum, Weight weight)
+{
+    Features result{};
+    for (size_t band = 0; band < kBands; ++band) {
+        for (size_t bin = kBandEdges[band]; bin <= kBandEdges[band + 1]; ++bin) {
+            result.energy[band] += square(spectrum[bin]);
+        }
+        result.amplitude[band] = std::sqrt(result.energy[band] * weight(band));
+    }
+    return result;
+}
+
+/// Without the decimator, whose loss the ramp makes up for. Only ratios of features count in the end, so
+/// the scale of the integer path serves.
+Features analyse_whole(std::span<const double> frame)
+{
+    return features_of(cosine_transform(equalise(frame)), [](size_t band) {
+        return 1.0 / static_cast<double>(kBandEdges[band + 1] - kBandEdges[band] + 1);
+    });
+}
+
+template <class Analyse>
+Shares fingerprint_of(std::span<const double> sounding, Analyse analyse_frame)
+{
+    std::vector<Features> frames;
+    for (size_t frame = 0; frame < kFrameLimit; ++frame) {
+        frames.push_back(analyse_frame(sounding.subspan(frame * kFrameHop, kFrameLength)));
+    }
+    return condense(frames);
+}
+
+} // namespace
+
 Features analyse(std::span<const double> frame)
 {
     Signal spectrum = cosine_transform(decimate(equalise(frame)));
@@ -154,14 +190,7 @@ Features analyse(std::span<const double> frame)
             spectrum[bin] *= (segment.gain + steps * segment.step) * 0x1p-30;
         }
     }
-    Features result{};
-    for (size_t band = 0; band < kBands; ++band) {
-        for (size_t bin = kBandEdges[band]; bin <= kBandEdges[band + 1]; ++bin) {
-            result.energy[band] += square(spectrum[bin]);
-        }
-        result.amplitude[band] = std::sqrt(result.energy[band] * kBandWeights[band]);
-    }
-    return result;
+    return features_of(spectrum, [](size_t band) { return static_cast<double>(kBandWeights[band]); });
 }
 
 Shares condense(std::span<const Features> frames)
@@ -192,12 +221,18 @@ Shares condense(std::span<const Features> frames)
 Shares fingerprint(const Ratio& ratio, std::span<const double> input)
 {
     const Signal signal = resample(ratio, input);
-    const auto sounding = std::span(signal).subspan(signal_start(signal));
-    std::vector<Features> frames;
-    for (size_t frame = 0; frame < kFrameLimit; ++frame) {
-        frames.push_back(analyse(sounding.subspan(frame * kFrameHop, kFrameLength)));
-    }
-    return condense(frames);
+    return fingerprint_of(std::span(signal).subspan(signal_start(signal)), analyse);
+}
+
+Shares float_fingerprint(const Ratio& ratio, std::span<const double> input)
+{
+    constexpr double kScale =
+        0x1p14; // of the integer path, whose thresholds for silence are stated
+    Signal signal = resample(ratio, input);
+    const double lost = ratio.length == 0 ? 1 : ratio.up == 1 ? 0.5 : storage_gain(ratio);
+    std::transform(signal.begin(), signal.end(), signal.begin(),
+                   [lost](double sample) { return sample * kScale / lost; });
+    return fingerprint_of(std::span(signal).subspan(signal_start(signal, kScale)), analyse_whole);
 }
 
 } // namespace kz::model::ideal

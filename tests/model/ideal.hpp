@@ -24,8 +24,8 @@ using Shares = std::array<double, 2 * kBands>;
 Signal resample(const Ratio& ratio, std::span<const double> signal);
 
 /// First sample of the signal proper: half a window before the mean deviation passes the threshold.
-/// The size of the signal when it is silent.
-size_t signal_start(std::span<const double> signal);
+/// The size of the signal when it is silent. `unit` is what the detector counts as 1.
+size_t signal_start(std::span<const double> signal, double unit = 8192);
 
 /// Every sample becomes 32768 times the number of samples of its own and lower levels, less the
 /// mean.
@@ -49,5 +49,9 @@ Shares condense(std::span<const Features> frames);
 
 /// From input samples to the 30 values; the first 12 frames must be there.
 Shares fingerprint(const Ratio& ratio, std::span<const double> input);
+
+/// The same by the floating-point path's rules: full gain, no decimation, no ramp and no weights. Samples have
+/// the scale of 16 bits.
+Shares float_fingerprint(const Ratio& ratio, std::span<const double> input);
 
 } // namespace kz::model::ideal

@@ -1,6 +1,6 @@
 // Whole songs through the public interface: the 30 values of the document are the model's to the
 // word, and those of plain double arithmetic within a bound.
-#include "model/fingerprint.hpp"
+#include "model/paths.hpp"
 
 #include <algorithm>
 #include <array>
@@ -12,8 +12,6 @@
 #include <gtest/gtest.h>
 
 #include "kzsdk/kzsdk.h"
-#include "model/ideal.hpp"
-#include "model/library_taps.hpp"
 #include "model/material.hpp"
 #include "model/query_document.hpp"
 
@@ -42,13 +40,13 @@ protected:
 using Piece = std::span<const uint8_t>;
 
 /// The document for a song fed in the given pieces; nothing when it is not complete after them.
-std::optional<std::string> library_document(const Ratio& ratio, Format format, size_t channels,
-                                            std::span<const Piece> pieces)
+std::optional<std::string> library_document(uint32_t algorithm, const Ratio& ratio, Format format,
+                                            size_t channels, std::span<const Piece> pieces)
 {
     kz_fpx_handle* handle = nullptr;
     EXPECT_EQ(KZ_OK,
-              kz_fpx_fingerprint_create(KZ_FPX_ALGORITHM_FIXED, static_cast<uint32_t>(format),
-                                        ratio.hertz, static_cast<uint32_t>(channels), &handle));
+              kz_fpx_fingerprint_create(algorithm, static_cast<uint32_t>(format), ratio.hertz,
+                                        static_cast<uint32_t>(channels), &handle));
     uint8_t complete = 0;
     for (const Piece& piece : pieces) {
         EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_add_audio(
@@ -67,15 +65,17 @@ std::optional<std::string> library_document(const Ratio& ratio, Format format, s
 }
 
 /// Feeds both, compares both; returns the model's values.
+template <class Path>
 std::optional<Values> compare(const Ratio& ratio, Format format, size_t channels,
                               std::span<const Piece> pieces)
 {
-    Fingerprint model(ratio, format, channels, library_filters(ratio));
+    typename Path::Road model(ratio, format, channels, Path::filters(ratio));
     for (const Piece& piece : pieces) {
         model.feed(piece);
     }
     const std::optional<Values> values = model.values();
-    const std::optional<std::string> document = library_document(ratio, format, channels, pieces);
+    const std::optional<std::string> document =
+        library_document(Path::kAlgorithm, ratio, format, channels, pieces);
     EXPECT_EQ(values.has_value(), document.has_value());
     if (values && document) {
         const Element root = DocumentReader::read(*document);
@@ -87,17 +87,18 @@ std::optional<Values> compare(const Ratio& ratio, Format format, size_t channels
     return values;
 }
 
+template <class Path>
 std::optional<Values> compare(const Ratio& ratio, Format format, size_t channels, Piece song)
 {
-    return compare(ratio, format, channels, std::span(&song, 1));
+    return compare<Path>(ratio, format, channels, std::span(&song, 1));
 }
 
 /// The farthest that a value lies from plain double arithmetic on the same mono words.
+template <class Path>
 double distance_from_plain(const Ratio& ratio, Format format, size_t channels, Piece song,
                            const Values& values)
 {
-    const std::vector<int32_t> mono = to_mono(format, channels, song);
-    const ideal::Shares plain = ideal::fingerprint(ratio, ideal::Signal(mono.begin(), mono.end()));
+    const ideal::Shares plain = Path::plain(ratio, format, channels, song);
     double farthest = 0;
     for (size_t i = 0; i < values.size(); ++i) {
         farthest = std::max(farthest, std::abs(values[i] - plain[i]));
@@ -156,6 +157,7 @@ std::vector<int16_t> left_channel(std::span<const int16_t> stereo)
 }
 
 /// The tune in every format, from one channel and from two.
+template <class Path>
 void compare_all_formats(const Ratio& ratio)
 {
     const std::vector<int16_t> stereo = kz::test::tune(ratio.hertz, 2, kSeconds);
@@ -163,11 +165,12 @@ void compare_all_formats(const Ratio& ratio)
     for (const size_t channels : {size_t{1}, size_t{2}}) {
         for (const Format format : kFormats) {
             const std::vector<uint8_t> song = encoded(format, channels == 1 ? mono : stereo);
-            const std::optional<Values> values = compare(ratio, format, channels, song);
+            const std::optional<Values> values = compare<Path>(ratio, format, channels, song);
             ASSERT_TRUE(values);
             if (format !=
                 Format::pcm8) { // folded samples wrap when resampled, which doubles do not
-                EXPECT_LE(distance_from_plain(ratio, format, channels, song, *values), kPlainBound)
+                EXPECT_LE(distance_from_plain<Path>(ratio, format, channels, song, *values),
+                          kPlainBound)
                     << ratio.hertz << " Hz, " << channels << " channels, format "
                     << static_cast<int>(format);
             }
@@ -177,20 +180,23 @@ void compare_all_formats(const Ratio& ratio)
 
 } // namespace
 
-class Song : public Library {};
+template <class Path>
+class Song : public Library {
+};
+TYPED_TEST_SUITE(Song, Paths, PathNames);
 
-TEST_F(Song, At8000HertzInEveryFormat) { compare_all_formats(kRatios[0]); }
-TEST_F(Song, At11025HertzInEveryFormat) { compare_all_formats(kRatios[1]); }
-TEST_F(Song, At16000HertzInEveryFormat) { compare_all_formats(kRatios[2]); }
-TEST_F(Song, At22050HertzInEveryFormat) { compare_all_formats(kRatios[3]); }
-TEST_F(Song, At24000HertzInEveryFormat) { compare_all_formats(kRatios[4]); }
-TEST_F(Song, At32000HertzInEveryFormat) { compare_all_formats(kRatios[5]); }
-TEST_F(Song, At44100HertzInEveryFormat) { compare_all_formats(kRatios[6]); }
-TEST_F(Song, At48000HertzInEveryFormat) { compare_all_formats(kRatios[7]); }
+TYPED_TEST(Song, At8000HertzInEveryFormat) { compare_all_formats<TypeParam>(kRatios[0]); }
+TYPED_TEST(Song, At11025HertzInEveryFormat) { compare_all_formats<TypeParam>(kRatios[1]); }
+TYPED_TEST(Song, At16000HertzInEveryFormat) { compare_all_formats<TypeParam>(kRatios[2]); }
+TYPED_TEST(Song, At22050HertzInEveryFormat) { compare_all_formats<TypeParam>(kRatios[3]); }
+TYPED_TEST(Song, At24000HertzInEveryFormat) { compare_all_formats<TypeParam>(kRatios[4]); }
+TYPED_TEST(Song, At32000HertzInEveryFormat) { compare_all_formats<TypeParam>(kRatios[5]); }
+TYPED_TEST(Song, At44100HertzInEveryFormat) { compare_all_formats<TypeParam>(kRatios[6]); }
+TYPED_TEST(Song, At48000HertzInEveryFormat) { compare_all_formats<TypeParam>(kRatios[7]); }
 
-TEST_F(Song, LoudQuietAndNoisyOnesAgree)
+TYPED_TEST(Song, LoudQuietAndNoisyOnesAgree)
 {
-    for (const Ratio& ratio : kRatios) {
+    for (const Ratio& ratio : TypeParam::ratios()) {
         const auto samples = static_cast<size_t>(kSeconds * ratio.hertz);
         const std::vector<int16_t> songs[] = {
             kz::test::noise(2 * samples, 1.0, ratio.hertz),
@@ -198,14 +204,14 @@ TEST_F(Song, LoudQuietAndNoisyOnesAgree)
             kz::test::noise(2 * samples, 0.05, ratio.hertz + 2),
         };
         for (const std::vector<int16_t>& song : songs) {
-            EXPECT_TRUE(compare(ratio, Format::pcm16, 2, to_bytes(song)));
+            EXPECT_TRUE(compare<TypeParam>(ratio, Format::pcm16, 2, to_bytes(song)));
         }
     }
 }
 
-TEST_F(Song, RandomBytesInEveryFormatAgree)
+TYPED_TEST(Song, RandomBytesInEveryFormatAgree)
 {
-    for (const Ratio& ratio : kRatios) {
+    for (const Ratio& ratio : TypeParam::ratios()) {
         kz::test::Random random(ratio.hertz);
         std::vector<uint8_t> bytes(static_cast<size_t>(kSeconds * ratio.hertz) * 4);
         std::generate(bytes.begin(), bytes.end(),
@@ -213,61 +219,62 @@ TEST_F(Song, RandomBytesInEveryFormatAgree)
         for (const Format format : kFormats) {
             for (const size_t channels : {size_t{1}, size_t{2}}) {
                 const size_t frame_bytes = bytes_per_sample(format) * channels;
-                EXPECT_TRUE(compare(ratio, format, channels,
-                                    Piece(bytes).first(bytes.size() / 4 * frame_bytes)));
+                EXPECT_TRUE(compare<TypeParam>(ratio, format, channels,
+                                               Piece(bytes).first(bytes.size() / 4 * frame_bytes)));
             }
         }
     }
 }
 
-TEST_F(Song, AClippedTuneAgrees)
+TYPED_TEST(Song, AClippedTuneAgrees)
 {
     for (const size_t which : {0u, 1u, 3u, 6u}) {
         const Ratio& ratio = kRatios[which];
         const std::vector<int16_t> loud = kz::test::tune(ratio.hertz, 2, kSeconds, 30.0);
-        EXPECT_TRUE(compare(ratio, Format::pcm16, 2, to_bytes(loud)));
+        EXPECT_TRUE(compare<TypeParam>(ratio, Format::pcm16, 2, to_bytes(loud)));
     }
 }
 
-TEST_F(Song, LeadingSilenceIsSkippedAtTheSameSample)
+TYPED_TEST(Song, LeadingSilenceIsSkippedAtTheSameSample)
 {
-    for (const Ratio& ratio : kRatios) {
+    for (const Ratio& ratio : TypeParam::ratios()) {
         const std::vector<int16_t> music =
             kz::test::noise(static_cast<size_t>(kSeconds * ratio.hertz), 0.6, 5);
         for (const double silence : {0.001, 2.9721, 7.0}) {
             std::vector<int16_t> song(static_cast<size_t>(silence * ratio.hertz), 0);
             song.insert(song.end(), music.begin(), music.end());
-            EXPECT_TRUE(compare(ratio, Format::pcm16, 1, to_bytes(song))) << silence;
+            EXPECT_TRUE(compare<TypeParam>(ratio, Format::pcm16, 1, to_bytes(song))) << silence;
         }
     }
 }
 
-TEST_F(Song, NearSilenceBeforeTheMusicIsJudgedAlike)
+TYPED_TEST(Song, NearSilenceBeforeTheMusicIsJudgedAlike)
 {
-    for (const Ratio& ratio : kRatios) {
+    for (const Ratio& ratio : TypeParam::ratios()) {
         const auto length = static_cast<size_t>(kSeconds * ratio.hertz);
         for (const double level : {0.002, 0.01, 0.02, 0.05, 0.1}) {
             std::vector<int16_t> song = kz::test::sine(ratio.hertz, 60, 4.0, level);
             const std::vector<int16_t> music = kz::test::noise(length, 0.6, 6);
             song.insert(song.end(), music.begin(), music.end());
-            EXPECT_TRUE(compare(ratio, Format::pcm16, 1, to_bytes(song))) << level;
+            EXPECT_TRUE(compare<TypeParam>(ratio, Format::pcm16, 1, to_bytes(song))) << level;
         }
     }
 }
 
-TEST_F(Song, SilenceAndSongsTooShortAreNotComplete)
+TYPED_TEST(Song, SilenceAndSongsTooShortAreNotComplete)
 {
-    for (const Ratio& ratio : kRatios) {
+    for (const Ratio& ratio : TypeParam::ratios()) {
         const std::vector<int16_t> silence(static_cast<size_t>(20 * ratio.hertz), 0);
-        EXPECT_FALSE(compare(ratio, Format::pcm16, 1, to_bytes(silence)));
+        EXPECT_FALSE(compare<TypeParam>(ratio, Format::pcm16, 1, to_bytes(silence)));
         const auto samples = static_cast<size_t>(14.1 * ratio.hertz);
-        EXPECT_FALSE(compare(ratio, Format::pcm16, 1, to_bytes(kz::test::noise(samples, 0.5, 7))));
+        EXPECT_FALSE(compare<TypeParam>(ratio, Format::pcm16, 1,
+                                        to_bytes(kz::test::noise(samples, 0.5, 7))));
     }
 }
 
-TEST_F(Song, PiecesOfAnySizeAgreeWithTheModelFedAlike)
+TYPED_TEST(Song, PiecesOfAnySizeAgreeWithTheModelFedAlike)
 {
-    for (const Ratio& ratio : kRatios) {
+    for (const Ratio& ratio : TypeParam::ratios()) {
         std::vector<int16_t> samples = kz::test::sine(ratio.hertz, 30, 2.0, 0.0012);
         const auto frames = static_cast<size_t>(kSeconds * ratio.hertz);
         const std::vector<int16_t> noise = kz::test::noise(2 * frames, 0.7, 8);
@@ -280,7 +287,7 @@ TEST_F(Song, PiecesOfAnySizeAgreeWithTheModelFedAlike)
                 pieces.push_back(
                     rest.first(std::min<size_t>(rest.size(), 4 * (1 + random.below(largest)))));
             }
-            EXPECT_TRUE(compare(ratio, Format::pcm16, 2, pieces)) << largest;
+            EXPECT_TRUE(compare<TypeParam>(ratio, Format::pcm16, 2, pieces)) << largest;
         }
     }
 }
