@@ -1,4 +1,5 @@
-// The stages of the floating-point path, to the bit: conversion, equaliser, transform, features, values.
+// The stages of the floating-point path, to the bit: conversion, filters, equaliser, transform,
+// features, values.
 #include "model/float_frame.hpp"
 
 #include <cstring>
@@ -187,7 +188,8 @@ TEST_F(ModelFloat, EqualiserAgreesForAnyNumberOfLevelsAndSamples)
     }
 }
 
-// But for the rounding, and the samples on the edge between two levels: a sine has many of the same value.
+// But for the rounding, and the samples on the edge between two levels: a sine has many of the same
+// value.
 TEST_F(ModelFloat, EqualiserIsThatOfThePlainRule)
 {
     for (const FloatMaterial& material : float_materials(kFrameLength)) {

@@ -160,8 +160,8 @@ Features features_of(std::span<const double> spectrum, Weight weight)
     return result;
 }
 
-/// Without the decimator, whose loss the ramp makes up for. Only ratios of features count in the end, so
-/// the scale of the integer path serves.
+/// Without the decimator, whose loss the ramp makes up for. Only ratios of features count in the
+/// end, so the scale of the integer path serves.
 Features analyse_whole(std::span<const double> frame)
 {
     return features_of(cosine_transform(equalise(frame)), [](size_t band) {
@@ -190,7 +190,8 @@ Features analyse(std::span<const double> frame)
             spectrum[bin] *= (segment.gain + steps * segment.step) * 0x1p-30;
         }
     }
-    return features_of(spectrum, [](size_t band) { return static_cast<double>(kBandWeights[band]); });
+    return features_of(spectrum,
+                       [](size_t band) { return static_cast<double>(kBandWeights[band]); });
 }
 
 Shares condense(std::span<const Features> frames)

@@ -50,8 +50,8 @@ Shares condense(std::span<const Features> frames);
 /// From input samples to the 30 values; the first 12 frames must be there.
 Shares fingerprint(const Ratio& ratio, std::span<const double> input);
 
-/// The same by the floating-point path's rules: full gain, no decimation, no ramp and no weights. Samples have
-/// the scale of 16 bits.
+/// The same by the floating-point path's rules: full gain, no decimation, no ramp and no weights.
+/// Samples have the scale of 16 bits.
 Shares float_fingerprint(const Ratio& ratio, std::span<const double> input);
 
 } // namespace kz::model::ideal

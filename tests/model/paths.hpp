@@ -1,6 +1,6 @@
 /// @file
-/// The two paths as tests over both see them: the model's road, the library's number of the algorithm, the
-/// filters, and what plain double arithmetic makes of a song.
+/// The two paths as tests over both see them: the model's road, the library's number of the
+/// algorithm, the filters, and what plain double arithmetic makes of a song.
 #pragma once
 
 #include <algorithm>
@@ -9,6 +9,7 @@
 #include <cstdint>
 #include <span>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include <gtest/gtest.h>
@@ -20,15 +21,16 @@
 
 namespace kz::model {
 
-/// Length of a designed filter: its zeros and taps, filled up to a multiple of `up`, and never not filled.
+/// Length of a designed filter: its zeros and taps, filled up to the next multiple of `up`, by `up`
+/// when they are one.
 constexpr size_t designed_length(const Ratio& ratio)
 {
     const size_t used = leading_zero_taps(ratio) + 20 * std::max(ratio.up, ratio.down) + 1;
     return used + (ratio.up - used % ratio.up);
 }
 
-/// The ratio that the floating-point path takes for a rate: the first convergent, of nearest integers, within
-/// a millionth of the quotient in single precision.
+/// The ratio that the floating-point path takes for a rate: the first convergent, of nearest
+/// integers, within a millionth of the quotient in single precision.
 inline Ratio float_ratio(uint32_t hertz)
 {
     const double x = 11025.0f / static_cast<float>(hertz);

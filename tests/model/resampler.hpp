@@ -77,8 +77,8 @@ public:
 
     const Ratio& ratio() const { return ratio_; }
 
-    /// Fills `output` from the start as far as `input` reaches. `sum(window, phase, reaches_back)` makes an
-    /// output of the samples of its window as the taps meet them, the newest first.
+    /// Fills `output` from the start as far as `input` reaches. `sum(window, phase, reaches_back)`
+    /// makes an output of the samples of its window as the taps meet them, the newest first.
     template <class Sum>
     StreamCounts resample(std::span<const Sample> input, std::span<Sample> output, Sum sum)
     {
