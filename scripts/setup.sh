@@ -1,7 +1,7 @@
 #!/bin/sh
 # Installs what is missing to build and test the library on Debian 12.
 #
-#   scripts/setup.sh [build] [tools] [test] [clips] [bench] [lint] [clang] [arch]
+#   scripts/setup.sh [build] [java] [tools] [test] [clips] [bench] [lint] [clang] [arch]
 #                                                  default: all of them but arch, the cross compilers
 #
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
@@ -12,6 +12,8 @@ packages_of() {
     build) echo "g++ cmake ninja-build make" ;;
     tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev" ;;
     test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso" ;;
+    # The Java front and its tests; Android's log, threads and jni.h as a desktop has them.
+    java) echo "default-jdk-headless junit4 android-liblog-dev android-libutils-dev android-libnativehelper-dev" ;;
     clips) echo "sox libsox-fmt-all espeak-ng" ;; # the demo's music, and the tests' clips
     bench) echo "libbenchmark-dev" ;;
     lint) echo "clang-format-14 clang-tidy-14 mandoc" ;;
@@ -28,7 +30,7 @@ installed() {
     [ "$(dpkg-query -W -f '${db:Status-Status}' "$1" 2>/dev/null || true)" = installed ]
 }
 
-[ $# -gt 0 ] || set -- build tools test clips bench lint clang
+[ $# -gt 0 ] || set -- build java tools test clips bench lint clang
 
 wanted=
 for group in "$@"; do

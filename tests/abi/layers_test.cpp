@@ -29,6 +29,7 @@ const std::map<std::string, std::set<std::string>> kBelow = {
     {"qvfixed", {"abs", "xml", "dsp", "qv"}},
     {"qvfloat", {"abs", "xml", "dsp", "qv"}},
     {"fpx", {"abs", "xml", "dsp", "qv", "qvfixed", "qvfloat"}},
+    {"jni", {"abs", "xml", "dsp", "qv", "qvfixed", "qvfloat", "fpx"}},
 };
 
 struct Include {

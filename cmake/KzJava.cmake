@@ -1,0 +1,87 @@
+# The Java front: whether it is built, over which platform, and which names leave the library.
+#
+#   KZ_JNI       build the front into the library. Default: on when a jni.h is at hand; it costs a
+#                few kilobytes, and makes the library one that Java can load
+#   KZ_PLATFORM  what the front logs to and starts threads with: see
+#                kzsdk/jni/platform/platform.hpp. Default: portable, which needs nothing and so loads
+#                anywhere; ndk when building for Android
+#   KZ_SMALL_MAP export only the extraction interface, start-up and what Java needs
+
+find_package(Java 1.8 COMPONENTS Development Runtime QUIET)
+if(Java_JAVAC_EXECUTABLE)
+  file(REAL_PATH "${Java_JAVAC_EXECUTABLE}" javac)
+  cmake_path(GET javac PARENT_PATH bin)
+  cmake_path(GET bin PARENT_PATH KZ_JAVA_HOME)
+endif()
+if(ANDROID)
+  find_path(KZ_JNI_INCLUDE_DIR jni.h)
+else()
+  find_path(KZ_JNI_INCLUDE_DIR jni.h HINTS "${KZ_JAVA_HOME}/include" "$ENV{JAVA_HOME}/include"
+            DOC "Where jni.h is")
+endif()
+find_path(
+  KZ_JNI_MD_INCLUDE_DIR jni_md.h
+  HINTS "${KZ_JNI_INCLUDE_DIR}/linux" "${KZ_JNI_INCLUDE_DIR}/darwin"
+  DOC "Where the jni_md.h that jni.h includes is")
+mark_as_advanced(KZ_JNI_INCLUDE_DIR KZ_JNI_MD_INCLUDE_DIR)
+
+set(jni_default OFF)
+if(KZ_JNI_INCLUDE_DIR)
+  set(jni_default ON)
+endif()
+option(KZ_JNI "Build the front that a Java VM loads" ${jni_default})
+option(KZ_SMALL_MAP "Export only the extraction interface, start-up and JNI_OnLoad" ${ANDROID})
+
+set(platform_default portable)
+if(ANDROID)
+  set(platform_default ndk)
+endif()
+set(KZ_PLATFORM ${platform_default} CACHE STRING "Log and threads of the Java front")
+set_property(CACHE KZ_PLATFORM PROPERTY STRINGS portable ndk aosp)
+if(NOT KZ_PLATFORM MATCHES "^(portable|ndk|aosp)$")
+  message(FATAL_ERROR "KZ_PLATFORM is portable, ndk or aosp, not ${KZ_PLATFORM}")
+endif()
+
+if(KZ_JNI AND NOT KZ_JNI_INCLUDE_DIR)
+  message(FATAL_ERROR "KZ_JNI needs jni.h: install a JDK, set JAVA_HOME, or take -DKZ_JNI=OFF")
+endif()
+
+add_library(kz_jni_headers INTERFACE)
+if(KZ_JNI AND NOT ANDROID)
+  target_include_directories(kz_jni_headers SYSTEM INTERFACE "${KZ_JNI_INCLUDE_DIR}")
+  if(KZ_JNI_MD_INCLUDE_DIR)
+    target_include_directories(kz_jni_headers SYSTEM INTERFACE "${KZ_JNI_MD_INCLUDE_DIR}")
+  endif()
+endif()
+
+# Android's log and threads: in the NDK's system root, or as Debian packages them for a desktop.
+if(ANDROID)
+  set(KZ_ANDROID_LOG_LIBRARY log)
+else()
+  find_path(KZ_ANDROID_INCLUDE_DIR android/log.h HINTS /usr/include/android)
+  find_library(KZ_ANDROID_LOG_LIBRARY log PATH_SUFFIXES android)
+  find_library(KZ_ANDROID_UTILS_LIBRARY utils PATH_SUFFIXES android)
+  mark_as_advanced(KZ_ANDROID_INCLUDE_DIR KZ_ANDROID_LOG_LIBRARY KZ_ANDROID_UTILS_LIBRARY)
+endif()
+
+set(KZ_PLATFORM_LIBRARIES "")
+if(KZ_PLATFORM STREQUAL "ndk")
+  set(KZ_PLATFORM_LIBRARIES ${KZ_ANDROID_LOG_LIBRARY})
+elseif(KZ_PLATFORM STREQUAL "aosp")
+  set(KZ_PLATFORM_LIBRARIES ${KZ_ANDROID_LOG_LIBRARY} ${KZ_ANDROID_UTILS_LIBRARY})
+endif()
+
+# kz_symbol_map(<variable>): the file that lists the exported names of this build.
+function(kz_symbol_map variable)
+  set(map "${PROJECT_SOURCE_DIR}/kzsdk/kzsdk.map")
+  if(KZ_SMALL_MAP)
+    set(map "${PROJECT_SOURCE_DIR}/kzsdk/kzsdk_small.map")
+  endif()
+  if(NOT KZ_JNI)
+    file(READ "${map}" names)
+    string(REGEX REPLACE "\n *# jni[^\n]*\n *JNI_OnLoad;" "" names "${names}")
+    set(map "${PROJECT_BINARY_DIR}/kzsdk_without_jni.map")
+    file(CONFIGURE OUTPUT "${map}" CONTENT "${names}" @ONLY)
+  endif()
+  set(${variable} "${map}" PARENT_SCOPE)
+endfunction()

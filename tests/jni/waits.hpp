@@ -1,0 +1,28 @@
+/// @file
+/// Gets between a condition variable and those who wait for it: the library's waits and signals only,
+/// not those of the C++ run-time library.
+#pragma once
+
+#include <cstdint>
+
+namespace kz::test {
+
+/// Waits that have begun so far. One that has begun holds the mutex until it sleeps.
+uint64_t waits_begun();
+
+/// Comes back when so many waits have begun.
+void until_waits_have_begun(uint64_t count);
+
+/// Signals are lost while it lives.
+class LostSignals {
+public:
+    LostSignals();
+    ~LostSignals();
+    LostSignals(const LostSignals&) = delete;
+    LostSignals& operator=(const LostSignals&) = delete;
+};
+
+/// Wakes whoever waits at the condition that was waited for last.
+void wake_without_reason();
+
+} // namespace kz::test
