@@ -85,3 +85,47 @@ function(kz_symbol_map variable)
   endif()
   set(${variable} "${map}" PARENT_SCOPE)
 endfunction()
+
+set(java_default OFF)
+if(KZ_JNI AND Java_JAVAC_EXECUTABLE AND Java_JAR_EXECUTABLE AND NOT CMAKE_CROSSCOMPILING)
+  set(java_default ON)
+endif()
+option(KZ_JAVA "Build kzsdk.jar, the Java side of the front" ${java_default})
+
+# kz_jar(<target> OUTPUT <name> SOURCES <files> [CLASSPATH <jars>] [MANIFEST <file>] [FLAGS <flags>])
+#
+# Compiles for Java 8, warnings being errors, and packs the classes. The jar's path is the target's
+# property KZ_JAR.
+function(kz_jar target)
+  cmake_parse_arguments(PARSE_ARGV 1 jar "" "OUTPUT;MANIFEST" "SOURCES;CLASSPATH;FLAGS")
+  set(classes "${CMAKE_CURRENT_BINARY_DIR}/${target}.classes")
+  set(output "${CMAKE_CURRENT_BINARY_DIR}/${jar_OUTPUT}")
+  if(Java_VERSION VERSION_GREATER_EQUAL 9)
+    set(level --release 8)
+  else()
+    set(level -source 8 -target 8)
+  endif()
+  set(classpath "")
+  if(jar_CLASSPATH)
+    string(JOIN ":" classpath ${jar_CLASSPATH})
+    set(classpath -classpath "${classpath}")
+  endif()
+  set(manifest "")
+  set(mode cf)
+  if(jar_MANIFEST)
+    set(mode cfm)
+    set(manifest "${jar_MANIFEST}")
+  endif()
+  add_custom_command(
+    OUTPUT "${output}"
+    COMMAND "${CMAKE_COMMAND}" -E rm -rf "${classes}"
+    COMMAND "${CMAKE_COMMAND}" -E make_directory "${classes}"
+    COMMAND "${Java_JAVAC_EXECUTABLE}" ${level} -encoding UTF-8 -g -Xlint:all,-options,-serial -Werror
+            ${jar_FLAGS} ${classpath} -d "${classes}" ${jar_SOURCES}
+    COMMAND "${Java_JAR_EXECUTABLE}" ${mode} "${output}" ${manifest} -C "${classes}" .
+    DEPENDS ${jar_SOURCES} ${jar_CLASSPATH} ${jar_MANIFEST}
+    COMMENT "Packing ${jar_OUTPUT}"
+    VERBATIM)
+  add_custom_target(${target} ALL DEPENDS "${output}")
+  set_target_properties(${target} PROPERTIES KZ_JAR "${output}")
+endfunction()

@@ -55,12 +55,23 @@ jint exchange_context(JNIEnv* env, jobject self, jint number) noexcept
     return before;
 }
 
+/// Leaves a number alone that another set-up has put there meanwhile.
+void clear_context(JNIEnv* env, jobject self, jint number) noexcept
+{
+    const Lock lock(context_mutex);
+    if (context_of(env, self) == number) {
+        env->SetIntField(self, java.context, 0);
+    }
+}
+
 void end_session(JNIEnv* env, jint number) noexcept
 {
-    auto* const session = static_cast<Session*>(sessions.take(number));
+    auto* const session = static_cast<Session*>(sessions.claim(number));
     if (session == nullptr) {
         return;
     }
+    session->thread.requestExit(); // the event of a running job still finds its text
+    sessions.remove(*session);
     const jobject reference = session->java_object;
     kz::jni::destroy(session);
     env->DeleteGlobalRef(reference);
@@ -151,7 +162,9 @@ void com_orvanta_android_kzsdk_Fingerprint_native_finalize(JNIEnv* env, jobject 
 
 void com_orvanta_android_kzsdk_Fingerprint_native_release(JNIEnv* env, jobject self) noexcept
 {
-    end_session(env, exchange_context(env, self, 0));
+    const jint number = context_of(env, self);
+    end_session(env, number);
+    clear_context(env, self, number);
 }
 
 jint com_orvanta_android_kzsdk_Fingerprint_native_generate(JNIEnv* env, jobject self,

@@ -62,7 +62,7 @@ int32_t FingerprintThread::generate(uint32_t sample_rate, int32_t channels,
 {
     const Lock lock(mutex_);
     const bool accepts = state_ == kReady || state_ == kLastSucceeded || state_ == kLastFailed;
-    if (!accepts || job_ == nullptr) {
+    if (!accepts || exit_requested_ || job_ == nullptr) {
         return kRefused;
     }
     job_->setGenerateConfig(sample_rate, channels, wave_format_code, bits_per_sample, audio,
@@ -125,6 +125,13 @@ void FingerprintThread::acknowledgeExit() noexcept
 }
 
 void FingerprintThread::withoutWorker() noexcept { acknowledgeExit(); }
+
+void FingerprintThread::requestExit() noexcept
+{
+    const Lock lock(mutex_);
+    exit_requested_ = true;
+    signal();
+}
 
 int32_t FingerprintThread::release() noexcept
 {

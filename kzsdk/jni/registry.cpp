@@ -31,19 +31,24 @@ void Registry::unpin(Registered& object) noexcept
     }
 }
 
-Registered* Registry::take(int32_t number) noexcept
+Registered* Registry::claim(int32_t number) noexcept
 {
     const Lock lock(mutex_);
-    Registered** const link = find(number);
-    Registered* const object = *link;
-    if (object == nullptr) {
+    Registered* const object = *find(number);
+    if (object == nullptr || object->claimed) {
         return nullptr;
     }
-    *link = object->next;
-    while (object->pins != 0) {
+    object->claimed = true;
+    return object;
+}
+
+void Registry::remove(Registered& object) noexcept
+{
+    const Lock lock(mutex_);
+    *find(object.number) = object.next;
+    while (object.pins != 0) {
         pthread_cond_wait(&unpinned_, &mutex_);
     }
-    return object;
 }
 
 /// The link that leads to the object, or the null link at the end.

@@ -13,6 +13,7 @@ namespace kz::jni {
 struct Registered {
     int32_t number = 0;
     uint32_t pins = 0;
+    bool claimed = false;
     Registered* next = nullptr;
 };
 
@@ -20,7 +21,8 @@ struct Registered {
 /// four thousand million objects. Objects are looked up in a list, since each has a thread, and threads
 /// are few.
 ///
-/// Threads: all calls are safe at any time. An object lives as long as somebody has it pinned.
+/// Threads: all calls are safe at any time. Whoever has claimed an object is the one to remove it, and
+/// does not get further as long as somebody has it pinned.
 class Registry {
 public:
     /// @param last_number  The number given before the first one.
@@ -29,13 +31,16 @@ public:
     /// Gives the object a number, which is never 0 nor that of another object here.
     int32_t add(Registered& object) noexcept;
 
-    /// Finds an object and keeps it from being taken; null for a number of none. Goes with unpin().
+    /// Finds an object and keeps it from being removed; null for a number of none. Goes with unpin().
     Registered* pin(int32_t number) noexcept;
     void unpin(Registered& object) noexcept;
 
-    /// Takes an object out: nobody finds it from now on. Comes back when nobody has it pinned any more.
-    /// Null for a number of none: the second of two calls gets that.
-    Registered* take(int32_t number) noexcept;
+    /// Finds an object that is to be removed. Null for a number of none, and for one that is claimed:
+    /// of two that want to remove an object one does.
+    Registered* claim(int32_t number) noexcept;
+
+    /// Takes a claimed object out: nobody finds it from now on. Comes back when nobody has it pinned.
+    void remove(Registered& object) noexcept;
 
 private:
     Registered** find(int32_t number) noexcept;

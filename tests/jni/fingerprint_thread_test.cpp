@@ -246,6 +246,22 @@ TEST_F(Worker, FinishesARunningJobBeforeItIsReleased)
     EXPECT_EQ(0, Events::all().wait_for(1));
 }
 
+TEST_F(Worker, BeginsNoJobOnceItsExitIsRequested)
+{
+    const uint64_t before = waits_begun();
+    const auto worker = started();
+    until_waits_have_begun(before + 2);
+    {
+        const LostSignals asleep;
+        EXPECT_EQ(0, request(*worker));
+        worker->requestExit();
+    }
+    EXPECT_EQ(-4, request(*worker));
+    wake_without_reason();
+    worker->requestExit();
+    EXPECT_EQ(0U, Events::all().count());
+}
+
 // A released worker has no job to describe the audio to.
 TEST_F(Worker, RefusesARequestAfterItsRelease)
 {

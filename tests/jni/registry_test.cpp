@@ -36,7 +36,7 @@ TEST(Registry, FindsNothingByAnUnknownNumber)
     const int32_t number = registry.add(object);
     for (const int32_t other : {0, number + 1, -number, std::numeric_limits<int32_t>::min()}) {
         EXPECT_EQ(nullptr, registry.pin(other));
-        EXPECT_EQ(nullptr, registry.take(other));
+        EXPECT_EQ(nullptr, registry.claim(other));
     }
 }
 
@@ -45,9 +45,22 @@ TEST(Registry, FindsNothingByAStaleNumber)
     Registry registry;
     Registered object;
     const int32_t stale = registry.add(object);
-    EXPECT_EQ(&object, registry.take(stale));
+    EXPECT_EQ(&object, registry.claim(stale));
+    registry.remove(object);
     EXPECT_EQ(nullptr, registry.pin(stale));
-    EXPECT_EQ(nullptr, registry.take(stale)) << "the second of two calls";
+    EXPECT_EQ(nullptr, registry.claim(stale));
+}
+
+TEST(Registry, LetsOneOfTwoClaimAnObjectThatOthersStillFind)
+{
+    Registry registry;
+    Registered object;
+    const int32_t number = registry.add(object);
+    EXPECT_EQ(&object, registry.claim(number));
+    EXPECT_EQ(nullptr, registry.claim(number));
+    EXPECT_EQ(&object, registry.pin(number));
+    registry.unpin(object);
+    registry.remove(object);
 }
 
 TEST(Registry, GivesNoNumberTwice)
@@ -58,7 +71,8 @@ TEST(Registry, GivesNoNumberTwice)
         Registered object;
         const int32_t number = registry.add(object);
         EXPECT_TRUE(given.insert(number).second);
-        registry.take(number);
+        registry.claim(number);
+        registry.remove(object);
     }
     EXPECT_FALSE(given.contains(0));
 }
@@ -83,7 +97,7 @@ TEST(Registry, StepsOverZeroAndNumbersInUseWhenAllHaveBeenGiven)
     EXPECT_EQ(3, full.add(five));
 }
 
-TEST(Registry, TakesFromAnywhereInTheList)
+TEST(Registry, RemovesFromAnywhereInTheList)
 {
     Registry registry;
     std::vector<Registered> objects(5);
@@ -92,31 +106,33 @@ TEST(Registry, TakesFromAnywhereInTheList)
         numbers.push_back(registry.add(object));
     }
     for (const size_t index : {2U, 4U, 0U, 1U, 3U}) {
-        EXPECT_EQ(&objects[index], registry.take(numbers[index]));
+        EXPECT_EQ(&objects[index], registry.claim(numbers[index]));
+        registry.remove(objects[index]);
         EXPECT_EQ(nullptr, registry.pin(numbers[index]));
     }
 }
 
-TEST(Registry, TakesNothingThatIsPinned)
+TEST(Registry, RemovesNothingThatIsPinned)
 {
     Registry registry;
     Registered object;
     const int32_t number = registry.add(object);
     registry.pin(number);
     registry.pin(number);
-    std::atomic<bool> taken{false};
+    std::atomic<bool> removed{false};
     const uint64_t before = kz::test::waits_begun();
-    std::thread taker([&] {
-        EXPECT_EQ(&object, registry.take(number));
-        taken = true;
+    std::thread remover([&] {
+        EXPECT_EQ(&object, registry.claim(number));
+        registry.remove(object);
+        removed = true;
     });
     kz::test::until_waits_have_begun(before + 1);
-    EXPECT_EQ(nullptr, registry.pin(number)) << "nobody finds what is being taken";
+    EXPECT_EQ(nullptr, registry.pin(number)) << "nobody finds what is being removed";
     registry.unpin(object);
     kz::test::wake_without_reason();
-    EXPECT_FALSE(taken);
+    EXPECT_FALSE(removed);
     registry.unpin(object);
-    taker.join();
+    remover.join();
 }
 
 TEST(Registry, ServesManyThreads)
@@ -137,9 +153,9 @@ TEST(Registry, ServesManyThreads)
     for (int i = 0; i < 2000; ++i) {
         Registered object; // gone at the end of this turn
         current = registry.add(object);
-        std::vector<std::thread> takers;
-        EXPECT_EQ(&object, registry.take(current));
-        EXPECT_EQ(nullptr, registry.take(current));
+        EXPECT_EQ(&object, registry.claim(current));
+        EXPECT_EQ(nullptr, registry.claim(current));
+        registry.remove(object);
     }
     done = true;
     for (auto& user : users) {

@@ -8,7 +8,7 @@
 namespace {
 
 std::atomic<uint64_t> waits{0};
-std::atomic<bool> lose_signals{false};
+std::atomic<bool> losing_signals{false};
 std::atomic<pthread_cond_t*> last_waited_for{nullptr};
 
 } // namespace
@@ -27,7 +27,7 @@ int __wrap_pthread_cond_wait(pthread_cond_t* condition, pthread_mutex_t* mutex)
 
 int __wrap_pthread_cond_signal(pthread_cond_t* condition)
 {
-    return lose_signals ? 0 : __real_pthread_cond_signal(condition);
+    return losing_signals ? 0 : __real_pthread_cond_signal(condition);
 }
 
 } // extern "C"
@@ -43,8 +43,10 @@ void until_waits_have_begun(uint64_t count)
     }
 }
 
-LostSignals::LostSignals() { lose_signals = true; }
-LostSignals::~LostSignals() { lose_signals = false; }
+void lose_signals(bool lose) { losing_signals = lose; }
+
+LostSignals::LostSignals() { lose_signals(true); }
+LostSignals::~LostSignals() { lose_signals(false); }
 
 void wake_without_reason() { pthread_cond_broadcast(last_waited_for); }
 

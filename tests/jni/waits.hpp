@@ -13,6 +13,9 @@ uint64_t waits_begun();
 /// Comes back when so many waits have begun.
 void until_waits_have_begun(uint64_t count);
 
+/// Whether signals are lost.
+void lose_signals(bool lose);
+
 /// Signals are lost while it lives.
 class LostSignals {
 public:

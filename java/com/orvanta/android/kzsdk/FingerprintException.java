@@ -1,0 +1,10 @@
+package com.orvanta.android.kzsdk;
+
+/** Tells that audio gave no fingerprint. */
+public final class FingerprintException extends Exception {
+    private static final long serialVersionUID = 1L;
+
+    FingerprintException(String message) {
+        super(message);
+    }
+}
