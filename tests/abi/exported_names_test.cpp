@@ -54,6 +54,19 @@ public:
         return found;
     }
 
+    std::vector<ElfW(Phdr)> loaded_segments() const
+    {
+        const auto header = at<ElfW(Ehdr)>(0);
+        std::vector<ElfW(Phdr)> found;
+        for (unsigned i = 0; i < header.e_phnum; ++i) {
+            const auto segment = at<ElfW(Phdr)>(header.e_phoff + i * header.e_phentsize);
+            if (segment.p_type == PT_LOAD) {
+                found.push_back(segment);
+            }
+        }
+        return found;
+    }
+
     Names dynamic_texts(ElfW(Sxword) tag) const
     {
         Names found;
@@ -194,6 +207,17 @@ TEST(ExportedNames, StandInTheMapOnce)
 TEST(SharedLibraryFile, BearsTheMajorVersionInItsName)
 {
     EXPECT_EQ(Names{"libkzsdk.so.1"}, SharedLibrary(KZ_LIBRARY).dynamic_texts(DT_SONAME));
+}
+
+// Pages of 16 KiB are found on Android and on ARM servers.
+TEST(SharedLibraryFile, LoadsWherePagesHaveSixteenKibibytes)
+{
+    const auto segments = SharedLibrary(KZ_LIBRARY).loaded_segments();
+    EXPECT_FALSE(segments.empty());
+    for (const auto& segment : segments) {
+        EXPECT_EQ(0U, segment.p_align % 16384);
+        EXPECT_EQ(segment.p_offset % 16384, segment.p_vaddr % 16384);
+    }
 }
 
 // Whatever else it needed would have to be there in the right version wherever the library loads.
