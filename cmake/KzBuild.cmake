@@ -28,6 +28,17 @@ if(KZ_SANITIZE)
   target_link_options(kz_settings INTERFACE -fsanitize=${KZ_SANITIZE})
 endif()
 
+# Objects that go into the library.
+function(kz_library_objects target)
+  add_library(${target} OBJECT ${ARGN})
+  target_link_libraries(${target} PRIVATE kz_settings)
+  target_include_directories(${target} PRIVATE "${PROJECT_SOURCE_DIR}")
+  target_compile_options(${target} PRIVATE -fno-exceptions -fno-rtti)
+  set_target_properties(
+    ${target} PROPERTIES POSITION_INDEPENDENT_CODE ON CXX_VISIBILITY_PRESET hidden
+                         VISIBILITY_INLINES_HIDDEN ON)
+endfunction()
+
 # kz_room(<name> [BELOW <room>...] HEADERS <public headers> SOURCES <files>)
 #
 # A room of the library becomes an object library. A room sees, and its tests link, only what is
@@ -35,13 +46,7 @@ endif()
 function(kz_room name)
   cmake_parse_arguments(PARSE_ARGV 1 room "" "" "BELOW;HEADERS;SOURCES")
   set(target kz_${name})
-  add_library(${target} OBJECT ${room_SOURCES})
-  target_link_libraries(${target} PRIVATE kz_settings)
-  target_include_directories(${target} PRIVATE "${PROJECT_SOURCE_DIR}")
-  target_compile_options(${target} PRIVATE -fno-exceptions -fno-rtti)
-  set_target_properties(
-    ${target} PROPERTIES POSITION_INDEPENDENT_CODE ON CXX_VISIBILITY_PRESET hidden
-                         VISIBILITY_INLINES_HIDDEN ON)
+  kz_library_objects(${target} ${room_SOURCES})
   set(closure ${name})
   foreach(below IN LISTS room_BELOW)
     get_property(lower GLOBAL PROPERTY KZ_ROOM_${below}_CLOSURE)

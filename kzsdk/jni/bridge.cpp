@@ -72,7 +72,7 @@ void end_session(JNIEnv* env, jint number) noexcept
     }
     session->thread.requestExit(); // the event of a running job still finds its text
     sessions.remove(*session);
-    const jobject reference = session->java_object;
+    jobject reference = session->java_object;
     kz::jni::destroy(session);
     env->DeleteGlobalRef(reference);
 }
@@ -133,7 +133,7 @@ int32_t start(FingerprintThread& thread) noexcept
 jint com_orvanta_android_kzsdk_Fingerprint_native_setup(JNIEnv* env, jobject self,
                                                         jobject weak_this) noexcept
 {
-    const jobject reference = env->NewGlobalRef(weak_this);
+    jobject reference = env->NewGlobalRef(weak_this);
     if (reference == nullptr && weak_this != nullptr) {
         return android::kNoMemory;
     }
@@ -235,7 +235,7 @@ int register_methods(JNIEnv* env) noexcept
 /// Null, or what could not be found.
 const char* find_java_side(JNIEnv* env) noexcept
 {
-    const jclass type = env->FindClass(kClassName);
+    jclass type = env->FindClass(kClassName);
     if (type == nullptr) {
         return "Can't find com/orvanta/android/kzsdk/Fingerprint";
     }
@@ -277,9 +277,8 @@ int register_com_orvanta_android_kzsdk_Fingerprint(JNIEnv* env) noexcept
     return result;
 }
 
-extern "C" JNIEXPORT jint JNICALL JNI_OnLoad(JavaVM* vm, void* /*reserved*/) noexcept;
-
-jint JNI_OnLoad(JavaVM* vm, void* /*reserved*/) noexcept
+// Declared in jni.h, for C and for export.
+jint JNI_OnLoad(JavaVM* vm, void* /*reserved*/)
 {
     void* env = nullptr;
     if (vm->GetEnv(&env, JNI_VERSION_1_4) != JNI_OK) {

@@ -37,7 +37,7 @@ void AndroidRuntime::setJavaVM(JavaVM* vm) noexcept { java_vm = vm; }
 int AndroidRuntime::registerNativeMethods(JNIEnv* env, const char* class_name,
                                           const JNINativeMethod* methods, int count) noexcept
 {
-    const jclass type = env->FindClass(class_name);
+    jclass type = env->FindClass(class_name);
     if (type == nullptr) {
         return JNI_ERR;
     }

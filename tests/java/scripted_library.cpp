@@ -107,7 +107,7 @@ SCRIPT(jbyteArray, audio)(JNIEnv* env, jclass)
 {
     const std::string& audio = script().audio;
     const auto size = static_cast<jsize>(audio.size());
-    const jbyteArray bytes = env->NewByteArray(size);
+    jbyteArray bytes = env->NewByteArray(size);
     env->SetByteArrayRegion(bytes, 0, size, reinterpret_cast<const jbyte*>(audio.data()));
     return bytes;
 }

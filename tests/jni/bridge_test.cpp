@@ -16,8 +16,7 @@
 #include "kzsdk/jni/runtime.hpp"
 #include "platform_probe.hpp"
 #include "scripted_core.hpp"
-
-extern "C" jint JNI_OnLoad(JavaVM* vm, void* reserved) noexcept;
+#include "support/allocation.hpp"
 
 namespace {
 
@@ -272,6 +271,83 @@ TEST(Environment, IsNullWhereTheThreadCannotBeAttached)
     EXPECT_EQ(Calls{"attach"}, vm_state.calls);
 }
 
+jint set_up()
+{
+    const auto setup = reinterpret_cast<jint (*)(JNIEnv*, jobject, jobject)>(natives.at(0));
+    return setup(&environment, thing<jobject>(0), thing<jobject>(0));
+}
+
+jint request()
+{
+    const auto generate =
+        reinterpret_cast<jint (*)(JNIEnv*, jobject, jint, jint, jint, jint, jbyteArray, jint)>(
+            natives.at(2));
+    return generate(&environment, thing<jobject>(0), 44100, 2, 1, 16, thing<jbyteArray>(0), 4);
+}
+
+void release()
+{
+    reinterpret_cast<void (*)(JNIEnv*, jobject)>(natives.at(4))(&environment, thing<jobject>(0));
+}
+
+TEST(SetUp, WithoutAThreadIsLoggedAndKeepsItsReference)
+{
+    vm_state = {};
+    ASSERT_EQ(0x10004, JNI_OnLoad(&vm, nullptr));
+    vm_state.global_references = 0;
+    context = 7;
+    const int64_t before = live_blocks();
+    const CapturedLog captured;
+    {
+        const NoThreads refused;
+        EXPECT_EQ(-2, set_up());
+    }
+    EXPECT_EQ((LogLines{{3, "FingerprintJNI", "native_setup: init error"},
+                        {3, "FingerprintJNI", "native_setup error"}}),
+              captured.lines());
+    EXPECT_EQ(7, context) << "the field is not set";
+    EXPECT_EQ(1, vm_state.global_references);
+    EXPECT_EQ(before, live_blocks());
+    context = 0;
+}
+
+TEST(SetUp, ReportsEachAllocationThatFails)
+{
+    vm_state = {};
+    ASSERT_EQ(0x10004, JNI_OnLoad(&vm, nullptr));
+    const CapturedLog captured;
+    for_every_failed_allocation([&](auto fired) {
+        const jint code = set_up();
+        EXPECT_EQ(fired() ? -2 : 0, code);
+        EXPECT_EQ(code == 0, context != 0);
+        release();
+    });
+}
+
+TEST(SetUp, ReportsThatNoReferenceCanBeMade)
+{
+    vm_state = {};
+    ASSERT_EQ(0x10004, JNI_OnLoad(&vm, nullptr));
+    vm_state.fails_at = "global reference";
+    EXPECT_EQ(-2, set_up());
+    EXPECT_EQ(0, context);
+}
+
+TEST(Request, WithoutMemoryForACopyIsRefusedAndLeavesTheWorkerReady)
+{
+    script() = {};
+    vm_state = {};
+    ASSERT_EQ(0x10004, JNI_OnLoad(&vm, nullptr));
+    ASSERT_EQ(0, set_up());
+    {
+        const AllocationFault fault(1);
+        EXPECT_EQ(-2, request());
+    }
+    android::AndroidRuntime::setJavaVM(nullptr); // nobody to post the event to
+    EXPECT_EQ(0, request());
+    release();
+}
+
 // A worker goes on without its VM, and says so.
 TEST(Environment, ThatIsMissingIsLoggedWithTheEventThatCannotBePosted)
 {
@@ -281,18 +357,12 @@ TEST(Environment, ThatIsMissingIsLoggedWithTheEventThatCannotBePosted)
     vm_state.fails_at = "attach";
     android::AndroidRuntime::setJavaVM(&detached_vm);
     const CapturedLog captured;
-    const auto setup = reinterpret_cast<jint (*)(JNIEnv*, jobject, jobject)>(natives.at(0));
-    const auto generate =
-        reinterpret_cast<jint (*)(JNIEnv*, jobject, jint, jint, jint, jint, jbyteArray, jint)>(
-            natives.at(2));
-    const auto release = reinterpret_cast<void (*)(JNIEnv*, jobject)>(natives.at(4));
-    EXPECT_EQ(0, setup(&environment, thing<jobject>(0), thing<jobject>(0)));
-    EXPECT_EQ(0,
-              generate(&environment, thing<jobject>(0), 44100, 2, 1, 16, thing<jbyteArray>(0), 4));
+    EXPECT_EQ(0, set_up());
+    EXPECT_EQ(0, request());
     while (captured.lines().empty()) {
         std::this_thread::yield();
     }
-    release(&environment, thing<jobject>(0));
+    release();
     EXPECT_EQ((LogLines{{6, "FingerprintJNI",
                          "fingerprint_eventcallback: No JNI env for Fingerprint event callback, "
                          "can't post event."}}),

@@ -43,6 +43,29 @@ std::string text_of(const FingerprintThread& worker)
     return {worker.getFingerprint(), strnlen(worker.getFingerprint(), 600)};
 }
 
+/// A job that stands in the middle until it may end.
+class HeldJob {
+public:
+    explicit HeldJob(FingerprintThread& worker)
+    {
+        script().during_job = [this] {
+            begun_ = true;
+            while (!may_end_) {
+                std::this_thread::yield();
+            }
+        };
+        EXPECT_EQ(0, request(worker));
+        while (!begun_) {
+            std::this_thread::yield();
+        }
+    }
+    void end() { may_end_ = true; }
+
+private:
+    std::atomic<bool> begun_{false};
+    std::atomic<bool> may_end_{false};
+};
+
 /// Long enough for anything that is going to happen; never waited for by what passes.
 constexpr auto kNever = 300ms;
 
@@ -194,18 +217,7 @@ TEST_F(Worker, LosesNoRequestMadeDuringAJob)
 TEST_F(Worker, WaitsInARequestForARunningJob)
 {
     const auto worker = started();
-    std::atomic<bool> begun{false};
-    std::atomic<bool> may_end{false};
-    script().during_job = [&] {
-        begun = true;
-        while (!may_end) {
-            std::this_thread::yield();
-        }
-    };
-    EXPECT_EQ(0, request(*worker));
-    while (!begun) {
-        std::this_thread::yield();
-    }
+    HeldJob job(*worker);
     std::atomic<bool> answered{false};
     std::thread second([&] {
         EXPECT_EQ(0, request(*worker));
@@ -213,7 +225,7 @@ TEST_F(Worker, WaitsInARequestForARunningJob)
     });
     std::this_thread::sleep_for(20ms);
     EXPECT_FALSE(answered);
-    may_end = true;
+    job.end();
     second.join();
     Events::all().wait_for(2);
 }
@@ -221,18 +233,7 @@ TEST_F(Worker, WaitsInARequestForARunningJob)
 TEST_F(Worker, FinishesARunningJobBeforeItIsReleased)
 {
     auto worker = started();
-    std::atomic<bool> begun{false};
-    std::atomic<bool> may_end{false};
-    script().during_job = [&] {
-        begun = true;
-        while (!may_end) {
-            std::this_thread::yield();
-        }
-    };
-    EXPECT_EQ(0, request(*worker));
-    while (!begun) {
-        std::this_thread::yield();
-    }
+    HeldJob job(*worker);
     std::atomic<bool> released{false};
     std::thread releaser([&] {
         worker.reset();
@@ -241,7 +242,7 @@ TEST_F(Worker, FinishesARunningJobBeforeItIsReleased)
     });
     std::this_thread::sleep_for(20ms);
     EXPECT_FALSE(released);
-    may_end = true;
+    job.end();
     releaser.join();
     EXPECT_EQ(0, Events::all().wait_for(1));
 }
