@@ -2,10 +2,9 @@
 #include <limits>
 #include <span>
 
-#include "kzsdk/abs/owned.hpp"
 #include "kzsdk/dsp/fxp.h"
 #include "kzsdk/dsp/fxp_ops.hpp"
-#include "kzsdk/qv/frame_pieces.hpp"
+#include "kzsdk/qv/equalise.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
 namespace {
@@ -18,7 +17,7 @@ using Pieces = kz::qv::FramePieces<FxpType>;
 // A frame whose halved range is no more than this is silent.
 constexpr int32_t kSilentRange = 8192;
 
-struct Extremes {
+struct SampleExtremes {
     int32_t low = std::numeric_limits<int32_t>::max();
     int32_t high = std::numeric_limits<int32_t>::min();
 
@@ -33,6 +32,7 @@ struct Extremes {
     // Halved before they are subtracted, so that the difference fits.
     int32_t bottom() const noexcept { return low >> 1; }
     int32_t range() const noexcept { return wrap_sub(high >> 1, low >> 1); }
+    bool is_silent() const noexcept { return range() <= kSilentRange; }
 };
 
 // Maps halved samples to levels 0 .. K - 1 by a multiplication with (K - 1) / range.
@@ -90,19 +90,25 @@ void rank_values(std::span<const uint32_t> histogram, std::span<uint32_t> ranks)
     }
 }
 
-void equalise(const Pieces& pieces, const Extremes& extremes, FxpType* output,
-              std::span<uint32_t> histogram, std::span<uint32_t> ranks) noexcept
-{
-    const Quantiser quantiser(extremes.bottom(), extremes.range(),
-                              static_cast<uint32_t>(histogram.size()));
-    std::fill(histogram.begin(), histogram.end(), 0U);
-    quantise(pieces.older, quantiser, output, histogram);
-    quantise(pieces.newer, quantiser, output + pieces.older.size(), histogram);
-    rank_values(histogram, ranks);
-    for (FxpType& value : std::span(output, pieces.older.size() + pieces.newer.size())) {
-        value = static_cast<FxpType>(ranks[static_cast<uint32_t>(value)]);
+struct Equaliser {
+    using Sample = FxpType;
+    using Rank = uint32_t;
+    using Extremes = SampleExtremes;
+
+    static void run(const Pieces& pieces, const SampleExtremes& extremes, FxpType* output,
+                    std::span<uint32_t> histogram, std::span<uint32_t> ranks) noexcept
+    {
+        const Quantiser quantiser(extremes.bottom(), extremes.range(),
+                                  static_cast<uint32_t>(histogram.size()));
+        std::fill(histogram.begin(), histogram.end(), 0U);
+        quantise(pieces.older, quantiser, output, histogram);
+        quantise(pieces.newer, quantiser, output + pieces.older.size(), histogram);
+        rank_values(histogram, ranks);
+        for (FxpType& value : std::span(output, pieces.older.size() + pieces.newer.size())) {
+            value = static_cast<FxpType>(ranks[static_cast<uint32_t>(value)]);
+        }
     }
-}
+};
 
 } // namespace
 
@@ -110,37 +116,12 @@ kz_status kzqvfixed_hist_eq_dual(const FxpType* first, uint32_t first_count, con
                                  uint32_t second_count, FxpType* output, uint32_t output_length,
                                  uint32_t* histogram, uint32_t levels) noexcept
 {
-    if (output == nullptr || histogram == nullptr || levels == 0) {
-        return KZ_OK;
-    }
-    const auto pieces =
-        kz::qv::cut_to_frame(first, first_count, second, second_count, output_length);
-    Extremes extremes;
-    extremes.take(pieces.older);
-    extremes.take(pieces.newer);
-    const auto ranks = kz::make_array<uint32_t>(levels);
-    if (!ranks || extremes.range() <= kSilentRange) {
-        kz::qv::copy_whole_frame(pieces, second, output, output_length);
-        return KZ_OK;
-    }
-    equalise(pieces, extremes, output, {histogram, levels}, {ranks.get(), levels});
-    return KZ_OK;
+    return kz::qv::equalise_two_pieces<Equaliser>(first, first_count, second, second_count, output,
+                                                  output_length, histogram, levels);
 }
 
 kz_status kzqvfixed_hist_eq2(const FxpType* input, FxpType* output, uint32_t count,
                              uint32_t* histogram, uint32_t levels) noexcept
 {
-    if (input == nullptr || output == nullptr || histogram == nullptr || levels == 0) {
-        return KZ_OK;
-    }
-    const Samples samples(input, count);
-    const auto ranks = kz::make_array<uint32_t>(levels);
-    if (!ranks) {
-        std::copy(samples.begin(), samples.end(), output);
-        return KZ_OK;
-    }
-    Extremes extremes;
-    extremes.take(samples);
-    equalise({samples, {}}, extremes, output, {histogram, levels}, {ranks.get(), levels});
-    return KZ_OK;
+    return kz::qv::equalise_one_piece<Equaliser>(input, output, count, histogram, levels);
 }

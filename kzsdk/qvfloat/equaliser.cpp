@@ -3,7 +3,7 @@
 
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/abs/saturate.hpp"
-#include "kzsdk/qv/frame_pieces.hpp"
+#include "kzsdk/qv/equalise.hpp"
 #include "kzsdk/qvfloat/qvfloat.h"
 
 namespace {
@@ -15,7 +15,7 @@ using Pieces = kz::qv::FramePieces<float>;
 constexpr float kSilentRange = 1.0F;
 
 // The search starts beyond any sample of 16 bits, not at the ends of the type.
-struct Extremes {
+struct SampleExtremes {
     float low = 1e6F;
     float high = -1e6F;
 
@@ -28,12 +28,13 @@ struct Extremes {
     }
 
     float range() const noexcept { return high - low; }
+    bool is_silent() const noexcept { return range() <= kSilentRange; }
 };
 
 // Maps samples to levels 0 .. K - 1.
 class Quantiser {
 public:
-    Quantiser(const Extremes& extremes, uint32_t levels) noexcept
+    Quantiser(const SampleExtremes& extremes, uint32_t levels) noexcept
         : bottom_(extremes.low), scale_(static_cast<float>(levels - 1) / extremes.range()),
           top_level_(levels - 1)
     {
@@ -85,17 +86,24 @@ void map_levels(Samples samples, const Quantiser& quantiser, std::span<const flo
     }
 }
 
-void equalise(const Pieces& pieces, const Extremes& extremes, float* output,
-              std::span<uint32_t> histogram, std::span<float> ranks) noexcept
-{
-    const Quantiser quantiser(extremes, static_cast<uint32_t>(histogram.size()));
-    std::fill(histogram.begin(), histogram.end(), 0U);
-    count_levels(pieces.older, quantiser, histogram);
-    count_levels(pieces.newer, quantiser, histogram);
-    rank_values(histogram, static_cast<float>(pieces.older.size() + pieces.newer.size()), ranks);
-    map_levels(pieces.older, quantiser, ranks, output);
-    map_levels(pieces.newer, quantiser, ranks, output + pieces.older.size());
-}
+struct Equaliser {
+    using Sample = float;
+    using Rank = float;
+    using Extremes = SampleExtremes;
+
+    static void run(const Pieces& pieces, const SampleExtremes& extremes, float* output,
+                    std::span<uint32_t> histogram, std::span<float> ranks) noexcept
+    {
+        const Quantiser quantiser(extremes, static_cast<uint32_t>(histogram.size()));
+        std::fill(histogram.begin(), histogram.end(), 0U);
+        count_levels(pieces.older, quantiser, histogram);
+        count_levels(pieces.newer, quantiser, histogram);
+        rank_values(histogram, static_cast<float>(pieces.older.size() + pieces.newer.size()),
+                    ranks);
+        map_levels(pieces.older, quantiser, ranks, output);
+        map_levels(pieces.newer, quantiser, ranks, output + pieces.older.size());
+    }
+};
 
 } // namespace
 
@@ -115,38 +123,13 @@ kz_status hist_eq(const float* input, float* output, uint32_t count, uint32_t le
 kz_status hist_eq2(const float* input, float* output, uint32_t count, uint32_t* histogram,
                    uint32_t levels) noexcept
 {
-    if (input == nullptr || output == nullptr || histogram == nullptr || levels == 0) {
-        return KZ_OK;
-    }
-    const Samples samples(input, count);
-    const auto ranks = kz::make_array<float>(levels);
-    if (!ranks) {
-        std::copy(samples.begin(), samples.end(), output);
-        return KZ_OK;
-    }
-    Extremes extremes;
-    extremes.take(samples);
-    equalise({samples, {}}, extremes, output, {histogram, levels}, {ranks.get(), levels});
-    return KZ_OK;
+    return kz::qv::equalise_one_piece<Equaliser>(input, output, count, histogram, levels);
 }
 
 kz_status hist_eq_dual(const float* first, uint32_t first_count, const float* second,
                        uint32_t second_count, float* output, uint32_t output_length,
                        uint32_t* histogram, uint32_t levels) noexcept
 {
-    if (output == nullptr || histogram == nullptr || levels == 0) {
-        return KZ_OK;
-    }
-    const auto pieces =
-        kz::qv::cut_to_frame(first, first_count, second, second_count, output_length);
-    Extremes extremes;
-    extremes.take(pieces.older);
-    extremes.take(pieces.newer);
-    const auto ranks = kz::make_array<float>(levels);
-    if (!ranks || extremes.range() <= kSilentRange) {
-        kz::qv::copy_whole_frame(pieces, second, output, output_length);
-        return KZ_OK;
-    }
-    equalise(pieces, extremes, output, {histogram, levels}, {ranks.get(), levels});
-    return KZ_OK;
+    return kz::qv::equalise_two_pieces<Equaliser>(first, first_count, second, second_count, output,
+                                                  output_length, histogram, levels);
 }
