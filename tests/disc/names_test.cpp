@@ -110,7 +110,7 @@ std::string built(const Builder& builder, const std::string& root)
 {
     std::string text(70'000, kGuard);
     builder.build(root.c_str(), text.data(), static_cast<uint32_t>(text.size()));
-    return text.c_str();
+    return text.substr(0, text.find('\0'));
 }
 
 class DiscNames : public ::testing::Test {

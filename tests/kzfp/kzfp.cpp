@@ -3,6 +3,7 @@
 #include <fstream>
 #include <iterator>
 #include <sstream>
+#include <utility>
 
 #include <gtest/gtest.h>
 
@@ -62,7 +63,7 @@ ProcessSetup fed_with(const std::string& text)
     ProcessSetup setup;
     setup.input = [text, done = false]() mutable {
         const bool again = std::exchange(done, true);
-        return again ? std::string_view() : std::string_view(text);
+        return again ? std::string_view{} : std::string_view{text};
     };
     return setup;
 }

@@ -3,12 +3,11 @@
 #pragma once
 
 #include <cerrno>
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <string>
 #include <system_error>
-
-#include <stdlib.h>
 
 namespace kz::test {
 
@@ -35,7 +34,7 @@ public:
     /// Writes a file, and the directories that lead to it, and gives its path.
     std::string write(const std::string& name, const std::string& bytes) const
     {
-        const std::string file = path(name);
+        std::string file = path(name);
         std::filesystem::create_directories(std::filesystem::path(file).parent_path());
         std::ofstream(file, std::ios::binary) << bytes;
         return file;

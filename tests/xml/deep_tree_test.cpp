@@ -44,7 +44,7 @@ void on_a_small_stack(const std::function<void()>& function)
     pthread_attr_t attributes;
     ASSERT_EQ(0, pthread_attr_init(&attributes));
     ASSERT_EQ(0, pthread_attr_setstacksize(&attributes, kStack));
-    pthread_t thread;
+    pthread_t thread{};
     auto* argument = const_cast<std::function<void()>*>(&function);
     ASSERT_EQ(0, pthread_create(&thread, &attributes, call, argument));
     EXPECT_EQ(0, pthread_join(thread, nullptr));
