@@ -2,7 +2,8 @@
 // features, values.
 #include "model/float_frame.hpp"
 
-#include <cstring>
+#include <algorithm>
+#include <bit>
 #include <memory>
 
 #include <gtest/gtest.h>
@@ -25,7 +26,8 @@ using Samples = std::vector<float>;
 std::vector<uint32_t> bits(std::span<const float> samples)
 {
     std::vector<uint32_t> words(samples.size());
-    std::memcpy(words.data(), samples.data(), samples.size_bytes());
+    std::transform(samples.begin(), samples.end(), words.begin(),
+                   [](float sample) { return std::bit_cast<uint32_t>(sample); });
     return words;
 }
 

@@ -53,6 +53,9 @@ struct FixedPath {
     using Road = Fingerprint;
     static constexpr uint32_t kAlgorithm = 1;
     static constexpr const char* kName = "Fixed";
+    /// How far a value may lie from plain double arithmetic, in units of 1 / 32768. The value
+    /// itself is cut to an integer, which takes up to 1; the largest distance measured is 1.98.
+    static constexpr double kPlainBound = 3.0;
 
     static Filters filters(const Ratio& ratio) { return library_filters(ratio); }
 
@@ -70,6 +73,8 @@ struct FloatPath {
     using Road = FloatFingerprint;
     static constexpr uint32_t kAlgorithm = 2;
     static constexpr const char* kName = "Float";
+    /// Nothing but that cut: the largest distance measured is 1.00.
+    static constexpr double kPlainBound = 1.1;
 
     static std::vector<float> filters(const Ratio& ratio) { return design(ratio); }
 

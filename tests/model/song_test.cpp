@@ -22,10 +22,6 @@ namespace {
 constexpr double kSeconds = 14.5; // 12 frames take 14.21 s
 constexpr Format kFormats[] = {Format::pcm8, Format::pcm16, Format::alaw, Format::ulaw};
 
-/// How far a value may lie from plain double arithmetic, in units of 1 / 32768. The value itself is
-/// cut to an integer, which takes up to 1; the largest distance measured is 1.98.
-constexpr double kPlainBound = 3.0;
-
 class Library : public ::testing::Test {
 protected:
     void SetUp() override
@@ -170,7 +166,7 @@ void compare_all_formats(const Ratio& ratio)
             if (format !=
                 Format::pcm8) { // folded samples wrap when resampled, which doubles do not
                 EXPECT_LE(distance_from_plain<Path>(ratio, format, channels, song, *values),
-                          kPlainBound)
+                          Path::kPlainBound)
                     << ratio.hertz << " Hz, " << channels << " channels, format "
                     << static_cast<int>(format);
             }
