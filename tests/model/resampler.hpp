@@ -168,7 +168,7 @@ public:
 private:
     using Window = std::reverse_iterator<std::vector<int32_t>::const_iterator>;
 
-    int32_t exact_sum(Window sample, size_t phase) const
+    int32_t exact_sum(const Window& sample, size_t phase) const
     {
         const int shift = ratio().up == 1 ? 32 : 31;
         int64_t sum = 0;
@@ -179,7 +179,7 @@ private:
         return word(sum);
     }
 
-    int32_t split_polyphase_sum(Window sample, size_t phase) const
+    int32_t split_polyphase_sum(const Window& sample, size_t phase) const
     {
         int64_t sum = 0;
         for (size_t k = 0; k < taps_per_phase(ratio()); ++k) {
@@ -192,11 +192,11 @@ private:
 
     /// Symmetric filters: the two samples that share a tap are added first, in 32 bits. Every tap
     /// at a whole number of `down` beside the centre is zero and left out.
-    int32_t split_decimation_sum(Window newest) const
+    int32_t split_decimation_sum(const Window& newest) const
     {
         const uint32_t down = ratio().down;
         const size_t centre = 10 * down + down - 1;
-        const auto sample = [newest](size_t k) { return newest[static_cast<ptrdiff_t>(k)]; };
+        const auto sample = [&newest](size_t k) { return newest[static_cast<ptrdiff_t>(k)]; };
         int64_t sum = split_high_product(taps_[centre], sample(centre));
         for (size_t away = 1; away < 10 * down; ++away) {
             if (away % down != 0) {
