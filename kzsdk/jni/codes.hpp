@@ -1,5 +1,6 @@
 /// @file
-/// The small numbers that the Android front speaks with: what its calls return, and what it reports.
+/// The small numbers that the Android front speaks with: what its calls return, and what it
+/// reports.
 #pragma once
 
 #include <cstdint>

@@ -14,8 +14,8 @@ namespace {
 constexpr kz_status kNoInputFormat = 0x9008000f;
 constexpr kz_status kNotEnoughAudio = 0x90080602;
 
-/// Set while the core is up by our doing. Two first jobs may both start it; the second start finds it
-/// up and succeeds.
+/// Set while the core is up by our doing. Two first jobs may both start it; the second start finds
+/// it up and succeeds.
 constinit std::atomic<uint8_t> core_is_up{0};
 
 void log_error(const char* format, uint32_t value = 0) noexcept
@@ -169,7 +169,7 @@ int32_t Fingerprint::do_fpx_fingerprint(char** result) noexcept
     if (length > kTextSize) {
         log_error("strlen((const char*)serialized_fingerprint > buffer ");
     }
-    // Deliberate: no terminator. The buffer was cleared, so that only a text that fills it has none.
+    // Deliberate: no terminator. In the cleared buffer only a text that fills it has none.
     std::memcpy(*result, text, std::min<size_t>(length, kTextSize));
     if (kz_fpx_fingerprint_serialize_free(&text) != KZ_OK) {
         log_error("kz_fpx_fingerprint_serialize_free() failed");

@@ -44,7 +44,8 @@ public:
     ///
     /// @param wave_format_code  WAVE format tag: 1 is PCM, 6 A-law, 7 mu-law. Only the low 16 bits
     ///                          of it and of @p bits_per_sample are read.
-    /// @param bits_per_sample   Of PCM: below 9 means 8-bit, all else 16-bit, so that audio of 24 or
+    /// @param bits_per_sample   Of PCM: below 9 means 8-bit, all else 16-bit, so that audio of 24
+    /// or
     ///                          32 bits is read as if it had 16.
     /// @param audio             Interleaved samples, the caller's; read by generate().
     void setGenerateConfig(uint32_t sample_rate, int32_t channels, int32_t wave_format_code,

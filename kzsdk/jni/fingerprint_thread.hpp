@@ -56,7 +56,8 @@ public:
     /// @param audio  Not copied: stays valid until the event has come, and after it until the next
     ///               accepted request or release(), as a thread may wake up without reason and then
     ///               repeats its last job.
-    /// @return kOk; kRefused before init(), while a request waits to be begun, and after requestExit() or
+    /// @return kOk; kRefused before init(), while a request waits to be begun, and after
+    /// requestExit() or
     ///         release().
     int32_t generate(uint32_t sample_rate, int32_t channels, int32_t wave_format_code,
                      int32_t bits_per_sample, const uint8_t* audio, uint32_t audio_length) noexcept;

@@ -1,6 +1,7 @@
 /// @file
-/// Objects and bytes on the system's heap. The library's own allocator fails until a job has started
-/// the core; objects and workers are there before that, and outlive a core that is shut down.
+/// Objects and bytes on the system's heap. The library's own allocator fails until a job has
+/// started the core; objects and workers are there before that, and outlive a core that is shut
+/// down.
 #pragma once
 
 #include <cstddef>
@@ -25,7 +26,8 @@ system_owned<T[]> make_system_array(size_t count) noexcept
     return system_owned<T[]>(static_cast<T*>(std::malloc(count * sizeof(T))));
 }
 
-/// Constructs an object; null when memory is short. `operator new` would need the C++ run-time library.
+/// Constructs an object; null when memory is short. `operator new` would need the C++ run-time
+/// library.
 template <class T, class... Arguments>
 T* create(Arguments&&... arguments) noexcept
 {

@@ -1,6 +1,7 @@
 /// @file
-/// Numbers for live objects. Java keeps an object in a field of 32 bits, which cannot hold a pointer
-/// everywhere; it gets a number instead, and a number that is unknown or stale finds nothing.
+/// Numbers for live objects. Java keeps an object in a field of 32 bits, which cannot hold a
+/// pointer everywhere; it gets a number instead, and a number that is unknown or stale finds
+/// nothing.
 #pragma once
 
 #include <cstdint>
@@ -18,11 +19,11 @@ struct Registered {
 };
 
 /// A number is given again only when all others have been given: a stale copy would have to survive
-/// four thousand million objects. Objects are looked up in a list, since each has a thread, and threads
-/// are few.
+/// four thousand million objects. Objects are looked up in a list, since each has a thread, and
+/// threads are few.
 ///
-/// Threads: all calls are safe at any time. Whoever has claimed an object is the one to remove it, and
-/// does not get further as long as somebody has it pinned.
+/// Threads: all calls are safe at any time. Whoever has claimed an object is the one to remove it,
+/// and does not get further as long as somebody has it pinned.
 class Registry {
 public:
     /// @param last_number  The number given before the first one.
@@ -31,15 +32,17 @@ public:
     /// Gives the object a number, which is never 0 nor that of another object here.
     int32_t add(Registered& object) noexcept;
 
-    /// Finds an object and keeps it from being removed; null for a number of none. Goes with unpin().
+    /// Finds an object and keeps it from being removed; null for a number of none. Goes with
+    /// unpin().
     Registered* pin(int32_t number) noexcept;
     void unpin(Registered& object) noexcept;
 
-    /// Finds an object that is to be removed. Null for a number of none, and for one that is claimed:
-    /// of two that want to remove an object one does.
+    /// Finds an object that is to be removed. Null for a number of none, and for one that is
+    /// claimed: of two that want to remove an object one does.
     Registered* claim(int32_t number) noexcept;
 
-    /// Takes a claimed object out: nobody finds it from now on. Comes back when nobody has it pinned.
+    /// Takes a claimed object out: nobody finds it from now on. Comes back when nobody has it
+    /// pinned.
     void remove(Registered& object) noexcept;
 
 private:

@@ -18,7 +18,8 @@ public:
                                      const JNINativeMethod* methods, int count) noexcept;
 
     /// The calling thread's environment. A thread that the VM does not know is attached to it, as a
-    /// daemon, which does not keep the VM from ending, and detached when it ends. Null when that fails.
+    /// daemon, which does not keep the VM from ending, and detached when it ends. Null when that
+    /// fails.
     static JNIEnv* getJNIEnv() noexcept;
 };
 

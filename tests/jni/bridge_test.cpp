@@ -1,5 +1,5 @@
-// What a VM does not do on demand: refuse an environment, lack a class or a member. A double of the VM
-// plays that; all else is tested on a real one, in tests/java.
+// What a VM does not do on demand: refuse an environment, lack a class or a member. A double of the
+// VM plays that; all else is tested on a real one, in tests/java.
 
 #include "kzsdk/jni/bridge.hpp"
 

@@ -200,7 +200,8 @@ TEST_F(Worker, LosesNoRequestMadeTheMomentItIsReady)
     }
 }
 
-// A request made during a job waits for the mutex, and is signalled between two waits of the worker.
+// A request made during a job waits for the mutex, and is signalled between two waits of the
+// worker.
 TEST_F(Worker, LosesNoRequestMadeDuringAJob)
 {
     const auto worker = started();

@@ -44,8 +44,8 @@ public:
     NoThreads& operator=(const NoThreads&) = delete;
 };
 
-/// What a platform shows of a thread: its own name, cut to what the system holds, and its nice value;
-/// or what it was asked for, where the platform does not care.
+/// What a platform shows of a thread: its own name, cut to what the system holds, and its nice
+/// value; or what it was asked for, where the platform does not care.
 struct ThreadLooks {
     std::string name;
     int priority;

@@ -1,6 +1,6 @@
 /// @file
-/// Gets between a condition variable and those who wait for it: the library's waits and signals only,
-/// not those of the C++ run-time library.
+/// Gets between a condition variable and those who wait for it: the library's waits and signals
+/// only, not those of the C++ run-time library.
 #pragma once
 
 #include <cstdint>
