@@ -5,6 +5,7 @@
 /// ratio makes it at run time. The mixture of single and double precision is part of the result.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <span>
 
@@ -41,8 +42,9 @@ constexpr FilterLayout filter_layout(uint32_t up, uint32_t down) noexcept
 /// @param taps  Room for `layout.length` values.
 inline void design_windowed_sinc(const FilterLayout& layout, std::span<float> taps) noexcept
 {
-    const uint64_t order = layout.taps - 1;
-    const uint64_t half = order / 2;
+    const auto leading = static_cast<size_t>(layout.leading);
+    const auto order = static_cast<size_t>(layout.taps - 1);
+    const size_t half = order / 2;
     const float cutoff =
         3.1415927F / static_cast<float>(layout.up > layout.down ? layout.up : layout.down);
     const float window_step = 6.2831855F / static_cast<float>(order);
@@ -51,17 +53,17 @@ inline void design_windowed_sinc(const FilterLayout& layout, std::span<float> ta
     for (float& tap : taps) {
         tap = 0;
     }
-    for (uint64_t i = 0; i < half; ++i) {
+    for (size_t i = 0; i < half; ++i) {
         const double x =
             (static_cast<double>(i) - static_cast<double>(half)) * static_cast<double>(cutoff);
         const auto sinc = static_cast<float>(kz_sin(x) / x);
         const float angle = static_cast<float>(i) * window_step;
         const double window = 0.54 - 0.46 * kz_cos(static_cast<double>(angle));
         const auto tap = static_cast<float>(static_cast<double>(sinc * gain) * window);
-        taps[layout.leading + i] = tap;
-        taps[layout.leading + order - i] = tap;
+        taps[leading + i] = tap;
+        taps[leading + order - i] = tap;
     }
-    taps[layout.leading + half] = gain;
+    taps[leading + half] = gain;
 }
 
 } // namespace kz::dsp

@@ -52,8 +52,8 @@ bool design(KZDSP_resampler& r) noexcept
     if (!taps) {
         return false;
     }
-    kz::dsp::design_windowed_sinc(layout, {taps.get(), layout.length});
     r.length = static_cast<uint32_t>(layout.length);
+    kz::dsp::design_windowed_sinc(layout, {taps.get(), r.length});
     r.taps = taps.release();
     r.owns_taps = 1;
     return true;
