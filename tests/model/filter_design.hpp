@@ -44,7 +44,7 @@ inline std::vector<float> windowed_sinc(const Ratio& ratio)
     const float gain = static_cast<float>(ratio.up) / static_cast<float>(ratio.down);
     std::vector<float> taps(used + (ratio.up - used % ratio.up), 0.0f);
     for (uint32_t i = 0; i < order / 2; ++i) {
-        const double x = (static_cast<double>(i) - order / 2) * double{cutoff};
+        const double x = (static_cast<double>(i) - static_cast<double>(order / 2)) * double{cutoff};
         const double window = 0.54 - 0.46 * std::cos(double{static_cast<float>(i) * window_step});
         const auto value =
             static_cast<float>(double{static_cast<float>(std::sin(x) / x) * gain} * window);
