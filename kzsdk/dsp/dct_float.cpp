@@ -3,6 +3,7 @@
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/dsp/butterfly.hpp"
 #include "kzsdk/dsp/dct.h"
+#include "kzsdk/dsp/kernels/kernels.hpp"
 
 namespace {
 
@@ -16,23 +17,6 @@ void fill_factors(std::span<float> factors) noexcept
     for (uint32_t half_width = 1; half_width < factors.size(); half_width *= 2) {
         for (uint32_t j = 0; j < half_width; ++j) {
             factors[half_width + j] = kz::dsp::butterfly_factor(half_width, j);
-        }
-    }
-}
-
-// `stage` counts down from the transform's order; a stage's factors start at its half-width.
-void run_stage(std::span<float> x, const float* coefficients, int32_t stage) noexcept
-{
-    const size_t half = size_t{1} << (stage - 1);
-    const float* factors = coefficients + half;
-    for (size_t start = 0; start < x.size(); start += 2 * half) {
-        for (size_t j = 0; j < half; ++j) {
-            float& upper = x[start + j];
-            float& lower = x[start + j + half];
-            const float a = upper;
-            const float b = lower;
-            upper = a + b;
-            lower = (a - b) * factors[j];
         }
     }
 }
@@ -79,12 +63,9 @@ void KZDSP_ComputeDCT(const KZDSP_DCT* dct, float* data, int32_t normalise) noex
     if (dct == nullptr || data == nullptr) {
         return;
     }
-    const std::span<float> x(data, dct->length);
-    kz::dsp::transform(
-        x, dct->order, [&](int32_t stage) { run_stage(x, dct->coefficients, stage); },
-        [](float a, float b) { return a + b; });
+    kz::dsp::kernels().dct_float(data, dct->coefficients, dct->order);
     if (normalise != 0) {
-        scale(x, 2.0F / static_cast<float>(dct->length));
+        scale({data, dct->length}, 2.0F / static_cast<float>(dct->length));
     }
-    x[0] *= kDcScale;
+    data[0] *= kDcScale;
 }

@@ -1,0 +1,163 @@
+/// @file
+/// Vectors of eight lanes, for the kernels' templates. See kernels/README.md for what a vector type
+/// brings.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include <immintrin.h>
+
+namespace {
+
+struct Avx2 {
+    static constexpr size_t kLanes = 8;
+
+    using Ints = __m256i;
+    using Floats = __m256;
+
+    static Ints load(const int32_t* from) noexcept
+    {
+        return _mm256_loadu_si256(reinterpret_cast<const __m256i*>(from));
+    }
+    static Floats load(const float* from) noexcept { return _mm256_loadu_ps(from); }
+    static void store(int32_t* to, Ints v) noexcept
+    {
+        _mm256_storeu_si256(reinterpret_cast<__m256i*>(to), v);
+    }
+    static void store(float* to, Floats v) noexcept { _mm256_storeu_ps(to, v); }
+    static Ints all(int32_t value) noexcept { return _mm256_set1_epi32(value); }
+    static Floats all(float value) noexcept { return _mm256_set1_ps(value); }
+
+    static Ints add(Ints a, Ints b) noexcept { return _mm256_add_epi32(a, b); }
+    static Floats add(Floats a, Floats b) noexcept { return _mm256_add_ps(a, b); }
+    static Ints sub(Ints a, Ints b) noexcept { return _mm256_sub_epi32(a, b); }
+    static Floats sub(Floats a, Floats b) noexcept { return _mm256_sub_ps(a, b); }
+    static Floats mul(Floats a, Floats b) noexcept { return _mm256_mul_ps(a, b); }
+
+    template <int Count>
+    static Ints shift_right(Ints v) noexcept
+    {
+        return _mm256_srai_epi32(v, Count);
+    }
+
+    /// Bits `Shift` to `Shift` + 31 of each 64-bit product; 1 <= Shift <= 32. The multiplier takes
+    /// even lanes, so odd lanes are moved down, and their products up: to where their bits belong.
+    template <int Shift>
+    static Ints product_bits(Ints a, Ints b) noexcept
+    {
+        const Ints even = _mm256_srli_epi64(_mm256_mul_epi32(a, b), Shift);
+        const Ints odd =
+            _mm256_slli_epi64(_mm256_mul_epi32(odd_lanes(a), odd_lanes(b)), 32 - Shift);
+        return _mm256_blend_epi32(even, odd, 0b10101010);
+    }
+
+    /// Lanes in the opposite order.
+    static Ints reversed(Ints v) noexcept
+    {
+        return _mm256_permutevar8x32_epi32(v, _mm256_setr_epi32(7, 6, 5, 4, 3, 2, 1, 0));
+    }
+    static Floats reversed(Floats v) noexcept
+    {
+        return _mm256_castsi256_ps(reversed(_mm256_castps_si256(v)));
+    }
+
+    /// Separates the lanes of even and odd index of the 16 that `a` and `b` hold.
+    static void deinterleave(Ints& a, Ints& b) noexcept
+    {
+        Floats x = _mm256_castsi256_ps(a);
+        Floats y = _mm256_castsi256_ps(b);
+        deinterleave(x, y);
+        a = _mm256_castps_si256(x);
+        b = _mm256_castps_si256(y);
+    }
+    static void deinterleave(Floats& a, Floats& b) noexcept
+    {
+        const Floats low = _mm256_permute2f128_ps(a, b, 0x20);
+        const Floats high = _mm256_permute2f128_ps(a, b, 0x31);
+        a = _mm256_shuffle_ps(low, high, 0b10001000);
+        b = _mm256_shuffle_ps(low, high, 0b11011101);
+    }
+
+    /// Lane j of vector i becomes lane i of vector j.
+    static void transpose(Ints (&v)[kLanes]) noexcept
+    {
+        Floats f[kLanes];
+        for (size_t i = 0; i < kLanes; ++i) {
+            f[i] = _mm256_castsi256_ps(v[i]);
+        }
+        transpose(f);
+        for (size_t i = 0; i < kLanes; ++i) {
+            v[i] = _mm256_castps_si256(f[i]);
+        }
+    }
+    static void transpose(Floats (&v)[kLanes]) noexcept
+    {
+        Floats pairs[kLanes];
+        for (size_t i = 0; i < kLanes; i += 2) {
+            pairs[i] = _mm256_unpacklo_ps(v[i], v[i + 1]);
+            pairs[i + 1] = _mm256_unpackhi_ps(v[i], v[i + 1]);
+        }
+        Floats fours[kLanes];
+        for (size_t i = 0; i < kLanes; i += 4) {
+            fours[i] = _mm256_shuffle_ps(pairs[i], pairs[i + 2], 0b01000100);
+            fours[i + 1] = _mm256_shuffle_ps(pairs[i], pairs[i + 2], 0b11101110);
+            fours[i + 2] = _mm256_shuffle_ps(pairs[i + 1], pairs[i + 3], 0b01000100);
+            fours[i + 3] = _mm256_shuffle_ps(pairs[i + 1], pairs[i + 3], 0b11101110);
+        }
+        for (size_t i = 0; i < 4; ++i) {
+            v[i] = _mm256_permute2f128_ps(fours[i], fours[i + 4], 0x20);
+            v[i + 4] = _mm256_permute2f128_ps(fours[i], fours[i + 4], 0x31);
+        }
+    }
+
+    /// `a` with its first lane replaced by that of `first`.
+    static Ints first_lane_of(Ints first, Ints a) noexcept
+    {
+        return _mm256_blend_epi32(a, first, 1);
+    }
+    static Floats first_lane_of(Floats first, Floats a) noexcept
+    {
+        return _mm256_blend_ps(a, first, 1);
+    }
+
+    /// The vector that begins at lane `Count` of `v`, `next` following it. Count: 2, 4 or 8.
+    template <size_t Count>
+    static Ints lanes_from(Ints v, Ints next) noexcept
+    {
+        if constexpr (Count == kLanes) {
+            return next;
+        } else {
+            const Ints middle = _mm256_permute2x128_si256(v, next, 0x21);
+            return Count == 4 ? middle : _mm256_alignr_epi8(middle, v, 8);
+        }
+    }
+    template <size_t Count>
+    static Floats lanes_from(Floats v, Floats next) noexcept
+    {
+        return _mm256_castsi256_ps(
+            lanes_from<Count>(_mm256_castps_si256(v), _mm256_castps_si256(next)));
+    }
+
+    /// `a` with the upper half of each group of `Group` lanes replaced by that of `b`.
+    template <size_t Group>
+    static Floats upper_halves(Floats a, Floats b) noexcept
+    {
+        constexpr int kMask = Group == 2 ? 0b10101010 : Group == 4 ? 0b11001100 : 0b11110000;
+        return _mm256_blend_ps(a, b, kMask);
+    }
+    template <size_t Group>
+    static Ints upper_halves(Ints a, Ints b) noexcept
+    {
+        return _mm256_castps_si256(
+            upper_halves<Group>(_mm256_castsi256_ps(a), _mm256_castsi256_ps(b)));
+    }
+
+private:
+    static Ints odd_lanes(Ints v) noexcept
+    {
+        return _mm256_castps_si256(_mm256_movehdup_ps(_mm256_castsi256_ps(v)));
+    }
+};
+
+} // namespace

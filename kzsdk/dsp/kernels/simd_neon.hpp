@@ -1,0 +1,136 @@
+/// @file
+/// Vectors of four lanes for 64-bit ARM. (The vector unit of 32-bit ARM flushes small floats to
+/// zero: there the plain variant serves.)
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include <arm_neon.h>
+
+namespace {
+
+struct Neon {
+    static constexpr size_t kLanes = 4;
+
+    using Ints = int32x4_t;
+    using Floats = float32x4_t;
+
+    static Ints load(const int32_t* from) noexcept { return vld1q_s32(from); }
+    static Floats load(const float* from) noexcept { return vld1q_f32(from); }
+    static void store(int32_t* to, Ints v) noexcept { vst1q_s32(to, v); }
+    static void store(float* to, Floats v) noexcept { vst1q_f32(to, v); }
+    static Ints all(int32_t value) noexcept { return vdupq_n_s32(value); }
+    static Floats all(float value) noexcept { return vdupq_n_f32(value); }
+
+    static Ints add(Ints a, Ints b) noexcept { return vaddq_s32(a, b); }
+    static Floats add(Floats a, Floats b) noexcept { return vaddq_f32(a, b); }
+    static Ints sub(Ints a, Ints b) noexcept { return vsubq_s32(a, b); }
+    static Floats sub(Floats a, Floats b) noexcept { return vsubq_f32(a, b); }
+    static Floats mul(Floats a, Floats b) noexcept { return vmulq_f32(a, b); }
+
+    template <int Count>
+    static Ints shift_right(Ints v) noexcept
+    {
+        return vshrq_n_s32(v, Count);
+    }
+
+    /// Bits `Shift` to `Shift` + 31 of each 64-bit product; 1 <= Shift <= 32.
+    template <int Shift>
+    static Ints product_bits(Ints a, Ints b) noexcept
+    {
+        const int64x2_t low = vmull_s32(vget_low_s32(a), vget_low_s32(b));
+        const int64x2_t high = vmull_high_s32(a, b);
+        return vshrn_high_n_s64(vshrn_n_s64(low, Shift), high, Shift);
+    }
+
+    /// Lanes in the opposite order.
+    static Ints reversed(Ints v) noexcept
+    {
+        const Ints swapped = vrev64q_s32(v);
+        return vextq_s32(swapped, swapped, 2);
+    }
+    static Floats reversed(Floats v) noexcept
+    {
+        return vreinterpretq_f32_s32(reversed(vreinterpretq_s32_f32(v)));
+    }
+
+    /// Separates the lanes of even and odd index of the 8 that `a` and `b` hold.
+    static void deinterleave(Ints& a, Ints& b) noexcept
+    {
+        const Ints even = vuzp1q_s32(a, b);
+        b = vuzp2q_s32(a, b);
+        a = even;
+    }
+    static void deinterleave(Floats& a, Floats& b) noexcept
+    {
+        const Floats even = vuzp1q_f32(a, b);
+        b = vuzp2q_f32(a, b);
+        a = even;
+    }
+
+    /// Lane j of vector i becomes lane i of vector j.
+    static void transpose(Ints (&v)[kLanes]) noexcept
+    {
+        const int32x4x2_t first = vtrnq_s32(v[0], v[1]);
+        const int32x4x2_t second = vtrnq_s32(v[2], v[3]);
+        v[0] = vcombine_s32(vget_low_s32(first.val[0]), vget_low_s32(second.val[0]));
+        v[1] = vcombine_s32(vget_low_s32(first.val[1]), vget_low_s32(second.val[1]));
+        v[2] = vcombine_s32(vget_high_s32(first.val[0]), vget_high_s32(second.val[0]));
+        v[3] = vcombine_s32(vget_high_s32(first.val[1]), vget_high_s32(second.val[1]));
+    }
+    static void transpose(Floats (&v)[kLanes]) noexcept
+    {
+        Ints ints[kLanes];
+        for (size_t i = 0; i < kLanes; ++i) {
+            ints[i] = vreinterpretq_s32_f32(v[i]);
+        }
+        transpose(ints);
+        for (size_t i = 0; i < kLanes; ++i) {
+            v[i] = vreinterpretq_f32_s32(ints[i]);
+        }
+    }
+
+    /// `a` with its first lane replaced by that of `first`.
+    static Ints first_lane_of(Ints first, Ints a) noexcept
+    {
+        return vcopyq_laneq_s32(a, 0, first, 0);
+    }
+    static Floats first_lane_of(Floats first, Floats a) noexcept
+    {
+        return vcopyq_laneq_f32(a, 0, first, 0);
+    }
+
+    /// The vector that begins at lane `Count` of `v`, `next` following it. Count: 2 or 4.
+    template <size_t Count>
+    static Ints lanes_from(Ints v, Ints next) noexcept
+    {
+        return Count == kLanes ? next : vextq_s32(v, next, 2);
+    }
+    template <size_t Count>
+    static Floats lanes_from(Floats v, Floats next) noexcept
+    {
+        return Count == kLanes ? next : vextq_f32(v, next, 2);
+    }
+
+    /// `a` with the upper half of each group of `Group` lanes replaced by that of `b`.
+    template <size_t Group>
+    static Ints upper_halves(Ints a, Ints b) noexcept
+    {
+        return vbslq_s32(upper_mask<Group>(), b, a);
+    }
+    template <size_t Group>
+    static Floats upper_halves(Floats a, Floats b) noexcept
+    {
+        return vbslq_f32(upper_mask<Group>(), b, a);
+    }
+
+private:
+    template <size_t Group>
+    static uint32x4_t upper_mask() noexcept
+    {
+        return uint32x4_t{0, Group == 2 ? ~0U : 0U, Group == 2 ? 0U : ~0U, ~0U};
+    }
+};
+
+} // namespace

@@ -1,0 +1,125 @@
+/// @file
+/// Vectors of four lanes for processors with SSE4.1, the first with a signed 32-bit multiplier.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include <smmintrin.h>
+
+namespace {
+
+struct Sse41 {
+    static constexpr size_t kLanes = 4;
+
+    using Ints = __m128i;
+    using Floats = __m128;
+
+    static Ints load(const int32_t* from) noexcept
+    {
+        return _mm_loadu_si128(reinterpret_cast<const __m128i*>(from));
+    }
+    static Floats load(const float* from) noexcept { return _mm_loadu_ps(from); }
+    static void store(int32_t* to, Ints v) noexcept
+    {
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(to), v);
+    }
+    static void store(float* to, Floats v) noexcept { _mm_storeu_ps(to, v); }
+    static Ints all(int32_t value) noexcept { return _mm_set1_epi32(value); }
+    static Floats all(float value) noexcept { return _mm_set1_ps(value); }
+
+    static Ints add(Ints a, Ints b) noexcept { return _mm_add_epi32(a, b); }
+    static Floats add(Floats a, Floats b) noexcept { return _mm_add_ps(a, b); }
+    static Ints sub(Ints a, Ints b) noexcept { return _mm_sub_epi32(a, b); }
+    static Floats sub(Floats a, Floats b) noexcept { return _mm_sub_ps(a, b); }
+    static Floats mul(Floats a, Floats b) noexcept { return _mm_mul_ps(a, b); }
+
+    template <int Count>
+    static Ints shift_right(Ints v) noexcept
+    {
+        return _mm_srai_epi32(v, Count);
+    }
+
+    /// Bits `Shift` to `Shift` + 31 of each 64-bit product; 1 <= Shift <= 32. The multiplier takes
+    /// even lanes, so odd lanes are moved down, and their products up: to where their bits belong.
+    template <int Shift>
+    static Ints product_bits(Ints a, Ints b) noexcept
+    {
+        const Ints even = _mm_srli_epi64(_mm_mul_epi32(a, b), Shift);
+        const Ints odd = _mm_slli_epi64(_mm_mul_epi32(odd_lanes(a), odd_lanes(b)), 32 - Shift);
+        return _mm_blend_epi16(even, odd, 0b11001100);
+    }
+
+    /// Lanes in the opposite order.
+    static Ints reversed(Ints v) noexcept { return _mm_shuffle_epi32(v, 0b00011011); }
+    static Floats reversed(Floats v) noexcept { return _mm_shuffle_ps(v, v, 0b00011011); }
+
+    /// Separates the lanes of even and odd index of the 8 that `a` and `b` hold.
+    static void deinterleave(Ints& a, Ints& b) noexcept
+    {
+        Floats x = _mm_castsi128_ps(a);
+        Floats y = _mm_castsi128_ps(b);
+        deinterleave(x, y);
+        a = _mm_castps_si128(x);
+        b = _mm_castps_si128(y);
+    }
+    static void deinterleave(Floats& a, Floats& b) noexcept
+    {
+        const Floats even = _mm_shuffle_ps(a, b, 0b10001000);
+        b = _mm_shuffle_ps(a, b, 0b11011101);
+        a = even;
+    }
+
+    /// Lane j of vector i becomes lane i of vector j.
+    static void transpose(Ints (&v)[kLanes]) noexcept
+    {
+        Floats f[kLanes];
+        for (size_t i = 0; i < kLanes; ++i) {
+            f[i] = _mm_castsi128_ps(v[i]);
+        }
+        transpose(f);
+        for (size_t i = 0; i < kLanes; ++i) {
+            v[i] = _mm_castps_si128(f[i]);
+        }
+    }
+    static void transpose(Floats (&v)[kLanes]) noexcept
+    {
+        _MM_TRANSPOSE4_PS(v[0], v[1], v[2], v[3]);
+    }
+
+    /// `a` with its first lane replaced by that of `first`.
+    static Ints first_lane_of(Ints first, Ints a) noexcept { return _mm_blend_epi16(a, first, 3); }
+    static Floats first_lane_of(Floats first, Floats a) noexcept { return _mm_move_ss(a, first); }
+
+    /// The vector that begins at lane `Count` of `v`, `next` following it. Count: 2 or 4.
+    template <size_t Count>
+    static Ints lanes_from(Ints v, Ints next) noexcept
+    {
+        return Count == kLanes ? next : _mm_alignr_epi8(next, v, 8);
+    }
+    template <size_t Count>
+    static Floats lanes_from(Floats v, Floats next) noexcept
+    {
+        return Count == kLanes ? next : _mm_shuffle_ps(v, next, 0b01001110);
+    }
+
+    /// `a` with the upper half of each group of `Group` lanes replaced by that of `b`.
+    template <size_t Group>
+    static Ints upper_halves(Ints a, Ints b) noexcept
+    {
+        return _mm_blend_epi16(a, b, Group == 2 ? 0b11001100 : 0b11110000);
+    }
+    template <size_t Group>
+    static Floats upper_halves(Floats a, Floats b) noexcept
+    {
+        return _mm_blend_ps(a, b, Group == 2 ? 0b1010 : 0b1100);
+    }
+
+private:
+    static Ints odd_lanes(Ints v) noexcept
+    {
+        return _mm_castps_si128(_mm_movehdup_ps(_mm_castsi128_ps(v)));
+    }
+};
+
+} // namespace

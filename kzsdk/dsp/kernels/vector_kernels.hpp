@@ -1,0 +1,42 @@
+/// @file
+/// The table of one variant, made of the kernels' templates over its vectors.
+///
+/// Only the file of a variant includes this. All that is local to that file: a function that was
+/// compiled for a newer processor must not be linked where an older one may run.
+#pragma once
+
+#include <cstdint>
+
+#include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/dsp/kernels/plain.hpp"
+#include "kzsdk/dsp/kernels/transform.hpp"
+
+namespace {
+
+template <class Simd>
+void dct_fixed(int32_t* x, const int32_t* factors, int32_t order) noexcept
+{
+    if (!transform<Simd, FixedButterflies>(x, factors, order)) {
+        kz::dsp::plain::dct_fixed(x, factors, order);
+    }
+}
+
+template <class Simd>
+void dct_float(float* x, const float* factors, int32_t order) noexcept
+{
+    if (!transform<Simd, FloatButterflies>(x, factors, order)) {
+        kz::dsp::plain::dct_float(x, factors, order);
+    }
+}
+
+template <class Simd>
+constexpr kz::dsp::Kernels vector_kernels(const char* name) noexcept
+{
+    return {
+        .name = name,
+        .dct_fixed = dct_fixed<Simd>,
+        .dct_float = dct_float<Simd>,
+    };
+}
+
+} // namespace
