@@ -15,6 +15,19 @@
 
 namespace kz::dsp {
 
+/// Makes one word of each frame of interleaved bytes: the sum of the channels, shifted left by
+/// 0 .. 31 bits. The number of frames counts as unsigned.
+template <class Word>
+using Converter = void(const void* input, Word* output, int32_t frames, int32_t shift) noexcept;
+
+template <class Word>
+struct Converters {
+    Converter<Word>* pcm16_mono;
+    Converter<Word>* pcm16_stereo;
+    Converter<Word>* pcm8_mono; ///< bytes count as 0 .. 255, their top bit inverted
+    Converter<Word>* pcm8_stereo;
+};
+
 struct Kernels {
     /// "plain", "sse41", "avx2" or "neon".
     const char* name;
@@ -24,6 +37,9 @@ struct Kernels {
 
     /// The transform of dct_float.cpp without its scalings, 2^order values in place.
     void (*dct_float)(float* x, const float* factors, int32_t order) noexcept;
+
+    Converters<int32_t> words;
+    Converters<float> floats;
 };
 
 /// The variant that all of the library uses.

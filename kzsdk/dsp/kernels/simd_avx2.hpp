@@ -52,6 +52,37 @@ struct Avx2 {
         return _mm256_blend_epi32(even, odd, 0b10101010);
     }
 
+    /// Shifts every lane by the same `count`, 0 .. 31.
+    static Ints shift_left(Ints v, int32_t count) noexcept
+    {
+        return _mm256_sll_epi32(v, _mm_cvtsi32_si128(count));
+    }
+
+    static Floats to_floats(Ints v) noexcept { return _mm256_cvtepi32_ps(v); }
+
+    /// Widens 16-bit samples; the sums of pairs of them.
+    static Ints load_shorts(const uint8_t* from) noexcept
+    {
+        return _mm256_cvtepi16_epi32(_mm_loadu_si128(reinterpret_cast<const __m128i*>(from)));
+    }
+    static Ints load_short_pairs(const uint8_t* from) noexcept
+    {
+        return _mm256_madd_epi16(load_vector(from), _mm256_set1_epi16(1));
+    }
+
+    /// Widens bytes with their top bit inverted; the sums of pairs of them.
+    static Ints load_bytes(const uint8_t* from) noexcept
+    {
+        const __m128i bytes = _mm_loadl_epi64(reinterpret_cast<const __m128i*>(from));
+        return _mm256_cvtepu8_epi32(_mm_xor_si128(bytes, _mm_set1_epi8(-128)));
+    }
+    static Ints load_byte_pairs(const uint8_t* from) noexcept
+    {
+        const __m128i bytes = _mm_loadu_si128(reinterpret_cast<const __m128i*>(from));
+        const __m128i folded = _mm_xor_si128(bytes, _mm_set1_epi8(-128));
+        return _mm256_cvtepi16_epi32(_mm_maddubs_epi16(folded, _mm_set1_epi8(1)));
+    }
+
     /// Lanes in the opposite order.
     static Ints reversed(Ints v) noexcept
     {
@@ -154,6 +185,10 @@ struct Avx2 {
     }
 
 private:
+    static Ints load_vector(const uint8_t* from) noexcept
+    {
+        return _mm256_loadu_si256(reinterpret_cast<const __m256i*>(from));
+    }
     static Ints odd_lanes(Ints v) noexcept
     {
         return _mm256_castps_si256(_mm256_movehdup_ps(_mm256_castsi256_ps(v)));

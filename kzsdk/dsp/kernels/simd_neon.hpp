@@ -44,6 +44,37 @@ struct Neon {
         return vshrn_high_n_s64(vshrn_n_s64(low, Shift), high, Shift);
     }
 
+    /// Shifts every lane by the same `count`, 0 .. 31.
+    static Ints shift_left(Ints v, int32_t count) noexcept
+    {
+        return vshlq_s32(v, vdupq_n_s32(count));
+    }
+
+    static Floats to_floats(Ints v) noexcept { return vcvtq_f32_s32(v); }
+
+    /// Widens 16-bit samples; the sums of pairs of them.
+    static Ints load_shorts(const uint8_t* from) noexcept
+    {
+        return vmovl_s16(vreinterpret_s16_u8(vld1_u8(from)));
+    }
+    static Ints load_short_pairs(const uint8_t* from) noexcept
+    {
+        return vpaddlq_s16(vreinterpretq_s16_u8(vld1q_u8(from)));
+    }
+
+    /// Widens bytes with their top bit inverted; the sums of pairs of them.
+    static Ints load_bytes(const uint8_t* from) noexcept
+    {
+        uint8_t bytes[8] = {from[0], from[1], from[2], from[3]};
+        const uint8x8_t folded = veor_u8(vld1_u8(bytes), vdup_n_u8(0x80));
+        return vreinterpretq_s32_u32(vmovl_u16(vget_low_u16(vmovl_u8(folded))));
+    }
+    static Ints load_byte_pairs(const uint8_t* from) noexcept
+    {
+        const uint8x8_t folded = veor_u8(vld1_u8(from), vdup_n_u8(0x80));
+        return vreinterpretq_s32_u32(vmovl_u16(vpaddl_u8(folded)));
+    }
+
     /// Lanes in the opposite order.
     static Ints reversed(Ints v) noexcept
     {

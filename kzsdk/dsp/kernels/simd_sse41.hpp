@@ -50,6 +50,37 @@ struct Sse41 {
         return _mm_blend_epi16(even, odd, 0b11001100);
     }
 
+    /// Shifts every lane by the same `count`, 0 .. 31.
+    static Ints shift_left(Ints v, int32_t count) noexcept
+    {
+        return _mm_sll_epi32(v, _mm_cvtsi32_si128(count));
+    }
+
+    static Floats to_floats(Ints v) noexcept { return _mm_cvtepi32_ps(v); }
+
+    /// Widens 16-bit samples; the sums of pairs of them.
+    static Ints load_shorts(const uint8_t* from) noexcept
+    {
+        return _mm_cvtepi16_epi32(_mm_loadl_epi64(reinterpret_cast<const __m128i*>(from)));
+    }
+    static Ints load_short_pairs(const uint8_t* from) noexcept
+    {
+        const __m128i shorts = _mm_loadu_si128(reinterpret_cast<const __m128i*>(from));
+        return _mm_madd_epi16(shorts, _mm_set1_epi16(1));
+    }
+
+    /// Widens bytes with their top bit inverted; the sums of pairs of them.
+    static Ints load_bytes(const uint8_t* from) noexcept
+    {
+        return _mm_cvtepu8_epi32(_mm_xor_si128(_mm_loadu_si32(from), _mm_set1_epi8(-128)));
+    }
+    static Ints load_byte_pairs(const uint8_t* from) noexcept
+    {
+        const __m128i bytes = _mm_loadl_epi64(reinterpret_cast<const __m128i*>(from));
+        const __m128i folded = _mm_xor_si128(bytes, _mm_set1_epi8(-128));
+        return _mm_cvtepi16_epi32(_mm_maddubs_epi16(folded, _mm_set1_epi8(1)));
+    }
+
     /// Lanes in the opposite order.
     static Ints reversed(Ints v) noexcept { return _mm_shuffle_epi32(v, 0b00011011); }
     static Floats reversed(Floats v) noexcept { return _mm_shuffle_ps(v, v, 0b00011011); }

@@ -7,6 +7,7 @@
 
 #include <cstdint>
 
+#include "kzsdk/dsp/kernels/convert.hpp"
 #include "kzsdk/dsp/kernels/kernels.hpp"
 #include "kzsdk/dsp/kernels/plain.hpp"
 #include "kzsdk/dsp/kernels/transform.hpp"
@@ -36,6 +37,8 @@ constexpr kz::dsp::Kernels vector_kernels(const char* name) noexcept
         .name = name,
         .dct_fixed = dct_fixed<Simd>,
         .dct_float = dct_float<Simd>,
+        .words = converters<Simd, int32_t>(),
+        .floats = converters<Simd, float>(),
     };
 }
 
