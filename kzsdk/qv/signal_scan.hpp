@@ -1,14 +1,18 @@
 /// @file
 /// Both twins search for the end of leading silence in the same way. A twin brings its samples and
-/// the rule that makes an integer of one.
+/// the rule that makes integers, the levels, of them: levels_of(samples, count, levels).
 #pragma once
 
+#include <algorithm>
+#include <array>
+#include <bit>
 #include <cstdint>
 #include <limits>
 #include <span>
 
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/dsp/kernels/kernels.hpp"
 
 namespace kz::qv {
 
@@ -50,19 +54,28 @@ kz_status reset_detector(Detector* detector) noexcept
     return KZ_OK;
 }
 
-/// Fills the rings with the block's beginning; where that is shorter than the window, with zeros.
-template <class Detector, class Sample, class ToInteger>
-void prime(Detector& detector, std::span<const Sample> block, ToInteger to_integer) noexcept
+template <class Detector>
+void take_level(Detector& detector, int32_t level) noexcept
 {
-    detector.level_sum = 0;
-    detector.deviation_sum = 0;
-    detector.position = 0;
-    for (uint32_t i = 0; i < detector.window; ++i) {
-        detector.levels[i] = i < block.size() ? to_integer(block[i]) : 0;
-        detector.level_sum = fxp::wrap_add(detector.level_sum, detector.levels[i]);
-        detector.deviations[i] = 0;
-    }
-    detector.primed = 1;
+    int32_t& oldest = detector.levels[detector.position];
+    detector.level_sum = fxp::wrap_add(fxp::wrap_sub(detector.level_sum, oldest), level);
+    oldest = level;
+}
+
+template <class Detector>
+void take_deviation(Detector& detector, int32_t deviation) noexcept
+{
+    int32_t& oldest = detector.deviations[detector.position];
+    detector.deviation_sum =
+        fxp::wrap_add(fxp::wrap_sub(detector.deviation_sum, oldest), deviation);
+    oldest = deviation;
+}
+
+template <class Detector>
+void advance(Detector& detector, uint32_t count) noexcept
+{
+    detector.position =
+        static_cast<uint32_t>((uint64_t{detector.position} + count) % detector.window);
 }
 
 /// Takes one sample into both moving means.
@@ -72,40 +85,150 @@ template <class Detector>
 bool step(Detector& detector, int32_t level) noexcept
 {
     const auto window = static_cast<int32_t>(detector.window);
-    int32_t& oldest_level = detector.levels[detector.position];
-    detector.level_sum = fxp::wrap_add(fxp::wrap_sub(detector.level_sum, oldest_level), level);
-    oldest_level = level;
-
+    take_level(detector, level);
     const int32_t distance = fxp::wrap_sub(level, detector.level_sum / window);
-    auto deviation = static_cast<int32_t>(fxp::magnitude(distance));
-    deviation = deviation < detector.max_deviation ? deviation : detector.max_deviation;
-    int32_t& oldest_deviation = detector.deviations[detector.position];
-    detector.deviation_sum =
-        fxp::wrap_add(fxp::wrap_sub(detector.deviation_sum, oldest_deviation), deviation);
-    oldest_deviation = deviation;
-
+    const auto deviation = static_cast<int32_t>(fxp::magnitude(distance));
+    take_deviation(detector, std::min(deviation, detector.max_deviation));
     detector.position = detector.position + 1 == detector.window ? 0 : detector.position + 1;
     return detector.threshold < static_cast<uint32_t>(detector.deviation_sum / window);
 }
 
+/// Takes levels as long as they are surely quiet, in a loop that is made for it; stops early where
+/// it cannot tell, and at the end of the rings.
+///
+/// @return How many were taken.
+template <class Detector>
+uint32_t pass_quiet(Detector& detector, std::span<const int32_t> levels) noexcept
+{
+    if (!std::has_single_bit(detector.window)) {
+        return 0; // the loop divides by shifting
+    }
+    // A sum below this is one whose mean does not exceed the threshold. Sums that are negative are
+    // beyond it, whatever the threshold.
+    constexpr uint64_t kNegative = uint64_t{1} << 31;
+    const uint64_t limit = (uint64_t{detector.threshold} + 1) * detector.window;
+    dsp::MovingMeans means{
+        .levels = detector.levels + detector.position,
+        .deviations = detector.deviations + detector.position,
+        .level_sum = detector.level_sum,
+        .deviation_sum = detector.deviation_sum,
+        .window_log2 = std::countr_zero(detector.window),
+        .max_deviation = detector.max_deviation,
+        .limit = static_cast<uint32_t>(std::min(limit, kNegative)),
+    };
+    const size_t count = std::min<size_t>(levels.size(), detector.window - detector.position);
+    const uint32_t taken =
+        dsp::kernels().pass_quiet(means, levels.data(), static_cast<uint32_t>(count));
+    detector.level_sum = means.level_sum;
+    detector.deviation_sum = means.deviation_sum;
+    advance(detector, taken);
+    return taken;
+}
+
+/// Takes levels until the mean deviation exceeds the threshold.
+///
+/// @return The index of the level that did it; the number of levels when none does.
+template <class Detector>
+uint32_t search(Detector& detector, std::span<const int32_t> levels) noexcept
+{
+    const auto count = static_cast<uint32_t>(levels.size());
+    for (uint32_t i = 0;; ++i) {
+        i += pass_quiet(detector, levels.subspan(i));
+        if (i == count || step(detector, levels[i])) {
+            return i;
+        }
+    }
+}
+
+/// Levels are made this many at a time.
+inline constexpr size_t kScanChunk = 256;
+
+/// Makes levels of samples and hands them on, chunk by chunk: take(first index, levels) returns
+/// whether to go on.
+template <class Sample, class LevelsOf, class Take>
+void for_all_levels(std::span<const Sample> samples, LevelsOf levels_of, Take take) noexcept
+{
+    std::array<int32_t, kScanChunk> levels;
+    for (size_t first = 0; first < samples.size(); first += levels.size()) {
+        const size_t count = std::min(samples.size() - first, levels.size());
+        levels_of(samples.data() + first, static_cast<uint32_t>(count), levels.data());
+        if (!take(static_cast<uint32_t>(first), std::span<const int32_t>(levels.data(), count))) {
+            return;
+        }
+    }
+}
+
+/// Fills the rings with the block's beginning; where that is shorter than the window, with zeros.
+template <class Detector, class Sample, class LevelsOf>
+void prime(Detector& detector, std::span<const Sample> block, LevelsOf levels_of) noexcept
+{
+    std::fill_n(detector.levels, detector.window, 0);
+    std::fill_n(detector.deviations, detector.window, 0);
+    detector.level_sum = 0;
+    detector.deviation_sum = 0;
+    detector.position = 0;
+    for_all_levels(block.first(std::min<size_t>(block.size(), detector.window)), levels_of,
+                   [&detector](uint32_t, std::span<const int32_t> levels) {
+                       for (const int32_t level : levels) {
+                           take_level(detector, level);
+                           advance(detector, 1);
+                       }
+                       return true;
+                   });
+    detector.position = 0;
+    detector.primed = 1;
+}
+
+/// Brings the means up to the end of a block. All that they hold then was made of its last two
+/// windows, so a longer block is entered there.
+template <class Detector, class Sample, class LevelsOf>
+void settle(Detector& detector, std::span<const Sample> rest, LevelsOf levels_of) noexcept
+{
+    const uint64_t remembered = uint64_t{detector.window} * 2;
+    uint32_t unheard = 0; // levels that only the mean level has to know
+    if (rest.size() > remembered) {
+        const auto skipped = static_cast<uint32_t>(rest.size() - remembered);
+        advance(detector, skipped);
+        rest = rest.subspan(skipped);
+        unheard = detector.window;
+    }
+    for_all_levels(rest, levels_of,
+                   [&detector, unheard](uint32_t first, std::span<const int32_t> levels) {
+                       for (const int32_t level : levels) {
+                           if (first++ < unheard) {
+                               take_level(detector, level);
+                               advance(detector, 1);
+                           } else {
+                               step(detector, level);
+                           }
+                       }
+                       return true;
+                   });
+}
+
 /// Where the signal starts in the next block of a stream; the block's size when it does not.
-template <class Detector, class Sample, class ToInteger>
+template <class Detector, class Sample, class LevelsOf>
 uint32_t signal_offset(Detector& detector, std::span<const Sample> block,
-                       ToInteger to_integer) noexcept
+                       LevelsOf levels_of) noexcept
 {
     if (detector.primed == 0) {
         prime(detector, block,
-              to_integer); // its first samples serve twice: they are scanned as well
+              levels_of); // its first samples serve twice: they are scanned as well
     }
     const auto none = static_cast<uint32_t>(block.size());
-    uint32_t offset = none;
-    for (uint32_t i = 0; i < block.size(); ++i) {
-        const bool sounding = step(detector, to_integer(block[i]));
-        if (sounding && offset == none) {
-            offset = i > detector.window / 2 ? i - detector.window / 2 : 0;
-        } // no early exit: the rings must hold the end of this block when the next one comes
+    uint32_t crossing = none;
+    for_all_levels(block, levels_of, [&](uint32_t first, std::span<const int32_t> levels) {
+        const uint32_t found = search(detector, levels);
+        crossing = found == levels.size() ? none : first + found;
+        return crossing == none;
+    });
+    if (crossing == none) {
+        return none;
     }
-    return offset;
+    // The rings must hold the end of this block when the next one comes.
+    settle(detector, block.subspan(crossing + 1), levels_of);
+    const uint32_t half = detector.window / 2;
+    return crossing > half ? crossing - half : 0;
 }
 
 } // namespace kz::qv

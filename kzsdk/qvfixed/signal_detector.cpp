@@ -1,19 +1,9 @@
+#include <algorithm>
 #include <span>
 
-#include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/dsp/kernels/kernels.hpp"
 #include "kzsdk/qv/signal_scan.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
-
-namespace {
-
-constexpr int32_t shifted_towards_zero(int32_t sample, int32_t shift) noexcept
-{
-    const auto shifted =
-        static_cast<int32_t>(kz::fxp::shift_right(kz::fxp::magnitude(sample), shift));
-    return sample < 0 ? kz::fxp::wrap_negate(shifted) : shifted;
-}
-
-} // namespace
 
 kzqvfixed_signal_detector* kzqvfixed_signal_detector_create(uint32_t window, uint32_t threshold,
                                                             int32_t max_deviation) noexcept
@@ -38,7 +28,15 @@ uint32_t kzqvfixed_signal_detector_get_signal_offset(kzqvfixed_signal_detector* 
     if (detector == nullptr || (samples == nullptr && count != 0)) {
         return count;
     }
-    return kz::qv::signal_offset(*detector, std::span(samples, count), [shift](FxpType sample) {
-        return shifted_towards_zero(sample, shift);
-    });
+    // Counts are taken modulo 256, as in all fixed-point shifts, and 32 and more leave nothing.
+    const auto bits = static_cast<uint8_t>(shift);
+    return kz::qv::signal_offset(*detector, std::span(samples, count),
+                                 [bits](const FxpType* from, uint32_t number, int32_t* levels) {
+                                     if (bits < 32) {
+                                         kz::dsp::kernels().shift_towards_zero(from, levels, number,
+                                                                               bits);
+                                     } else {
+                                         std::fill_n(levels, number, 0);
+                                     }
+                                 });
 }

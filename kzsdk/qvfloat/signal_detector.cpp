@@ -1,6 +1,6 @@
 #include <span>
 
-#include "kzsdk/abs/saturate.hpp"
+#include "kzsdk/dsp/kernels/kernels.hpp"
 #include "kzsdk/qv/signal_scan.hpp"
 #include "kzsdk/qvfloat/qvfloat.h"
 
@@ -19,5 +19,7 @@ uint32_t QVSD_GetSignalOffset(QVSD* detector, const float* samples, uint32_t cou
         return count;
     }
     return kz::qv::signal_offset(*detector, std::span(samples, count),
-                                 [](float sample) { return kz::to_int32(sample); });
+                                 [](const float* from, uint32_t number, int32_t* levels) {
+                                     kz::dsp::kernels().truncate(from, levels, number);
+                                 });
 }

@@ -28,6 +28,19 @@ struct Converters {
     Converter<Word>* pcm8_stereo;
 };
 
+/// Two moving means over the last 2^window_log2 samples: of their levels, and of the deviations of
+/// the levels from their mean, none of which counts for more than max_deviation. The arrays are
+/// rings, given from the oldest entry on.
+struct MovingMeans {
+    int32_t* levels;
+    int32_t* deviations;
+    int32_t level_sum;
+    int32_t deviation_sum;
+    int32_t window_log2;
+    int32_t max_deviation;
+    uint32_t limit; ///< a sum of deviations that reaches this, as an unsigned number, is not quiet
+};
+
 struct Kernels {
     /// "plain", "sse41", "avx2" or "neon".
     const char* name;
@@ -40,6 +53,20 @@ struct Kernels {
 
     Converters<int32_t> words;
     Converters<float> floats;
+
+    /// Divides by 2^shift, 0 <= shift <= 31, towards zero.
+    void (*shift_towards_zero)(const int32_t* input, int32_t* output, uint32_t count,
+                               int32_t shift) noexcept;
+
+    /// kz::to_int32 of each value.
+    void (*truncate)(const float* input, int32_t* output, uint32_t count) noexcept;
+
+    /// Takes samples into both means until one might not be quiet, or fewer are left than the
+    /// variant takes at a time.
+    ///
+    /// @return How many were taken; the means are as they are after these, and the rings are not
+    ///         moved on.
+    uint32_t (*pass_quiet)(MovingMeans& means, const int32_t* samples, uint32_t count) noexcept;
 };
 
 /// The variant that all of the library uses.

@@ -1,7 +1,5 @@
 #include "kzsdk/dsp/kernels/plain.hpp"
 
-#include "kzsdk/dsp/kernels/kernels.hpp"
-
 namespace kz::dsp {
 
 namespace {
@@ -22,6 +20,9 @@ const Kernels kPlainKernels = {
     .dct_float = plain::dct_float,
     .words = kPlainConverters<int32_t>,
     .floats = kPlainConverters<float>,
+    .shift_towards_zero = plain::shift_towards_zero,
+    .truncate = plain::truncate,
+    .pass_quiet = plain::pass_quiet,
 };
 
 } // namespace kz::dsp

@@ -5,6 +5,8 @@
 
 #include <cstdint>
 
+#include "kzsdk/dsp/kernels/kernels.hpp"
+
 namespace kz::dsp::plain {
 
 void dct_fixed(int32_t* x, const int32_t* factors, int32_t order) noexcept;
@@ -18,5 +20,10 @@ void pcm16_mono(const void* input, float* output, int32_t frames, int32_t shift)
 void pcm16_stereo(const void* input, float* output, int32_t frames, int32_t shift) noexcept;
 void pcm8_mono(const void* input, float* output, int32_t frames, int32_t shift) noexcept;
 void pcm8_stereo(const void* input, float* output, int32_t frames, int32_t shift) noexcept;
+
+void shift_towards_zero(const int32_t* input, int32_t* output, uint32_t count,
+                        int32_t shift) noexcept;
+void truncate(const float* input, int32_t* output, uint32_t count) noexcept;
+uint32_t pass_quiet(MovingMeans& means, const int32_t* samples, uint32_t count) noexcept;
 
 } // namespace kz::dsp::plain

@@ -50,6 +50,43 @@ struct Neon {
         return vshlq_s32(v, vdupq_n_s32(count));
     }
 
+    /// Shifts every lane by the same `count`, 0 .. 31.
+    static Ints shift_right(Ints v, int32_t count) noexcept
+    {
+        return vshlq_s32(v, vdupq_n_s32(-count));
+    }
+    static Ints shift_right_unsigned(Ints v, int32_t count) noexcept
+    {
+        return vreinterpretq_s32_u32(vshlq_u32(vreinterpretq_u32_s32(v), vdupq_n_s32(-count)));
+    }
+
+    static Ints exclusive_or(Ints a, Ints b) noexcept { return veorq_s32(a, b); }
+    static Ints bits_and(Ints a, Ints b) noexcept { return vandq_s32(a, b); }
+    static Ints smaller(Ints a, Ints b) noexcept { return vminq_s32(a, b); }
+
+    /// Magnitudes; -2^31 stays.
+    static Ints size_of(Ints v) noexcept { return vabsq_s32(v); }
+
+    /// Whether any lane of `v`, as an unsigned number, is no less than that of `limit`.
+    static bool any_reaches(Ints v, Ints limit) noexcept
+    {
+        return vmaxvq_u32(vcgeq_u32(vreinterpretq_u32_s32(v), vreinterpretq_u32_s32(limit))) != 0;
+    }
+
+    /// Lane k becomes the sum of lanes 0 to k.
+    static Ints running_sums(Ints v) noexcept
+    {
+        const Ints zero = vdupq_n_s32(0);
+        v = vaddq_s32(v, vextq_s32(zero, v, 3));
+        return vaddq_s32(v, vextq_s32(zero, v, 2));
+    }
+    static Ints last_lane_to_all(Ints v) noexcept { return vdupq_laneq_s32(v, 3); }
+    static int32_t first_lane(Ints v) noexcept { return vgetq_lane_s32(v, 0); }
+
+    /// Truncates towards zero as kz::to_int32 does: here the processor saturates and takes NaN for
+    /// 0 by itself.
+    static Ints truncated(Floats v) noexcept { return vcvtq_s32_f32(v); }
+
     static Floats to_floats(Ints v) noexcept { return vcvtq_f32_s32(v); }
 
     /// Widens 16-bit samples; the sums of pairs of them.

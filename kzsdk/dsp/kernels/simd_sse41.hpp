@@ -56,6 +56,47 @@ struct Sse41 {
         return _mm_sll_epi32(v, _mm_cvtsi32_si128(count));
     }
 
+    /// Shifts every lane by the same `count`, 0 .. 31.
+    static Ints shift_right(Ints v, int32_t count) noexcept
+    {
+        return _mm_sra_epi32(v, _mm_cvtsi32_si128(count));
+    }
+    static Ints shift_right_unsigned(Ints v, int32_t count) noexcept
+    {
+        return _mm_srl_epi32(v, _mm_cvtsi32_si128(count));
+    }
+
+    static Ints exclusive_or(Ints a, Ints b) noexcept { return _mm_xor_si128(a, b); }
+    static Ints bits_and(Ints a, Ints b) noexcept { return _mm_and_si128(a, b); }
+    static Ints smaller(Ints a, Ints b) noexcept { return _mm_min_epi32(a, b); }
+
+    /// Magnitudes; -2^31 stays.
+    static Ints size_of(Ints v) noexcept { return _mm_abs_epi32(v); }
+
+    /// Whether any lane of `v`, as an unsigned number, is no less than that of `limit`.
+    static bool any_reaches(Ints v, Ints limit) noexcept
+    {
+        return _mm_movemask_epi8(_mm_cmpeq_epi32(_mm_max_epu32(v, limit), v)) != 0;
+    }
+
+    /// Lane k becomes the sum of lanes 0 to k.
+    static Ints running_sums(Ints v) noexcept
+    {
+        v = _mm_add_epi32(v, _mm_slli_si128(v, 4));
+        return _mm_add_epi32(v, _mm_slli_si128(v, 8));
+    }
+    static Ints last_lane_to_all(Ints v) noexcept { return _mm_shuffle_epi32(v, 0b11111111); }
+    static int32_t first_lane(Ints v) noexcept { return _mm_cvtsi128_si32(v); }
+
+    /// Truncates towards zero as kz::to_int32 does. The processor's own conversion gives -2^31 for
+    /// all that does not fit: right for what is too low, mended for what is too high and for NaN.
+    static Ints truncated(Floats v) noexcept
+    {
+        const Ints too_high = _mm_castps_si128(_mm_cmpge_ps(v, all(0x1p31F)));
+        const Ints number = _mm_castps_si128(_mm_cmpord_ps(v, v));
+        return bits_and(exclusive_or(_mm_cvttps_epi32(v), too_high), number);
+    }
+
     static Floats to_floats(Ints v) noexcept { return _mm_cvtepi32_ps(v); }
 
     /// Widens 16-bit samples; the sums of pairs of them.

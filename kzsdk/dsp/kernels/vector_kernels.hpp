@@ -9,6 +9,7 @@
 
 #include "kzsdk/dsp/kernels/convert.hpp"
 #include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/dsp/kernels/moving_means.hpp"
 #include "kzsdk/dsp/kernels/plain.hpp"
 #include "kzsdk/dsp/kernels/transform.hpp"
 
@@ -39,6 +40,9 @@ constexpr kz::dsp::Kernels vector_kernels(const char* name) noexcept
         .dct_float = dct_float<Simd>,
         .words = converters<Simd, int32_t>(),
         .floats = converters<Simd, float>(),
+        .shift_towards_zero = shift_towards_zero<Simd>,
+        .truncate = truncate<Simd>,
+        .pass_quiet = pass_quiet<Simd>,
     };
 }
 
