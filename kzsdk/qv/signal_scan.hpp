@@ -100,7 +100,7 @@ bool step(Detector& detector, int32_t level) noexcept
 template <class Detector>
 uint32_t pass_quiet(Detector& detector, std::span<const int32_t> levels) noexcept
 {
-    if (!std::has_single_bit(detector.window)) {
+    if ((detector.window & (detector.window - 1)) != 0) {
         return 0; // the loop divides by shifting
     }
     // A sum below this is one whose mean does not exceed the threshold. Sums that are negative are
@@ -116,12 +116,12 @@ uint32_t pass_quiet(Detector& detector, std::span<const int32_t> levels) noexcep
         .max_deviation = detector.max_deviation,
         .limit = static_cast<uint32_t>(std::min(limit, kNegative)),
     };
-    const size_t count = std::min<size_t>(levels.size(), detector.window - detector.position);
-    const uint32_t taken =
-        dsp::kernels().pass_quiet(means, levels.data(), static_cast<uint32_t>(count));
+    const uint32_t room = detector.window - detector.position;
+    const auto count = static_cast<uint32_t>(std::min<size_t>(levels.size(), room));
+    const uint32_t taken = dsp::kernels().pass_quiet(means, levels.data(), count);
     detector.level_sum = means.level_sum;
     detector.deviation_sum = means.deviation_sum;
-    advance(detector, taken);
+    detector.position = taken == room ? 0 : detector.position + taken;
     return taken;
 }
 
@@ -132,16 +132,22 @@ template <class Detector>
 uint32_t search(Detector& detector, std::span<const int32_t> levels) noexcept
 {
     const auto count = static_cast<uint32_t>(levels.size());
-    for (uint32_t i = 0;; ++i) {
-        i += pass_quiet(detector, levels.subspan(i));
-        if (i == count || step(detector, levels[i])) {
-            return i;
+    uint32_t i = 0;
+    while (i < count) {
+        const uint32_t taken = pass_quiet(detector, levels.subspan(i));
+        i += taken;
+        if (taken == 0) {
+            if (step(detector, levels[i])) {
+                return i;
+            }
+            ++i;
         }
     }
+    return count;
 }
 
 /// Levels are made this many at a time.
-inline constexpr size_t kScanChunk = 256;
+inline constexpr size_t kScanChunk = 1024;
 
 /// Makes levels of samples and hands them on, chunk by chunk: take(first index, levels) returns
 /// whether to go on.

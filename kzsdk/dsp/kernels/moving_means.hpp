@@ -58,19 +58,20 @@ uint32_t pass_quiet(kz::dsp::MovingMeans& m, const int32_t* samples, uint32_t co
     uint32_t i = 0;
     for (; i + Simd::kLanes <= count; i += Simd::kLanes) {
         const auto x = Simd::load(samples + i);
-        const auto levels =
-            Simd::add(level_sum, Simd::running_sums(Simd::sub(x, Simd::load(m.levels + i))));
+        const auto gained = Simd::running_sums(Simd::sub(x, Simd::load(m.levels + i)));
+        const auto levels = Simd::add(level_sum, gained);
         const auto distance = Simd::sub(x, mean_of<Simd>(levels, m.window_log2));
         const auto deviation = Simd::smaller(Simd::size_of(distance), most);
-        const auto deviations = Simd::add(
-            deviation_sum, Simd::running_sums(Simd::sub(deviation, Simd::load(m.deviations + i))));
+        const auto strayed =
+            Simd::running_sums(Simd::sub(deviation, Simd::load(m.deviations + i)));
+        const auto deviations = Simd::add(deviation_sum, strayed);
         if (Simd::any_reaches(deviations, limit)) {
             break;
         }
         Simd::store(m.levels + i, x);
         Simd::store(m.deviations + i, deviation);
-        level_sum = Simd::last_lane_to_all(levels);
-        deviation_sum = Simd::last_lane_to_all(deviations);
+        level_sum = Simd::add(level_sum, Simd::last_lane_to_all(gained));
+        deviation_sum = Simd::add(deviation_sum, Simd::last_lane_to_all(strayed));
     }
     m.level_sum = Simd::first_lane(level_sum);
     m.deviation_sum = Simd::first_lane(deviation_sum);
