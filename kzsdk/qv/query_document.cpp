@@ -32,26 +32,44 @@ struct FingerprintData {
     }
 };
 
+constexpr size_t kMostDigits = 5;
+
+// Writes a number in decimal.
+//
+// @return Behind its last digit.
+char* write_decimal(char* to, uint16_t value) noexcept
+{
+    char digits[kMostDigits];
+    size_t count = 0;
+    uint32_t rest = value;
+    do {
+        digits[count++] = static_cast<char>('0' + rest % 10);
+        rest /= 10;
+    } while (rest != 0);
+    while (count != 0) {
+        *to++ = digits[--count];
+    }
+    return to;
+}
+
 // The values are declared signed and printed unsigned: -1 is written 65535.
 kz_status format_values(const FingerprintData& data, kz::owned<char[]>& out_text) noexcept
 {
-    constexpr uint64_t kLongestElement = 6; // five digits and a separator
-    const uint64_t room = data.count() * kLongestElement + 1;
-    auto text = kz::make_array<char>(room);
+    auto text = kz::make_array<char>(uint64_t{data.count()} * (kMostDigits + 1) + 1);
     if (!text) {
         return KZ_QV_ERROR_MEMORY;
     }
-    uint32_t length = 0;
-    for (uint32_t i = 0; i < data.count(); ++i) {
-        const char* end = i + 1 == data.count() ? "\n" : kSeparator;
-        length += static_cast<uint32_t>(kz_snprintf(text.get() + length,
-                                                    static_cast<uint32_t>(room - length), "%hu%s",
-                                                    data.element(i), end));
-    }
-    if (length == 0) {
+    if (data.count() == 0) {
         return KZ_QV_ERROR_EMPTY;
     }
-    text[length - 1] = '\0'; // the line break behind the last value
+    char* to = text.get();
+    for (uint32_t i = 0; i < data.count(); ++i) {
+        if (i != 0) {
+            *to++ = kSeparator[0];
+        }
+        to = write_decimal(to, data.element(i));
+    }
+    *to = '\0';
     out_text = std::move(text);
     return KZ_OK;
 }

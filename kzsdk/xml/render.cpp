@@ -1,5 +1,6 @@
 #include "kzsdk/xml/xml.h"
 
+#include <algorithm>
 #include <memory>
 
 #include "kzsdk/abs/dyn_buf.h"
@@ -136,14 +137,27 @@ private:
             append(nullptr);
             return;
         }
-        // One byte at a time: where memory ends, as much of the text is there as fits.
-        for (; *text != '\0' && is_well(); ++text) {
+        while (*text != '\0' && is_well()) {
             if (const char* entity = entity_for(*text); entity != nullptr) {
                 append(entity);
+                ++text;
             } else {
-                append(text, 1);
+                text += plain_run(text);
             }
         }
+    }
+
+    /// Appends what needs no entity, at most as much as there is room for, or one byte. So where
+    /// memory ends, as much of the text is there as fits.
+    uint32_t plain_run(const char* text) noexcept
+    {
+        const uint32_t room = std::max(buffer_.capacity - buffer_.length, 1U);
+        uint32_t count = 1;
+        while (count < room && text[count] != '\0' && entity_for(text[count]) == nullptr) {
+            ++count;
+        }
+        append(text, count);
+        return count;
     }
 
     void attribute(const XMLAttr& attribute) noexcept
