@@ -5,10 +5,12 @@
 /// kzsdk/dsp/butterfly.hpp. A machine whose mathematics rounds otherwise must not make another
 /// library: the words are compared with a digest, and a difference fails the build.
 
+#include <algorithm>
 #include <bit>
 #include <cmath>
 #include <cstdint>
 #include <cstdio>
+#include <cstdlib>
 #include <fstream>
 #include <iostream>
 #include <string_view>
@@ -77,17 +79,26 @@ struct Source {
 };
 
 template <class Value>
+void write_array(std::ostream& out, std::string_view type, std::string_view name,
+                 const std::vector<Value>& values)
+{
+    out << "const " << type << ' ' << name << '[' << values.size() << "] = {";
+    for (size_t i = 0; i < values.size(); ++i) {
+        out << (i % 12 == 0 ? "\n    " : " ");
+        write_value(out, values[i]);
+        out << ',';
+    }
+    out << "\n};\n\n";
+}
+
+template <class Value>
 void write_array(Source& out, std::string_view type, std::string_view name,
                  const std::vector<Value>& values)
 {
-    out.text << "const " << type << ' ' << name << '[' << values.size() << "] = {";
-    for (size_t i = 0; i < values.size(); ++i) {
-        out.text << (i % 12 == 0 ? "\n    " : " ");
-        write_value(out.text, values[i]);
-        out.text << ',';
-        out.digest.take(values[i]);
+    write_array(out.text, type, name, values);
+    for (const Value value : values) {
+        out.digest.take(value);
     }
-    out.text << "\n};\n\n";
 }
 
 // The taps in two halves, which is how fixed-point inner loops multiply them, and their accessors.
@@ -112,18 +123,57 @@ void write_filter(Source& out, uint32_t hertz, const std::vector<int32_t>& words
     accessor("uint32_t", "length") << " { return " << words.size() << "; }\n\n";
 }
 
+// The same taps once more, in rows. These words follow from those that the digest knows.
+void write_rows(std::ostream& out, uint32_t hertz, uint32_t up, uint32_t down,
+                const std::vector<int32_t>& words)
+{
+    constexpr size_t kWidestVector = 8;
+    const size_t per_phase = words.size() / up;
+    const size_t row_length = (per_phase + kWidestVector - 1) / kWidestVector * kWidestVector;
+    std::vector<int32_t> row_of(up);
+    std::vector<int32_t> taps(up * row_length);
+    std::vector<int32_t> high_parts(up * row_length);
+    std::vector<int32_t> high_sums(up);
+    int32_t largest_high = 0;
+    for (uint32_t row = 0, phase = 0; row < up; ++row, phase = (phase + down) % up) {
+        row_of[phase] = static_cast<int32_t>(row);
+        for (size_t k = 0; k < per_phase; ++k) {
+            const int32_t word = words[phase + k * up];
+            const int32_t high = word >> 16;
+            const size_t at = row * row_length + per_phase - 1 - k;
+            taps[at] = std::bit_cast<int32_t>(std::rotl(std::bit_cast<uint32_t>(word), 16));
+            high_parts[at] = high + ((word >> 15) & 1);
+            high_sums[row] += high;
+            largest_high = std::max(largest_high, std::abs(high));
+        }
+    }
+    out << "namespace hertz_" << hertz << " {\n";
+    write_array(out, "uint16_t", "row_of", row_of);
+    write_array(out, "int32_t", "taps", taps);
+    write_array(out, "int16_t", "high_parts", high_parts);
+    write_array(out, "int32_t", "high_sums", high_sums);
+    out << "} // namespace hertz_" << hertz << "\n\nconst kz::dsp::PhaseRows kz::dsp::rows_"
+        << hertz << " = {" << up << ", " << row_length << ", " << largest_high << ", hertz_"
+        << hertz << "::row_of,\n    hertz_" << hertz << "::taps, hertz_" << hertz
+        << "::high_parts, hertz_" << hertz << "::high_sums};\n\n";
+}
+
 void write_filters(Source& out)
 {
     for (const Polyphase& rate : kPolyphase) {
         const auto layout = kz::dsp::filter_layout(rate.up, rate.down);
         std::vector<float> taps(layout.length);
         kz::dsp::design_windowed_sinc(layout, taps);
-        write_filter(out, rate.hertz, to_q31(taps, rate.gain));
+        const auto words = to_q31(taps, rate.gain);
+        write_filter(out, rate.hertz, words);
+        write_rows(out.text, rate.hertz, rate.up, rate.down, words);
     }
     const auto half_band = kz::tables::design_short_filter(kz::tables::kHalfBand);
     const auto quarter_band = kz::tables::design_short_filter(kz::tables::kQuarterBand);
     write_filter(out, 22050, to_q31(half_band, 1.0));
+    write_rows(out.text, 22050, 1, 2, to_q31(half_band, 1.0));
     write_filter(out, 44100, to_q31(quarter_band, 1.0));
+    write_rows(out.text, 44100, 1, 4, to_q31(quarter_band, 1.0));
     write_array(out, "float", "kz::dsp::coefficients_2to1", half_band);
     write_array(out, "float", "kz::dsp::coefficients_4to1", quarter_band);
 }

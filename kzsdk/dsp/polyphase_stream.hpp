@@ -159,9 +159,31 @@ void keep_tail(Resampler& r, std::span<const Sample> tail) noexcept
     r.history_end += static_cast<uint32_t>(tail.size());
 }
 
+/// Moves the phase on by one output.
+///
+/// @return How many samples the window moves.
+template <class Resampler>
+uint32_t next_phase(Resampler& r) noexcept
+{
+    // The phase advances before the taps are read and the window moves after: each output is up to
+    // one input sample off its ideal time, and this is how the stream is defined.
+    const uint32_t t = r.phase + r.down;
+    r.phase = t % r.up;
+    return t / r.up;
+}
+
+/// Outputs whose windows all lie in a block, of which `spare` samples are left behind the first
+/// window: output i needs (phase + i * down) / up of them.
+template <class Resampler>
+uint64_t outputs_inside(const Resampler& r, uint64_t spare) noexcept
+{
+    return ((spare + 1) * r.up - 1 - r.phase) / r.down + 1;
+}
+
 /// Resamples one block.
 ///
-/// @param inside  (oldest sample of the window, phase) -> output, for a window inside the block.
+/// @param inside  (oldest sample of the first window, phase before the first output, outputs): all
+///                outputs whose windows lie inside the block, at once.
 /// @param across  (newer samples, older samples, phase) -> output, for a window that reaches into
 ///                the history; both spans run forwards in time, and the newer one may be empty.
 template <class Resampler, class Sample, class Inside, class Across>
@@ -171,33 +193,36 @@ BlockCounts resample_block(Resampler& r, std::span<const Sample> input, std::spa
     const uint32_t window = r.taps_per_phase;
     const uint64_t available = input.size();
     uint64_t needed = need(r);
-    uint32_t oldest = 0; // first sample of the block that is still needed
+    uint64_t oldest = 0; // first sample of the block that is still needed
     uint32_t produced = 0;
-    while (produced < output.size() && needed <= available) {
-        // The phase advances before the taps are read and the window moves after: each output is
-        // up to one input sample off its ideal time, and this is how the stream is defined.
-        const uint32_t t = r.phase + r.down;
-        const uint32_t step = t / r.up;
-        r.phase = t % r.up;
-        const uint32_t pending = r.history_end - r.history_start;
-        if (pending == 0) {
-            output[produced] = inside(input.data() + oldest, r.phase);
-            oldest += step;
-        } else {
-            const std::span<const Sample> older(r.history + r.history_start, pending);
-            output[produced] = across(input.first(window - pending), older, r.phase);
-            r.history_start += step;
-            if (step >= pending) {
-                r.history_start = 0;
-                r.history_end = 0;
-                oldest = step - pending;
-            }
+    uint32_t pending = r.history_end - r.history_start;
+    while (pending != 0 && produced < output.size() && needed <= available) {
+        const std::span<const Sample> older(r.history + r.history_start, pending);
+        const uint32_t step = next_phase(r);
+        output[produced++] = across(input.first(window - pending), older, r.phase);
+        r.history_start += step;
+        if (step >= pending) {
+            r.history_start = 0;
+            r.history_end = 0;
+            oldest = step - pending;
         }
-        ++produced;
+        pending = r.history_end - r.history_start;
         needed += step;
     }
+    if (pending == 0 && produced < output.size() && needed <= available) {
+        const auto outputs = output.subspan(
+            produced, static_cast<size_t>(std::min<uint64_t>(
+                          output.size() - produced, outputs_inside(r, available - needed))));
+        inside(input.data() + oldest, r.phase, outputs);
+        const uint64_t t = r.phase + uint64_t{outputs.size()} * r.down;
+        r.phase = static_cast<uint32_t>(t % r.up);
+        oldest += t / r.up;
+        needed += t / r.up;
+        produced += static_cast<uint32_t>(outputs.size());
+    }
     const auto consumed = static_cast<uint32_t>(std::min(needed, available));
-    keep_tail(r, input.subspan(oldest, consumed - oldest));
+    keep_tail(r,
+              input.subspan(static_cast<size_t>(oldest), static_cast<size_t>(consumed - oldest)));
     return {consumed, produced};
 }
 

@@ -1,10 +1,14 @@
 #include "kzsdk/dsp/resampler.h"
 
+#include <algorithm>
+#include <array>
 #include <span>
 
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/dsp/kernels/kernels.hpp"
 #include "kzsdk/dsp/polyphase_stream.hpp"
+#include "kzsdk/dsp/tables.hpp"
 
 namespace {
 
@@ -18,28 +22,36 @@ struct Conversion {
     const int16_t* (*msb)() noexcept;
     const uint16_t* (*lsb)() noexcept;
     uint32_t (*length)() noexcept;
+    const kz::dsp::PhaseRows* rows;
 };
 
-constexpr Conversion kCopy{1, 1, 1, 1, nullptr, nullptr, nullptr};
+constexpr Conversion kCopy{1, 1, 1, 1, nullptr, nullptr, nullptr, nullptr};
 
 constexpr Conversion kConversions[] = {
     kCopy,
     {48000, 11025, 147, 640, kzdsp_get_48000_11025_fixed_coeff_msb,
-     kzdsp_get_48000_11025_fixed_coeff_lsb, kzdsp_get_48000_11025_fixed_coeff_length},
+     kzdsp_get_48000_11025_fixed_coeff_lsb, kzdsp_get_48000_11025_fixed_coeff_length,
+     &kz::dsp::rows_48000},
     {44100, 11025, 1, 4, kzdsp_get_44100_11025_fixed_coeff_msb,
-     kzdsp_get_44100_11025_fixed_coeff_lsb, kzdsp_get_44100_11025_fixed_coeff_length},
+     kzdsp_get_44100_11025_fixed_coeff_lsb, kzdsp_get_44100_11025_fixed_coeff_length,
+     &kz::dsp::rows_44100},
     {32000, 11025, 441, 1280, kzdsp_get_32000_11025_fixed_coeff_msb,
-     kzdsp_get_32000_11025_fixed_coeff_lsb, kzdsp_get_32000_11025_fixed_coeff_length},
+     kzdsp_get_32000_11025_fixed_coeff_lsb, kzdsp_get_32000_11025_fixed_coeff_length,
+     &kz::dsp::rows_32000},
     {24000, 11025, 147, 320, kzdsp_get_24000_11025_fixed_coeff_msb,
-     kzdsp_get_24000_11025_fixed_coeff_lsb, kzdsp_get_24000_11025_fixed_coeff_length},
+     kzdsp_get_24000_11025_fixed_coeff_lsb, kzdsp_get_24000_11025_fixed_coeff_length,
+     &kz::dsp::rows_24000},
     {22050, 11025, 1, 2, kzdsp_get_22050_11025_fixed_coeff_msb,
-     kzdsp_get_22050_11025_fixed_coeff_lsb, kzdsp_get_22050_11025_fixed_coeff_length},
+     kzdsp_get_22050_11025_fixed_coeff_lsb, kzdsp_get_22050_11025_fixed_coeff_length,
+     &kz::dsp::rows_22050},
     {2, 1, 1, 2, kzdsp_get_22050_11025_fixed_coeff_msb, kzdsp_get_22050_11025_fixed_coeff_lsb,
-     kzdsp_get_22050_11025_fixed_coeff_length},
+     kzdsp_get_22050_11025_fixed_coeff_length, &kz::dsp::rows_22050},
     {16000, 11025, 441, 640, kzdsp_get_16000_11025_fixed_coeff_msb,
-     kzdsp_get_16000_11025_fixed_coeff_lsb, kzdsp_get_16000_11025_fixed_coeff_length},
+     kzdsp_get_16000_11025_fixed_coeff_lsb, kzdsp_get_16000_11025_fixed_coeff_length,
+     &kz::dsp::rows_16000},
     {8000, 11025, 441, 320, kzdsp_get_8000_11025_fixed_coeff_msb,
-     kzdsp_get_8000_11025_fixed_coeff_lsb, kzdsp_get_8000_11025_fixed_coeff_length},
+     kzdsp_get_8000_11025_fixed_coeff_lsb, kzdsp_get_8000_11025_fixed_coeff_length,
+     &kz::dsp::rows_8000},
 };
 
 const Conversion* find_conversion(uint32_t input_rate, uint32_t output_rate) noexcept
@@ -53,79 +65,6 @@ const Conversion* find_conversion(uint32_t input_rate, uint32_t output_rate) noe
         }
     }
     return input_rate == output_rate ? &kCopy : nullptr;
-}
-
-struct Halves {
-    int32_t high; // signed
-    uint32_t low; // unsigned
-};
-
-constexpr Halves halves(int32_t word) noexcept
-{
-    return {word >> 16, static_cast<uint32_t>(word) & 0xffffU};
-}
-
-// low1 * high1 + low2 * high2, the middle of a product of 32-bit words. May wrap: see the header.
-constexpr int32_t cross_products(Halves sample, int32_t msb, uint32_t lsb) noexcept
-{
-    return wrap_add(wrap_mul(sample.high, static_cast<int32_t>(lsb)),
-                    wrap_mul(static_cast<int32_t>(sample.low), msb));
-}
-
-// One phase of the prototype against a window inside the block, in units of 2^-31 of the product.
-int32_t polyphase(const KZDSP_resampler_fixed& r, const int32_t* window, uint32_t phase) noexcept
-{
-    const int32_t* newest = window + r.taps_per_phase - 1;
-    int32_t sum = 0;
-    for (uint32_t k = 0; k < r.taps_per_phase; ++k) {
-        const uint32_t tap = phase + k * r.up;
-        const Halves sample = halves(*(newest - k));
-        const int32_t high = wrap_mul(2 * r.msb[tap], sample.high);
-        const int32_t middle = cross_products(sample, r.msb[tap], r.lsb[tap]) >> 15;
-        sum = wrap_add(sum, wrap_add(high, middle));
-    }
-    return sum;
-}
-
-// The symmetric filters of the integer decimators: a pair of samples is added before it is
-// multiplied, and the product counts in units of 2^-32. (Polyphase filters count in 2^-31: so 22050
-// and 44100 Hz come out at half level, which later stages level out.)
-int32_t tap_product(const KZDSP_resampler_fixed& r, uint32_t tap, int32_t sample) noexcept
-{
-    const Halves s = halves(sample);
-    return wrap_add(wrap_mul(r.msb[tap], s.high), cross_products(s, r.msb[tap], r.lsb[tap]) >> 16);
-}
-
-int32_t pair_product(const KZDSP_resampler_fixed& r, const int32_t* newest, uint32_t tap,
-                     uint32_t centre) noexcept
-{
-    return tap_product(r, tap, wrap_add(*(newest - tap), *(newest - (2 * centre - tap))));
-}
-
-// Every even tap and the centre; the other odd taps are zero.
-int32_t half_band(const KZDSP_resampler_fixed& r, const int32_t* window) noexcept
-{
-    constexpr uint32_t kCentre = 21;
-    const int32_t* newest = window + r.taps_per_phase - 1;
-    int32_t sum = tap_product(r, kCentre, *(newest - kCentre));
-    for (uint32_t tap = 2; tap < kCentre; tap += 2) {
-        sum = wrap_add(sum, pair_product(r, newest, tap, kCentre));
-    }
-    return sum;
-}
-
-// Three taps of four and the centre; every tap whose index is 3 modulo 4 is zero but the centre.
-int32_t quarter_band(const KZDSP_resampler_fixed& r, const int32_t* window) noexcept
-{
-    constexpr uint32_t kCentre = 43;
-    const int32_t* newest = window + r.taps_per_phase - 1;
-    int32_t sum = tap_product(r, kCentre, *(newest - kCentre));
-    for (uint32_t tap = 4; tap < kCentre; tap += 4) {
-        for (uint32_t i = 0; i < 3; ++i) {
-            sum = wrap_add(sum, pair_product(r, newest, tap + i, kCentre));
-        }
-    }
-    return sum;
 }
 
 using Samples = std::span<const int32_t>;
@@ -158,29 +97,60 @@ int32_t dual_convolve(Samples newer, Samples older, const Taps& taps, int32_t sh
     return add_products(sum, older, taps, newer.size(), shift);
 }
 
+const kz::dsp::PhaseRows& rows_of(const KZDSP_resampler_fixed& r) noexcept
+{
+    for (const Conversion& conversion : kConversions) {
+        if (conversion.up == r.up && conversion.down == r.down && conversion.rows != nullptr) {
+            return *conversion.rows;
+        }
+    }
+    return *kConversions[1].rows; // not reached: every resampler is made from the table
+}
+
+// Windows that reach into the history: they are laid together, and each product is exact.
+class AcrossBlocks {
+public:
+    AcrossBlocks(const kz::dsp::PhaseRows& rows, uint32_t taps) noexcept
+        : rows_(rows), taps_(taps),
+          convolve_(rows.up == 1 ? kz::dsp::kernels().convolve_from_bit_32
+                                 : kz::dsp::kernels().convolve_from_bit_31)
+    {
+    }
+
+    int32_t operator()(Samples newer, Samples older, uint32_t phase) const noexcept
+    {
+        std::array<int32_t, kLongestRow> window;
+        const auto end = std::copy(newer.begin(), newer.end(),
+                                   std::copy(older.begin(), older.end(), window.begin()));
+        std::fill(end, window.begin() + rows_.row_length, 0);
+        const int32_t* row = rows_.taps + size_t{rows_.row_of[phase]} * rows_.row_length;
+        return convolve_(window.data(), row, rows_.row_length);
+    }
+
+private:
+    static constexpr size_t kLongestRow = 96;
+
+    const kz::dsp::PhaseRows& rows_;
+    uint32_t taps_;
+    int32_t (*convolve_)(const int32_t*, const int32_t*, uint32_t) noexcept;
+};
+
 kz::dsp::BlockCounts resample(KZDSP_resampler_fixed& r, Samples input,
                               std::span<int32_t> output) noexcept
 {
     if (kz::dsp::copies(r)) {
         return kz::dsp::copy_block(input, output);
     }
-    const auto across = [&r](Samples newer, Samples older, uint32_t phase) {
-        return dual_convolve(newer, older, {r.msb + phase, r.lsb + phase, r.up}, r.up == 1 ? 0 : 1);
-    };
-    if (r.up != 1) {
-        return kz::dsp::resample_block(
-            r, input, output,
-            [&r](const int32_t* window, uint32_t phase) { return polyphase(r, window, phase); },
-            across);
-    }
-    if (r.down == 4) {
-        return kz::dsp::resample_block(
-            r, input, output,
-            [&r](const int32_t* window, uint32_t) { return quarter_band(r, window); }, across);
-    }
+    const kz::dsp::PhaseRows& rows = rows_of(r);
+    const auto& kernels = kz::dsp::kernels();
+    const auto run = r.up == 1 ? kernels.symmetric : kernels.polyphase;
     return kz::dsp::resample_block(
-        r, input, output, [&r](const int32_t* window, uint32_t) { return half_band(r, window); },
-        across);
+        r, input, output,
+        [&](const int32_t* oldest, uint32_t phase, std::span<int32_t> outputs) {
+            run(rows, {oldest, r.taps_per_phase, r.down, phase}, outputs.data(),
+                static_cast<uint32_t>(outputs.size()));
+        },
+        AcrossBlocks(rows, r.taps_per_phase));
 }
 
 } // namespace

@@ -88,9 +88,14 @@ kz::dsp::BlockCounts resample(KZDSP_resampler& r, Samples input, std::span<float
     // Both sums run over the same products in the same order, so that a cut does not show.
     return kz::dsp::resample_block(
         r, input, output,
-        [&r](const float* window, uint32_t phase) {
-            return KZDSP_Convolve(window + r.taps_per_phase - 1, r.taps + phase, r.taps_per_phase,
-                                  r.up);
+        [&r](const float* window, uint32_t phase, std::span<float> outputs) {
+            for (float& value : outputs) {
+                const uint32_t t = phase + r.down;
+                phase = t % r.up;
+                value = KZDSP_Convolve(window + r.taps_per_phase - 1, r.taps + phase,
+                                       r.taps_per_phase, r.up);
+                window += t / r.up;
+            }
         },
         [&r](Samples newer, Samples older, uint32_t phase) {
             return KZDSP_DualConvolve(newest(newer), static_cast<uint32_t>(newer.size()),

@@ -16,4 +16,25 @@ extern const int32_t kDctCoefficients[32768];
 extern const float coefficients_2to1[42];
 extern const float coefficients_4to1[84];
 
+/// A fixed-point prototype with the taps of each phase side by side, as the inner loops take them:
+/// oldest sample first, rows in the order in which outputs use the phases, each row filled up with
+/// zeros.
+struct PhaseRows {
+    uint32_t up;
+    uint32_t row_length;       ///< a multiple of 8
+    int32_t largest_high;      ///< the largest magnitude among the high halves
+    const uint16_t* row_of;    ///< by phase
+    const int32_t* taps;       ///< low half above, high half below
+    const int16_t* high_parts; ///< high half, plus 1 where the low half has its top bit
+    const int32_t* high_sums;  ///< by row: the sum of the high halves
+};
+
+extern const PhaseRows rows_8000;
+extern const PhaseRows rows_16000;
+extern const PhaseRows rows_22050;
+extern const PhaseRows rows_24000;
+extern const PhaseRows rows_32000;
+extern const PhaseRows rows_44100;
+extern const PhaseRows rows_48000;
+
 } // namespace kz::dsp

@@ -41,6 +41,16 @@ struct MovingMeans {
     uint32_t limit; ///< a sum of deviations that reaches this, as an unsigned number, is not quiet
 };
 
+struct PhaseRows;
+
+/// A stream of outputs whose windows all lie in one block.
+struct Windows {
+    const int32_t* oldest; ///< first sample of the first window
+    uint32_t taps;         ///< samples of a window
+    uint32_t down;
+    uint32_t phase; ///< before the first output; it advances by `down`, modulo `up`, before each
+};
+
 struct Kernels {
     /// "plain", "sse41", "avx2" or "neon".
     const char* name;
@@ -67,6 +77,21 @@ struct Kernels {
     /// @return How many were taken; the means are as they are after these, and the rings are not
     ///         moved on.
     uint32_t (*pass_quiet)(MovingMeans& means, const int32_t* samples, uint32_t count) noexcept;
+
+    /// Makes `count` outputs of a polyphase filter, the direct rule of resampler_fixed.cpp.
+    void (*polyphase)(const PhaseRows& rows, const Windows& windows, int32_t* output,
+                      uint32_t count) noexcept;
+
+    /// Makes `count` outputs of one of the two symmetric filters, `down` being 2 or 4.
+    void (*symmetric)(const PhaseRows& rows, const Windows& windows, int32_t* output,
+                      uint32_t count) noexcept;
+
+    /// The sum of bits 31 to 62, or 32 to 63, of the exact products of a row of taps and as many
+    /// samples.
+    int32_t (*convolve_from_bit_31)(const int32_t* samples, const int32_t* row,
+                                    uint32_t count) noexcept;
+    int32_t (*convolve_from_bit_32)(const int32_t* samples, const int32_t* row,
+                                    uint32_t count) noexcept;
 };
 
 /// The variant that all of the library uses.

@@ -62,8 +62,7 @@ uint32_t pass_quiet(kz::dsp::MovingMeans& m, const int32_t* samples, uint32_t co
         const auto levels = Simd::add(level_sum, gained);
         const auto distance = Simd::sub(x, mean_of<Simd>(levels, m.window_log2));
         const auto deviation = Simd::smaller(Simd::size_of(distance), most);
-        const auto strayed =
-            Simd::running_sums(Simd::sub(deviation, Simd::load(m.deviations + i)));
+        const auto strayed = Simd::running_sums(Simd::sub(deviation, Simd::load(m.deviations + i)));
         const auto deviations = Simd::add(deviation_sum, strayed);
         if (Simd::any_reaches(deviations, limit)) {
             break;

@@ -23,6 +23,10 @@ const Kernels kPlainKernels = {
     .shift_towards_zero = plain::shift_towards_zero,
     .truncate = plain::truncate,
     .pass_quiet = plain::pass_quiet,
+    .polyphase = plain::polyphase,
+    .symmetric = plain::symmetric,
+    .convolve_from_bit_31 = plain::convolve_from_bit_31,
+    .convolve_from_bit_32 = plain::convolve_from_bit_32,
 };
 
 } // namespace kz::dsp

@@ -26,4 +26,11 @@ void shift_towards_zero(const int32_t* input, int32_t* output, uint32_t count,
 void truncate(const float* input, int32_t* output, uint32_t count) noexcept;
 uint32_t pass_quiet(MovingMeans& means, const int32_t* samples, uint32_t count) noexcept;
 
+void polyphase(const PhaseRows& rows, const Windows& windows, int32_t* output,
+               uint32_t count) noexcept;
+void symmetric(const PhaseRows& rows, const Windows& windows, int32_t* output,
+               uint32_t count) noexcept;
+int32_t convolve_from_bit_31(const int32_t* samples, const int32_t* row, uint32_t count) noexcept;
+int32_t convolve_from_bit_32(const int32_t* samples, const int32_t* row, uint32_t count) noexcept;
+
 } // namespace kz::dsp::plain

@@ -29,6 +29,53 @@ struct Avx2 {
     static Ints all(int32_t value) noexcept { return _mm256_set1_epi32(value); }
     static Floats all(float value) noexcept { return _mm256_set1_ps(value); }
 
+    static Ints load(const int16_t* from) noexcept
+    {
+        return _mm256_loadu_si256(reinterpret_cast<const __m256i*>(from));
+    }
+    /// The low 16 bits of the lanes of both.
+    static void store_narrow(int16_t* to, Ints a, Ints b) noexcept
+    {
+        const Ints packed = _mm256_packs_epi32(truncated_to_shorts(a), truncated_to_shorts(b));
+        _mm256_storeu_si256(reinterpret_cast<__m256i*>(to),
+                            _mm256_permute4x64_epi64(packed, 0b11011000));
+    }
+
+    static Ints mul(Ints a, Ints b) noexcept { return _mm256_mullo_epi32(a, b); }
+    static Ints larger(Ints a, Ints b) noexcept { return _mm256_max_epi32(a, b); }
+
+    /// Exchanges the 16-bit halves of every lane.
+    static Ints swap_halves(Ints v) noexcept
+    {
+        return _mm256_or_si256(_mm256_slli_epi32(v, 16), _mm256_srli_epi32(v, 16));
+    }
+
+    /// In every lane the products of the low halves and of the high halves, added.
+    static Ints pair_products(Ints a, Ints b) noexcept { return _mm256_madd_epi16(a, b); }
+
+    /// The same of half a vector; the other lanes are 0.
+    static Ints half_pair_products(const int16_t* a, const int16_t* b) noexcept
+    {
+        const __m128i x = _mm_loadu_si128(reinterpret_cast<const __m128i*>(a));
+        const __m128i y = _mm_loadu_si128(reinterpret_cast<const __m128i*>(b));
+        return _mm256_zextsi128_si256(_mm_madd_epi16(x, y));
+    }
+
+    static int32_t sum_of_lanes(Ints v) noexcept
+    {
+        __m128i sum = _mm_add_epi32(_mm256_castsi256_si128(v), _mm256_extracti128_si256(v, 1));
+        sum = _mm_add_epi32(sum, _mm_shuffle_epi32(sum, 0b01001110));
+        sum = _mm_add_epi32(sum, _mm_shuffle_epi32(sum, 0b10110001));
+        return _mm_cvtsi128_si32(sum);
+    }
+    static int32_t largest_lane(Ints v) noexcept
+    {
+        __m128i most = _mm_max_epi32(_mm256_castsi256_si128(v), _mm256_extracti128_si256(v, 1));
+        most = _mm_max_epi32(most, _mm_shuffle_epi32(most, 0b01001110));
+        most = _mm_max_epi32(most, _mm_shuffle_epi32(most, 0b10110001));
+        return _mm_cvtsi128_si32(most);
+    }
+
     static Ints add(Ints a, Ints b) noexcept { return _mm256_add_epi32(a, b); }
     static Floats add(Floats a, Floats b) noexcept { return _mm256_add_ps(a, b); }
     static Ints sub(Ints a, Ints b) noexcept { return _mm256_sub_epi32(a, b); }
@@ -237,6 +284,10 @@ private:
     static Ints load_vector(const uint8_t* from) noexcept
     {
         return _mm256_loadu_si256(reinterpret_cast<const __m256i*>(from));
+    }
+    static Ints truncated_to_shorts(Ints v) noexcept
+    {
+        return _mm256_srai_epi32(_mm256_slli_epi32(v, 16), 16);
     }
     static Ints odd_lanes(Ints v) noexcept
     {

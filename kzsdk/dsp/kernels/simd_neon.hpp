@@ -23,6 +23,42 @@ struct Neon {
     static Ints all(int32_t value) noexcept { return vdupq_n_s32(value); }
     static Floats all(float value) noexcept { return vdupq_n_f32(value); }
 
+    static Ints load(const int16_t* from) noexcept
+    {
+        return vreinterpretq_s32_s16(vld1q_s16(from));
+    }
+    /// The low 16 bits of the lanes of both.
+    static void store_narrow(int16_t* to, Ints a, Ints b) noexcept
+    {
+        vst1q_s16(to, vcombine_s16(vmovn_s32(a), vmovn_s32(b)));
+    }
+
+    static Ints mul(Ints a, Ints b) noexcept { return vmulq_s32(a, b); }
+    static Ints larger(Ints a, Ints b) noexcept { return vmaxq_s32(a, b); }
+
+    /// Exchanges the 16-bit halves of every lane.
+    static Ints swap_halves(Ints v) noexcept
+    {
+        return vreinterpretq_s32_s16(vrev32q_s16(vreinterpretq_s16_s32(v)));
+    }
+
+    /// In every lane the products of the low halves and of the high halves, added.
+    static Ints pair_products(Ints a, Ints b) noexcept
+    {
+        const int16x8_t x = vreinterpretq_s16_s32(a);
+        const int16x8_t y = vreinterpretq_s16_s32(b);
+        return vpaddq_s32(vmull_s16(vget_low_s16(x), vget_low_s16(y)), vmull_high_s16(x, y));
+    }
+
+    /// The same of half a vector; the other lanes are 0.
+    static Ints half_pair_products(const int16_t* a, const int16_t* b) noexcept
+    {
+        return vpaddq_s32(vmull_s16(vld1_s16(a), vld1_s16(b)), vdupq_n_s32(0));
+    }
+
+    static int32_t sum_of_lanes(Ints v) noexcept { return vaddvq_s32(v); }
+    static int32_t largest_lane(Ints v) noexcept { return vmaxvq_s32(v); }
+
     static Ints add(Ints a, Ints b) noexcept { return vaddq_s32(a, b); }
     static Floats add(Floats a, Floats b) noexcept { return vaddq_f32(a, b); }
     static Ints sub(Ints a, Ints b) noexcept { return vsubq_s32(a, b); }

@@ -28,6 +28,49 @@ struct Sse41 {
     static Ints all(int32_t value) noexcept { return _mm_set1_epi32(value); }
     static Floats all(float value) noexcept { return _mm_set1_ps(value); }
 
+    static Ints load(const int16_t* from) noexcept
+    {
+        return _mm_loadu_si128(reinterpret_cast<const __m128i*>(from));
+    }
+    /// The low 16 bits of the lanes of both.
+    static void store_narrow(int16_t* to, Ints a, Ints b) noexcept
+    {
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(to),
+                         _mm_packs_epi32(truncated_to_shorts(a), truncated_to_shorts(b)));
+    }
+
+    static Ints mul(Ints a, Ints b) noexcept { return _mm_mullo_epi32(a, b); }
+    static Ints larger(Ints a, Ints b) noexcept { return _mm_max_epi32(a, b); }
+
+    /// Exchanges the 16-bit halves of every lane.
+    static Ints swap_halves(Ints v) noexcept
+    {
+        return _mm_or_si128(_mm_slli_epi32(v, 16), _mm_srli_epi32(v, 16));
+    }
+
+    /// In every lane the products of the low halves and of the high halves, added.
+    static Ints pair_products(Ints a, Ints b) noexcept { return _mm_madd_epi16(a, b); }
+
+    /// The same of half a vector; the other lanes are 0.
+    static Ints half_pair_products(const int16_t* a, const int16_t* b) noexcept
+    {
+        return _mm_madd_epi16(_mm_loadl_epi64(reinterpret_cast<const __m128i*>(a)),
+                              _mm_loadl_epi64(reinterpret_cast<const __m128i*>(b)));
+    }
+
+    static int32_t sum_of_lanes(Ints v) noexcept
+    {
+        v = _mm_add_epi32(v, _mm_shuffle_epi32(v, 0b01001110));
+        v = _mm_add_epi32(v, _mm_shuffle_epi32(v, 0b10110001));
+        return _mm_cvtsi128_si32(v);
+    }
+    static int32_t largest_lane(Ints v) noexcept
+    {
+        v = _mm_max_epi32(v, _mm_shuffle_epi32(v, 0b01001110));
+        v = _mm_max_epi32(v, _mm_shuffle_epi32(v, 0b10110001));
+        return _mm_cvtsi128_si32(v);
+    }
+
     static Ints add(Ints a, Ints b) noexcept { return _mm_add_epi32(a, b); }
     static Floats add(Floats a, Floats b) noexcept { return _mm_add_ps(a, b); }
     static Ints sub(Ints a, Ints b) noexcept { return _mm_sub_epi32(a, b); }
@@ -188,6 +231,10 @@ struct Sse41 {
     }
 
 private:
+    static Ints truncated_to_shorts(Ints v) noexcept
+    {
+        return _mm_srai_epi32(_mm_slli_epi32(v, 16), 16);
+    }
     static Ints odd_lanes(Ints v) noexcept
     {
         return _mm_castps_si128(_mm_movehdup_ps(_mm_castsi128_ps(v)));

@@ -11,6 +11,8 @@
 #include "kzsdk/dsp/kernels/kernels.hpp"
 #include "kzsdk/dsp/kernels/moving_means.hpp"
 #include "kzsdk/dsp/kernels/plain.hpp"
+#include "kzsdk/dsp/kernels/polyphase.hpp"
+#include "kzsdk/dsp/kernels/symmetric.hpp"
 #include "kzsdk/dsp/kernels/transform.hpp"
 
 namespace {
@@ -43,6 +45,10 @@ constexpr kz::dsp::Kernels vector_kernels(const char* name) noexcept
         .shift_towards_zero = shift_towards_zero<Simd>,
         .truncate = truncate<Simd>,
         .pass_quiet = pass_quiet<Simd>,
+        .polyphase = Polyphase<Simd>::run,
+        .symmetric = Symmetric<Simd>::run,
+        .convolve_from_bit_31 = convolve<Simd, 31>,
+        .convolve_from_bit_32 = convolve<Simd, 32>,
     };
 }
 
