@@ -4,6 +4,8 @@
 
 #include "kzsdk/dsp/fxp.h"
 #include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/qv/byte_levels.hpp"
 #include "kzsdk/qv/equalise.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
@@ -18,20 +20,17 @@ using Pieces = kz::qv::FramePieces<FxpType>;
 constexpr int32_t kSilentRange = 8192;
 
 struct SampleExtremes {
-    int32_t low = std::numeric_limits<int32_t>::max();
-    int32_t high = std::numeric_limits<int32_t>::min();
+    kz::dsp::Extremes<int32_t> ends{std::numeric_limits<int32_t>::max(),
+                                    std::numeric_limits<int32_t>::min()};
 
     void take(Samples samples) noexcept
     {
-        for (const FxpType sample : samples) {
-            low = std::min(low, sample);
-            high = std::max(high, sample);
-        }
+        kz::dsp::kernels().widen_words(ends, samples.data(), static_cast<uint32_t>(samples.size()));
     }
 
     // Halved before they are subtracted, so that the difference fits.
-    int32_t bottom() const noexcept { return low >> 1; }
-    int32_t range() const noexcept { return wrap_sub(high >> 1, low >> 1); }
+    int32_t bottom() const noexcept { return ends.low >> 1; }
+    int32_t range() const noexcept { return wrap_sub(ends.high >> 1, ends.low >> 1); }
     bool is_silent() const noexcept { return range() <= kSilentRange; }
 };
 
@@ -55,6 +54,14 @@ public:
     {
         const int32_t level = smul_high(wrap_sub(sample >> 1, bottom_), scale_) >> shift_;
         return std::clamp(level, 0, top_level_);
+    }
+
+    // The same, for the samples from whose extremes this was made, as bytes. There are at most 256
+    // levels; none comes out below 0, because no sample lies below the bottom.
+    void write_levels(Samples samples, uint8_t* levels) const noexcept
+    {
+        kz::dsp::kernels().word_levels({bottom_, scale_, shift_, top_level_}, samples.data(),
+                                       levels, static_cast<uint32_t>(samples.size()));
     }
 
 private:
@@ -100,11 +107,21 @@ struct Equaliser {
     {
         const Quantiser quantiser(extremes.bottom(), extremes.range(),
                                   static_cast<uint32_t>(histogram.size()));
+        const std::span<FxpType> frame(output, pieces.older.size() + pieces.newer.size());
+        if (histogram.size() <= kz::qv::kMostByteLevels) {
+            const kz::qv::ByteLevels<FxpType> levels(frame);
+            quantiser.write_levels(pieces.older, levels.from(0));
+            quantiser.write_levels(pieces.newer, levels.from(pieces.older.size()));
+            levels.count(histogram);
+            rank_values(histogram, ranks);
+            levels.replace(std::span<const uint32_t>(ranks));
+            return;
+        }
         std::fill(histogram.begin(), histogram.end(), 0U);
         quantise(pieces.older, quantiser, output, histogram);
         quantise(pieces.newer, quantiser, output + pieces.older.size(), histogram);
         rank_values(histogram, ranks);
-        for (FxpType& value : std::span(output, pieces.older.size() + pieces.newer.size())) {
+        for (FxpType& value : frame) {
             value = static_cast<FxpType>(ranks[static_cast<uint32_t>(value)]);
         }
     }

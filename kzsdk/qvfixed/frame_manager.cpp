@@ -5,6 +5,7 @@
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/dsp/fxp.h"
 #include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/dsp/kernels/kernels.hpp"
 #include "kzsdk/qv/frame_list.hpp"
 #include "kzsdk/qv/frame_pieces.hpp"
 #include "kzsdk/qvfixed/band_tables.hpp"
@@ -91,12 +92,9 @@ void correct_tilt(std::span<FxpType> spectrum) noexcept
         if (segment.first_bin > spectrum.size() || segment.end_bin > spectrum.size()) {
             continue;
         }
-        int32_t gain = segment.gain;
-        for (FxpType& bin :
-             spectrum.subspan(segment.first_bin, segment.end_bin - segment.first_bin)) {
-            bin = shift_left(smul_high(bin, gain), 2);
-            gain = wrap_add(gain, segment.step);
-        }
+        kz::dsp::kernels().apply_ramp(spectrum.data() + segment.first_bin,
+                                      segment.end_bin - segment.first_bin, segment.gain,
+                                      segment.step);
     }
 }
 
@@ -114,10 +112,8 @@ std::span<const FxpType> band_bins(const Manager& m, uint32_t band) noexcept
 
 int32_t band_energy(std::span<const FxpType> bins) noexcept
 {
-    uint64_t sum = 0;
-    for (const FxpType bin : bins) {
-        sum += static_cast<uint64_t>(smul(bin, bin)) >> 16;
-    }
+    const uint64_t sum =
+        kz::dsp::kernels().sum_squares(bins.data(), static_cast<uint32_t>(bins.size()));
     return static_cast<int32_t>(static_cast<uint32_t>(sum >> 16));
 }
 

@@ -3,6 +3,8 @@
 
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/abs/saturate.hpp"
+#include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/qv/byte_levels.hpp"
 #include "kzsdk/qv/equalise.hpp"
 #include "kzsdk/qvfloat/qvfloat.h"
 
@@ -16,18 +18,15 @@ constexpr float kSilentRange = 1.0F;
 
 // The search starts beyond any sample of 16 bits, not at the ends of the type.
 struct SampleExtremes {
-    float low = 1e6F;
-    float high = -1e6F;
+    kz::dsp::Extremes<float> ends{1e6F, -1e6F};
 
     void take(Samples samples) noexcept
     {
-        for (const float sample : samples) {
-            low = sample < low ? sample : low;
-            high = sample > high ? sample : high;
-        }
+        kz::dsp::kernels().widen_floats(ends, samples.data(),
+                                        static_cast<uint32_t>(samples.size()));
     }
 
-    float range() const noexcept { return high - low; }
+    float range() const noexcept { return ends.high - ends.low; }
     bool is_silent() const noexcept { return range() <= kSilentRange; }
 };
 
@@ -35,7 +34,7 @@ struct SampleExtremes {
 class Quantiser {
 public:
     Quantiser(const SampleExtremes& extremes, uint32_t levels) noexcept
-        : bottom_(extremes.low), scale_(static_cast<float>(levels - 1) / extremes.range()),
+        : bottom_(extremes.ends.low), scale_(static_cast<float>(levels - 1) / extremes.range()),
           top_level_(levels - 1)
     {
     }
@@ -45,6 +44,14 @@ public:
     uint32_t level(float sample) const noexcept
     {
         return std::min(kz::to_uint32((sample - bottom_) * scale_), top_level_);
+    }
+
+    // The same as bytes, of which there are at most 256.
+    void write_levels(Samples samples, uint8_t* levels) const noexcept
+    {
+        kz::dsp::kernels().float_levels({bottom_, scale_, static_cast<int32_t>(top_level_)},
+                                        samples.data(), levels,
+                                        static_cast<uint32_t>(samples.size()));
     }
 
 private:
@@ -95,11 +102,21 @@ struct Equaliser {
                     std::span<uint32_t> histogram, std::span<float> ranks) noexcept
     {
         const Quantiser quantiser(extremes, static_cast<uint32_t>(histogram.size()));
+        const std::span<float> frame(output, pieces.older.size() + pieces.newer.size());
+        const auto count = static_cast<float>(frame.size());
+        if (histogram.size() <= kz::qv::kMostByteLevels) {
+            const kz::qv::ByteLevels<float> levels(frame);
+            quantiser.write_levels(pieces.older, levels.from(0));
+            quantiser.write_levels(pieces.newer, levels.from(pieces.older.size()));
+            levels.count(histogram);
+            rank_values(histogram, count, ranks);
+            levels.replace(std::span<const float>(ranks));
+            return;
+        }
         std::fill(histogram.begin(), histogram.end(), 0U);
         count_levels(pieces.older, quantiser, histogram);
         count_levels(pieces.newer, quantiser, histogram);
-        rank_values(histogram, static_cast<float>(pieces.older.size() + pieces.newer.size()),
-                    ranks);
+        rank_values(histogram, count, ranks);
         map_levels(pieces.older, quantiser, ranks, output);
         map_levels(pieces.newer, quantiser, ranks, output + pieces.older.size());
     }

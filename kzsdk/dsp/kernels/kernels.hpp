@@ -41,6 +41,29 @@ struct MovingMeans {
     uint32_t limit; ///< a sum of deviations that reaches this, as an unsigned number, is not quiet
 };
 
+/// The smallest and the largest sample so far.
+template <class Sample>
+struct Extremes {
+    Sample low;
+    Sample high;
+};
+
+/// Level of a word x: bits 32 and up of (x / 2 - bottom) * scale, shifted right by `shift`, at most
+/// `top`. No x is below 2 * bottom, and the scale is not negative.
+struct WordLevels {
+    int32_t bottom;
+    int32_t scale;
+    int32_t shift;
+    int32_t top; ///< at most 255
+};
+
+/// Level of a value x: (x - bottom) * scale as a whole number, 0 to `top`; NaN counts as 0.
+struct FloatLevels {
+    float bottom;
+    float scale;
+    int32_t top; ///< at most 255
+};
+
 struct PhaseRows;
 
 /// A stream of outputs whose windows all lie in one block.
@@ -92,6 +115,24 @@ struct Kernels {
                                     uint32_t count) noexcept;
     int32_t (*convolve_from_bit_32)(const int32_t* samples, const int32_t* row,
                                     uint32_t count) noexcept;
+
+    /// Widens the extremes by samples. NaN is passed over.
+    void (*widen_words)(Extremes<int32_t>& extremes, const int32_t* samples,
+                        uint32_t count) noexcept;
+    void (*widen_floats)(Extremes<float>& extremes, const float* samples, uint32_t count) noexcept;
+
+    /// Writes the level of each sample.
+    void (*word_levels)(const WordLevels& rule, const int32_t* samples, uint8_t* levels,
+                        uint32_t count) noexcept;
+    void (*float_levels)(const FloatLevels& rule, const float* samples, uint8_t* levels,
+                         uint32_t count) noexcept;
+
+    /// Multiplies each word by a gain that grows by `step` from word to word: 4 times the product's
+    /// upper 32 bits, which are truncated towards zero.
+    void (*apply_ramp)(int32_t* words, uint32_t count, int32_t gain, int32_t step) noexcept;
+
+    /// The sum of the squares, each shifted right by 16 bits; modulo 2^64.
+    uint64_t (*sum_squares)(const int32_t* words, uint32_t count) noexcept;
 };
 
 /// The variant that all of the library uses.

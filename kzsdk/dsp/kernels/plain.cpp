@@ -27,6 +27,12 @@ const Kernels kPlainKernels = {
     .symmetric = plain::symmetric,
     .convolve_from_bit_31 = plain::convolve_from_bit_31,
     .convolve_from_bit_32 = plain::convolve_from_bit_32,
+    .widen_words = plain::widen_words,
+    .widen_floats = plain::widen_floats,
+    .word_levels = plain::word_levels,
+    .float_levels = plain::float_levels,
+    .apply_ramp = plain::apply_ramp,
+    .sum_squares = plain::sum_squares,
 };
 
 } // namespace kz::dsp

@@ -33,4 +33,13 @@ void symmetric(const PhaseRows& rows, const Windows& windows, int32_t* output,
 int32_t convolve_from_bit_31(const int32_t* samples, const int32_t* row, uint32_t count) noexcept;
 int32_t convolve_from_bit_32(const int32_t* samples, const int32_t* row, uint32_t count) noexcept;
 
+void widen_words(Extremes<int32_t>& extremes, const int32_t* samples, uint32_t count) noexcept;
+void widen_floats(Extremes<float>& extremes, const float* samples, uint32_t count) noexcept;
+void word_levels(const WordLevels& rule, const int32_t* samples, uint8_t* levels,
+                 uint32_t count) noexcept;
+void float_levels(const FloatLevels& rule, const float* samples, uint8_t* levels,
+                  uint32_t count) noexcept;
+void apply_ramp(int32_t* words, uint32_t count, int32_t gain, int32_t step) noexcept;
+uint64_t sum_squares(const int32_t* words, uint32_t count) noexcept;
+
 } // namespace kz::dsp::plain

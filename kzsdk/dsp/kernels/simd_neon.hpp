@@ -123,6 +123,43 @@ struct Neon {
     /// 0 by itself.
     static Ints truncated(Floats v) noexcept { return vcvtq_s32_f32(v); }
 
+    /// a < b ? a : b, and a > b ? a : b: b where one is no number.
+    static Floats smaller(Floats a, Floats b) noexcept { return vbslq_f32(vcltq_f32(a, b), a, b); }
+    static Floats larger(Floats a, Floats b) noexcept { return vbslq_f32(vcgtq_f32(a, b), a, b); }
+
+    /// The lanes, each 0 .. 255, of four vectors as bytes.
+    static void store_bytes(uint8_t* to, Ints a, Ints b, Ints c, Ints d) noexcept
+    {
+        const int16x8_t low = vcombine_s16(vmovn_s32(a), vmovn_s32(b));
+        const int16x8_t high = vcombine_s16(vmovn_s32(c), vmovn_s32(d));
+        vst1q_u8(to, vcombine_u8(vqmovun_s16(low), vqmovun_s16(high)));
+    }
+
+    /// Upper halves of the products, truncated towards zero: the products are of magnitudes.
+    static Ints truncated_high_products(Ints a, Ints b) noexcept
+    {
+        const uint32x4_t x = vreinterpretq_u32_s32(size_of(a));
+        const uint32x4_t y = vreinterpretq_u32_s32(size_of(b));
+        const uint64x2_t low = vmull_u32(vget_low_u32(x), vget_low_u32(y));
+        const uint64x2_t upper = vmull_high_u32(x, y);
+        const Ints high = vreinterpretq_s32_u32(vshrn_high_n_u64(vshrn_n_u64(low, 32), upper, 32));
+        const Ints sign = shift_right<31>(exclusive_or(a, b));
+        return sub(exclusive_or(high, sign), sign);
+    }
+
+    /// Sums of 64 bits.
+    using WideSums = uint64x2_t;
+    static WideSums no_wide_sums() noexcept { return vdupq_n_u64(0); }
+    template <int Shift>
+    static void add_shifted_squares(WideSums& sums, Ints v) noexcept
+    {
+        const int64x2_t low = vmull_s32(vget_low_s32(v), vget_low_s32(v));
+        const int64x2_t high = vmull_high_s32(v, v);
+        sums = vsraq_n_u64(sums, vreinterpretq_u64_s64(low), Shift);
+        sums = vsraq_n_u64(sums, vreinterpretq_u64_s64(high), Shift);
+    }
+    static uint64_t sum_of_wide_lanes(WideSums sums) noexcept { return vaddvq_u64(sums); }
+
     static Floats to_floats(Ints v) noexcept { return vcvtq_f32_s32(v); }
 
     /// Widens 16-bit samples; the sums of pairs of them.

@@ -140,6 +140,46 @@ struct Sse41 {
         return bits_and(exclusive_or(_mm_cvttps_epi32(v), too_high), number);
     }
 
+    /// a < b ? a : b, and a > b ? a : b: b where one is no number.
+    static Floats smaller(Floats a, Floats b) noexcept { return _mm_min_ps(a, b); }
+    static Floats larger(Floats a, Floats b) noexcept { return _mm_max_ps(a, b); }
+
+    /// The lanes, each 0 .. 255, of four vectors as bytes.
+    static void store_bytes(uint8_t* to, Ints a, Ints b, Ints c, Ints d) noexcept
+    {
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(to),
+                         _mm_packus_epi16(_mm_packs_epi32(a, b), _mm_packs_epi32(c, d)));
+    }
+
+    /// Upper halves of the products, truncated towards zero: the products are of magnitudes.
+    static Ints truncated_high_products(Ints a, Ints b) noexcept
+    {
+        const Ints x = size_of(a);
+        const Ints y = size_of(b);
+        const Ints even = _mm_srli_epi64(_mm_mul_epu32(x, y), 32);
+        const Ints odd = _mm_mul_epu32(odd_lanes(x), odd_lanes(y));
+        const Ints high = _mm_blend_epi16(even, odd, 0b11001100);
+        const Ints sign = shift_right<31>(exclusive_or(a, b));
+        return sub(exclusive_or(high, sign), sign);
+    }
+
+    /// Sums of 64 bits.
+    using WideSums = __m128i;
+    static WideSums no_wide_sums() noexcept { return _mm_setzero_si128(); }
+    template <int Shift>
+    static void add_shifted_squares(WideSums& sums, Ints v) noexcept
+    {
+        const Ints odd = odd_lanes(v);
+        sums = _mm_add_epi64(sums, _mm_srli_epi64(_mm_mul_epi32(v, v), Shift));
+        sums = _mm_add_epi64(sums, _mm_srli_epi64(_mm_mul_epi32(odd, odd), Shift));
+    }
+    static uint64_t sum_of_wide_lanes(WideSums sums) noexcept
+    {
+        uint64_t lanes[2];
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(lanes), sums);
+        return lanes[0] + lanes[1];
+    }
+
     static Floats to_floats(Ints v) noexcept { return _mm_cvtepi32_ps(v); }
 
     /// Widens 16-bit samples; the sums of pairs of them.

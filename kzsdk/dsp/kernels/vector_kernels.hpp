@@ -7,8 +7,10 @@
 
 #include <cstdint>
 
+#include "kzsdk/dsp/kernels/bands.hpp"
 #include "kzsdk/dsp/kernels/convert.hpp"
 #include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/dsp/kernels/levels.hpp"
 #include "kzsdk/dsp/kernels/moving_means.hpp"
 #include "kzsdk/dsp/kernels/plain.hpp"
 #include "kzsdk/dsp/kernels/polyphase.hpp"
@@ -49,6 +51,12 @@ constexpr kz::dsp::Kernels vector_kernels(const char* name) noexcept
         .symmetric = Symmetric<Simd>::run,
         .convolve_from_bit_31 = convolve<Simd, 31>,
         .convolve_from_bit_32 = convolve<Simd, 32>,
+        .widen_words = widen_words<Simd>,
+        .widen_floats = widen_floats<Simd>,
+        .word_levels = word_levels<Simd>,
+        .float_levels = float_levels<Simd>,
+        .apply_ramp = apply_ramp<Simd>,
+        .sum_squares = sum_squares<Simd>,
     };
 }
 
