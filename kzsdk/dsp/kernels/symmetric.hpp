@@ -48,8 +48,8 @@ private:
         int32_t high;       ///< m in the upper half, nothing in the lower
         int32_t high_part;  ///< m + u there
         int32_t correction; ///< selects 2^16 sh if u
-        uint32_t stream[2];
-        uint32_t index[2];
+        size_t one;         ///< where its samples for output 0 lie among the streams
+        size_t other;
     };
 
     template <uint32_t Down>
@@ -101,11 +101,13 @@ private:
                     .high = m * (1 << 16),
                     .high_part = rows.high_parts[k] * (1 << 16),
                     .correction = word < 0 ? -(1 << 16) : 0,
-                    .stream = {k % Down, mirrored % Down},
-                    .index = {k / Down, mirrored / Down}};
+                    .one = place(k),
+                    .other = place(mirrored)};
         }
 
         // Sample i goes to stream i mod Down.
+        static constexpr size_t place(size_t i) noexcept { return i % Down * kStream + i / Down; }
+
         //
         // @return The largest sample, or the largest complement of a negative one.
         int32_t deal_out(const int32_t* input, size_t count) noexcept
@@ -122,18 +124,18 @@ private:
                 }
                 separate(v);
                 for (size_t k = 0; k < Down; ++k) {
-                    Simd::store(streams_[k] + i / Down, v[k]);
+                    Simd::store(streams_ + place(i + k), v[k]);
                 }
             }
             int32_t most = Simd::largest_lane(loudest);
             for (; i < count; ++i) {
-                streams_[i % Down][i / Down] = input[i];
+                streams_[place(i)] = input[i];
                 const int32_t size = input[i] ^ (input[i] >> 31);
                 most = size > most ? size : most;
             }
             // What the last vector reads beyond the samples decides nothing that is kept.
             for (const size_t end = i + kStep; i < end; ++i) {
-                streams_[i % Down][i / Down] = 0;
+                streams_[place(i)] = 0;
             }
             return most;
         }
@@ -153,12 +155,14 @@ private:
         template <bool Quick>
         void make(int32_t* output, uint32_t count) const noexcept
         {
+            constexpr size_t kTogether = 4; // whose sums share the constants of a tap
             size_t i = 0;
-            for (; i + 2 * kLanes <= count; i += 2 * kLanes) {
-                Ints sums[2];
+            for (; i + kTogether * kLanes <= count; i += kTogether * kLanes) {
+                Ints sums[kTogether];
                 add_up<Quick>(sums, i);
-                Simd::store(output + i, sums[0]);
-                Simd::store(output + i + kLanes, sums[1]);
+                for (size_t v = 0; v < kTogether; ++v) {
+                    Simd::store(output + i + v * kLanes, sums[v]);
+                }
             }
             for (; i < count; i += kLanes) {
                 Ints sums[1];
@@ -177,13 +181,13 @@ private:
             for (Ints& sum : sums) {
                 sum = Simd::all(0);
             }
-            const int32_t* middle = streams_[centre_.stream[0]] + centre_.index[0] + first;
+            const int32_t* middle = streams_ + centre_.one + first;
             for (size_t v = 0; v < Vectors; ++v) {
                 add_product<Quick>(sums[v], Simd::load(middle + v * kLanes), centre_);
             }
             for (const Tap& tap : pairs_) {
-                const int32_t* one = streams_[tap.stream[0]] + tap.index[0] + first;
-                const int32_t* other = streams_[tap.stream[1]] + tap.index[1] + first;
+                const int32_t* one = streams_ + tap.one + first;
+                const int32_t* other = streams_ + tap.other + first;
                 for (size_t v = 0; v < Vectors; ++v) {
                     const Ints pair =
                         Simd::add(Simd::load(one + v * kLanes), Simd::load(other + v * kLanes));
@@ -209,7 +213,7 @@ private:
         Tap pairs_[kPairs];
         Tap centre_{};
         int32_t largest_high_ = 0;
-        int32_t streams_[Down][kStream];
+        int32_t streams_[Down * kStream];
     };
 };
 
