@@ -76,13 +76,49 @@ std::span<const float> band_bins(const QVFM& m, uint32_t band) noexcept
     return {m.frame_buffer + first, last - first + 1};
 }
 
-float band_energy(std::span<const float> bins) noexcept
+// Each sum is made in the order of its bins: the order is part of the result. So the sums of
+// several bands run side by side, and none waits for its own last addition.
+template <size_t Count>
+void sum_energies(const std::span<const float> (&bands)[Count], float* energies) noexcept
 {
-    float sum = 0;
-    for (const float bin : bins) {
-        sum += bin * bin;
+    size_t shared = bands[0].size();
+    for (const auto& bins : bands) {
+        shared = std::min(shared, bins.size());
     }
-    return sum;
+    float sums[Count] = {};
+    for (size_t i = 0; i < shared; ++i) {
+        for (size_t k = 0; k < Count; ++k) {
+            sums[k] += bands[k][i] * bands[k][i];
+        }
+    }
+    for (size_t k = 0; k < Count; ++k) {
+        for (const float bin : bands[k].subspan(shared)) {
+            sums[k] += bin * bin;
+        }
+        energies[k] = sums[k];
+    }
+}
+
+template <size_t Count>
+void sum_energies(const QVFM& m, uint32_t first_band, float* energies) noexcept
+{
+    std::span<const float> bands[Count];
+    for (uint32_t k = 0; k < Count; ++k) {
+        bands[k] = band_bins(m, first_band + k);
+    }
+    sum_energies(bands, energies + first_band);
+}
+
+void sum_energies(const QVFM& m, float* energies) noexcept
+{
+    constexpr uint32_t kSideBySide = 5; // neighbours have much the same width
+    uint32_t band = 0;
+    for (; m.band_count - band >= kSideBySide; band += kSideBySide) {
+        sum_energies<kSideBySide>(m, band, energies);
+    }
+    for (; band < m.band_count; ++band) {
+        sum_energies<1>(m, band, energies);
+    }
 }
 
 float root(float value) noexcept { return static_cast<float>(kz_sqrt(static_cast<double>(value))); }
@@ -93,11 +129,10 @@ void append_features(QVFM& m) noexcept
     if (!record) {
         return; // the frame is lost; the fingerprint completes one frame later
     }
+    sum_energies(m, record->energy);
     for (uint32_t band = 0; band < m.band_count; ++band) {
-        const auto bins = band_bins(m, band);
-        const float energy = band_energy(bins);
-        record->energy[band] = energy;
-        record->amplitude[band] = bins.empty() ? 0 : root(energy / static_cast<float>(bins.size()));
+        const auto count = static_cast<float>(band_bins(m, band).size());
+        record->amplitude[band] = count == 0 ? 0 : root(record->energy[band] / count);
     }
     kz::qv::append_record(m, std::move(record));
 }
