@@ -57,8 +57,15 @@ shell_scripts() {
     done
 }
 
+python_scripts() {
+    for script in bench/*.py; do
+        python3 -c 'import ast, sys; ast.parse(open(sys.argv[1]).read(), sys.argv[1])' "$script" || return 1
+    done
+}
+
 check clang-format format
 check "shell scripts" shell_scripts
+check "Python scripts" python_scripts
 check "man page" man_page
 check clang-tidy tidy
 

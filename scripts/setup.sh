@@ -15,7 +15,8 @@ packages_of() {
     # The Java front and its tests; Android's log, threads and jni.h as a desktop has them.
     java) echo "default-jdk-headless junit4 android-liblog-dev android-libutils-dev android-libnativehelper-dev" ;;
     clips) echo "sox libsox-fmt-all espeak-ng" ;; # the demo's music, and the tests' clips
-    bench) echo "libbenchmark-dev" ;;
+    # What counts instructions and prints tables, and the peers, each of which may be missing.
+    bench) echo "valgrind python3 pkg-config libcli11-dev nlohmann-json3-dev libchromaprint-dev libfftw3-dev libswresample-dev libavutil-dev libsoxr-dev libspeexdsp-dev libpugixml-dev libtinyxml2-dev libxml2-dev" ;;
     lint) echo "clang-format-14 clang-tidy-14 mandoc" ;;
     clang) echo "clang-14 libclang-rt-14-dev" ;;
     arch) echo "g++-aarch64-linux-gnu g++-arm-linux-gnueabihf g++-i686-linux-gnu qemu-user" ;;

@@ -19,113 +19,27 @@
 #include <vector>
 
 #include "kzsdk/kzsdk.h"
+#include "support/digest.hpp"
+#include "support/melody.hpp"
 
 namespace {
 
+using kz::test::Digest;
+
 constexpr uint32_t kSeconds = 15; // 12 frames take 14.21 s
-
-// ---- digests
-
-class Digest { // FNV-1a, 64 bits
-public:
-    void take(uint8_t byte) { value_ = (value_ ^ byte) * 0x100000001b3U; }
-    void take(std::string_view text)
-    {
-        for (const char c : text) {
-            take(static_cast<uint8_t>(c));
-        }
-    }
-    void take(std::span<const float> numbers)
-    {
-        for (const float number : numbers) {
-            uint32_t bits = 0;
-            std::memcpy(&bits, &number, sizeof bits);
-            for (const int shift : {0, 8, 16, 24}) {
-                take(static_cast<uint8_t>(bits >> shift));
-            }
-        }
-    }
-    std::string text() const
-    {
-        std::array<char, 17> digits{};
-        std::snprintf(digits.data(), digits.size(), "%016" PRIx64, value_);
-        return digits.data();
-    }
-
-private:
-    uint64_t value_ = 0xcbf29ce484222325U;
-};
 
 // ---- sound
 
-class Random { // a linear congruential generator with 64 bits of state
-public:
-    explicit Random(uint64_t seed) : state_(seed) {}
-    uint32_t next()
-    {
-        state_ = state_ * 6364136223846793005U + 1442695040888963407U;
-        return static_cast<uint32_t>(state_ >> 32);
-    }
-    uint32_t below(uint32_t bound)
-    {
-        return static_cast<uint32_t>((uint64_t{next()} * bound) >> 32);
-    }
-
-private:
-    uint64_t state_;
-};
-
-// An arch for each half of the turn: near a sine, with some odd harmonics. Q15 from a phase of 32
-// bits.
-int32_t arch_wave(uint32_t phase)
-{
-    const auto x = static_cast<int64_t>(phase >> 16) - 32768;
-    return static_cast<int32_t>((x * (32768 - (x < 0 ? -x : x))) >> 13);
-}
-
 using Sound = std::vector<int16_t>;
 
-int16_t clipped(int64_t value)
-{
-    return static_cast<int16_t>(std::clamp<int64_t>(value, INT16_MIN, INT16_MAX));
-}
-
-// Three voices that take a new note every fifth of a second and fade; `gain` in 1/256.
 Sound melody(uint32_t rate, uint32_t channels, int64_t gain)
 {
-    struct Voice {
-        uint32_t phase = 0;
-        uint32_t step = 0;
-        int64_t level = 0;
-    };
-    constexpr uint32_t kHertz[] = {55, 82, 110, 165, 220, 247, 330, 370, 440, 494, 659, 880, 1320};
-    std::array<Voice, 3> voices;
-    Random random(7);
-    Sound sound(size_t{rate} * kSeconds * channels);
-    for (size_t frame = 0; frame < sound.size() / channels; ++frame) {
-        if (frame % (rate / 5) == 0) {
-            Voice& voice = voices[frame / (rate / 5) % voices.size()];
-            const uint64_t hertz = kHertz[random.below(13)];
-            voice.step = static_cast<uint32_t>((hertz << 32) / rate);
-            voice.level = 1 << 24;
-        }
-        int64_t sum = 0;
-        for (Voice& voice : voices) {
-            voice.phase += voice.step;
-            voice.level -= voice.level / (rate / 4);
-            sum += (arch_wave(voice.phase) * voice.level) >> 26;
-        }
-        for (uint32_t channel = 0; channel < channels; ++channel) {
-            const int64_t side = channel == 0 ? 256 : 224;
-            sound[frame * channels + channel] = clipped((sum * gain * side) >> 16);
-        }
-    }
-    return sound;
+    return kz::test::melody(rate, channels, kSeconds, gain);
 }
 
 Sound noise(uint32_t rate, uint32_t channels, int32_t shift)
 {
-    Random random(rate + channels);
+    kz::test::Congruential random(rate + channels);
     Sound sound(size_t{rate} * kSeconds * channels);
     for (int16_t& sample : sound) {
         sample = static_cast<int16_t>(static_cast<int32_t>(random.next()) >> (16 + shift));

@@ -1,0 +1,145 @@
+// kzbench: what the library costs, beside what others cost.
+//
+//   kzbench pairs [case...]     times cases beside their peers
+//   kzbench digests [case...]   prints what the cases yield
+//   kzbench count [case...]     runs each case once for callgrind to count; see bench/counts.py
+//   kzbench list                prints the cases' names
+
+#include <algorithm>
+#include <cstdio>
+#include <fstream>
+#include <iostream>
+#include <iterator>
+
+#include <CLI/CLI.hpp>
+
+#include "case.hpp"
+#include "kzsdk/kzsdk.h"
+#include "measure/bits.hpp"
+#include "measure/contest.hpp"
+#include "measure/counted.hpp"
+#include "report.hpp"
+
+namespace {
+
+using namespace kz::bench;
+using Json = nlohmann::ordered_json;
+
+struct Options {
+    std::vector<std::string> names;
+    std::string output = "-";
+    int rounds = 15;
+    double slice_milliseconds = 15;
+};
+
+void start_library()
+{
+    kzconf_configuration configuration;
+    kzconf_initialize_configuration(&configuration);
+    require(kzinit_initialize_vesk(&configuration) == KZ_OK, "the library does not start");
+}
+
+/// Whether a word stands for a case: it is its name, or the beginning of several cases' names.
+bool stands_for(const std::string& word, const Case& one, const std::vector<Case>& all)
+{
+    const auto is_word = [&](const Case& other) { return other.name == word; };
+    return std::any_of(all.begin(), all.end(), is_word) ? is_word(one)
+                                                        : one.name.rfind(word, 0) == 0;
+}
+
+/// The cases that any of these words stand for; all when there are none.
+std::vector<Case> chosen_cases(const std::vector<std::string>& words)
+{
+    const auto all = all_cases();
+    std::vector<Case> chosen;
+    std::copy_if(all.begin(), all.end(), std::back_inserter(chosen), [&](const Case& one) {
+        return words.empty() || std::any_of(words.begin(), words.end(), [&](const auto& word) {
+                   return stands_for(word, one, all);
+               });
+    });
+    require(!chosen.empty(), "no such case");
+    return chosen;
+}
+
+void write(const Json& report, const std::string& path)
+{
+    if (path == "-") {
+        std::cout << report.dump(1) << '\n';
+        return;
+    }
+    std::ofstream file(path);
+    file << report.dump(1) << '\n';
+    require(file.good(), "cannot write " + path);
+}
+
+/// All cases take part in every round, so that a noisy minute touches a little of each.
+void measure_pairs(const Options& options)
+{
+    const auto cases = chosen_cases(options.names);
+    std::cerr << "comparing words with the plain variant's\n";
+    require_plain_bits(cases);
+    Json report = describe_run();
+    std::vector<Contest> contests;
+    for (const Case& one : cases) {
+        std::cerr << "preparing " << one.name << '\n';
+        contests.emplace_back(one.prepare(), options.slice_milliseconds * 1e-3);
+    }
+    for (int round = 0; round < options.rounds; ++round) {
+        std::cerr << "round " << round + 1 << " of " << options.rounds << '\n';
+        for (Contest& contest : contests) {
+            contest.round(round % 2 == 1);
+        }
+    }
+    report["rounds"] = options.rounds;
+    report["cases"] = Json::array();
+    for (size_t i = 0; i < cases.size(); ++i) {
+        report["cases"].push_back(describe(cases[i], contests[i].result()));
+    }
+    report["load_at_end"] = describe_run()["load"];
+    write(report, options.output);
+}
+
+void list()
+{
+    for (const Case& one : all_cases()) {
+        std::printf("%-28s %s, in %s\n", one.name.c_str(), one.measures.c_str(),
+                    one.unit.name.c_str());
+    }
+}
+
+} // namespace
+
+int main(int argc, char** argv)
+try {
+    Options options;
+    CLI::App app("What the library costs, beside what others cost.", "kzbench");
+    app.require_subcommand(1);
+    auto* const pairs = app.add_subcommand("pairs", "time cases beside their peers");
+    pairs->add_option("--rounds", options.rounds, "pairs of slices for each peer")
+        ->check(CLI::PositiveNumber);
+    pairs->add_option("--slice", options.slice_milliseconds, "length of a slice in ms")
+        ->check(CLI::PositiveNumber);
+    auto* const digests = app.add_subcommand("digests", "print what the cases yield");
+    auto* const count = app.add_subcommand("count", "run each case once for callgrind to count");
+    for (auto* const command : {pairs, digests, count}) {
+        command->add_option("case", options.names, "names, or their beginnings; default: all");
+    }
+    pairs->add_option("--output", options.output, "file for the results; - is standard output");
+    app.add_subcommand("list", "print the cases' names");
+    CLI11_PARSE(app, argc, argv);
+
+    start_library();
+    if (pairs->parsed()) {
+        measure_pairs(options);
+    } else if (digests->parsed()) {
+        print_digests(chosen_cases(options.names));
+    } else if (count->parsed()) {
+        run_counted(chosen_cases(options.names));
+    } else {
+        list();
+    }
+    return 0;
+} catch (const std::exception& failure) {
+    std::cerr << "kzbench: " << failure.what() << '\n';
+    return 1;
+}
