@@ -1,6 +1,7 @@
 // kzbench: what the library costs, beside what others cost.
 //
 //   kzbench pairs [case...]     times cases beside their peers
+//   kzbench grow [table...]     shows how the cost grows
 //   kzbench digests [case...]   prints what the cases yield
 //   kzbench count [case...]     runs each case once for callgrind to count; see bench/counts.py
 //   kzbench list                prints the cases' names
@@ -14,6 +15,7 @@
 #include <CLI/CLI.hpp>
 
 #include "case.hpp"
+#include "growth/growth.hpp"
 #include "kzsdk/kzsdk.h"
 #include "measure/bits.hpp"
 #include "measure/contest.hpp"
@@ -30,6 +32,7 @@ struct Options {
     std::string output = "-";
     int rounds = 15;
     double slice_milliseconds = 15;
+    bool thorough = false;
 };
 
 void start_library()
@@ -39,25 +42,26 @@ void start_library()
     require(kzinit_initialize_vesk(&configuration) == KZ_OK, "the library does not start");
 }
 
-/// Whether a word stands for a case: it is its name, or the beginning of several cases' names.
-bool stands_for(const std::string& word, const Case& one, const std::vector<Case>& all)
+/// Whether a word stands for a thing: it is its name, or the beginning of several things' names.
+template <class Thing>
+bool stands_for(const std::string& word, const Thing& one, const std::vector<Thing>& all)
 {
-    const auto is_word = [&](const Case& other) { return other.name == word; };
+    const auto is_word = [&](const Thing& other) { return other.name == word; };
     return std::any_of(all.begin(), all.end(), is_word) ? is_word(one)
                                                         : one.name.rfind(word, 0) == 0;
 }
 
-/// The cases that any of these words stand for; all when there are none.
-std::vector<Case> chosen_cases(const std::vector<std::string>& words)
+/// The things that any of these words stand for; all when there are none.
+template <class Thing>
+std::vector<Thing> chosen(const std::vector<Thing>& all, const std::vector<std::string>& words)
 {
-    const auto all = all_cases();
-    std::vector<Case> chosen;
-    std::copy_if(all.begin(), all.end(), std::back_inserter(chosen), [&](const Case& one) {
+    std::vector<Thing> chosen;
+    std::copy_if(all.begin(), all.end(), std::back_inserter(chosen), [&](const Thing& one) {
         return words.empty() || std::any_of(words.begin(), words.end(), [&](const auto& word) {
                    return stands_for(word, one, all);
                });
     });
-    require(!chosen.empty(), "no such case");
+    require(!chosen.empty(), "nothing has such a name");
     return chosen;
 }
 
@@ -75,7 +79,7 @@ void write(const Json& report, const std::string& path)
 /// All cases take part in every round, so that a noisy minute touches a little of each.
 void measure_pairs(const Options& options)
 {
-    const auto cases = chosen_cases(options.names);
+    const auto cases = chosen(all_cases(), options.names);
     std::cerr << "comparing words with the plain variant's\n";
     require_plain_bits(cases);
     Json report = describe_run();
@@ -99,6 +103,17 @@ void measure_pairs(const Options& options)
     write(report, options.output);
 }
 
+void measure_growth(const Options& options)
+{
+    Json report = describe_run();
+    report["tables"] = Json::array();
+    for (const Growth& growth : chosen(all_growths(), options.names)) {
+        std::cerr << "measuring " << growth.name << '\n';
+        report["tables"].push_back(describe(growth, growth.measure(options.thorough)));
+    }
+    write(report, options.output);
+}
+
 void list()
 {
     for (const Case& one : all_cases()) {
@@ -119,22 +134,29 @@ try {
         ->check(CLI::PositiveNumber);
     pairs->add_option("--slice", options.slice_milliseconds, "length of a slice in ms")
         ->check(CLI::PositiveNumber);
+    auto* const grow = app.add_subcommand("grow", "show how the cost grows");
+    grow->add_flag("--long", options.thorough, "take sizes that take minutes");
     auto* const digests = app.add_subcommand("digests", "print what the cases yield");
     auto* const count = app.add_subcommand("count", "run each case once for callgrind to count");
-    for (auto* const command : {pairs, digests, count}) {
+    for (auto* const command : {pairs, grow, digests, count}) {
         command->add_option("case", options.names, "names, or their beginnings; default: all");
     }
-    pairs->add_option("--output", options.output, "file for the results; - is standard output");
+    for (auto* const command : {pairs, grow}) {
+        command->add_option("--output", options.output,
+                            "file for the results; - is standard output");
+    }
     app.add_subcommand("list", "print the cases' names");
     CLI11_PARSE(app, argc, argv);
 
     start_library();
     if (pairs->parsed()) {
         measure_pairs(options);
+    } else if (grow->parsed()) {
+        measure_growth(options);
     } else if (digests->parsed()) {
-        print_digests(chosen_cases(options.names));
+        print_digests(chosen(all_cases(), options.names));
     } else if (count->parsed()) {
-        run_counted(chosen_cases(options.names));
+        run_counted(chosen(all_cases(), options.names));
     } else {
         list();
     }

@@ -81,4 +81,13 @@ Json describe(const Case& measured, const Result& result)
             {"goal", describe(measured.goal)}};
 }
 
+Json describe(const Growth& growth, const GrowthTable& table)
+{
+    return {{"name", growth.name},
+            {"law", table.law},
+            {"holds", table.holds ? Json(*table.holds) : Json(nullptr)},
+            {"columns", table.columns},
+            {"rows", table.rows}};
+}
+
 } // namespace kz::bench

@@ -11,7 +11,7 @@ packages_of() {
     case $1 in
     build) echo "g++ cmake ninja-build make" ;;
     tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev" ;;
-    test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso" ;;
+    test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso python3" ;;
     # The Java front and its tests; Android's log, threads and jni.h as a desktop has them.
     java) echo "default-jdk-headless junit4 android-liblog-dev android-libutils-dev android-libnativehelper-dev" ;;
     clips) echo "sox libsox-fmt-all espeak-ng" ;; # the demo's music, and the tests' clips

@@ -8,6 +8,7 @@
 #ifdef KZ_PEER_CHROMAPRINT
 
 #include <chromaprint.h>
+#include <malloc.h>
 
 namespace kz::bench {
 
@@ -80,6 +81,19 @@ Peer chromaprint_life(uint32_t rate, uint32_t channels)
     return {kChromaprint, [rate, channels] { keep(started(rate, channels).get()); }};
 }
 
+ContextHeap chromaprint_heap(const std::vector<int16_t>& samples, uint32_t rate, uint32_t channels)
+{
+    const auto whole_heap = [] {
+        const struct mallinfo2 info = mallinfo2();
+        return static_cast<int64_t>(info.uordblks + info.hblkhd);
+    };
+    const int64_t before = whole_heap();
+    const Context context = started(rate, channels);
+    const int64_t fresh = whole_heap() - before;
+    listen(context.get(), samples);
+    return {fresh, whole_heap() - before};
+}
+
 } // namespace kz::bench
 
 #else
@@ -88,6 +102,7 @@ namespace kz::bench {
 
 Peer chromaprint_fingerprint(std::vector<int16_t>, uint32_t, uint32_t) { return {kChromaprint}; }
 Peer chromaprint_life(uint32_t, uint32_t) { return {kChromaprint}; }
+ContextHeap chromaprint_heap(const std::vector<int16_t>&, uint32_t, uint32_t) { return {}; }
 
 } // namespace kz::bench
 

@@ -31,6 +31,13 @@ Peer chromaprint_fingerprint(std::vector<int16_t> samples, uint32_t rate, uint32
 /// The life of a libchromaprint context without any audio.
 Peer chromaprint_life(uint32_t rate, uint32_t channels);
 
+/// Bytes of heap that a libchromaprint context holds, fresh and fed; nothing where it is absent.
+struct ContextHeap {
+    int64_t fresh = 0;
+    int64_t fed = 0;
+};
+ContextHeap chromaprint_heap(const std::vector<int16_t>& samples, uint32_t rate, uint32_t channels);
+
 /// FFTW's own DCT-II, and one over its real transform. Single precision, out of place, planned with
 /// patience once and remembered in a file.
 Peer cosine_by_fftw(uint32_t length);
