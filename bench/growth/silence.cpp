@@ -21,15 +21,20 @@ GrowthTable grow_silence(bool thorough)
                       true};
     int64_t first_heap = 0;
     for (const uint32_t seconds : durations) {
-        const int64_t before = heap_use().bytes;
-        Fingerprint fingerprint(kStereo);
-        const double time = cpu_seconds([&] {
-            for (uint32_t at = 0; at < seconds; at += kPiece) {
-                fingerprint.feed(silence.data(), bytes_of(silence));
-            }
-        });
-        const int64_t heap = heap_use().bytes - before;
+        std::vector<double> times;
+        int64_t heap = 0;
+        for (uint32_t fed = 0; fed < 300; fed += seconds) {
+            const int64_t before = heap_use().bytes;
+            Fingerprint fingerprint(kStereo);
+            times.push_back(cpu_seconds([&] {
+                for (uint32_t at = 0; at < seconds; at += kPiece) {
+                    fingerprint.feed(silence.data(), bytes_of(silence));
+                }
+            }));
+            heap = heap_use().bytes - before;
+        }
         first_heap = first_heap == 0 ? heap : first_heap;
+        const double time = spread_of(times).median;
         const double nanoseconds = time * 1e9 / (static_cast<double>(seconds) * kRate);
         table.rows.push_back({number(seconds) + " s", in_time(time), number(nanoseconds, 2),
                               number(static_cast<double>(heap)) + " bytes"});

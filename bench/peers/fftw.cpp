@@ -10,6 +10,7 @@
 
 #include <fftw3.h>
 
+#include "measure/slice.hpp"
 #include "peers/cosine_rotation.hpp"
 #include "support/melody.hpp"
 
@@ -107,6 +108,22 @@ private:
     Plan plan_;
 };
 
+// These arrays fill much of a second-level cache, and by the pages that they happen to get a
+// transform can take half as long again. So several are made, and the luckiest is kept.
+template <class Transform>
+std::shared_ptr<const Transform> best_placed(uint32_t length)
+{
+    constexpr int kTries = 5;
+    std::vector<std::shared_ptr<const Transform>> tried;
+    std::vector<double> times;
+    for (int i = 0; i < kTries; ++i) {
+        tried.push_back(std::make_shared<const Transform>(length));
+        const Slice slice([transform = tried.back()] { transform->run(); }, 0.005);
+        times.push_back(std::min({slice.measure(), slice.measure(), slice.measure()}));
+    }
+    return tried[static_cast<size_t>(std::min_element(times.begin(), times.end()) - times.begin())];
+}
+
 // One bin of the transform as it is defined.
 double defined_bin(const float* input, uint32_t length, uint32_t bin)
 {
@@ -154,14 +171,14 @@ void verify_folded(const Folded& folded, uint32_t length)
 
 Peer cosine_by_fftw(uint32_t length)
 {
-    const auto direct = std::make_shared<const Direct>(length);
+    const auto direct = best_placed<Direct>(length);
     return {kCosineFftw, [direct] { direct->run(); },
             [direct, length] { verify_direct(*direct, length); }};
 }
 
 Peer cosine_by_real_fftw(uint32_t length)
 {
-    const auto folded = std::make_shared<const Folded>(length);
+    const auto folded = best_placed<Folded>(length);
     return {kCosineByRealFftw, [folded] { folded->run(); },
             [folded, length] { verify_folded(*folded, length); }};
 }
