@@ -1,12 +1,15 @@
 #!/usr/bin/env python3
 """Prints the tables of kzbench's results, as Markdown.
 
-    bench/table.py results.json [...]     results of `kzbench pairs` or `kzbench grow`
+    bench/table.py results.json [...]                     results of `kzbench pairs` or `kzbench grow`
+    bench/table.py --into bench/README.md results.json    write them into a document instead
 
-A limit is met when the upper quartile of the ratios keeps it, and `just` when only the median does.
+A document has a place for each of the two: all between the lines `<!-- pairs -->` (or `growth`) and
+`<!-- end -->`. A limit is met when the upper quartile of the ratios keeps it, and `just` when only the median does.
 """
 
 import json
+import pathlib
 import sys
 
 
@@ -65,41 +68,62 @@ def rows_of(case):
         ours, limits = ["", ""], ["", ""]
 
 
-def print_table(header, rows):
-    print("| " + " | ".join(header) + " |")
-    print("|" + "---|" * len(header))
+def table_lines(header, rows):
+    yield "| " + " | ".join(header) + " |"
+    yield "|" + "---|" * len(header)
     for row in rows:
-        print("| " + " | ".join(row) + " |")
+        yield "| " + " | ".join(row) + " |"
 
 
-def print_pairs(results):
-    print_table(
+def heading(results):
+    return (f"{results['date']}, {results['processors']} × {results['processor']}, "
+            f"load {digits(results['load'])}, {results['build']}, variant `{results['variant']}`:")
+
+
+def pairs_lines(results):
+    yield from table_lines(
         ["case", "ours", "peer", "peer's time", "ours / peer", "best / best", "must", "goal"],
         [row for case in results["cases"] for row in rows_of(case)],
     )
 
 
-def print_growth(results):
+def growth_lines(results):
     for table in results["tables"]:
         holds = {True: "holds", False: "**BROKEN**", None: "not judged"}[table["holds"]]
-        print(f"### `{table['name']}`: {holds}\n\n{table['law']}.\n")
-        print_table(table["columns"], table["rows"])
-        print()
+        yield from (f"### `{table['name']}`: {holds}", "", f"{table['law']}.", "")
+        yield from table_lines(table["columns"], table["rows"])
+        yield ""
 
 
-def main(paths):
-    for path in paths:
-        with open(path, encoding="utf-8") as file:
-            results = json.load(file)
-        print(
-            f"{results['date']}, {results['processors']} × {results['processor']}, "
-            f"load {digits(results['load'])}, {results['build']}, "
-            f"variant `{results['variant']}`\n"
-        )
-        if "cases" in results:
-            print_pairs(results)
-        if "tables" in results:
-            print_growth(results)
+def render(results):
+    """The name of the results' place, and their text."""
+    name, lines = ("pairs", pairs_lines) if "cases" in results else ("growth", growth_lines)
+    return name, "\n".join([heading(results), "", *lines(results)]).rstrip() + "\n"
+
+
+def put_into(document, name, text):
+    """The document with a text in the place of that name."""
+    begin, end = f"<!-- {name} -->\n", "<!-- end -->"
+    before, found, rest = document.partition(begin)
+    old, closed, after = rest.partition(end)
+    if not found or not closed:
+        raise ValueError(f"the document has no place for {name}")
+    return f"{before}{begin}\n{text}\n{end}{after}"
+
+
+def main(arguments):
+    path = None
+    if arguments[0] == "--into":
+        path = pathlib.Path(arguments[1])
+        arguments = arguments[2:]
+    rendered = [render(json.loads(pathlib.Path(name).read_text("utf-8"))) for name in arguments]
+    if path is None:
+        print("\n".join(text for _, text in rendered), end="")
+        return 0
+    document = path.read_text("utf-8")
+    for name, text in rendered:
+        document = put_into(document, name, text)
+    path.write_text(document, "utf-8")
     return 0
 
 

@@ -43,6 +43,18 @@ class Verdicts(unittest.TestCase):
         self.assertEqual(told, "≤ 1.00 of other: no peer")
 
 
+class Documents(unittest.TestCase):
+    def test_results_go_into_their_own_place(self):
+        document = "a\n<!-- pairs -->\nold\n<!-- end -->\nb\n<!-- growth -->\nold\n<!-- end -->\n"
+        told = table.put_into(document, "growth", "new\n")
+        self.assertEqual(
+            told, "a\n<!-- pairs -->\nold\n<!-- end -->\nb\n<!-- growth -->\n\nnew\n\n<!-- end -->\n")
+
+    def test_a_document_without_the_place_is_refused(self):
+        with self.assertRaises(ValueError):
+            table.put_into("nothing", "pairs", "new")
+
+
 class Counts(unittest.TestCase):
     def test_a_rise_of_three_percent_passes_and_a_larger_one_does_not(self):
         self.assertEqual(counts.rises({"a": 1000, "b": 1000}, {"a": 1030, "b": 1031}), ["b"])
