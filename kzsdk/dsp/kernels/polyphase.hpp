@@ -31,6 +31,7 @@
 #include <cstdint>
 
 #include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/dsp/kernels/polyphase_columns.hpp"
 #include "kzsdk/dsp/tables.hpp"
 
 namespace {
@@ -117,15 +118,32 @@ public:
     static void run(const kz::dsp::PhaseRows& rows, const kz::dsp::Windows& windows,
                     int32_t* output, uint32_t count) noexcept
     {
-        Polyphase polyphase(rows, windows);
+        kz::dsp::Windows place = windows;
         while (count != 0) {
-            const uint32_t made = polyphase.run_block(output, count);
+            uint32_t made = run_columns_of(rows, place, output, count);
+            if (made == 0) {
+                made = Polyphase(rows, place).run_block(output, count);
+            }
+            const uint64_t next = place.phase + uint64_t{made} * place.down;
+            place.oldest += next / rows.up;
+            place.phase = static_cast<uint32_t>(next % rows.up);
             output += made;
             count -= made;
         }
     }
 
 private:
+    // Not inlined, so that both kinds of scratch are never on the stack together.
+    [[gnu::noinline]] static uint32_t run_columns_of(const kz::dsp::PhaseRows& rows,
+                                                     const kz::dsp::Windows& windows,
+                                                     int32_t* output, uint32_t count) noexcept
+    {
+        if (!PolyphaseColumns<Simd>::suits(windows, rows.up, count)) {
+            return 0;
+        }
+        return PolyphaseColumns<Simd>(rows, windows).run(output, count);
+    }
+
     Polyphase(const kz::dsp::PhaseRows& rows, const kz::dsp::Windows& windows) noexcept
         : rows_(rows), taps_(windows.taps), whole_step_(windows.down / rows.up),
           phase_step_(windows.down % rows.up), down_(windows.down), phase_(windows.phase),
@@ -134,7 +152,7 @@ private:
     }
 
     // As many outputs as the split samples can serve.
-    uint32_t run_block(int32_t* output, uint32_t count) noexcept
+    [[gnu::noinline]] uint32_t run_block(int32_t* output, uint32_t count) noexcept
     {
         const uint64_t room = Samples::kMost - taps_;
         const uint64_t fitting = ((room + 1) * rows_.up - 1 - phase_) / down_ + 1;
@@ -148,9 +166,6 @@ private:
         } else {
             run_exact(first, output, made);
         }
-        const uint64_t next = last + down_;
-        oldest_ += next / rows_.up;
-        phase_ = static_cast<uint32_t>(next % rows_.up);
         return made;
     }
 
@@ -304,8 +319,8 @@ private:
     const uint32_t whole_step_;
     const uint32_t phase_step_;
     const uint32_t down_;
-    uint32_t phase_;
-    const int32_t* oldest_;
+    const uint32_t phase_;
+    const int32_t* const oldest_;
     Samples samples_;
 };
 

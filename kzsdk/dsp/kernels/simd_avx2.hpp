@@ -27,6 +27,11 @@ struct Avx2 {
     }
     static void store(float* to, Floats v) noexcept { _mm256_storeu_ps(to, v); }
     static Ints all(int32_t value) noexcept { return _mm256_set1_epi32(value); }
+    /// Every lane holds the same two 16-bit numbers.
+    static Ints all_pairs(const int16_t* pair) noexcept
+    {
+        return _mm256_broadcastd_epi32(_mm_loadu_si32(pair));
+    }
     static Floats all(float value) noexcept { return _mm256_set1_ps(value); }
 
     static Ints load(const int16_t* from) noexcept

@@ -21,6 +21,12 @@ struct Neon {
     static void store(int32_t* to, Ints v) noexcept { vst1q_s32(to, v); }
     static void store(float* to, Floats v) noexcept { vst1q_f32(to, v); }
     static Ints all(int32_t value) noexcept { return vdupq_n_s32(value); }
+    /// Every lane holds the same two 16-bit numbers.
+    static Ints all_pairs(const int16_t* pair) noexcept
+    {
+        const int16x4_t two = vset_lane_s16(pair[1], vdup_n_s16(pair[0]), 1);
+        return vdupq_lane_s32(vreinterpret_s32_s16(two), 0);
+    }
     static Floats all(float value) noexcept { return vdupq_n_f32(value); }
 
     static Ints load(const int16_t* from) noexcept
