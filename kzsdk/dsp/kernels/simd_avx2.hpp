@@ -1,6 +1,5 @@
 /// @file
-/// Vectors of eight lanes, for the kernels' templates. See kernels/README.md for what a vector type
-/// brings.
+/// Vectors of eight lanes for processors with AVX2.
 #pragma once
 
 #include <cstddef>
