@@ -10,6 +10,8 @@
 /// shift and is added to m sh. 2^15 m does not, but A + 2^15 m stays in the word by itself, because
 /// no |m| is above 2^14.
 ///
+/// The centre tap is 2^31 / Down, a power of two: its product is a shift.
+///
 /// Samples that follow each other in a window are `down` apart in the sums of neighbouring outputs:
 /// so the block is dealt out to `down` streams, in which neighbouring outputs have neighbours.
 #pragma once
@@ -27,7 +29,7 @@ class Symmetric {
     using Ints = typename Simd::Ints;
 
     static constexpr size_t kLanes = Simd::kLanes;
-    static constexpr uint32_t kMostOutputs = 512;
+    static constexpr uint32_t kMostOutputs = 576;
 
 public:
     static void run(const kz::dsp::PhaseRows& rows, const kz::dsp::Windows& windows,
@@ -63,7 +65,6 @@ private:
                     pairs_[next++] = make_tap(rows, 2 * kCentre - k, k);
                 }
             }
-            centre_ = make_tap(rows, kCentre, kCentre);
         }
 
         void run(const int32_t* input, int32_t* output, uint32_t count) noexcept
@@ -86,6 +87,7 @@ private:
 
     private:
         static constexpr uint32_t kCentre = 10 * Down;
+        static constexpr int kCentreShift = Down == 2 ? 2 : 3;
         static constexpr size_t kWindow = 21 * Down;
         static constexpr size_t kPairs = 10 * (Down - 1);
         static constexpr size_t kStream = kMostOutputs + 21 + kLanes;
@@ -155,7 +157,7 @@ private:
         template <bool Quick>
         void make(int32_t* output, uint32_t count) const noexcept
         {
-            constexpr size_t kTogether = 4; // whose sums share the constants of a tap
+            constexpr size_t kTogether = 6; // whose sums share the constants of a tap
             size_t i = 0;
             for (; i + kTogether * kLanes <= count; i += kTogether * kLanes) {
                 Ints sums[kTogether];
@@ -178,12 +180,9 @@ private:
         template <bool Quick, size_t Vectors>
         void add_up(Ints (&sums)[Vectors], size_t first) const noexcept
         {
-            for (Ints& sum : sums) {
-                sum = Simd::all(0);
-            }
-            const int32_t* middle = streams_ + centre_.one + first;
+            const int32_t* middle = streams_ + place(kCentre) + first;
             for (size_t v = 0; v < Vectors; ++v) {
-                add_product<Quick>(sums[v], Simd::load(middle + v * kLanes), centre_);
+                sums[v] = Simd::template shift_right<kCentreShift>(Simd::load(middle + v * kLanes));
             }
             for (const Tap& tap : pairs_) {
                 const int32_t* one = streams_ + tap.one + first;
@@ -211,7 +210,6 @@ private:
         }
 
         Tap pairs_[kPairs];
-        Tap centre_{};
         int32_t largest_high_ = 0;
         int32_t streams_[Down * kStream];
     };
