@@ -80,7 +80,7 @@ def print_comparison(recorded, counted):
     print(f"{'':24}{'recorded':>14}{'now':>14}{'change':>10}")
     for name, now in sorted(counted.items(), key=lambda item: CASES.index(item[0])):
         was = recorded.get(name)
-        told = f"{was:14,}{now:14,}{change(was, now):+10.2%}" if was else f"{'':14}{now:14,}{'new':>10}"
+        told = f"{was:14,}{now:14,}{change(was, now):+10.2%}" if was else f"{'':14}{now:14,}"
         print(f"{name:24}{told}")
 
 

@@ -6,15 +6,14 @@
 //   kzbench count [case...]     runs each case once for callgrind to count; see bench/counts.py
 //   kzbench list                prints the cases' names
 
-#include <algorithm>
 #include <cstdio>
 #include <fstream>
 #include <iostream>
-#include <iterator>
 
 #include <CLI/CLI.hpp>
 
 #include "case.hpp"
+#include "choice.hpp"
 #include "growth/growth.hpp"
 #include "kzsdk/kzsdk.h"
 #include "measure/bits.hpp"
@@ -40,29 +39,6 @@ void start_library()
     kzconf_configuration configuration;
     kzconf_initialize_configuration(&configuration);
     require(kzinit_initialize_vesk(&configuration) == KZ_OK, "the library does not start");
-}
-
-/// Whether a word stands for a thing: it is its name, or the beginning of several things' names.
-template <class Thing>
-bool stands_for(const std::string& word, const Thing& one, const std::vector<Thing>& all)
-{
-    const auto is_word = [&](const Thing& other) { return other.name == word; };
-    return std::any_of(all.begin(), all.end(), is_word) ? is_word(one)
-                                                        : one.name.rfind(word, 0) == 0;
-}
-
-/// The things that any of these words stand for; all when there are none.
-template <class Thing>
-std::vector<Thing> chosen(const std::vector<Thing>& all, const std::vector<std::string>& words)
-{
-    std::vector<Thing> chosen;
-    std::copy_if(all.begin(), all.end(), std::back_inserter(chosen), [&](const Thing& one) {
-        return words.empty() || std::any_of(words.begin(), words.end(), [&](const auto& word) {
-                   return stands_for(word, one, all);
-               });
-    });
-    require(!chosen.empty(), "nothing has such a name");
-    return chosen;
 }
 
 void write(const Json& report, const std::string& path)

@@ -1,11 +1,11 @@
 #!/usr/bin/env python3
 """Prints the tables of kzbench's results, as Markdown.
 
-    bench/table.py results.json [...]                     results of `kzbench pairs` or `kzbench grow`
-    bench/table.py --into bench/README.md results.json    write them into a document instead
+    bench/table.py RESULTS...                     what `kzbench pairs` or `kzbench grow` wrote
+    bench/table.py --into DOCUMENT RESULTS...     puts the tables into a document instead
 
-A document has a place for each of the two: all between the lines `<!-- pairs -->` (or `growth`) and
-`<!-- end -->`. A limit is met when the upper quartile of the ratios keeps it, and `just` when only the median does.
+A document has a place for each of the two: all between the lines `<!-- pairs -->` (or `growth`)
+and `<!-- end -->`. A limit is met when the upper quartile of the ratios keeps it, and `just` when only the median does.
 """
 
 import json

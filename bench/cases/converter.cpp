@@ -12,10 +12,11 @@ namespace {
 
 constexpr uint32_t kMany = 4; ///< channels of the converters for any number
 
-/// @tparam Word     What it makes.
-/// @tparam Convert  (input, output, frames)
-template <class Word, class Convert>
-Prepared converting(uint32_t channels, size_t sample_bytes, Convert convert)
+template <class Word>
+using Convert = std::function<void(const void* input, Word* output, int32_t frames)>;
+
+template <class Word>
+Prepared converting(uint32_t channels, size_t sample_bytes, const Convert<Word>& convert)
 {
     const auto music = kz::test::melody(44100, channels, 1.0);
     const Aligned<int16_t> sound(music.begin(), music.end());
@@ -28,16 +29,16 @@ Prepared converting(uint32_t channels, size_t sample_bytes, Convert convert)
         run();
         return kz::test::digest_of(*words);
     };
-    return {run, digest,
-            [=] { return Peers{copying(kChunk * (channels * sample_bytes + sizeof(Word)))}; }};
+    const size_t bytes = kChunk * (channels * sample_bytes + sizeof(Word));
+    return {run, digest, [bytes] { return Peers{copying(bytes)}; }};
 }
 
 template <class Word>
-Case converter(const std::string& name, uint32_t channels, size_t sample_bytes,
-               void (*convert)(const void*, Word*, int32_t) noexcept)
+Case conversion(const std::string& name, uint32_t channels, size_t sample_bytes,
+                const Convert<Word>& convert)
 {
     return {"convert_" + name,
-            channels == 1 ? "one channel" : "two channels",
+            "conversion of " + std::to_string(channels) + " channel" + (channels == 1 ? "" : "s"),
             nanoseconds_per("frame", kChunk),
             share_of(kCopying, 4),
             share_of(kCopying, 1.5),
@@ -45,18 +46,20 @@ Case converter(const std::string& name, uint32_t channels, size_t sample_bytes,
 }
 
 template <class Word>
+Case converter(const std::string& name, uint32_t channels, size_t sample_bytes,
+               void (*convert)(const void*, Word*, int32_t) noexcept)
+{
+    return conversion<Word>(name, channels, sample_bytes, convert);
+}
+
+template <class Word>
 Case many_channels(const std::string& name, size_t sample_bytes,
                    void (*convert)(int32_t, const void*, Word*, int32_t) noexcept)
 {
-    const auto bound = [convert](const void* input, Word* output, int32_t frames) {
-        convert(kMany, input, output, frames);
-    };
-    return {"convert_" + name,
-            "four channels",
-            nanoseconds_per("frame", kChunk),
-            share_of(kCopying, 4),
-            share_of(kCopying, 1.5),
-            [=] { return converting<Word>(kMany, sample_bytes, bound); }};
+    return conversion<Word>(name, kMany, sample_bytes,
+                            [convert](const void* input, Word* output, int32_t frames) {
+                                convert(kMany, input, output, frames);
+                            });
 }
 
 } // namespace

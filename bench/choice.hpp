@@ -1,0 +1,37 @@
+/// @file
+/// Which of the cases or tables the words of a command line stand for.
+#pragma once
+
+#include <algorithm>
+#include <iterator>
+#include <string>
+#include <vector>
+
+#include "case.hpp"
+
+namespace kz::bench {
+
+/// Whether a word stands for a thing: it is its name, or the beginning of several things' names.
+template <class Thing>
+bool stands_for(const std::string& word, const Thing& one, const std::vector<Thing>& all)
+{
+    const auto is_word = [&](const Thing& other) { return other.name == word; };
+    return std::any_of(all.begin(), all.end(), is_word) ? is_word(one)
+                                                        : one.name.rfind(word, 0) == 0;
+}
+
+/// The things that any of these words stand for; all when there are none.
+template <class Thing>
+std::vector<Thing> chosen(const std::vector<Thing>& all, const std::vector<std::string>& words)
+{
+    std::vector<Thing> chosen;
+    std::copy_if(all.begin(), all.end(), std::back_inserter(chosen), [&](const Thing& one) {
+        return words.empty() || std::any_of(words.begin(), words.end(), [&](const auto& word) {
+                   return stands_for(word, one, all);
+               });
+    });
+    require(!chosen.empty(), "nothing has such a name");
+    return chosen;
+}
+
+} // namespace kz::bench
