@@ -5,7 +5,8 @@
     bench/table.py --into DOCUMENT RESULTS...     puts the tables into a document instead
 
 A document has a place for each of the two: all between the lines `<!-- pairs -->` (or `growth`)
-and `<!-- end -->`. A limit is met when the upper quartile of the ratios keeps it, and `just` when only the median does.
+and `<!-- end -->`. A limit is met when the upper quartile of the ratios keeps it, and `just` when
+only the median does.
 """
 
 import json
