@@ -9,9 +9,9 @@
 #include <memory>
 #include <string>
 #include <type_traits>
-#include <vector>
 
 #include "case.hpp"
+#include "measure/aligned.hpp"
 #include "support/melody.hpp"
 
 namespace kz::bench {
@@ -23,10 +23,10 @@ template <class Sample>
 inline constexpr double kFullScale = std::is_floating_point_v<Sample> ? 1.0 : 32767.0;
 
 template <class Sample>
-std::vector<Sample> block_of_sound(uint32_t rate, size_t block)
+Aligned<Sample> block_of_sound(uint32_t rate, size_t block)
 {
     const auto sound = kz::test::melody(rate, 1, static_cast<double>(block + 1) / rate);
-    std::vector<Sample> samples(block);
+    Aligned<Sample> samples(block);
     std::transform(
         sound.begin(), sound.begin() + static_cast<ptrdiff_t>(block), samples.begin(),
         [](int16_t value) { return static_cast<Sample>(value * (kFullScale<Sample> / 32767.0)); });

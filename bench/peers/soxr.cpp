@@ -43,11 +43,11 @@ public:
         return made;
     }
 
-    std::vector<float> output;
+    Aligned<float> output;
 
 private:
     std::unique_ptr<soxr, Free> converter_;
-    std::vector<float> input_;
+    Aligned<float> input_;
 };
 
 } // namespace

@@ -36,11 +36,11 @@ public:
         return made;
     }
 
-    std::vector<float> output;
+    Aligned<float> output;
 
 private:
     std::unique_ptr<SpeexResamplerState, Free> state_;
-    std::vector<float> input_;
+    Aligned<float> input_;
 };
 
 } // namespace

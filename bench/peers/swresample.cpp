@@ -59,11 +59,11 @@ public:
         return static_cast<size_t>(made);
     }
 
-    std::vector<Sample> output;
+    Aligned<Sample> output;
 
 private:
     Context context_;
-    std::vector<Sample> input_;
+    Aligned<Sample> input_;
 };
 
 } // namespace
