@@ -107,32 +107,44 @@ const kz::dsp::PhaseRows& rows_of(const KZDSP_resampler_fixed& r) noexcept
     return *kConversions[1].rows; // not reached: every resampler is made from the table
 }
 
-// Windows that reach into the history: they are laid together, and each product is exact.
+// Windows that reach into the history: each product is exact. What is left of the history and the
+// beginning of the block are laid together once, so that all these windows lie in one piece.
 class AcrossBlocks {
 public:
-    AcrossBlocks(const kz::dsp::PhaseRows& rows, uint32_t taps) noexcept
-        : rows_(rows), taps_(taps),
+    AcrossBlocks(const kz::dsp::PhaseRows& rows, uint32_t taps, Samples block) noexcept
+        : rows_(rows), beginning_(block.first(std::min<size_t>(block.size(), taps))),
           convolve_(rows.up == 1 ? kz::dsp::kernels().convolve_from_bit_32
                                  : kz::dsp::kernels().convolve_from_bit_31)
     {
     }
 
-    int32_t operator()(Samples newer, Samples older, uint32_t phase) const noexcept
+    int32_t operator()(Samples /*newer*/, Samples older, uint32_t phase) noexcept
     {
-        std::array<int32_t, kLongestRow> window;
-        const auto end = std::copy(newer.begin(), newer.end(),
-                                   std::copy(older.begin(), older.end(), window.begin()));
-        std::fill(end, window.begin() + rows_.row_length, 0);
+        if (pending_ == 0) {
+            join(older);
+        }
+        const int32_t* window = joined_.data() + (pending_ - older.size());
         const int32_t* row = rows_.taps + size_t{rows_.row_of[phase]} * rows_.row_length;
-        return convolve_(window.data(), row, rows_.row_length);
+        return convolve_(window, row, rows_.row_length);
     }
 
 private:
-    static constexpr size_t kLongestRow = 96;
+    static constexpr size_t kMostTaps = 91;
+    static constexpr size_t kPadding = 8; // read for the zeros at the end of a row
+
+    void join(Samples older) noexcept
+    {
+        pending_ = older.size();
+        auto end = std::copy(older.begin(), older.end(), joined_.begin());
+        end = std::copy(beginning_.begin(), beginning_.end(), end);
+        std::fill_n(end, kPadding, 0);
+    }
 
     const kz::dsp::PhaseRows& rows_;
-    uint32_t taps_;
+    Samples beginning_;
     int32_t (*convolve_)(const int32_t*, const int32_t*, uint32_t) noexcept;
+    size_t pending_ = 0;
+    std::array<int32_t, 2 * kMostTaps + kPadding> joined_;
 };
 
 kz::dsp::BlockCounts resample(KZDSP_resampler_fixed& r, Samples input,
@@ -150,7 +162,7 @@ kz::dsp::BlockCounts resample(KZDSP_resampler_fixed& r, Samples input,
             run(rows, {oldest, r.taps_per_phase, r.down, phase}, outputs.data(),
                 static_cast<uint32_t>(outputs.size()));
         },
-        AcrossBlocks(rows, r.taps_per_phase));
+        AcrossBlocks(rows, r.taps_per_phase, input));
 }
 
 } // namespace

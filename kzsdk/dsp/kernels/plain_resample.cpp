@@ -56,12 +56,13 @@ int32_t tap_product(int32_t swapped_tap, int32_t sample) noexcept
 }
 
 // The centre tap, and the taps beside it that are not zero by design.
-int32_t symmetric_sum(const int32_t* window, const int32_t* row, uint32_t down) noexcept
+template <uint32_t Down>
+int32_t symmetric_sum(const int32_t* window, const int32_t* row) noexcept
 {
-    const uint32_t centre = 10 * down;
+    constexpr uint32_t centre = 10 * Down;
     int32_t sum = tap_product(row[centre], window[centre]);
     for (uint32_t k = 1; k < centre; ++k) {
-        if (k % down != 0) {
+        if (k % Down != 0) {
             const uint32_t mirrored = 2 * centre - k;
             const int32_t pair = wrap_add(window[k], window[mirrored]);
             sum = wrap_add(sum, tap_product(row[mirrored], pair));
@@ -101,9 +102,9 @@ void polyphase(const PhaseRows& rows, const Windows& windows, int32_t* output,
 void symmetric(const PhaseRows& rows, const Windows& windows, int32_t* output,
                uint32_t count) noexcept
 {
-    const uint32_t down = windows.down;
+    const auto sum = windows.down == 2 ? symmetric_sum<2> : symmetric_sum<4>;
     for (uint32_t i = 0; i < count; ++i) {
-        output[i] = symmetric_sum(windows.oldest + size_t{i} * down, rows.taps, down);
+        output[i] = sum(windows.oldest + size_t{i} * windows.down, rows.taps);
     }
 }
 

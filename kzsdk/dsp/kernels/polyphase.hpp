@@ -40,12 +40,12 @@ namespace {
 template <class Simd, int Shift>
 int32_t convolve(const int32_t* samples, const int32_t* row, uint32_t count) noexcept
 {
-    auto sum = Simd::all(0);
+    auto sums = Simd::all(0);
     for (size_t k = 0; k < count; k += Simd::kLanes) {
         const auto taps = Simd::swap_halves(Simd::load(row + k));
-        sum = Simd::add(sum, Simd::template product_bits<Shift>(Simd::load(samples + k), taps));
+        Simd::template add_product_bits<Shift>(sums, Simd::load(samples + k), taps);
     }
-    return Simd::sum_of_lanes(sum);
+    return Simd::sum_of_product_bits(sums);
 }
 
 /// Samples of a block, as the multiplier takes them.

@@ -51,7 +51,9 @@ struct Avx2 {
     /// Exchanges the 16-bit halves of every lane.
     static Ints swap_halves(Ints v) noexcept
     {
-        return _mm256_or_si256(_mm256_slli_epi32(v, 16), _mm256_srli_epi32(v, 16));
+        const Ints order = _mm256_broadcastsi128_si256(
+            _mm_setr_epi8(2, 3, 0, 1, 6, 7, 4, 5, 10, 11, 8, 9, 14, 15, 12, 13));
+        return _mm256_shuffle_epi8(v, order);
     }
 
     /// In every lane the products of the low halves and of the high halves, added.
@@ -223,6 +225,21 @@ struct Avx2 {
         const __m128i bytes = _mm_loadu_si128(reinterpret_cast<const __m128i*>(from));
         const __m128i folded = _mm_xor_si128(bytes, _mm_set1_epi8(-128));
         return _mm256_cvtepi16_epi32(_mm_maddubs_epi16(folded, _mm_set1_epi8(1)));
+    }
+
+    /// Adds bits `Shift` to `Shift` + 31 of each product, 1 <= Shift <= 32, to sums that
+    /// sum_of_product_bits() reads: they are the odd lanes, the others hold nothing of use.
+    template <int Shift>
+    static void add_product_bits(Ints& sums, Ints a, Ints b) noexcept
+    {
+        const Ints even = _mm256_slli_epi64(_mm256_mul_epi32(a, b), 32 - Shift);
+        const Ints odd =
+            _mm256_slli_epi64(_mm256_mul_epi32(odd_lanes(a), odd_lanes(b)), 32 - Shift);
+        sums = add(sums, add(even, odd));
+    }
+    static int32_t sum_of_product_bits(Ints sums) noexcept
+    {
+        return sum_of_lanes(_mm256_srli_epi64(sums, 32));
     }
 
     /// Lanes in the opposite order.

@@ -191,6 +191,15 @@ struct Neon {
         return vreinterpretq_s32_u32(vmovl_u16(vpaddl_u8(folded)));
     }
 
+    /// Adds bits `Shift` to `Shift` + 31 of each product, 1 <= Shift <= 32, to sums that
+    /// sum_of_product_bits() reads.
+    template <int Shift>
+    static void add_product_bits(Ints& sums, Ints a, Ints b) noexcept
+    {
+        sums = add(sums, product_bits<Shift>(a, b));
+    }
+    static int32_t sum_of_product_bits(Ints sums) noexcept { return sum_of_lanes(sums); }
+
     /// Lanes in the opposite order.
     static Ints reversed(Ints v) noexcept
     {

@@ -50,7 +50,8 @@ struct Sse41 {
     /// Exchanges the 16-bit halves of every lane.
     static Ints swap_halves(Ints v) noexcept
     {
-        return _mm_or_si128(_mm_slli_epi32(v, 16), _mm_srli_epi32(v, 16));
+        return _mm_shuffle_epi8(
+            v, _mm_setr_epi8(2, 3, 0, 1, 6, 7, 4, 5, 10, 11, 8, 9, 14, 15, 12, 13));
     }
 
     /// In every lane the products of the low halves and of the high halves, added.
@@ -208,6 +209,20 @@ struct Sse41 {
         const __m128i bytes = _mm_loadl_epi64(reinterpret_cast<const __m128i*>(from));
         const __m128i folded = _mm_xor_si128(bytes, _mm_set1_epi8(-128));
         return _mm_cvtepi16_epi32(_mm_maddubs_epi16(folded, _mm_set1_epi8(1)));
+    }
+
+    /// Adds bits `Shift` to `Shift` + 31 of each product, 1 <= Shift <= 32, to sums that
+    /// sum_of_product_bits() reads: they are the odd lanes, the others hold nothing of use.
+    template <int Shift>
+    static void add_product_bits(Ints& sums, Ints a, Ints b) noexcept
+    {
+        const Ints even = _mm_slli_epi64(_mm_mul_epi32(a, b), 32 - Shift);
+        const Ints odd = _mm_slli_epi64(_mm_mul_epi32(odd_lanes(a), odd_lanes(b)), 32 - Shift);
+        sums = add(sums, add(even, odd));
+    }
+    static int32_t sum_of_product_bits(Ints sums) noexcept
+    {
+        return sum_of_lanes(_mm_srli_epi64(sums, 32));
     }
 
     /// Lanes in the opposite order.

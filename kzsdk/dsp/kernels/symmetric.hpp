@@ -110,7 +110,6 @@ private:
         // Sample i goes to stream i mod Down.
         static constexpr size_t place(size_t i) noexcept { return i % Down * kStream + i / Down; }
 
-        //
         // @return The largest sample, or the largest complement of a negative one.
         int32_t deal_out(const int32_t* input, size_t count) noexcept
         {
@@ -157,14 +156,15 @@ private:
         template <bool Quick>
         void make(int32_t* output, uint32_t count) const noexcept
         {
-            constexpr size_t kTogether = 6; // whose sums share the constants of a tap
+            constexpr size_t kTogether = 6; // vectors whose sums share the constants of a tap
+            constexpr size_t kGroup = kTogether * kLanes;
             size_t i = 0;
-            for (; i + kTogether * kLanes <= count; i += kTogether * kLanes) {
-                Ints sums[kTogether];
-                add_up<Quick>(sums, i);
-                for (size_t v = 0; v < kTogether; ++v) {
-                    Simd::store(output + i + v * kLanes, sums[v]);
-                }
+            for (; i + kGroup <= count; i += kGroup) {
+                make_group<Quick, kTogether>(output, i);
+            }
+            if (i != count && count >= kGroup) {
+                make_group<Quick, kTogether>(output, count - kGroup); // some of them once more
+                return;
             }
             for (; i < count; i += kLanes) {
                 Ints sums[1];
@@ -174,6 +174,16 @@ private:
                 for (size_t k = 0; k < kLanes && i + k < count; ++k) {
                     output[i + k] = lanes[k];
                 }
+            }
+        }
+
+        template <bool Quick, size_t Vectors>
+        void make_group(int32_t* output, size_t first) const noexcept
+        {
+            Ints sums[Vectors];
+            add_up<Quick>(sums, first);
+            for (size_t v = 0; v < Vectors; ++v) {
+                Simd::store(output + first + v * kLanes, sums[v]);
             }
         }
 
