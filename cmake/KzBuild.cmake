@@ -28,12 +28,38 @@ if(KZ_SANITIZE)
   target_link_options(kz_settings INTERFACE -fsanitize=${KZ_SANITIZE})
 endif()
 
+# What a compiler and a linker can do against the exploitation of a bug. tests/abi/hardening_test.cpp
+# looks for it in the built files. A sanitizer sees more, and some of its checks do not go with these.
+option(KZ_HARDEN "Compile and link with the usual protections" ON)
+if(KZ_HARDEN AND NOT KZ_SANITIZE)
+  include(CheckCXXCompilerFlag)
+  foreach(flag -fstack-protector-strong -fcf-protection=full -mbranch-protection=standard)
+    string(MAKE_C_IDENTIFIER "KZ_HAS${flag}" known)
+    check_cxx_compiler_flag("${flag} -Werror" ${known})
+    if(${known})
+      target_compile_options(kz_settings INTERFACE ${flag})
+    endif()
+  endforeach()
+  # Debug builds do not optimise, and the C library's checks need that.
+  target_compile_options(
+    kz_settings INTERFACE "$<$<NOT:$<CONFIG:Debug>>:SHELL:-U_FORTIFY_SOURCE -D_FORTIFY_SOURCE=2>")
+  if(NOT APPLE)
+    target_link_options(kz_settings INTERFACE -Wl,-z,relro -Wl,-z,now -Wl,-z,noexecstack)
+  endif()
+  # The kernels' scratch, tens of KB on the stack, is written before it is read: clearing it first
+  # would cost more than some of the loops. Their files are the only ones to go without.
+  check_cxx_compiler_flag("-ftrivial-auto-var-init=zero -Werror" KZ_HAS_AUTO_VAR_INIT)
+endif()
+
 # Objects that go into the library.
 function(kz_library_objects target)
   add_library(${target} OBJECT ${ARGN})
   target_link_libraries(${target} PRIVATE kz_settings)
   target_include_directories(${target} PRIVATE "${PROJECT_SOURCE_DIR}")
   target_compile_options(${target} PRIVATE -fno-exceptions -fno-rtti)
+  if(KZ_HAS_AUTO_VAR_INIT AND KZ_HARDEN AND NOT KZ_SANITIZE)
+    target_compile_options(${target} PRIVATE -ftrivial-auto-var-init=zero)
+  endif()
   set_target_properties(
     ${target} PROPERTIES POSITION_INDEPENDENT_CODE ON CXX_VISIBILITY_PRESET hidden
                          VISIBILITY_INLINES_HIDDEN ON)
