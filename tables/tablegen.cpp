@@ -13,6 +13,7 @@
 #include <cstdlib>
 #include <fstream>
 #include <iostream>
+#include <sstream>
 #include <string_view>
 #include <vector>
 
@@ -70,7 +71,7 @@ private:
     uint64_t hash_ = 0xcbf29ce484222325U;
 };
 
-constexpr uint64_t kKnownDigest = 0xbc47314ee591dfe9U;
+constexpr uint64_t kKnownDigest = 0x6c676693ad4e4d42U;
 
 // The source file that is written, and the digest of what is in it.
 struct Source {
@@ -158,8 +159,23 @@ void write_rows(std::ostream& out, uint32_t hertz, uint32_t up, uint32_t down,
         << "::high_parts, hertz_" << hertz << "::high_sums};\n\n";
 }
 
+// The same design for the floating-point resampler, phase by phase.
+void write_phases(Source& out, const Polyphase& rate, const std::vector<float>& taps)
+{
+    std::vector<float> phases;
+    for (uint32_t phase = 0; phase < rate.up; ++phase) {
+        for (size_t i = phase; i < taps.size(); i += rate.up) {
+            phases.push_back(taps[i]);
+        }
+    }
+    out.text << "namespace hertz_" << rate.hertz << " {\n";
+    write_array(out, "float", "phases", phases);
+    out.text << "} // namespace hertz_" << rate.hertz << "\n\n";
+}
+
 void write_filters(Source& out)
 {
+    std::ostringstream designed;
     for (const Polyphase& rate : kPolyphase) {
         const auto layout = kz::dsp::filter_layout(rate.up, rate.down);
         std::vector<float> taps(layout.length);
@@ -167,7 +183,12 @@ void write_filters(Source& out)
         const auto words = to_q31(taps, rate.gain);
         write_filter(out, rate.hertz, words);
         write_rows(out.text, rate.hertz, rate.up, rate.down, words);
+        write_phases(out, rate, taps);
+        designed << "    {" << rate.up << ", " << rate.down << ", " << taps.size() / rate.up
+                 << ", hertz_" << rate.hertz << "::phases},\n";
     }
+    out.text << "const kz::dsp::DesignedFilter kz::dsp::designed_filters[] = {\n"
+             << designed.str() << "};\n\n";
     const auto half_band = kz::tables::design_short_filter(kz::tables::kHalfBand);
     const auto quarter_band = kz::tables::design_short_filter(kz::tables::kQuarterBand);
     write_filter(out, 22050, to_q31(half_band, 1.0));
@@ -192,6 +213,13 @@ std::vector<int32_t> dct_coefficients(uint32_t length)
     return words;
 }
 
+std::vector<float> dct_factors(uint32_t length)
+{
+    std::vector<float> factors(length);
+    kz::dsp::fill_butterfly_factors(factors);
+    return factors;
+}
+
 } // namespace
 
 int main(int argc, char** argv)
@@ -207,6 +235,7 @@ int main(int argc, char** argv)
     Source out{file, {}};
     write_filters(out);
     write_array(out, "int32_t", "kz::dsp::kDctCoefficients", dct_coefficients(32768));
+    write_array(out, "float", "kz::dsp::kDctFactors", dct_factors(32768));
     file.close();
     if (!file) {
         std::cerr << "tablegen: cannot write " << argv[1] << '\n';

@@ -25,6 +25,16 @@ inline float butterfly_factor(uint32_t half_width, uint32_t j) noexcept
     return static_cast<float>(1.0 / (2.0 * kz_cos(angle)));
 }
 
+/// Factor j of half-width h at h + j; 0 at 0.
+inline void fill_butterfly_factors(std::span<float> factors) noexcept
+{
+    for (uint32_t half_width = 1; half_width < factors.size(); half_width *= 2) {
+        for (uint32_t j = 0; j < half_width; ++j) {
+            factors[half_width + j] = butterfly_factor(half_width, j);
+        }
+    }
+}
+
 /// Swaps every value with the one at the bit-reversed index. The length is a power of two.
 template <class T>
 void bit_reverse(std::span<T> x) noexcept

@@ -56,13 +56,14 @@ typedef struct KZDSP_DCT {
     int32_t order;              /**< base-2 logarithm of the length */
     uint32_t length;            /**< L */
     const float* coefficients;  /**< L butterfly factors; entry 0 is 0 and not used */
-    uint32_t owns_coefficients; /**< always 1: the factors are computed at creation */
+    uint32_t owns_coefficients; /**< 0 for a constant table, 1 for one made at creation */
 } KZDSP_DCT;
 
 /**
- * Makes a transform of 2^@p order points. Computes one cosine per point.
+ * Makes a transform of 2^@p order points. Up to order 15 the factors are constants of the library;
+ * above, one cosine per point is computed here.
  *
- * @param order  1 .. 29; the factors take 4 * 2^order bytes.
+ * @param order  1 .. 29; factors of its own take 4 * 2^order bytes.
  * @return The transform, which the caller frees with KZDSP_DestroyDCT(); null for any other order
  *         (from 30 on the factors would not fit a 32-bit size) or when memory is short.
  */

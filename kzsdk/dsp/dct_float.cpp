@@ -1,9 +1,11 @@
+#include <iterator>
 #include <span>
 
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/dsp/butterfly.hpp"
 #include "kzsdk/dsp/dct.h"
 #include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/dsp/tables.hpp"
 
 namespace {
 
@@ -11,15 +13,6 @@ constexpr int32_t kSmallestOrder = 1;
 constexpr int32_t kLargestOrder = 29; // 2^30 factors of four bytes would be 0 in 32 bits
 
 constexpr float kDcScale = 0.70710678F;
-
-void fill_factors(std::span<float> factors) noexcept
-{
-    for (uint32_t half_width = 1; half_width < factors.size(); half_width *= 2) {
-        for (uint32_t j = 0; j < half_width; ++j) {
-            factors[half_width + j] = kz::dsp::butterfly_factor(half_width, j);
-        }
-    }
-}
 
 void scale(std::span<float> x, float factor) noexcept
 {
@@ -35,17 +28,23 @@ KZDSP_DCT* KZDSP_CreateDCT(int32_t order) noexcept
     if (order < kSmallestOrder || order > kLargestOrder) {
         return nullptr;
     }
-    const uint32_t length = 1U << order;
     auto dct = kz::make_record<KZDSP_DCT>();
-    auto factors = kz::make_array<float>(length);
-    if (!dct || !factors) {
+    if (!dct) {
         return nullptr;
     }
-    fill_factors({factors.get(), length});
-    *dct = {.order = order,
-            .length = length,
-            .coefficients = factors.release(),
-            .owns_coefficients = 1};
+    dct->order = order;
+    dct->length = 1U << order;
+    if (dct->length <= std::size(kz::dsp::kDctFactors)) {
+        dct->coefficients = kz::dsp::kDctFactors;
+        return dct.release();
+    }
+    auto factors = kz::make_array<float>(dct->length);
+    if (!factors) {
+        return nullptr;
+    }
+    kz::dsp::fill_butterfly_factors({factors.get(), dct->length});
+    dct->coefficients = factors.release();
+    dct->owns_coefficients = 1;
     return dct.release();
 }
 

@@ -159,17 +159,24 @@ void keep_tail(Resampler& r, std::span<const Sample> tail) noexcept
     r.history_end += static_cast<uint32_t>(tail.size());
 }
 
-/// Moves the phase on by one output.
+/// Moves the phase on by some outputs. It advances before the taps are read and the window moves
+/// after: each output is up to one input sample off its ideal time, and this is how the stream is
+/// defined.
 ///
 /// @return How many samples the window moves.
 template <class Resampler>
-uint32_t next_phase(Resampler& r) noexcept
+uint64_t advance(Resampler& r, size_t outputs) noexcept
 {
-    // The phase advances before the taps are read and the window moves after: each output is up to
-    // one input sample off its ideal time, and this is how the stream is defined.
-    const uint32_t t = r.phase + r.down;
-    r.phase = t % r.up;
+    const uint64_t t = r.phase + uint64_t{outputs} * r.down;
+    r.phase = static_cast<uint32_t>(t % r.up);
     return t / r.up;
+}
+
+/// Outputs whose windows begin before sample `end` of the first window.
+template <class Resampler>
+uint64_t outputs_beginning_before(const Resampler& r, uint64_t end) noexcept
+{
+    return (end * r.up - r.phase + r.down - 1) / r.down;
 }
 
 /// Outputs whose windows all lie in a block, of which `spare` samples are left behind the first
@@ -182,48 +189,73 @@ uint64_t outputs_inside(const Resampler& r, uint64_t spare) noexcept
 
 /// Resamples one block.
 ///
-/// @param inside  (oldest sample of the first window, phase before the first output, outputs): all
-///                outputs whose windows lie inside the block, at once.
-/// @param across  (newer samples, older samples, phase) -> output, for a window that reaches into
-///                the history; both spans run forwards in time, and the newer one may be empty.
-template <class Resampler, class Sample, class Inside, class Across>
+/// @param across  (samples of the history, samples of the block, phase, outputs): all outputs whose
+///                windows begin in the history; the two runs of samples follow each other.
+/// @param inside  (oldest sample of the first window, phase, outputs): all outputs whose windows
+///                lie inside the block.
+///
+/// The phase is always the one before the first output.
+template <class Resampler, class Sample, class Across, class Inside>
 BlockCounts resample_block(Resampler& r, std::span<const Sample> input, std::span<Sample> output,
-                           Inside inside, Across across) noexcept
+                           Across across, Inside inside) noexcept
 {
-    const uint32_t window = r.taps_per_phase;
     const uint64_t available = input.size();
+    const uint64_t pending = r.history_end - r.history_start;
     uint64_t needed = need(r);
     uint64_t oldest = 0; // first sample of the block that is still needed
-    uint32_t produced = 0;
-    uint32_t pending = r.history_end - r.history_start;
-    while (pending != 0 && produced < output.size() && needed <= available) {
-        const std::span<const Sample> older(r.history + r.history_start, pending);
-        const uint32_t step = next_phase(r);
-        output[produced++] = across(input.first(window - pending), older, r.phase);
-        r.history_start += step;
-        if (step >= pending) {
+    auto left = output;  // outputs that are not made yet
+    const auto take_outputs = [&](uint64_t wanted) {
+        const auto taken = left.first(std::min<uint64_t>(left.size(), wanted));
+        left = left.subspan(taken.size());
+        return taken;
+    };
+    if (pending != 0 && !left.empty() && needed <= available) {
+        const auto outputs = take_outputs(
+            std::min(outputs_beginning_before(r, pending), outputs_inside(r, available - needed)));
+        across(std::span<const Sample>(r.history + r.history_start, pending), input, r.phase,
+               outputs);
+        const uint64_t moved = advance(r, outputs.size());
+        needed += moved;
+        if (moved < pending) {
+            r.history_start += static_cast<uint32_t>(moved);
+        } else {
+            oldest = moved - pending;
             r.history_start = 0;
             r.history_end = 0;
-            oldest = step - pending;
         }
-        pending = r.history_end - r.history_start;
-        needed += step;
     }
-    if (pending == 0 && produced < output.size() && needed <= available) {
-        const auto outputs = output.subspan(
-            produced, static_cast<size_t>(std::min<uint64_t>(
-                          output.size() - produced, outputs_inside(r, available - needed))));
+    if (r.history_start == r.history_end && !left.empty() && needed <= available) {
+        const auto outputs = take_outputs(outputs_inside(r, available - needed));
         inside(input.data() + oldest, r.phase, outputs);
-        const uint64_t t = r.phase + uint64_t{outputs.size()} * r.down;
-        r.phase = static_cast<uint32_t>(t % r.up);
-        oldest += t / r.up;
-        needed += t / r.up;
-        produced += static_cast<uint32_t>(outputs.size());
+        const uint64_t moved = advance(r, outputs.size());
+        needed += moved;
+        oldest += moved;
     }
-    const auto consumed = static_cast<uint32_t>(std::min(needed, available));
-    keep_tail(r,
-              input.subspan(static_cast<size_t>(oldest), static_cast<size_t>(consumed - oldest)));
-    return {consumed, produced};
+    const uint64_t consumed = std::min(needed, available);
+    keep_tail(r, input.subspan(oldest, consumed - oldest));
+    return {static_cast<uint32_t>(consumed), static_cast<uint32_t>(output.size() - left.size())};
 }
+
+/// The samples of all windows that begin in a history, in one run.
+template <class Sample>
+class JoinedSamples {
+public:
+    static constexpr size_t kMostTaps = 96;
+    static constexpr size_t kPadding = 8; // for sums that are made in whole vectors
+
+    /// @param taps  At most kMostTaps.
+    JoinedSamples(std::span<const Sample> older, std::span<const Sample> newer,
+                  size_t taps) noexcept
+    {
+        assert(older.size() <= taps && taps <= kMostTaps);
+        auto* const end = std::copy(older.begin(), older.end(), samples_);
+        std::fill_n(std::copy_n(newer.begin(), std::min(newer.size(), taps), end), kPadding, 0);
+    }
+
+    const Sample* begin() const noexcept { return samples_; }
+
+private:
+    Sample samples_[2 * kMostTaps + kPadding];
+};
 
 } // namespace kz::dsp

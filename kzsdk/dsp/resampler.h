@@ -130,7 +130,7 @@ typedef struct KZDSP_resampler {
     uint32_t taps_per_phase; /**< P; 0 when samples are only copied */
     uint32_t length;         /**< taps of the prototype, a multiple of L; 0 when copying */
     const float* taps;       /**< the prototype */
-    uint32_t owns_taps;      /**< 1 when it was designed for this resampler, 0 for a stored one */
+    uint32_t owns_taps;      /**< 1 when it was made for this resampler, 0 for a stored one */
     uint32_t phase;          /**< 0 .. L - 1 */
     float* history;          /**< owned; room for P samples */
     uint32_t history_start;  /**< oldest sample still needed */
@@ -145,8 +145,9 @@ typedef struct KZDSP_resampler {
  *
  * The quotient of the rates, in single precision, becomes L / M by KZDSP_Rationalize() to one part
  * in a million. Decimation by 2 and by 4 uses a stored filter; equal rates copy; for every other
- * ratio a Hamming-windowed sinc of 20 max(L, M) + 1 taps is designed here, which takes a sine and a
- * cosine for every second tap.
+ * ratio the resampler gets a Hamming-windowed sinc of 20 max(L, M) + 1 taps: a copy at the ratios
+ * of the fixed-point resampler, else designed here, which takes a sine and a cosine for every
+ * second tap.
  *
  * @param input_rate   Hertz, finite and above 0.
  * @param output_rate  Hertz, finite and above 0.

@@ -1,7 +1,5 @@
 #include "kzsdk/dsp/resampler.h"
 
-#include <algorithm>
-#include <array>
 #include <span>
 
 #include "kzsdk/abs/owned.hpp"
@@ -107,45 +105,22 @@ const kz::dsp::PhaseRows& rows_of(const KZDSP_resampler_fixed& r) noexcept
     return *kConversions[1].rows; // not reached: every resampler is made from the table
 }
 
-// Windows that reach into the history: each product is exact. What is left of the history and the
-// beginning of the block are laid together once, so that all these windows lie in one piece.
-class AcrossBlocks {
-public:
-    AcrossBlocks(const kz::dsp::PhaseRows& rows, uint32_t taps, Samples block) noexcept
-        : rows_(rows), beginning_(block.first(std::min<size_t>(block.size(), taps))),
-          convolve_(rows.up == 1 ? kz::dsp::kernels().convolve_from_bit_32
-                                 : kz::dsp::kernels().convolve_from_bit_31)
-    {
+// Windows that reach into the history: each product is exact.
+void make_across(const KZDSP_resampler_fixed& r, const kz::dsp::PhaseRows& rows, Samples older,
+                 Samples newer, uint32_t phase, std::span<int32_t> outputs) noexcept
+{
+    const auto& kernels = kz::dsp::kernels();
+    const auto convolve = r.up == 1 ? kernels.convolve_from_bit_32 : kernels.convolve_from_bit_31;
+    const kz::dsp::JoinedSamples<int32_t> joined(older, newer, r.taps_per_phase);
+    const int32_t* window = joined.begin();
+    for (int32_t& output : outputs) {
+        const uint32_t t = phase + r.down;
+        phase = t % r.up;
+        output = convolve(window, rows.taps + size_t{rows.row_of[phase]} * rows.row_length,
+                          rows.row_length);
+        window += t / r.up;
     }
-
-    int32_t operator()(Samples /*newer*/, Samples older, uint32_t phase) noexcept
-    {
-        if (pending_ == 0) {
-            join(older);
-        }
-        const int32_t* window = joined_.data() + (pending_ - older.size());
-        const int32_t* row = rows_.taps + size_t{rows_.row_of[phase]} * rows_.row_length;
-        return convolve_(window, row, rows_.row_length);
-    }
-
-private:
-    static constexpr size_t kMostTaps = 91;
-    static constexpr size_t kPadding = 8; // read for the zeros at the end of a row
-
-    void join(Samples older) noexcept
-    {
-        pending_ = older.size();
-        auto end = std::copy(older.begin(), older.end(), joined_.begin());
-        end = std::copy(beginning_.begin(), beginning_.end(), end);
-        std::fill_n(end, kPadding, 0);
-    }
-
-    const kz::dsp::PhaseRows& rows_;
-    Samples beginning_;
-    int32_t (*convolve_)(const int32_t*, const int32_t*, uint32_t) noexcept;
-    size_t pending_ = 0;
-    std::array<int32_t, 2 * kMostTaps + kPadding> joined_;
-};
+}
 
 kz::dsp::BlockCounts resample(KZDSP_resampler_fixed& r, Samples input,
                               std::span<int32_t> output) noexcept
@@ -158,11 +133,13 @@ kz::dsp::BlockCounts resample(KZDSP_resampler_fixed& r, Samples input,
     const auto run = r.up == 1 ? kernels.symmetric : kernels.polyphase;
     return kz::dsp::resample_block(
         r, input, output,
+        [&](Samples older, Samples newer, uint32_t phase, std::span<int32_t> outputs) {
+            make_across(r, rows, older, newer, phase, outputs);
+        },
         [&](const int32_t* oldest, uint32_t phase, std::span<int32_t> outputs) {
             run(rows, {oldest, r.taps_per_phase, r.down, phase}, outputs.data(),
                 static_cast<uint32_t>(outputs.size()));
-        },
-        AcrossBlocks(rows, r.taps_per_phase, input));
+        });
 }
 
 } // namespace

@@ -5,6 +5,7 @@
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/dsp/convolve.h"
 #include "kzsdk/dsp/filter_design.hpp"
+#include "kzsdk/dsp/kernels/kernels.hpp"
 #include "kzsdk/dsp/polyphase_stream.hpp"
 #include "kzsdk/dsp/resampler.h"
 #include "kzsdk/dsp/tables.hpp"
@@ -36,6 +37,27 @@ bool use_stored(KZDSP_resampler& r, const float (&taps)[Length]) noexcept
     return true;
 }
 
+const kz::dsp::DesignedFilter* find_designed(const KZDSP_resampler& r) noexcept
+{
+    for (const kz::dsp::DesignedFilter& filter : kz::dsp::designed_filters) {
+        if (filter.up == r.up && filter.down == r.down) {
+            return &filter;
+        }
+    }
+    return nullptr;
+}
+
+// Lays the taps of all phases together again: what design_windowed_sinc() would write.
+void copy_designed(const kz::dsp::DesignedFilter& filter, float* taps) noexcept
+{
+    const float* tap = filter.taps;
+    for (uint32_t phase = 0; phase < filter.up; ++phase) {
+        for (uint32_t k = 0; k < filter.taps_per_phase; ++k) {
+            taps[phase + size_t{k} * filter.up] = *tap++;
+        }
+    }
+}
+
 // A factor of 0 says that the rates have no ratio.
 bool is_designable(uint32_t factor) noexcept
 {
@@ -53,7 +75,11 @@ bool design(KZDSP_resampler& r) noexcept
         return false;
     }
     r.length = static_cast<uint32_t>(layout.length);
-    kz::dsp::design_windowed_sinc(layout, {taps.get(), r.length});
+    if (const kz::dsp::DesignedFilter* filter = find_designed(r)) {
+        copy_designed(*filter, taps.get());
+    } else {
+        kz::dsp::design_windowed_sinc(layout, {taps.get(), r.length});
+    }
     r.taps = taps.release();
     r.owns_taps = 1;
     return true;
@@ -75,9 +101,31 @@ bool choose_filter(KZDSP_resampler& r) noexcept
 
 using Samples = std::span<const float>;
 
-const float* newest(Samples samples) noexcept
+// Shared tables serve better than the taps of the resampler, which are dealt out over all phases.
+kz::dsp::FloatPhases phases_of(const KZDSP_resampler& r) noexcept
 {
-    return samples.empty() ? nullptr : &samples.back();
+    if (const kz::dsp::DesignedFilter* filter = find_designed(r)) {
+        return {filter->taps, filter->taps_per_phase, 1, r.taps_per_phase, r.up, r.down};
+    }
+    return {r.taps, 1, r.up, r.taps_per_phase, r.up, r.down};
+}
+
+// Windows that reach into the history and are too long to be joined.
+void make_across(const kz::dsp::FloatPhases& phases, Samples older, Samples newer, uint32_t phase,
+                 std::span<float> outputs) noexcept
+{
+    size_t begin = 0; // of the window, in the history
+    for (float& output : outputs) {
+        const uint32_t t = phase + phases.down;
+        phase = t % phases.up;
+        const Samples rest = older.subspan(begin);
+        const size_t fresh = phases.taps_per_phase - rest.size();
+        output = KZDSP_DualConvolve(
+            fresh == 0 ? nullptr : &newer[fresh - 1], static_cast<uint32_t>(fresh), &rest.back(),
+            static_cast<uint32_t>(rest.size()), phases.taps + phase * phases.phase_stride,
+            static_cast<uint32_t>(phases.tap_stride));
+        begin += t / phases.up;
+    }
 }
 
 kz::dsp::BlockCounts resample(KZDSP_resampler& r, Samples input, std::span<float> output) noexcept
@@ -85,23 +133,22 @@ kz::dsp::BlockCounts resample(KZDSP_resampler& r, Samples input, std::span<float
     if (kz::dsp::copies(r)) {
         return kz::dsp::copy_block(input, output);
     }
-    // Both sums run over the same products in the same order, so that a cut does not show.
+    const kz::dsp::FloatPhases phases = phases_of(r);
+    const auto make = [&](const float* oldest, uint32_t phase, std::span<float> outputs) {
+        kz::dsp::kernels().polyphase_floats(phases, oldest, phase, outputs.data(),
+                                            static_cast<uint32_t>(outputs.size()));
+    };
+    // All sums run over the same products in the same order, so that a cut does not show.
     return kz::dsp::resample_block(
         r, input, output,
-        [&r](const float* window, uint32_t phase, std::span<float> outputs) {
-            for (float& value : outputs) {
-                const uint32_t t = phase + r.down;
-                phase = t % r.up;
-                value = KZDSP_Convolve(window + r.taps_per_phase - 1, r.taps + phase,
-                                       r.taps_per_phase, r.up);
-                window += t / r.up;
+        [&](Samples older, Samples newer, uint32_t phase, std::span<float> outputs) {
+            using Joined = kz::dsp::JoinedSamples<float>;
+            if (r.taps_per_phase > Joined::kMostTaps) {
+                return make_across(phases, older, newer, phase, outputs);
             }
+            make(Joined(older, newer, r.taps_per_phase).begin(), phase, outputs);
         },
-        [&r](Samples newer, Samples older, uint32_t phase) {
-            return KZDSP_DualConvolve(newest(newer), static_cast<uint32_t>(newer.size()),
-                                      newest(older), static_cast<uint32_t>(older.size()),
-                                      r.taps + phase, r.up);
-        });
+        make);
 }
 
 struct Destroy {

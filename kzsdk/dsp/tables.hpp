@@ -10,11 +10,27 @@ namespace kz::dsp {
 /// butterfly_factor(h, j), truncated. The first half serves the 16384-point transform.
 extern const int32_t kDctCoefficients[32768];
 
+/// What fill_butterfly_factors() writes. The first 2^n serve the floating-point transform of as
+/// many points.
+extern const float kDctFactors[32768];
+
 /// Prototypes of the floating-point decimators; in Q31 they serve the fixed-point ones. The
 /// half-band filter has its centre tap, 0.5, at index 21; the quarter-band filter its own, 0.25, at
 /// index 43.
 extern const float coefficients_2to1[42];
 extern const float coefficients_4to1[84];
+
+/// The prototype that design_windowed_sinc() makes for a ratio, phase by phase: tap k of phase p,
+/// which is tap p + k * up of the prototype, is taps[p * taps_per_phase + k].
+struct DesignedFilter {
+    uint32_t up;
+    uint32_t down;
+    uint32_t taps_per_phase;
+    const float* taps;
+};
+
+/// Those of the rates that both fingerprinters accept.
+extern const DesignedFilter designed_filters[5];
 
 /// A fixed-point prototype with the taps of each phase side by side, as the inner loops take them:
 /// oldest sample first, rows in the order in which outputs use the phases, each row filled up with

@@ -12,6 +12,8 @@
 #include <gtest/gtest.h>
 
 #include "golden/table_digests.hpp"
+#include "kzsdk/dsp/butterfly.hpp"
+#include "kzsdk/dsp/filter_design.hpp"
 #include "kzsdk/dsp/resampler.h"
 
 namespace kz::test {
@@ -109,6 +111,29 @@ TEST(Tables, FilterTapsAreTheKnownWords)
             << std::hex << "0x" << filter.digest_of_halves() << " over " << std::dec
             << filter.length() << " taps";
     }
+}
+
+// The tables stand for what would else be computed when a resampler or a transform is made.
+TEST(Tables, DesignedFiltersAreWhatTheDesignGivesHereToTheBit)
+{
+    for (const dsp::DesignedFilter& filter : dsp::designed_filters) {
+        const auto layout = dsp::filter_layout(filter.up, filter.down);
+        ASSERT_EQ(layout.length, uint64_t{filter.up} * filter.taps_per_phase);
+        std::vector<float> taps(layout.length);
+        dsp::design_windowed_sinc(layout, taps);
+        for (size_t i = 0; i < taps.size(); ++i) {
+            const size_t at = i % filter.up * filter.taps_per_phase + i / filter.up;
+            ASSERT_EQ(std::bit_cast<uint32_t>(taps[i]), std::bit_cast<uint32_t>(filter.taps[at]))
+                << "tap " << i << " of " << filter.up << '/' << filter.down;
+        }
+    }
+}
+
+TEST(Tables, FloatTransformFactorsAreWhatTheFormulaGivesHereToTheBit)
+{
+    std::vector<float> factors(std::size(dsp::kDctFactors));
+    dsp::fill_butterfly_factors(factors);
+    EXPECT_EQ(digest_of_floats(factors), digest_of_floats(dsp::kDctFactors));
 }
 
 TEST(Tables, DecimatorTapsAreTheKnownFloats)

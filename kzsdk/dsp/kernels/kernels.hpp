@@ -74,6 +74,17 @@ struct Windows {
     uint32_t phase; ///< before the first output; it advances by `down`, modulo `up`, before each
 };
 
+/// A floating-point polyphase filter. Tap k of phase p belongs to the k-th newest sample of a
+/// window and is taps[p * phase_stride + k * tap_stride].
+struct FloatPhases {
+    const float* taps;
+    size_t phase_stride;
+    size_t tap_stride;
+    uint32_t taps_per_phase;
+    uint32_t up;
+    uint32_t down;
+};
+
 struct Kernels {
     /// "plain", "sse41", "avx2" or "neon".
     const char* name;
@@ -115,6 +126,12 @@ struct Kernels {
                                     uint32_t count) noexcept;
     int32_t (*convolve_from_bit_32)(const int32_t* samples, const int32_t* row,
                                     uint32_t count) noexcept;
+
+    /// Makes `count` outputs of a polyphase filter, each in the order of KZDSP_Convolve(), from
+    /// windows that all lie in one block. `oldest` is the first sample of the first window, `phase`
+    /// the one before the first output.
+    void (*polyphase_floats)(const FloatPhases& phases, const float* oldest, uint32_t phase,
+                             float* output, uint32_t count) noexcept;
 
     /// Widens the extremes by samples. NaN is passed over.
     void (*widen_words)(Extremes<int32_t>& extremes, const int32_t* samples,

@@ -27,6 +27,7 @@ const Kernels kPlainKernels = {
     .symmetric = plain::symmetric,
     .convolve_from_bit_31 = plain::convolve_from_bit_31,
     .convolve_from_bit_32 = plain::convolve_from_bit_32,
+    .polyphase_floats = plain::polyphase_floats,
     .widen_words = plain::widen_words,
     .widen_floats = plain::widen_floats,
     .word_levels = plain::word_levels,

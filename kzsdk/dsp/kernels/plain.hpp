@@ -32,6 +32,8 @@ void symmetric(const PhaseRows& rows, const Windows& windows, int32_t* output,
                uint32_t count) noexcept;
 int32_t convolve_from_bit_31(const int32_t* samples, const int32_t* row, uint32_t count) noexcept;
 int32_t convolve_from_bit_32(const int32_t* samples, const int32_t* row, uint32_t count) noexcept;
+void polyphase_floats(const FloatPhases& phases, const float* oldest, uint32_t phase, float* output,
+                      uint32_t count) noexcept;
 
 void widen_words(Extremes<int32_t>& extremes, const int32_t* samples, uint32_t count) noexcept;
 void widen_floats(Extremes<float>& extremes, const float* samples, uint32_t count) noexcept;

@@ -1,6 +1,7 @@
 #include <bit>
 #include <cassert>
 
+#include "kzsdk/dsp/convolve.h"
 #include "kzsdk/dsp/fxp_ops.hpp"
 #include "kzsdk/dsp/kernels/plain.hpp"
 #include "kzsdk/dsp/tables.hpp"
@@ -116,6 +117,19 @@ int32_t convolve_from_bit_31(const int32_t* samples, const int32_t* row, uint32_
 int32_t convolve_from_bit_32(const int32_t* samples, const int32_t* row, uint32_t count) noexcept
 {
     return convolve<32>(samples, row, count);
+}
+
+void polyphase_floats(const FloatPhases& phases, const float* oldest, uint32_t phase, float* output,
+                      uint32_t count) noexcept
+{
+    const float* newest = oldest + phases.taps_per_phase - 1;
+    for (uint32_t i = 0; i < count; ++i) {
+        const uint32_t t = phase + phases.down;
+        phase = t % phases.up;
+        output[i] = KZDSP_Convolve(newest, phases.taps + phase * phases.phase_stride,
+                                   phases.taps_per_phase, static_cast<uint32_t>(phases.tap_stride));
+        newest += t / phases.up;
+    }
 }
 
 } // namespace kz::dsp::plain

@@ -14,6 +14,7 @@
 #include "kzsdk/dsp/kernels/moving_means.hpp"
 #include "kzsdk/dsp/kernels/plain.hpp"
 #include "kzsdk/dsp/kernels/polyphase.hpp"
+#include "kzsdk/dsp/kernels/polyphase_floats.hpp"
 #include "kzsdk/dsp/kernels/symmetric.hpp"
 #include "kzsdk/dsp/kernels/transform.hpp"
 
@@ -51,6 +52,7 @@ constexpr kz::dsp::Kernels vector_kernels(const char* name) noexcept
         .symmetric = Symmetric<Simd>::run,
         .convolve_from_bit_31 = convolve<Simd, 31>,
         .convolve_from_bit_32 = convolve<Simd, 32>,
+        .polyphase_floats = polyphase_floats<Simd>,
         .widen_words = widen_words<Simd>,
         .widen_floats = widen_floats<Simd>,
         .word_levels = word_levels<Simd>,
