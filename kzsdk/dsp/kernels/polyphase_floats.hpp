@@ -66,7 +66,11 @@ class Columns {
     using Floats = typename Simd::Floats;
 
     static constexpr size_t kLanes = Simd::kLanes;
-    static constexpr size_t kRows = 3; // outputs of a column that take turns, sharing samples
+
+    // Outputs of a column that take turns, so that each sample is loaded once for all. Their sums
+    // fit the registers; both numbers divide the known periods, 147 and 441. A window is at least
+    // 20 steps long: all of them have most samples in common.
+    static constexpr size_t kRows = Vectors == 1 ? 7 : 3;
 
 public:
     static constexpr size_t kWidth = kLanes * Vectors;
@@ -81,6 +85,8 @@ public:
     void run(uint32_t phase, float* output, uint32_t outputs) noexcept
     {
         const uint32_t height = outputs < phases_.up ? outputs : phases_.up;
+        const uint64_t last = (phase + uint64_t{height - 1} * phases_.down) / phases_.up;
+        const size_t end = static_cast<size_t>(last) + phases_.taps_per_phase;
         PhaseWalk walk(phases_, phase);
         size_t ready_to = 0; // samples of the columns are laid up to here
         for (uint32_t i = 0; i < height;) {
@@ -93,8 +99,8 @@ public:
                         break;
                     }
                     first_ = walk.window();
-                    ready_to = first_ + kSteps;
-                    lay_out();
+                    ready_to = first_ + kSteps < end ? first_ + kSteps : end;
+                    lay_out(ready_to - first_);
                 }
                 rows[taken] = {newest - first_, walk.taps()};
                 walk.advance();
@@ -116,14 +122,22 @@ private:
         const float* taps;
     };
 
-    // Samples from first_ on of every column.
-    void lay_out() noexcept
+    // Samples first_ .. first_ + length - 1 of every column.
+    void lay_out(size_t length) noexcept
     {
-        for (size_t t = 0; t < kSteps; t += kLanes) {
-            for (size_t v = 0; v < Vectors; ++v) {
+        for (size_t v = 0; v < Vectors; ++v) {
+            const size_t column = first_ + v * kLanes * phases_.down;
+            const size_t last = column + (kLanes - 1) * phases_.down;
+            for (size_t t = 0; t < length; t += kLanes) {
                 Floats block[kLanes];
-                for (size_t j = 0; j < kLanes; ++j) {
-                    block[j] = load_inside(first_ + t + (v * kLanes + j) * phases_.down);
+                if (last + t + kLanes <= count_) {
+                    for (size_t j = 0; j < kLanes; ++j) {
+                        block[j] = Simd::load(samples_ + column + t + j * phases_.down);
+                    }
+                } else {
+                    for (size_t j = 0; j < kLanes; ++j) {
+                        block[j] = load_inside(column + t + j * phases_.down);
+                    }
                 }
                 Simd::transpose(block);
                 for (size_t j = 0; j < kLanes; ++j) {
@@ -139,6 +153,9 @@ private:
         if (at + kLanes <= count_) {
             return Simd::load(samples_ + at);
         }
+        if (at >= count_) {
+            return Simd::all(0.0F);
+        }
         float lanes[kLanes] = {};
         for (size_t j = 0; at + j < count_; ++j) {
             lanes[j] = samples_[at + j];
@@ -152,7 +169,7 @@ private:
         Floats sums[Count][Vectors];
         const size_t shared_from = rows[0].newest;
         const size_t shared_to = rows[Count - 1].newest - last_tap_;
-#pragma GCC unroll 4
+#pragma GCC unroll 8
         for (size_t r = 0; r < Count; ++r) {
             for (Floats& sum : sums[r]) {
                 sum = Simd::all(0.0F);
@@ -160,7 +177,7 @@ private:
             add_up<1>(&sums[r], rows + r, rows[r].newest, shared_from);
         }
         add_up<Count>(sums, rows, shared_from, shared_to - 1);
-#pragma GCC unroll 4
+#pragma GCC unroll 8
         for (size_t r = 0; r < Count; ++r) {
             add_up<1>(&sums[r], rows + r, shared_to - 1, rows[r].newest - last_tap_ - 1);
             deal_out(sums[r], output + r, outputs - static_cast<uint32_t>(r));
@@ -174,13 +191,13 @@ private:
     {
         const size_t stride = phases_.tap_stride;
         const float* taps[Count];
-#pragma GCC unroll 4
+#pragma GCC unroll 8
         for (size_t r = 0; r < Count; ++r) {
             taps[r] = rows[r].taps + (rows[r].newest - from) * stride;
         }
         const float* samples = columns_ + from * kWidth;
         for (size_t left = from - to; left != 0; --left, samples -= kWidth) {
-#pragma GCC unroll 4
+#pragma GCC unroll 8
             for (size_t r = 0; r < Count; ++r) {
                 const Floats tap = Simd::all(*taps[r]);
                 taps[r] += stride;
