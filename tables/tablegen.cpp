@@ -132,16 +132,19 @@ void write_rows(std::ostream& out, uint32_t hertz, uint32_t up, uint32_t down,
     const size_t per_phase = words.size() / up;
     const size_t row_length = (per_phase + kWidestVector - 1) / kWidestVector * kWidestVector;
     std::vector<int32_t> row_of(up);
-    std::vector<int32_t> taps(up * row_length);
-    std::vector<int32_t> high_parts(up * row_length);
+    std::vector<int32_t> taps(kWidestVector + up * row_length);
+    std::vector<int32_t> high_parts(taps.size());
     std::vector<int32_t> high_sums(up);
     int32_t largest_high = 0;
+    size_t used = 0;
     for (uint32_t row = 0, phase = 0; row < up; ++row, phase = (phase + down) % up) {
         row_of[phase] = static_cast<int32_t>(row);
         for (size_t k = 0; k < per_phase; ++k) {
             const int32_t word = words[phase + k * up];
             const int32_t high = word >> 16;
-            const size_t at = row * row_length + per_phase - 1 - k;
+            const size_t column = per_phase - 1 - k;
+            const size_t at = kWidestVector + row * row_length + column;
+            used = word != 0 ? std::max(used, column + 1) : used;
             taps[at] = std::bit_cast<int32_t>(std::rotl(std::bit_cast<uint32_t>(word), 16));
             high_parts[at] = high + ((word >> 15) & 1);
             high_sums[row] += high;
@@ -154,9 +157,10 @@ void write_rows(std::ostream& out, uint32_t hertz, uint32_t up, uint32_t down,
     write_array(out, "int16_t", "high_parts", high_parts);
     write_array(out, "int32_t", "high_sums", high_sums);
     out << "} // namespace hertz_" << hertz << "\n\nconst kz::dsp::PhaseRows kz::dsp::rows_"
-        << hertz << " = {" << up << ", " << row_length << ", " << largest_high << ", hertz_"
-        << hertz << "::row_of,\n    hertz_" << hertz << "::taps, hertz_" << hertz
-        << "::high_parts, hertz_" << hertz << "::high_sums};\n\n";
+        << hertz << " = {" << up << ", " << row_length << ", " << used << ", " << largest_high
+        << ", hertz_" << hertz << "::row_of,\n    hertz_" << hertz << "::taps + " << kWidestVector
+        << ", hertz_" << hertz << "::high_parts + " << kWidestVector << ", hertz_" << hertz
+        << "::high_sums};\n\n";
 }
 
 // The same design for the floating-point resampler, phase by phase.

@@ -34,10 +34,11 @@ extern const DesignedFilter designed_filters[5];
 
 /// A fixed-point prototype with the taps of each phase side by side, as the inner loops take them:
 /// oldest sample first, rows in the order in which outputs use the phases, each row filled up with
-/// zeros.
+/// zeros. Zeros also lie before the first row, at least 8 in each table.
 struct PhaseRows {
     uint32_t up;
     uint32_t row_length;       ///< a multiple of 8
+    uint32_t used;             ///< taps up to the last one of any row that is not zero
     int32_t largest_high;      ///< the largest magnitude among the high halves
     const uint16_t* row_of;    ///< by phase
     const int32_t* taps;       ///< low half above, high half below

@@ -105,7 +105,7 @@ class Polyphase {
     using Samples = SplitSamples<Simd>;
 
     static constexpr size_t kLanes = Simd::kLanes;
-    static constexpr uint32_t kMostColumns = 6; // whose sums and one row fill the registers
+    static constexpr uint32_t kMostColumns = 7; // whose sums and one row fill the registers
 
     // Where the next output is made.
     struct Place {
@@ -133,15 +133,15 @@ public:
     }
 
 private:
-    // Not inlined, so that both kinds of scratch are never on the stack together.
+    // 0 if that would not pay, or not give the same words. Not inlined, so that both kinds of
+    // scratch are never on the stack together.
     [[gnu::noinline]] static uint32_t run_columns_of(const kz::dsp::PhaseRows& rows,
                                                      const kz::dsp::Windows& windows,
                                                      int32_t* output, uint32_t count) noexcept
     {
-        if (!PolyphaseColumns<Simd>::suits(windows, rows.up, count)) {
-            return 0;
-        }
-        return PolyphaseColumns<Simd>(rows, windows).run(output, count);
+        return PolyphaseColumns<Simd>::suits(rows, windows, count)
+                   ? PolyphaseColumns<Simd>(rows, windows).run(output, count)
+                   : 0;
     }
 
     Polyphase(const kz::dsp::PhaseRows& rows, const kz::dsp::Windows& windows) noexcept
@@ -217,6 +217,8 @@ private:
             return run_columns<5>(place, output, from, to);
         case 6:
             return run_columns<6>(place, output, from, to);
+        case 7:
+            return run_columns<7>(place, output, from, to);
         default:
             return;
         }
@@ -226,7 +228,7 @@ private:
     void run_columns(Place& place, int32_t* output, uint32_t from, uint32_t to) noexcept
     {
         for (uint32_t i = from; i < to; ++i) {
-            int32_t sums[Width];
+            int32_t sums[(Width + 3) / 4 * 4];
             quick_sums<Width>(place, sums);
             for (size_t j = 0; j < Width; ++j) {
                 output[i + j * rows_.up] = sums[j];
@@ -236,11 +238,11 @@ private:
     }
 
     template <size_t Width>
-    void quick_sums(const Place& place, int32_t (&results)[Width]) const noexcept
+    void quick_sums(const Place& place, int32_t* results) const noexcept
     {
-        const size_t length = rows_.row_length;
-        const int32_t* taps = rows_.taps + place.row * length;
-        const int16_t* highs = rows_.high_parts + place.row * length;
+        const size_t length = (rows_.used + kLanes - 1) / kLanes * kLanes;
+        const int32_t* taps = rows_.taps + size_t{place.row} * rows_.row_length;
+        const int16_t* highs = rows_.high_parts + size_t{place.row} * rows_.row_length;
         const int32_t* flipped = samples_.flipped + place.window;
         const int16_t* doubled = samples_.doubled_highs + place.window;
         Ints sums[Width];
@@ -264,8 +266,21 @@ private:
                                     Simd::half_pair_products(doubled + k + j * down_, highs + k));
             }
         }
-        for (size_t j = 0; j < Width; ++j) {
-            results[j] = wrap_add(Simd::sum_of_lanes(sums[j]), rows_.high_sums[place.row]);
+        gather(sums, rows_.high_sums[place.row], results);
+    }
+
+    template <size_t Width>
+    static void gather(const Ints (&sums)[Width], int32_t offset, int32_t* results) noexcept
+    {
+        if constexpr (Width == 1) {
+            results[0] = wrap_add(Simd::sum_of_lanes(sums[0]), offset);
+        } else {
+            for (size_t j = 0; j < Width; j += 4) {
+                const Ints two = j + 2 < Width ? sums[j + 2] : sums[j];
+                const Ints three = j + 3 < Width ? sums[j + 3] : sums[j];
+                Simd::store_sums(results + j, sums[j], sums[j + 1 < Width ? j + 1 : j], two, three,
+                                 offset);
+            }
         }
     }
 
@@ -294,7 +309,7 @@ private:
         const int32_t* flipped = samples_.flipped + place.window;
         const Ints high_mask = Simd::all(-0x10000);
         Ints sum = Simd::all(0);
-        for (size_t k = 0; k < rows_.row_length; k += kLanes) {
+        for (size_t k = 0; k < rows_.used; k += kLanes) {
             const Ints taps = Simd::load(row + k);
             const Ints samples = Simd::load(flipped + k);
             const Ints raised = Simd::shift_left(taps, 16); // m 2^16

@@ -31,10 +31,11 @@ public:
     }
 
     /// Whether it pays: most lanes are in use, and the rows have room.
-    static bool suits(const kz::dsp::Windows& windows, uint32_t up, uint32_t count) noexcept
+    static bool suits(const kz::dsp::PhaseRows& rows, const kz::dsp::Windows& windows,
+                      uint32_t count) noexcept
     {
-        return count > uint64_t{up} * (kColumns * 5 / 8) && windows.down <= kMostDown &&
-               windows.taps <= kMostTaps;
+        return count > uint64_t{rows.up} * (kColumns * 5 / 8) &&
+               uint64_t{windows.down} + rows.used <= kMostRows - 2;
     }
 
     /// Makes up to kColumns * up outputs.
@@ -54,9 +55,7 @@ public:
     }
 
 private:
-    static constexpr uint32_t kMostDown = 320;
-    static constexpr uint32_t kMostTaps = 48;
-    static constexpr size_t kMostRows = kMostDown + kMostTaps + 2;
+    static constexpr size_t kMostRows = 372;
 
     struct Row {
         int32_t lanes[kColumns];
@@ -65,33 +64,40 @@ private:
     // @return The largest high half, or the largest complement of a negative one.
     int32_t lay_out(size_t samples) noexcept
     {
-        const size_t length = windows_.down + windows_.taps + 2;
-        Ints loudest = Simd::all(0);
+        const size_t length = windows_.down + rows_.used + 2;
+        Ints highest = Simd::all(0);
+        Ints lowest = Simd::all(0);
         for (size_t v = 0; v < kVectors; ++v) {
             for (size_t i = 0; i < length; i += kLanes) {
                 Ints block[kLanes];
                 load_block(v * kLanes, i, samples, block);
                 for (const Ints samples_of_row : block) {
-                    const Ints sign = Simd::template shift_right<31>(samples_of_row);
-                    loudest = Simd::larger(loudest, Simd::exclusive_or(samples_of_row, sign));
+                    highest = Simd::larger(highest, samples_of_row);
+                    lowest = Simd::smaller(lowest, samples_of_row);
                 }
                 Simd::transpose(block);
-                for (size_t k = 0; k < kLanes && i + k < length; ++k) {
-                    Simd::store(flipped_[i + k].lanes + v * kLanes,
-                                Simd::exclusive_or(block[k], Simd::all(0x8000)));
-                }
+                store_block(v * kLanes, i, block);
             }
         }
-        split(length);
+        const Ints loudest = Simd::larger(highest, Simd::exclusive_or(lowest, Simd::all(-1)));
         return Simd::largest_lane(loudest) >> 16;
     }
 
     // Samples i .. of as many columns, each column in a vector; zeros beyond the last sample.
     void load_block(size_t column, size_t i, size_t samples, Ints (&block)[kLanes]) const noexcept
     {
+        const int32_t* from = windows_.oldest + column * windows_.down + i;
+        if ((column + kLanes - 1) * windows_.down + i + kLanes <= samples) {
+            for (size_t j = 0; j < kLanes; ++j) {
+                block[j] = Simd::load(from + j * windows_.down);
+            }
+            return;
+        }
         for (size_t j = 0; j < kLanes; ++j) {
             const size_t at = (column + j) * windows_.down + i;
-            if (at + kLanes <= samples) {
+            if (at >= samples) {
+                block[j] = Simd::all(0);
+            } else if (at + kLanes <= samples) {
                 block[j] = Simd::load(windows_.oldest + at);
             } else {
                 int32_t rest[kLanes] = {};
@@ -103,20 +109,19 @@ private:
         }
     }
 
-    // Row i of the high halves holds those of rows i and i + 1, doubled, side by side.
-    void split(size_t length) noexcept
+    // Row i / 2 of the high halves holds those of rows i and i + 1, doubled, side by side.
+    void store_block(size_t column, size_t i, const Ints (&block)[kLanes]) noexcept
     {
-        const Ints low_mask = Simd::all(0xfffe);
-        const Ints high_mask = Simd::all(-0x20000);
-        for (size_t at = 0; at < kColumns; at += kLanes) {
-            Ints here = Simd::load(flipped_[0].lanes + at);
-            for (size_t i = 0; i < length; ++i) {
-                const Ints next = Simd::load(flipped_[i + 1 < length ? i + 1 : i].lanes + at);
-                const Ints low = Simd::bits_and(Simd::template shift_right<15>(here), low_mask);
-                const Ints high = Simd::bits_and(Simd::shift_left(next, 1), high_mask);
-                Simd::store(highs_[i].lanes + at, Simd::exclusive_or(low, high));
-                here = next;
-            }
+        for (size_t k = 0; k < kLanes; ++k) {
+            Simd::store(flipped_[i + k].lanes + column,
+                        Simd::exclusive_or(block[k], Simd::all(0x8000)));
+        }
+        for (size_t k = 0; k < kLanes; k += 2) {
+            const Ints low =
+                Simd::bits_and(Simd::template shift_right<15>(block[k]), Simd::all(0xfffe));
+            const Ints high =
+                Simd::bits_and(Simd::shift_left(block[k + 1], 1), Simd::all(-0x20000));
+            Simd::store(highs_[(i + k) / 2].lanes + column, Simd::exclusive_or(low, high));
         }
     }
 
@@ -132,10 +137,16 @@ private:
             const uint32_t width = rows_.up - first < kLanes ? rows_.up - first : kLanes;
             for (uint32_t i = 0; i < kLanes; ++i) {
                 if (i >= width) {
-                    sums[0][i] = sums[1][i] = Simd::all(0);
+                    for (size_t v = 0; v < kVectors; ++v) {
+                        sums[v][i] = Simd::all(0);
+                    }
                     continue;
                 }
-                add_up(row, window, sums[0][i], sums[1][i]);
+                Ints sum[kVectors];
+                add_up(row, window, sum);
+                for (size_t v = 0; v < kVectors; ++v) {
+                    sums[v][i] = sum[v];
+                }
                 phase += phase_step;
                 window += whole_step;
                 if (phase >= rows_.up) {
@@ -148,23 +159,34 @@ private:
         }
     }
 
-    void add_up(uint32_t row, size_t window, Ints& sum0, Ints& sum1) const noexcept
+    // High halves are paired from even samples on: a window that begins at an odd one is taken from
+    // the sample before. Zeros surround the taps of a row.
+    void add_up(uint32_t row, size_t window, Ints (&results)[kVectors]) const noexcept
     {
-        const int32_t* taps = rows_.taps + size_t{row} * rows_.row_length;
-        const int16_t* high_parts = rows_.high_parts + size_t{row} * rows_.row_length;
-        Ints a = Simd::all(rows_.high_sums[row]);
-        Ints b = a;
-        for (size_t k = 0; k < windows_.taps; k += 2) {
-            const Row* samples = flipped_ + window + k;
-            const Row& highs = highs_[window + k];
-            const Ints tap0 = Simd::all(taps[k]);
-            const Ints tap1 = Simd::all(taps[k + 1]);
-            const Ints parts = Simd::all_pairs(high_parts + k);
-            add_products(a, samples, highs, 0, tap0, tap1, parts);
-            add_products(b, samples, highs, kLanes, tap0, tap1, parts);
+        const size_t odd = window % 2;
+        const int32_t* taps = rows_.taps + size_t{row} * rows_.row_length - odd;
+        const int16_t* high_parts = rows_.high_parts + size_t{row} * rows_.row_length - odd;
+        const Row* samples = flipped_ + (window - odd);
+        const Row* highs = highs_ + (window - odd) / 2;
+        Ints sums[kVectors];
+        for (Ints& sum : sums) {
+            sum = Simd::all(rows_.high_sums[row]);
         }
-        sum0 = a;
-        sum1 = b;
+        for (size_t pairs = rows_.used / 2 + 1; pairs != 0; --pairs) {
+            const Ints tap0 = Simd::all(taps[0]);
+            const Ints tap1 = Simd::all(taps[1]);
+            const Ints parts = Simd::all_pairs(high_parts);
+            for (size_t v = 0; v < kVectors; ++v) {
+                add_products(sums[v], samples, *highs, v * kLanes, tap0, tap1, parts);
+            }
+            taps += 2;
+            high_parts += 2;
+            samples += 2;
+            ++highs;
+        }
+        for (size_t v = 0; v < kVectors; ++v) {
+            results[v] = sums[v];
+        }
     }
 
     static void add_products(Ints& sum, const Row* samples, const Row& highs, size_t at, Ints tap0,
@@ -177,7 +199,7 @@ private:
                                                        Simd::template shift_right<15>(middle1))));
     }
 
-    // Vector i holds output first + i of all columns of its half.
+    // Vector i holds output first + i of as many columns.
     void store(Ints (&sums)[kVectors][kLanes], int32_t* output, uint32_t first,
                uint32_t width) const noexcept
     {
@@ -201,8 +223,8 @@ private:
     const kz::dsp::PhaseRows& rows_;
     const kz::dsp::Windows windows_;
     uint32_t count_ = 0;
-    alignas(32) Row flipped_[kMostRows];
-    alignas(32) Row highs_[kMostRows];
+    alignas(32) Row flipped_[kMostRows + kLanes];
+    alignas(32) Row highs_[(kMostRows + kLanes) / 2];
 };
 
 } // namespace

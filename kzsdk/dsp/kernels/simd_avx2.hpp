@@ -74,6 +74,17 @@ struct Avx2 {
         sum = _mm_add_epi32(sum, _mm_shuffle_epi32(sum, 0b10110001));
         return _mm_cvtsi128_si32(sum);
     }
+    /// `offset` and the sum of the lanes of each of four vectors.
+    static void store_sums(int32_t* to, Ints a, Ints b, Ints c, Ints d, int32_t offset) noexcept
+    {
+        const Ints ab = add(_mm256_unpacklo_epi32(a, b), _mm256_unpackhi_epi32(a, b));
+        const Ints cd = add(_mm256_unpacklo_epi32(c, d), _mm256_unpackhi_epi32(c, d));
+        const Ints abcd = add(_mm256_unpacklo_epi64(ab, cd), _mm256_unpackhi_epi64(ab, cd));
+        const __m128i sums =
+            _mm_add_epi32(_mm256_castsi256_si128(abcd), _mm256_extracti128_si256(abcd, 1));
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(to),
+                         _mm_add_epi32(sums, _mm_set1_epi32(offset)));
+    }
     static int32_t largest_lane(Ints v) noexcept
     {
         __m128i most = _mm_max_epi32(_mm256_castsi256_si128(v), _mm256_extracti128_si256(v, 1));

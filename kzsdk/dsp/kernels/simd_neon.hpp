@@ -63,6 +63,11 @@ struct Neon {
     }
 
     static int32_t sum_of_lanes(Ints v) noexcept { return vaddvq_s32(v); }
+    /// `offset` and the sum of the lanes of each of four vectors.
+    static void store_sums(int32_t* to, Ints a, Ints b, Ints c, Ints d, int32_t offset) noexcept
+    {
+        store(to, add(vpaddq_s32(vpaddq_s32(a, b), vpaddq_s32(c, d)), all(offset)));
+    }
     static int32_t largest_lane(Ints v) noexcept { return vmaxvq_s32(v); }
 
     static Ints add(Ints a, Ints b) noexcept { return vaddq_s32(a, b); }

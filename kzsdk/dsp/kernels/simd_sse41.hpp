@@ -70,6 +70,14 @@ struct Sse41 {
         v = _mm_add_epi32(v, _mm_shuffle_epi32(v, 0b10110001));
         return _mm_cvtsi128_si32(v);
     }
+    /// `offset` and the sum of the lanes of each of four vectors.
+    static void store_sums(int32_t* to, Ints a, Ints b, Ints c, Ints d, int32_t offset) noexcept
+    {
+        const Ints ab = add(_mm_unpacklo_epi32(a, b), _mm_unpackhi_epi32(a, b));
+        const Ints cd = add(_mm_unpacklo_epi32(c, d), _mm_unpackhi_epi32(c, d));
+        const Ints sums = add(_mm_unpacklo_epi64(ab, cd), _mm_unpackhi_epi64(ab, cd));
+        store(to, add(sums, all(offset)));
+    }
     static int32_t largest_lane(Ints v) noexcept
     {
         v = _mm_max_epi32(v, _mm_shuffle_epi32(v, 0b01001110));
