@@ -105,7 +105,7 @@ class Polyphase {
     using Samples = SplitSamples<Simd>;
 
     static constexpr size_t kLanes = Simd::kLanes;
-    static constexpr uint32_t kMostColumns = 7; // whose sums and one row fill the registers
+    static constexpr uint32_t kAnyDown = 0;
 
     // Where the next output is made.
     struct Place {
@@ -162,7 +162,7 @@ private:
             samples_.split(oldest_, static_cast<size_t>(last / rows_.up) + taps_);
         const Place first{rows_.row_of[(phase_ + phase_step_) % rows_.up], phase_, 0};
         if (loudest < (1 << 14) && loudest + rows_.largest_high < (1 << 15)) {
-            run_quick(first, output, made);
+            choose_quick(first, output, made);
         } else {
             run_exact(first, output, made);
         }
@@ -182,10 +182,26 @@ private:
 
     // ---- no sum of cross products can wrap
 
+    // With a distance that is known the columns need one address, not one each, and more of them
+    // find registers.
+    void choose_quick(Place first, int32_t* output, uint32_t count) noexcept
+    {
+        switch (down_) {
+        case 640:
+            return run_quick<640>(first, output, count);
+        case 1280:
+            return run_quick<1280>(first, output, count);
+        default:
+            return run_quick<kAnyDown>(first, output, count);
+        }
+    }
+
     // Column j are the outputs from j * up on. A row of taps serves one output of each column; the
     // last column may be shorter than the others.
+    template <uint32_t Down>
     void run_quick(Place first, int32_t* output, uint32_t count) noexcept
     {
+        constexpr uint32_t kMostColumns = Down == 640 ? 7 : 4;
         const uint32_t columns = (count + rows_.up - 1) / rows_.up;
         const uint32_t passes = (columns + kMostColumns - 1) / kMostColumns;
         for (uint32_t pass = 0, done = 0; pass < passes; ++pass) {
@@ -195,51 +211,36 @@ private:
             const uint32_t in_all = left < most ? left - (width - 1) * rows_.up : rows_.up;
             Place place = first;
             place.window += size_t{done} * down_;
-            run_columns(width, place, output + size_t{done} * rows_.up, 0, in_all);
-            run_columns(width - 1, place, output + size_t{done} * rows_.up, in_all, rows_.up);
+            run_columns<Down, kMostColumns>(width, place, output + size_t{done} * rows_.up, 0,
+                                            in_all);
+            run_columns<Down, kMostColumns>(width - 1, place, output + size_t{done} * rows_.up,
+                                            in_all, rows_.up);
             done += width;
         }
     }
 
+    template <uint32_t Down, uint32_t Width>
     void run_columns(uint32_t width, Place& place, int32_t* output, uint32_t from,
                      uint32_t to) noexcept
     {
-        switch (width) {
-        case 1:
-            return run_columns<1>(place, output, from, to);
-        case 2:
-            return run_columns<2>(place, output, from, to);
-        case 3:
-            return run_columns<3>(place, output, from, to);
-        case 4:
-            return run_columns<4>(place, output, from, to);
-        case 5:
-            return run_columns<5>(place, output, from, to);
-        case 6:
-            return run_columns<6>(place, output, from, to);
-        case 7:
-            return run_columns<7>(place, output, from, to);
-        default:
-            return;
-        }
-    }
-
-    template <size_t Width>
-    void run_columns(Place& place, int32_t* output, uint32_t from, uint32_t to) noexcept
-    {
-        for (uint32_t i = from; i < to; ++i) {
-            int32_t sums[(Width + 3) / 4 * 4];
-            quick_sums<Width>(place, sums);
-            for (size_t j = 0; j < Width; ++j) {
-                output[i + j * rows_.up] = sums[j];
+        if (width == Width) {
+            for (uint32_t i = from; i < to; ++i) {
+                int32_t sums[(Width + 3) / 4 * 4];
+                quick_sums<Down, Width>(place, sums);
+                for (size_t j = 0; j < Width; ++j) {
+                    output[i + j * rows_.up] = sums[j];
+                }
+                advance(place);
             }
-            advance(place);
+        } else if constexpr (Width > 1) {
+            run_columns<Down, Width - 1>(width, place, output, from, to);
         }
     }
 
-    template <size_t Width>
+    template <uint32_t Down, size_t Width>
     void quick_sums(const Place& place, int32_t* results) const noexcept
     {
+        const size_t down = Down == kAnyDown ? down_ : Down;
         const size_t length = (rows_.used + kLanes - 1) / kLanes * kLanes;
         const int32_t* taps = rows_.taps + size_t{place.row} * rows_.row_length;
         const int16_t* highs = rows_.high_parts + size_t{place.row} * rows_.row_length;
@@ -251,19 +252,18 @@ private:
         }
         size_t k = 0;
         for (; k + 2 * kLanes <= length; k += 2 * kLanes) {
-            add_middles(sums, flipped + k, Simd::load(taps + k));
-            add_middles(sums, flipped + k + kLanes, Simd::load(taps + k + kLanes));
+            add_middles(sums, flipped + k, down, Simd::load(taps + k));
+            add_middles(sums, flipped + k + kLanes, down, Simd::load(taps + k + kLanes));
             const Ints high_parts = Simd::load(highs + k);
             for (size_t j = 0; j < Width; ++j) {
-                sums[j] = Simd::add(
-                    sums[j], Simd::pair_products(Simd::load(doubled + k + j * down_), high_parts));
+                Simd::add_to(sums[j], Simd::pair_products(Simd::load(doubled + k + j * down),
+                                                          high_parts));
             }
         }
         if (k != length) {
-            add_middles(sums, flipped + k, Simd::load(taps + k));
+            add_middles(sums, flipped + k, down, Simd::load(taps + k));
             for (size_t j = 0; j < Width; ++j) {
-                sums[j] = Simd::add(sums[j],
-                                    Simd::half_pair_products(doubled + k + j * down_, highs + k));
+                Simd::add_to(sums[j], Simd::half_pair_products(doubled + k + j * down, highs + k));
             }
         }
         gather(sums, rows_.high_sums[place.row], results);
@@ -285,11 +285,12 @@ private:
     }
 
     template <size_t Width>
-    void add_middles(Ints (&sums)[Width], const int32_t* flipped, Ints taps) const noexcept
+    static void add_middles(Ints (&sums)[Width], const int32_t* flipped, size_t down,
+                            Ints taps) noexcept
     {
         for (size_t j = 0; j < Width; ++j) {
-            const Ints middles = Simd::pair_products(Simd::load(flipped + j * down_), taps);
-            sums[j] = Simd::add(sums[j], Simd::template shift_right<15>(middles));
+            const Ints middles = Simd::pair_products(Simd::load(flipped + j * down), taps);
+            Simd::add_to(sums[j], Simd::template shift_right<15>(middles));
         }
     }
 

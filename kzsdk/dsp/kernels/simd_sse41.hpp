@@ -47,6 +47,14 @@ struct Sse41 {
     static Ints mul(Ints a, Ints b) noexcept { return _mm_mullo_epi32(a, b); }
     static Ints larger(Ints a, Ints b) noexcept { return _mm_max_epi32(a, b); }
 
+    /// Adds, and keeps the compiler from regrouping a long sum, for which it would need more registers
+    /// than there are.
+    static void add_to(Ints& sum, Ints v) noexcept
+    {
+        sum = add(sum, v);
+        __asm__("" : "+x"(sum));
+    }
+
     /// Exchanges the 16-bit halves of every lane.
     static Ints swap_halves(Ints v) noexcept
     {
