@@ -1,8 +1,10 @@
 /// @file
 /// The levels of an equaliser with at most 256 of them, one byte each.
 ///
-/// They are kept where the equalised frame will be: in its last quarter, so that the values, which
-/// are four times as long, overtake them only when the last one has been read.
+/// They are kept where the equalised frame will be: in its first quarter, so that a frame may be
+/// equalised in place. A level lies no further on than the sample it is made of, which has been
+/// read by then; the values, which are four times as long, are written from the last one on
+/// backwards and reach the levels when these have been read.
 #pragma once
 
 #include <array>
@@ -21,7 +23,7 @@ public:
     static_assert(sizeof(Value) == 4);
 
     explicit ByteLevels(std::span<Value> frame) noexcept
-        : frame_(frame), levels_(reinterpret_cast<uint8_t*>(frame.data()) + 3 * frame.size())
+        : frame_(frame), levels_(reinterpret_cast<uint8_t*>(frame.data()))
     {
     }
 
@@ -52,16 +54,16 @@ public:
     template <class Rank>
     void replace(std::span<const Rank> ranks) const noexcept
     {
-        size_t i = 0;
-        for (; i + kGroup <= frame_.size(); i += kGroup) {
-            std::array<uint8_t, kGroup> group; // read before anything is written
-            std::memcpy(group.data(), levels_ + i, kGroup);
-            for (size_t k = 0; k < kGroup; ++k) {
-                frame_[i + k] = static_cast<Value>(ranks[group[k]]);
-            }
+        size_t i = frame_.size();
+        for (; i % kGroup != 0; --i) {
+            frame_[i - 1] = static_cast<Value>(ranks[levels_[i - 1]]);
         }
-        for (; i < frame_.size(); ++i) {
-            frame_[i] = static_cast<Value>(ranks[levels_[i]]);
+        for (; i != 0; i -= kGroup) {
+            std::array<uint8_t, kGroup> group; // read before anything is written
+            std::memcpy(group.data(), levels_ + i - kGroup, kGroup);
+            for (size_t k = 0; k < kGroup; ++k) {
+                frame_[i - kGroup + k] = static_cast<Value>(ranks[group[k]]);
+            }
         }
     }
 

@@ -8,6 +8,7 @@
 ///     run(pieces, extremes, output, histogram, ranks)
 #pragma once
 
+#include <algorithm>
 #include <cstdint>
 #include <span>
 
@@ -41,7 +42,15 @@ kz_status equalise_two_pieces(const Sample* first, uint32_t first_count, const S
     return KZ_OK;
 }
 
-/// Equalises a frame in one piece, silent or not. It is copied when memory is short.
+template <class Sample>
+void copy_unless_in_place(const Sample* input, Sample* output, uint32_t count) noexcept
+{
+    if (input != output) {
+        std::copy_n(input, count, output);
+    }
+}
+
+/// Equalises a frame in one piece, silent or not, also in place. It is copied when memory is short.
 template <class Equaliser, class Sample = typename Equaliser::Sample>
 kz_status equalise_one_piece(const Sample* input, Sample* output, uint32_t count,
                              uint32_t* histogram, uint32_t levels) noexcept
@@ -52,7 +61,7 @@ kz_status equalise_one_piece(const Sample* input, Sample* output, uint32_t count
     const FramePieces<Sample> whole{{input, count}, {}};
     const auto ranks = make_array<typename Equaliser::Rank>(levels);
     if (!ranks) {
-        copy_pieces(whole, output);
+        copy_unless_in_place(input, output, count);
         return KZ_OK;
     }
     typename Equaliser::Extremes extremes;

@@ -160,7 +160,7 @@ KZ_API kz_status kzqvfixed_hist_eq_dual(const FxpType* first, uint32_t first_cou
  * memory is short the samples are copied.
  *
  * @param input      @p count samples.
- * @param output     Room for @p count samples, apart from @p input.
+ * @param output     Room for @p count samples; @p input itself, or apart from it.
  * @param histogram  @p levels + 1 counters, scratch.
  * @param levels     K, 1 or more; 0, or a null array, does nothing.
  * @return 0.

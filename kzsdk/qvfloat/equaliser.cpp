@@ -131,7 +131,7 @@ kz_status hist_eq(const float* input, float* output, uint32_t count, uint32_t le
     }
     const auto histogram = kz::make_array<uint32_t>(levels);
     if (!histogram) {
-        std::copy_n(input, count, output);
+        kz::qv::copy_unless_in_place(input, output, count);
         return KZ_OK;
     }
     return hist_eq2(input, output, count, histogram.get(), levels);

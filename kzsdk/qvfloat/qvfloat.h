@@ -135,7 +135,7 @@ KZ_API uint32_t QVSD_GetSignalOffset(QVSD* detector, const float* samples,
  * are copied.
  *
  * @param input   @p count samples.
- * @param output  Room for @p count samples, apart from @p input.
+ * @param output  Room for @p count samples; @p input itself, or apart from it.
  * @param levels  K, 1 or more; 0, or a null array, does nothing.
  * @return 0.
  */

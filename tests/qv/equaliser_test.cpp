@@ -201,6 +201,30 @@ TYPED_TEST(Equaliser, ShortOfMemoryCopiesAFrame)
     EXPECT_TRUE(fault.fired());
 }
 
+TYPED_TEST(Equaliser, AFrameMayBeEqualisedInPlace)
+{
+    for (const uint32_t levels : {1U, 2U, 255U, 256U, 257U, 3000U}) {
+        for (const uint32_t count : {0U, 1U, 7U, 8U, 31U, 32U, 33U, 1000U, 32768U}) {
+            auto frame = this->samples(random_frame(count, levels));
+            const auto apart = this->one(frame, levels);
+            std::vector<uint32_t> histogram(levels + 1);
+            TypeParam::hist_eq2(frame.data(), frame.data(), count, histogram.data(), levels);
+            ASSERT_EQ(apart, frame) << count << " samples, " << levels << " levels";
+        }
+    }
+}
+
+TYPED_TEST(Equaliser, ShortOfMemoryLeavesAFrameInPlaceAsItIs)
+{
+    const auto before = this->samples(random_frame(100, 10));
+    auto frame = before;
+    std::vector<uint32_t> histogram(257);
+    const AllocationFault fault(1);
+    TypeParam::hist_eq2(frame.data(), frame.data(), 100, histogram.data(), 256);
+    EXPECT_TRUE(fault.fired());
+    EXPECT_EQ(before, frame);
+}
+
 TYPED_TEST(Equaliser, AConstantFrameInOnePieceIsAllLevelZero)
 {
     for (const int32_t value : {0, 5, -5, 32767, -32768}) {
