@@ -52,7 +52,7 @@ TEST_F(ModelEqualiser, LibraryAgreesOnFramesOfEveryKind)
 
 TEST_F(ModelEqualiser, LibraryAgreesForAnyNumberOfLevels)
 {
-    for (uint32_t levels = 1; levels <= 5000; levels += 1 + levels / 5) {
+    for (const uint32_t levels : numbers_of_levels()) {
         for (const int shift : {0, 3, 17, 31}) {
             const std::vector<int32_t> words = random_words(700, levels, shift);
             EXPECT_EQ(equalise(words, levels), library_equalise2(words, levels)) << levels;

@@ -29,6 +29,16 @@ inline std::vector<int32_t> as_words(std::span<const int16_t> samples, int shift
     return words;
 }
 
+/// For an equaliser: some from 1 to 5000, and those about 256, up to which levels are bytes.
+inline std::vector<uint32_t> numbers_of_levels()
+{
+    std::vector<uint32_t> all{254, 255, 256, 257, 258};
+    for (uint32_t levels = 1; levels <= 5000; levels += 1 + levels / 5) {
+        all.push_back(levels);
+    }
+    return all;
+}
+
 inline std::vector<int32_t> random_words(size_t count, uint64_t seed, int shift = 0)
 {
     test::Random random(seed);
