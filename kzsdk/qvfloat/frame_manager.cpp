@@ -76,48 +76,61 @@ std::span<const float> band_bins(const QVFM& m, uint32_t band) noexcept
     return {m.frame_buffer + first, last - first + 1};
 }
 
+struct Energy {
+    std::span<const float> bins; // that are left
+    float sum = 0;
+};
+
 // Each sum is made in the order of its bins: the order is part of the result. So the sums of
-// several bands run side by side, and none waits for its own last addition.
+// several bands run side by side, and none waits for its own last addition. When the narrowest band
+// is through, the others go on.
 template <size_t Count>
-void sum_energies(const std::span<const float> (&bands)[Count], float* energies) noexcept
+void add_squares(Energy* (&bands)[Count]) noexcept
 {
-    size_t shared = bands[0].size();
-    for (const auto& bins : bands) {
-        shared = std::min(shared, bins.size());
+    const auto narrower = [](const Energy* a, const Energy* b) noexcept {
+        return a->bins.size() < b->bins.size();
+    };
+    std::iter_swap(std::min_element(bands, bands + Count, narrower), bands + Count - 1);
+    const size_t shared = bands[Count - 1]->bins.size();
+    const float* bins[Count];
+    float sums[Count];
+    for (size_t k = 0; k < Count; ++k) {
+        bins[k] = bands[k]->bins.data();
+        sums[k] = bands[k]->sum;
     }
-    float sums[Count] = {};
     for (size_t i = 0; i < shared; ++i) {
         for (size_t k = 0; k < Count; ++k) {
-            sums[k] += bands[k][i] * bands[k][i];
+            sums[k] += bins[k][i] * bins[k][i];
         }
     }
     for (size_t k = 0; k < Count; ++k) {
-        for (const float bin : bands[k].subspan(shared)) {
-            sums[k] += bin * bin;
-        }
-        energies[k] = sums[k];
+        bands[k]->sum = sums[k];
+        bands[k]->bins = bands[k]->bins.subspan(shared);
     }
-}
-
-template <size_t Count>
-void sum_energies(const QVFM& m, uint32_t first_band, float* energies) noexcept
-{
-    std::span<const float> bands[Count];
-    for (uint32_t k = 0; k < Count; ++k) {
-        bands[k] = band_bins(m, first_band + k);
+    if constexpr (Count > 1) {
+        Energy* others[Count - 1];
+        std::copy_n(bands, Count - 1, others);
+        add_squares(others);
     }
-    sum_energies(bands, energies + first_band);
 }
 
 void sum_energies(const QVFM& m, float* energies) noexcept
 {
     constexpr uint32_t kSideBySide = 5; // neighbours have much the same width
-    uint32_t band = 0;
-    for (; m.band_count - band >= kSideBySide; band += kSideBySide) {
-        sum_energies<kSideBySide>(m, band, energies);
-    }
-    for (; band < m.band_count; ++band) {
-        sum_energies<1>(m, band, energies);
+    for (uint32_t first = 0; first < m.band_count; first += kSideBySide) {
+        const uint32_t count = std::min(m.band_count - first, kSideBySide);
+        Energy sums[kSideBySide];
+        Energy* bands[kSideBySide];
+        for (uint32_t k = 0; k < kSideBySide; ++k) {
+            bands[k] = &sums[k];
+            if (k < count) {
+                sums[k].bins = band_bins(m, first + k);
+            }
+        }
+        add_squares(bands);
+        for (uint32_t k = 0; k < count; ++k) {
+            energies[first + k] = sums[k].sum;
+        }
     }
 }
 

@@ -100,6 +100,31 @@ TEST_F(FloatFrameManager, OnePieceMustBeAWholeFrame)
     EXPECT_EQ(1U, manager->frame_count);
 }
 
+TEST_F(FloatFrameManager, EnergiesAreSumsInTheOrderOfTheBinsForAnyBands)
+{
+    Random random(3);
+    for (uint32_t count = 1; count <= 17; ++count) {
+        std::vector<float> edges; // some bands are empty, and some end beyond the spectrum
+        for (uint32_t i = 0; i < 2 * count; ++i) {
+            edges.push_back(static_cast<float>(random.below(i % 2 == 0 ? 4000 : 6000)));
+        }
+        const auto manager = make_manager<Float>([&](QVConfig& config) {
+            QVConfig_SetFreqTable(&config, edges.data(), static_cast<uint32_t>(edges.size()));
+        });
+        append_one(manager, tune_frame(0));
+        for (uint32_t band = 0; band < count; ++band) {
+            const float width = manager->bin_width;
+            const auto first = static_cast<uint32_t>(edges[2 * band] / width);
+            const auto last = static_cast<uint32_t>(edges[2 * band + 1] / width);
+            float sum = 0;
+            for (uint32_t bin = first; bin <= std::min(last, kFrame - 1); ++bin) {
+                sum += manager->frame_buffer[bin] * manager->frame_buffer[bin];
+            }
+            ASSERT_EQ(sum, manager->records->energy[band]) << band << " of " << count;
+        }
+    }
+}
+
 TEST_F(FloatFrameManager, OnePieceStopsAtTheLimit)
 {
     const auto manager = make_manager<Float>([](QVConfig& config) { config.frame_limit = 2; });
