@@ -39,7 +39,7 @@ tidy() {
     else
         left_out='^tests/'
     fi
-    scripts/sources.sh | grep '\.cpp$' | grep -v "$left_out" |
+    scripts/sources.sh | grep '\.cpp$' | grep -v -e '^fuzz/' -e "$left_out" |
         xargs -P "$jobs" -n 1 clang-tidy-14 -p "$build" --quiet --warnings-as-errors='*' 2>&1 |
         { ! grep -v -e 'warnings generated' -e 'warning generated' -e '^Suppressed ' -e '^Use -header-filter'; }
 }
@@ -49,7 +49,7 @@ man_page() {
 }
 
 shell_scripts() {
-    for script in run .ci/run scripts/*.sh; do
+    for script in run .ci/run scripts/*.sh fuzz/*.sh; do
         case $(head -n 1 "$script") in
         *bash*) bash -n "$script" ;;
         *) sh -n "$script" ;;

@@ -1,7 +1,7 @@
 #!/bin/sh
 # Installs what is missing to build and test the library on Debian 12.
 #
-#   scripts/setup.sh [build] [java] [tools] [test] [clips] [bench] [lint] [clang] [arch]
+#   scripts/setup.sh [build] [java] [tools] [test] [clips] [bench] [lint] [clang] [fuzz] [arch]
 #                                                  default: all of them but arch, the cross compilers
 #
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
@@ -18,6 +18,7 @@ packages_of() {
     # What counts instructions and prints tables, and the peers, each of which may be missing.
     bench) echo "valgrind python3 pkg-config libcli11-dev nlohmann-json3-dev libchromaprint-dev libfftw3-dev libswresample-dev libavutil-dev libsoxr-dev libspeexdsp-dev libpugixml-dev libtinyxml2-dev libxml2-dev" ;;
     lint) echo "clang-format-14 clang-tidy-14 mandoc" ;;
+    fuzz) echo "libexpat1-dev python3" ;; # a parser to read what is rendered, and the seeds
     clang) echo "clang-14 libclang-rt-14-dev" ;;
     arch) echo "g++-aarch64-linux-gnu g++-arm-linux-gnueabihf g++-i686-linux-gnu qemu-user" ;;
     *)
@@ -31,7 +32,7 @@ installed() {
     [ "$(dpkg-query -W -f '${db:Status-Status}' "$1" 2>/dev/null || true)" = installed ]
 }
 
-[ $# -gt 0 ] || set -- build java tools test clips bench lint clang
+[ $# -gt 0 ] || set -- build java tools test clips bench lint clang fuzz
 
 wanted=
 for group in "$@"; do
