@@ -262,7 +262,7 @@ std::string to_line(const nlohmann::ordered_json& object)
 
 std::string to_json(const std::string& path, const Content& content)
 {
-    nlohmann::ordered_json object;
+    nlohmann::ordered_json object = nlohmann::ordered_json::object_t(); // as in output.cpp
     object["path"] = path;
     object["bluray"] = content.is_bluray;
     object["dvd"] = content.is_dvd;
@@ -277,7 +277,7 @@ std::string to_json(const std::string& path, const Content& content)
 
 std::string to_json(const std::string& path, const Labels& labels)
 {
-    nlohmann::ordered_json object;
+    nlohmann::ordered_json object = nlohmann::ordered_json::object_t(); // as in output.cpp
     object["path"] = path;
     object["iso9660_label"] = nullptr;
     object["udf_label"] = nullptr;

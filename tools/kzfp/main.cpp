@@ -6,8 +6,11 @@
 #include <exception>
 #include <iostream>
 #include <new>
+#include <string_view>
+#include <typeinfo>
 #include <utility>
 
+#include <cxxabi.h>
 #include <fcntl.h>
 #include <unistd.h>
 
@@ -21,6 +24,31 @@
 namespace {
 
 using namespace kzfp;
+
+[[noreturn]] void end_short_of_memory()
+{
+    constexpr std::string_view kMessage = "kzfp: not enough memory\n";
+    static_cast<void>(!::write(STDERR_FILENO, kMessage.data(), kMessage.size()));
+    ::_exit(some_file_failed);
+}
+
+std::terminate_handler usual_end;
+
+/// Memory can be too short to make an exception, or to report one that was caught.
+void end_uncaught()
+{
+    const std::type_info* const type = abi::__cxa_current_exception_type();
+    if (type == nullptr || *type == typeid(std::bad_alloc)) {
+        end_short_of_memory();
+    }
+    usual_end();
+}
+
+/// Before the first object of the program is made: what that throws is caught by nobody.
+[[gnu::constructor(101)]] void watch_for_uncaught()
+{
+    usual_end = std::set_terminate(end_uncaught);
+}
 
 struct Result {
     InputFacts facts;
@@ -122,6 +150,8 @@ int main(int argc, char** argv)
             write_message(std::string("kzfp: ") + error.what());
         }
         return some_file_failed;
+    } catch (const std::bad_alloc&) {
+        end_short_of_memory();
     } catch (const std::exception& error) {
         write_message(std::string("kzfp: ") + error.what());
         return some_file_failed;

@@ -19,7 +19,9 @@ double to_microseconds(double seconds) { return std::round(seconds * 1e6) / 1e6;
 std::string to_json(const std::string& file, Algorithm algorithm, const InputFacts& facts,
                     const Fingerprint& fingerprint)
 {
-    nlohmann::ordered_json object;
+    // Not made into an object by its first member: without memory for that, it could not be
+    // destroyed.
+    nlohmann::ordered_json object = nlohmann::ordered_json::object_t();
     object["file"] = file;
     object["algorithm"] = algorithm == Algorithm::fixed ? "fixed" : "float";
     object["duration"] = nullptr;

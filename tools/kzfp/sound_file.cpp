@@ -40,6 +40,10 @@ SoundFile::SoundFile(int file, Algorithm algorithm)
         throw FileError("is not a sound file that can be read (WAV, FLAC, OGG, MP3, ...); "
                         "headerless audio needs --raw");
     }
+    // A header that could be read in part only is taken for another one; the next call forgets it.
+    if (sf_error(file_.get()) == SF_ERR_SYSTEM) {
+        throw FileError("cannot be read (" + trouble() + ")");
+    }
     check();
     if (is_companded() && info_.channels <= 2 && takes_rate(algorithm, file_rate())) {
         const bool alaw = (info_.format & SF_FORMAT_SUBMASK) == SF_FORMAT_ALAW;
