@@ -16,7 +16,8 @@ constexpr kz_status kBadArgument = 0x900f0004;
 constexpr kz_status kNotComplete = 0x900f0961;
 constexpr uint32_t kFixedRates[] = {8000, 11025, 16000, 22050, 24000, 32000, 44100, 48000};
 constexpr uint32_t kOtherRates[] = {0, 1, 1000, 4000, 11024, 12345, 44056, 96000, 192000};
-constexpr size_t kLongest = 3U << 20; ///< bytes of sound in a run
+constexpr size_t kLongest = 3U << 20; ///< bytes of sound, so that every fingerprint gets complete
+constexpr size_t kUsual = 1U << 16;   ///< so that most runs are short
 
 struct Job {
     uint32_t algorithm;
@@ -49,10 +50,10 @@ Job choose_job(Choices& choices)
 }
 
 /// Sound of one kind; one byte of a sample after the other, whatever the format.
-void add_stretch(Choices& choices, std::vector<uint8_t>& sound)
+void add_stretch(Choices& choices, std::vector<uint8_t>& sound, size_t longest)
 {
     const size_t count = std::min<size_t>(choices.ConsumeIntegral<uint16_t>() * size_t{4} + 1,
-                                          kLongest - sound.size());
+                                          longest - sound.size());
     const auto value = choices.ConsumeIntegral<uint8_t>();
     test::Random random(choices.ConsumeIntegral<uint16_t>());
     switch (choices.ConsumeIntegralInRange<int>(0, 3)) {
@@ -77,9 +78,10 @@ void add_stretch(Choices& choices, std::vector<uint8_t>& sound)
 
 std::vector<uint8_t> choose_sound(Choices& choices)
 {
+    const size_t longest = one_in(choices, 32) ? kLongest : kUsual;
     std::vector<uint8_t> sound;
     for (auto stretches = choices.ConsumeIntegralInRange<int>(0, 12); stretches > 0; --stretches) {
-        add_stretch(choices, sound);
+        add_stretch(choices, sound, longest);
     }
     return sound;
 }

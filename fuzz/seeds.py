@@ -46,7 +46,7 @@ def extraction():
             channels = 1 + index // 4 % 2
             seed = Seed().flag(fixed).number(form, 1, 4).number(index, 0, 7)
             seed.number(channels, 1, 2).number(0, 0, 3).number(0, 0, 31).number(0, 0, 7)
-            seed.number(3, 0, 7)  # address
+            seed.number(3, 0, 7).number(31, 0, 31)  # address, and long
             wanted = 15 * rate * channels * (2 if form == 2 else 1)
             stretches = [0] + [65535] * (wanted // 262141 + 1)
             seed.number(len(stretches), 0, 12)
