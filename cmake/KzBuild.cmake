@@ -51,6 +51,13 @@ if(KZ_HARDEN AND NOT KZ_SANITIZE)
   check_cxx_compiler_flag("-ftrivial-auto-var-init=zero -Werror" KZ_HAS_AUTO_VAR_INIT)
 endif()
 
+# What is shipped does not tell where it was built: the same sources give the same bytes in any folder.
+# Debuggers and coverage tools want the real names, and get them in the other builds.
+target_compile_options(
+  kz_settings
+  INTERFACE
+    "$<$<CONFIG:Release,MinSizeRel>:-ffile-prefix-map=${PROJECT_BINARY_DIR}=build;-ffile-prefix-map=${PROJECT_SOURCE_DIR}=.>")
+
 # Objects that go into the library.
 function(kz_library_objects target)
   add_library(${target} OBJECT ${ARGN})

@@ -92,6 +92,15 @@ if(KZ_JNI AND Java_JAVAC_EXECUTABLE AND Java_JAR_EXECUTABLE AND NOT CMAKE_CROSSC
 endif()
 option(KZ_JAVA "Build kzsdk.jar, the Java side of the front" ${java_default})
 
+# A jar tells when each class was written, unless the tool (of JDK 17 and later) is told what to say.
+set(KZ_JAR_DATE "")
+if(KZ_JAVA)
+  execute_process(COMMAND "${Java_JAR_EXECUTABLE}" --help OUTPUT_VARIABLE jar_help ERROR_QUIET)
+  if(jar_help MATCHES "--date=")
+    set(KZ_JAR_DATE --date=1980-01-01T00:00:02Z)
+  endif()
+endif()
+
 # kz_jar(<target> OUTPUT <name> SOURCES <files> [CLASSPATH <jars>] [MANIFEST <file>] [FLAGS <flags>])
 #
 # Compiles for Java 8, warnings being errors, and packs the classes. The jar's path is the target's
@@ -110,11 +119,15 @@ function(kz_jar target)
     string(JOIN ":" classpath ${jar_CLASSPATH})
     set(classpath -classpath "${classpath}")
   endif()
-  set(manifest "")
-  set(mode cf)
-  if(jar_MANIFEST)
-    set(mode cfm)
-    set(manifest "${jar_MANIFEST}")
+  if(KZ_JAR_DATE)
+    set(pack --create --file "${output}" ${KZ_JAR_DATE})
+    if(jar_MANIFEST)
+      list(APPEND pack --manifest "${jar_MANIFEST}")
+    endif()
+  elseif(jar_MANIFEST)
+    set(pack cfm "${output}" "${jar_MANIFEST}")
+  else()
+    set(pack cf "${output}")
   endif()
   add_custom_command(
     OUTPUT "${output}"
@@ -122,7 +135,7 @@ function(kz_jar target)
     COMMAND "${CMAKE_COMMAND}" -E make_directory "${classes}"
     COMMAND "${Java_JAVAC_EXECUTABLE}" ${level} -encoding UTF-8 -g -Xlint:all,-options,-serial -Werror
             ${jar_FLAGS} ${classpath} -d "${classes}" ${jar_SOURCES}
-    COMMAND "${Java_JAR_EXECUTABLE}" ${mode} "${output}" ${manifest} -C "${classes}" .
+    COMMAND "${Java_JAR_EXECUTABLE}" ${pack} -C "${classes}" .
     DEPENDS ${jar_SOURCES} ${jar_CLASSPATH} ${jar_MANIFEST}
     COMMENT "Packing ${jar_OUTPUT}"
     VERBATIM)
