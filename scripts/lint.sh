@@ -1,5 +1,5 @@
 #!/bin/sh
-# Checks the tree: format, clang-tidy, the man page, the scripts. Every check runs; any complaint
+# Checks the tree: format, clang-tidy, cppcheck, the man page, the scripts. Every check runs; any complaint
 # makes the whole fail.
 #
 #   scripts/lint.sh [build-directory]     where compile_commands.json is; default build/lint, made here
@@ -44,6 +44,13 @@ tidy() {
         { ! grep -v -e 'warnings generated' -e 'warning generated' -e '^Suppressed ' -e '^Use -header-filter'; }
 }
 
+# What clang-tidy does not look at: whole classes, and what holds on other processors.
+other_analyser() {
+    cppcheck --quiet --std=c++20 --enable=warning,performance,portability --inconclusive \
+        --suppressions-list=scripts/cppcheck_suppressions.txt --error-exitcode=1 -j "$jobs" -I . \
+        --template='{file}:{line}: {severity}: {message} [{id}]' kzsdk tables tools examples
+}
+
 man_page() {
     find tools docs -name '*.[1-8]' -print0 | xargs -0 -r mandoc -T lint -W warning
 }
@@ -67,6 +74,7 @@ check clang-format format
 check "shell scripts" shell_scripts
 check "Python scripts" python_scripts
 check "man page" man_page
+check cppcheck other_analyser
 check clang-tidy tidy
 
 if [ -n "$failed" ]; then

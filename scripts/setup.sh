@@ -17,10 +17,10 @@ packages_of() {
     clips) echo "sox libsox-fmt-all espeak-ng" ;; # the demo's music, and the tests' clips
     # What counts instructions and prints tables, and the peers, each of which may be missing.
     bench) echo "valgrind python3 pkg-config libcli11-dev nlohmann-json3-dev libchromaprint-dev libfftw3-dev libswresample-dev libavutil-dev libsoxr-dev libspeexdsp-dev libpugixml-dev libtinyxml2-dev libxml2-dev" ;;
-    lint) echo "clang-format-14 clang-tidy-14 mandoc" ;;
     fuzz) echo "libexpat1-dev python3" ;; # a parser to read what is rendered, and the seeds
+    lint) echo "clang-format-14 clang-tidy-14 cppcheck mandoc" ;;
     clang) echo "clang-14 libclang-rt-14-dev" ;;
-    arch) echo "g++-aarch64-linux-gnu g++-arm-linux-gnueabihf g++-i686-linux-gnu qemu-user" ;;
+    arch) echo "g++-aarch64-linux-gnu g++-arm-linux-gnueabihf g++-arm-linux-gnueabi g++-s390x-linux-gnu g++-i686-linux-gnu qemu-user" ;;
     *)
         echo "setup: no such group: $1" >&2
         exit 2

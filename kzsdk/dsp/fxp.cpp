@@ -122,13 +122,16 @@ constexpr Aligned aligned(Pair a, Pair b) noexcept
 }
 
 /// 1/X in Q31 at the middle of each of the 64 segments of [0.5, 1), to start Newton's iteration.
-constexpr auto kReciprocalSeeds = [] {
+consteval std::array<uint32_t, 64> reciprocal_seeds() noexcept
+{
     std::array<uint32_t, 64> seeds{};
     for (uint32_t i = 0; i < seeds.size(); ++i) {
         seeds[i] = static_cast<uint32_t>((uint64_t{1} << 39) / (2 * i + 129));
     }
     return seeds;
-}();
+}
+
+constexpr auto kReciprocalSeeds = reciprocal_seeds();
 static_assert(kReciprocalSeeds.front() == 0xfe03f80f && kReciprocalSeeds.back() == 0x80808080);
 
 constexpr uint32_t reciprocal(uint32_t x) noexcept
