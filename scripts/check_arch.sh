@@ -2,20 +2,26 @@
 # Builds the library in several ways, for several processors, and compares what it makes of some sixty
 # pieces of sound with tests/golden/documents.txt. Prints one line for each way; any difference fails.
 #
-#   scripts/check_arch.sh          g++ and clang++ at -O0 and -O3; 64-bit and 32-bit ARM at -O2
-#   scripts/check_arch.sh all      also -O1, -O2 and -march=native, 32-bit x86, and ARM at -O0 and -O3
+#   scripts/check_arch.sh          g++ at -O0 and clang++ at -O3; at -O2 64-bit ARM and S/390
+#   scripts/check_arch.sh all      also the other levels, -march=native, 32-bit ARM with and without
+#                                  floating-point hardware, 32-bit x86, and unit tests on other processors
 #   scripts/check_arch.sh <way>... just these: see `scripts/check_arch.sh list`
 #
-# ARM and 32-bit x86 programs run under QEMU. Which factors and taps the floating-point path computes rests
-# on the C library's sine and cosine: the cross-built programs run against the same release of it.
+# Each way is run with all variants of the inner loops that its processor has. A way that ends in -tests
+# runs the unit tests of the rooms that compute.
+#
+# Programs for ARM and S/390, whose bytes run from the highest to the lowest, run under QEMU; those for
+# 32-bit x86 run natively where the machine can. Which factors and taps the floating-point path computes
+# rests on the C library's sine and cosine: the cross-built programs run against the same release of it.
 set -eu
 cd "$(dirname "$0")/.."
 
 jobs=${JOBS:-$(getconf _NPROCESSORS_ONLN)}
 golden=tests/golden/documents.txt
-quick="g++-O0 g++-O3 clang++-O0 clang++-O3 aarch64-O2 armhf-O2"
-rest="g++-O1 g++-O2 g++-O3-native clang++-O1 clang++-O2 clang++-O3-native \
-aarch64-O0 aarch64-O3 armhf-O0 armhf-O3 i686-O0 i686-O2 i686-O3"
+quick="g++-O0 clang++-O3 aarch64-O2 s390x-O2"
+rest="g++-O1 g++-O2 g++-O3 g++-O3-native clang++-O0 clang++-O1 clang++-O2 clang++-O3-native \
+aarch64-O0 aarch64-O3 armhf-O0 armhf-O2 armhf-O3 armel-O2 s390x-O0 s390x-O3 i686-O0 i686-O2 i686-O3 \
+aarch64-O2-tests s390x-O2-tests armel-O2-tests i686-O2-tests"
 
 case ${1:-quick} in
 quick) ways=$quick ;;
@@ -29,13 +35,19 @@ esac
 
 # How a way is configured: its flags are everything behind the first hyphen.
 configure() {
-    flags=$(echo "${1#*-}" | sed 's/-native$/ -march=native/')
+    flags=$(echo "${1#*-}" | sed 's/-native$/ -march=native/; s/-tests$//')
+    what=-DKZ_BUILD_TESTS=OFF
+    case $1 in
+    *-tests) what="-DKZ_BUILD_TESTS=ON -DKZ_GTEST_SOURCE=/usr/src/googletest" ;;
+    esac
     flags=-${flags#-}
     case $1 in
     g++-*) compiler="-DCMAKE_C_COMPILER=gcc -DCMAKE_CXX_COMPILER=g++" ;;
     clang++-*) compiler="-DCMAKE_C_COMPILER=clang-14 -DCMAKE_CXX_COMPILER=clang++-14" ;;
     aarch64-*) compiler="-DCMAKE_TOOLCHAIN_FILE=cmake/toolchains/aarch64-linux-gnu.cmake" ;;
     armhf-*) compiler="-DCMAKE_TOOLCHAIN_FILE=cmake/toolchains/arm-linux-gnueabihf.cmake" ;;
+    armel-*) compiler="-DCMAKE_TOOLCHAIN_FILE=cmake/toolchains/arm-linux-gnueabi.cmake" ;;
+    s390x-*) compiler="-DCMAKE_TOOLCHAIN_FILE=cmake/toolchains/s390x-linux-gnu.cmake" ;;
     i686-*) compiler="-DCMAKE_TOOLCHAIN_FILE=cmake/toolchains/i686-linux-gnu.cmake" ;;
     *)
         echo "no such way: $1"
@@ -44,40 +56,81 @@ configure() {
     esac
     # shellcheck disable=SC2086 # the options are meant to be split
     cmake -S . -B "$2" -G Ninja $compiler -DCMAKE_BUILD_TYPE=None -DCMAKE_C_FLAGS="$flags" \
-        -DCMAKE_CXX_FLAGS="$flags" -DKZ_BUILD_TOOLS=OFF -DKZ_BUILD_TESTS=OFF -DKZ_BUILD_GOLDEN=ON \
-        -DKZ_WERROR=ON
+        -DCMAKE_CXX_FLAGS="$flags" -DKZ_BUILD_TOOLS=OFF $what -DKZ_BUILD_GOLDEN=ON -DKZ_WERROR=ON
 }
 
+# What starts a program of this way.
 emulator() {
     case $1 in
     aarch64-*) echo "qemu-aarch64 -L /usr/aarch64-linux-gnu" ;;
     armhf-*) echo "qemu-arm -L /usr/arm-linux-gnueabihf" ;;
-    i686-*) echo "qemu-i386 -L /usr/i686-linux-gnu" ;;
+    armel-*) echo "qemu-arm -L /usr/arm-linux-gnueabi" ;;
+    s390x-*) echo "qemu-s390x -L /usr/s390x-linux-gnu" ;;
+    i686-*)
+        native="/usr/i686-linux-gnu/lib/ld-linux.so.2 --library-path /usr/i686-linux-gnu/lib"
+        if $native --version >/dev/null 2>&1; then
+            echo "$native"
+        else
+            echo "qemu-i386 -L /usr/i686-linux-gnu"
+        fi
+        ;;
     esac
+}
+
+# The variants that programs of this way may have; one that the processor lacks is the default again.
+variants() {
+    case $1 in
+    *-O0) echo "default" ;;
+    aarch64-*) echo "plain neon" ;;
+    g++-* | clang++-* | i686-*) echo "plain sse41 avx2" ;;
+    *) echo "default" ;;
+    esac
+}
+
+compare_documents() {
+    for variant in $(variants "$1"); do
+        # shellcheck disable=SC2046 # the words are meant to be split
+        if KZSDK_KERNELS=$variant $(emulator "$1") "$2/tests/golden/golden_documents" "$golden" \
+            >"$2/result"; then
+            echo "$1, $variant: $(wc -l <"$golden") digests, all the same"
+        else
+            cat "$2/result"
+            echo "$1, $variant: DIFFERENT"
+            return 1
+        fi
+    done
+}
+
+run_tests() {
+    if ctest --test-dir "$2" --parallel "$jobs" >"$2/result" 2>&1; then
+        echo "$1: $(grep 'tests passed' "$2/result")"
+    else
+        tail -n 30 "$2/result"
+        echo "$1: FAILED"
+        return 1
+    fi
 }
 
 check() {
     build=build/arch/$1
     mkdir -p "$build"
-    if ! { configure "$1" "$build" && cmake --build "$build" --parallel "$jobs" --target golden_documents; } \
+    case $1 in
+    *-tests) target=all run=run_tests ;;
+    *) target=golden_documents run=compare_documents ;;
+    esac
+    if ! { configure "$1" "$build" && cmake --build "$build" --parallel "$jobs" --target "$target"; } \
         >"$build/log" 2>&1; then
         tail -n 20 "$build/log"
         echo "$1: not built"
         return 1
     fi
-    # shellcheck disable=SC2046 # likewise
-    if $(emulator "$1") "$build/tests/golden/golden_documents" "$golden" >"$build/result"; then
-        echo "$1: $(wc -l <"$golden") digests, all the same"
-    else
-        cat "$build/result"
-        echo "$1: DIFFERENT"
-        return 1
-    fi
+    $run "$1" "$build"
 }
 
 groups="build"
 case $ways in *clang*) groups="$groups clang" ;; esac
-case $ways in *aarch64* | *armhf* | *i686*) groups="$groups arch" ;; esac
+case $ways in *aarch64* | *arm* | *s390x* | *i686*) groups="$groups arch" ;; esac
+case $ways in *-tests*) groups="$groups test" ;; esac
 if [ "${SETUP:-yes}" != no ]; then
     # shellcheck disable=SC2086 # likewise
     scripts/setup.sh $groups

@@ -1,9 +1,16 @@
-# 32-bit x86, with Debian's cross compiler; what is built runs under QEMU.
+# 32-bit x86, with Debian's cross compiler; what is built runs natively where the machine can, else under
+# QEMU. (The other way to such programs, g++-multilib, cannot be installed beside cross compilers.)
 set(CMAKE_SYSTEM_NAME Linux)
 set(CMAKE_SYSTEM_PROCESSOR i686)
 set(CMAKE_C_COMPILER i686-linux-gnu-gcc)
 set(CMAKE_CXX_COMPILER i686-linux-gnu-g++)
-set(CMAKE_CROSSCOMPILING_EMULATOR qemu-i386 -L /usr/i686-linux-gnu)
+set(native /usr/i686-linux-gnu/lib/ld-linux.so.2 --library-path /usr/i686-linux-gnu/lib)
+execute_process(COMMAND ${native} --version RESULT_VARIABLE failed OUTPUT_QUIET ERROR_QUIET)
+if(failed)
+  set(CMAKE_CROSSCOMPILING_EMULATOR qemu-i386 -L /usr/i686-linux-gnu)
+else()
+  set(CMAKE_CROSSCOMPILING_EMULATOR ${native})
+endif()
 set(CMAKE_FIND_ROOT_PATH /usr/i686-linux-gnu)
 set(CMAKE_FIND_ROOT_PATH_MODE_PROGRAM NEVER)
 set(CMAKE_FIND_ROOT_PATH_MODE_LIBRARY ONLY)

@@ -8,6 +8,7 @@
 
 #include <algorithm>
 #include <array>
+#include <bit>
 #include <cinttypes>
 #include <cstdint>
 #include <cstdio>
@@ -72,16 +73,19 @@ const Piece kSilence{"silence",
 
 constexpr const char* kFormatNames[] = {"", "u8", "s16", "alaw", "ulaw"};
 
-// Of formats of one byte, any byte is a sample: the high bytes serve.
+// Samples of 16 bits go in as the processor holds them. Of formats of one byte, any byte is a
+// sample: the high bytes serve.
 std::vector<uint8_t> encode(uint32_t format, const Sound& sound)
 {
     std::vector<uint8_t> bytes;
     for (const int16_t sample : sound) {
         const auto bits = static_cast<uint16_t>(sample);
         if (format == KZ_FPX_FORMAT_PCM16) {
-            bytes.push_back(static_cast<uint8_t>(bits));
+            const auto held = std::bit_cast<std::array<uint8_t, sizeof bits>>(bits);
+            bytes.insert(bytes.end(), held.begin(), held.end());
+        } else {
+            bytes.push_back(static_cast<uint8_t>(bits >> 8));
         }
-        bytes.push_back(static_cast<uint8_t>(bits >> 8));
     }
     return bytes;
 }
