@@ -2,6 +2,7 @@
 // documents nor race for anything that they share. The thread sanitizer watches these tests in CI.
 
 #include <algorithm>
+#include <atomic>
 #include <cstdint>
 #include <string>
 #include <thread>
@@ -87,6 +88,131 @@ TEST_F(Threads, MaySeeTheMemoryManagerSwitchedOffAndOn)
         }
     });
     EXPECT_EQ(KZ_MEM_ALREADY_ON, kzmem_query_availability());
+}
+
+// CTest gives each test a process of its own, so these are the first calls that need the kernels.
+TEST_F(Threads, MayMakeTheFirstCallsOfTheProcessTogether)
+{
+    const auto music = kz::test::tune(22050, 1, 15.0, 0.5, 1);
+    std::vector<std::string> documents(4);
+    run_beside_each_other(documents.size(),
+                          [&](size_t i) { documents[i] = document_of(music, 22050); });
+    for (const auto& document : documents) {
+        EXPECT_TRUE(document.starts_with("<?xml")) << document;
+        EXPECT_EQ(documents[0], document);
+    }
+}
+
+/// A whole fingerprint and a tree, whose calls may fail at any place and must come back.
+void use_what_may_be_switched_off(const std::vector<int16_t>& music)
+{
+    document_of(music, 11025);
+    XMLTag* tag = CreateXMLTagFromStr("A", "data");
+    SetXMLSubTagDataFromStr(tag, "B/C", "data", 1);
+    XMLTag* clone = CloneXMLTag(tag, 1);
+    _kzmem_free(RenderXMLTagToStr(clone, 1));
+    DisposeXMLTag(clone);
+    DisposeXMLTag(tag);
+}
+
+#if defined(__SANITIZE_ADDRESS__)
+#define KZ_FINDS_LEAKS 1
+#elif defined(__has_feature)
+#if __has_feature(address_sanitizer)
+#define KZ_FINDS_LEAKS 1
+#endif
+#endif
+
+// Their blocks leak, as documented: that is all.
+TEST_F(Threads, AtWorkSurviveTheMemoryManagerSwitchedOffAndOn)
+{
+#if defined(KZ_FINDS_LEAKS)
+    GTEST_SKIP() << "what leaks here is meant to";
+#endif
+    const auto music = kz::test::tune(11025, 1, 4.0, 0.5, 1);
+    std::atomic<bool> stop{false};
+    std::jthread switching([&stop] {
+        while (!stop) {
+            kzmem_shutdown();
+            kzmem_initialize(0, 0);
+        }
+    });
+    run_beside_each_other(3, [&music](size_t) {
+        for (int round = 0; round < 20; ++round) {
+            use_what_may_be_switched_off(music);
+        }
+    });
+    stop = true;
+    switching.join();
+    const auto whole = kz::test::tune(11025, 1, 15.0, 0.5, 1);
+    EXPECT_TRUE(document_of(whole, 11025).starts_with("<?xml")) << "all works as before";
+}
+
+const char* renamed(const char* name) { return name[0] == 'A' ? "X" : name; }
+const char* kept(const char* name) { return name; }
+const char* renamed_attribute(const char* /*tag*/, const char* name) { return renamed(name); }
+const char* kept_attribute(const char* /*tag*/, const char* name) { return name; }
+const char* shortened(const char* /*tag*/, const char* /*name*/, const char* /*value*/)
+{
+    return "v";
+}
+const char* kept_value(const char* /*tag*/, const char* /*name*/, const char* value)
+{
+    return value;
+}
+
+// A clone that is being made while maps are installed has each name by the one or by the other.
+TEST_F(Threads, MayInstallMapsWhileOthersCloneByThem)
+{
+    run_beside_each_other(4, [](size_t i) {
+        for (int round = 0; round < 2000; ++round) {
+            if (i == 0) {
+                SetMapXMLTagName(round % 2 == 0 ? renamed : kept);
+                SetMapXMLAttrName(round % 2 == 0 ? renamed_attribute : kept_attribute);
+                SetMapXMLAttrValue(round % 2 == 0 ? shortened : kept_value);
+                continue;
+            }
+            XMLTag* tag = CreateXMLTagFromStr("A", "data");
+            SetXMLTagAttrFromStr(tag, "A", "value");
+            XMLTag* clone = CloneAndMutateXMLTag(tag, 1);
+            const std::string name = GetXMLTagName(clone);
+            const std::string value = GetXMLTagAttrValue(clone, 0);
+            EXPECT_TRUE(name == "A" || name == "X") << name;
+            EXPECT_TRUE(value == "value" || value == "v") << value;
+            DisposeXMLTag(clone);
+            DisposeXMLTag(tag);
+        }
+    });
+}
+
+/// What a family's calls may answer when it may be off and others' failures are its last error.
+void expect_one_of(kz_status status, std::initializer_list<kz_status> possible)
+{
+    EXPECT_NE(possible.end(), std::find(possible.begin(), possible.end(), status)) << status;
+}
+
+TEST_F(Threads, MaySwitchTheDiscFamiliesWhileOthersUseThem)
+{
+    run_beside_each_other(4, [](size_t i) {
+        for (int round = 0; round < 2000; ++round) {
+            if (i == 0) {
+                expect_one_of(kzbdfs_initialize(), {KZ_OK});
+                expect_one_of(kzdvdfs_initialize(), {KZ_OK});
+                expect_one_of(kzbdfs_shutdown(), {KZ_OK});
+                expect_one_of(kzdvdfs_shutdown(), {KZ_OK});
+                continue;
+            }
+            EXPECT_EQ(-1, kzbdfs_open("/nowhere/at/all"));
+            EXPECT_EQ(0, kzdvdfs_exists("/nowhere/at/all"));
+            expect_one_of(kzbdfs_get_error(), {KZ_OK, KZ_DISC_NOT_ON, KZ_DISC_ERROR_NOT_FOUND});
+            expect_one_of(kzdvdfs_get_error(), {KZ_OK, KZ_DISC_NOT_ON, KZ_DISC_ERROR_NOT_FOUND});
+            const int32_t file = kzdvdfs_open("/dev/null");
+            if (file >= 0) {
+                while (kzdvdfs_close(file) == KZ_DISC_NOT_ON) {
+                }
+            }
+        }
+    });
 }
 
 } // namespace
