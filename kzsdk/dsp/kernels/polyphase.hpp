@@ -256,8 +256,8 @@ private:
             add_middles(sums, flipped + k + kLanes, down, Simd::load(taps + k + kLanes));
             const Ints high_parts = Simd::load(highs + k);
             for (size_t j = 0; j < Width; ++j) {
-                Simd::add_to(sums[j], Simd::pair_products(Simd::load(doubled + k + j * down),
-                                                          high_parts));
+                Simd::add_to(sums[j],
+                             Simd::pair_products(Simd::load(doubled + k + j * down), high_parts));
             }
         }
         if (k != length) {

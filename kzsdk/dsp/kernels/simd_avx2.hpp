@@ -48,8 +48,8 @@ struct Avx2 {
     static Ints mul(Ints a, Ints b) noexcept { return _mm256_mullo_epi32(a, b); }
     static Ints larger(Ints a, Ints b) noexcept { return _mm256_max_epi32(a, b); }
 
-    /// Adds, and keeps the compiler from regrouping a long sum, for which it would need more registers
-    /// than there are.
+    /// Adds, and keeps the compiler from regrouping a long sum, for which it would need more
+    /// registers than there are.
     static void add_to(Ints& sum, Ints v) noexcept
     {
         sum = add(sum, v);

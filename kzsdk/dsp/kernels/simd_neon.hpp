@@ -42,8 +42,8 @@ struct Neon {
     static Ints mul(Ints a, Ints b) noexcept { return vmulq_s32(a, b); }
     static Ints larger(Ints a, Ints b) noexcept { return vmaxq_s32(a, b); }
 
-    /// Adds, and keeps the compiler from regrouping a long sum, for which it would need more registers
-    /// than there are.
+    /// Adds, and keeps the compiler from regrouping a long sum, for which it would need more
+    /// registers than there are.
     static void add_to(Ints& sum, Ints v) noexcept
     {
         sum = add(sum, v);

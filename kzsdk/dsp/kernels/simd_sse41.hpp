@@ -47,8 +47,8 @@ struct Sse41 {
     static Ints mul(Ints a, Ints b) noexcept { return _mm_mullo_epi32(a, b); }
     static Ints larger(Ints a, Ints b) noexcept { return _mm_max_epi32(a, b); }
 
-    /// Adds, and keeps the compiler from regrouping a long sum, for which it would need more registers
-    /// than there are.
+    /// Adds, and keeps the compiler from regrouping a long sum, for which it would need more
+    /// registers than there are.
     static void add_to(Ints& sum, Ints v) noexcept
     {
         sum = add(sum, v);
