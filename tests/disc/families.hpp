@@ -109,7 +109,7 @@ void as_nobody(Act act)
     if (before == 0) {
         ASSERT_EQ(0, ::seteuid(kNobody));
     }
-    const AtEnd restore([before] { static_cast<void>(::seteuid(before)); });
+    const AtEnd restore([before] { EXPECT_EQ(0, ::seteuid(before)); });
     act();
 }
 

@@ -10,6 +10,9 @@
 //
 // It serves from before the program's first line on, so nothing here needs to be initialised.
 
+// Checked forms of the functions that are replaced here would be defined twice.
+#undef _FORTIFY_SOURCE
+
 #include <cerrno>
 #include <cstddef>
 #include <cstdlib>

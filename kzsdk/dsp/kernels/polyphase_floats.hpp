@@ -189,14 +189,17 @@ private:
     template <size_t Count>
     void add_up(Floats (*sums)[Vectors], const Row* rows, size_t from, size_t to) const noexcept
     {
+        if (from == to) {
+            return; // where `from` may be before the first, too
+        }
         const size_t stride = phases_.tap_stride;
         const float* taps[Count];
 #pragma GCC unroll 8
         for (size_t r = 0; r < Count; ++r) {
             taps[r] = rows[r].taps + (rows[r].newest - from) * stride;
         }
-        const float* samples = columns_ + from * kWidth;
-        for (size_t left = from - to; left != 0; --left, samples -= kWidth) {
+        for (size_t step = from; step != to; --step) {
+            const float* samples = columns_ + step * kWidth;
 #pragma GCC unroll 8
             for (size_t r = 0; r < Count; ++r) {
                 const Floats tap = Simd::all(*taps[r]);
