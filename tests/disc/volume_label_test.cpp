@@ -317,7 +317,7 @@ TEST_P(DiscDevice, ThatMayNotBeReadIsDenied)
     if (::getuid() == 0 && ::seteuid(65534) != 0) {
         GTEST_SKIP() << "the only user of a user namespace cannot give its privilege up";
     }
-    const AtEnd restore([] { static_cast<void>(::seteuid(0)); });
+    const AtEnd restore([before = ::getuid()] { EXPECT_EQ(0, ::seteuid(before)); });
     char text[32];
     uint32_t length = 0;
     EXPECT_EQ(0x90060047u, family().read_vol_label("/", 32, &length, text));

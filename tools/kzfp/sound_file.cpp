@@ -42,7 +42,7 @@ SoundFile::SoundFile(int file, Algorithm algorithm)
     }
     // A header that could be read in part only is taken for another one; the next call forgets it.
     if (sf_error(file_.get()) == SF_ERR_SYSTEM) {
-        throw FileError("cannot be read (" + trouble() + ")");
+        throw FileError("cannot be read (" + SoundFile::trouble() + ")");
     }
     check();
     if (is_companded() && info_.channels <= 2 && takes_rate(algorithm, file_rate())) {

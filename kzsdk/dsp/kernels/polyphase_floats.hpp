@@ -285,7 +285,7 @@ public:
     }
 
 private:
-    FloatDecimator() noexcept {} // the streams are written before they are read
+    FloatDecimator() noexcept = default; // the streams are written before they are read
 
     // Sample i goes to stream i mod Down; zeros follow.
     void deal_out(const float* samples, size_t count) noexcept
