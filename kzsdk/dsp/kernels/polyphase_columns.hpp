@@ -137,8 +137,9 @@ private:
             const uint32_t width = rows_.up - first < kLanes ? rows_.up - first : kLanes;
             for (uint32_t i = 0; i < kLanes; ++i) {
                 if (i >= width) {
-                    for (auto& half : sums) {
-                        half[i] = Simd::all(0);
+                    // NOLINTNEXTLINE(modernize-loop-convert): GCC makes better code of the index
+                    for (size_t v = 0; v < kVectors; ++v) {
+                        sums[v][i] = Simd::all(0);
                     }
                     continue;
                 }
