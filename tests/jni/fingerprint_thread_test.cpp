@@ -396,7 +396,7 @@ TEST_F(Worker, KeepsToItselfAmongOthers)
             });
             EXPECT_EQ(0, worker.init());
             for (int made = 0; made < kRequests;) {
-                made += request(worker, 3) == 0; // fails above the script, which has no lock
+                made += request(worker, 3) == 0; // refused before there is a handle
             }
             while (events.at(i) < kRequests) {
                 std::this_thread::yield();

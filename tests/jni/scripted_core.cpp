@@ -1,6 +1,7 @@
 #include "scripted_core.hpp"
 
 #include <cstring>
+#include <mutex>
 
 #include "kzsdk/abs/startup.h"
 #include "kzsdk/fpx/fpx.h"
@@ -14,6 +15,26 @@ namespace {
 using kz::test::script;
 
 kz_fpx_handle the_handle;
+
+/// First jobs of several workers start the core at once.
+std::mutex noting;
+
+void note(const char* call)
+{
+    const std::lock_guard lock(noting);
+    script().calls.emplace_back(call);
+}
+
+kz_status next_start()
+{
+    const std::lock_guard lock(noting);
+    if (script().starts.empty()) {
+        return KZ_OK;
+    }
+    const kz_status status = script().starts.front();
+    script().starts.erase(script().starts.begin());
+    return status;
+}
 
 } // namespace
 
@@ -29,36 +50,31 @@ Script& script()
 
 kz_status kzconf_initialize_configuration(kzconf_configuration* record) noexcept
 {
-    script().calls.emplace_back("configure");
+    note("configure");
     std::memset(record, 0, sizeof *record);
     return script().configuration;
 }
 
 kz_status kzinit_initialize_vesk(const kzconf_configuration* record) noexcept
 {
-    script().calls.emplace_back("start");
+    note("start");
     const kzconf_configuration zero = {};
     if (std::memcmp(record, &zero, sizeof zero) != 0) {
-        script().calls.emplace_back("with a record that is not clear");
+        note("with a record that is not clear");
     }
-    kz_status status = KZ_OK;
-    if (!script().starts.empty()) {
-        status = script().starts.front();
-        script().starts.erase(script().starts.begin());
-    }
-    return status;
+    return next_start();
 }
 
 kz_status kzinit_shutdown_vesk() noexcept
 {
-    script().calls.emplace_back("shut down");
+    note("shut down");
     return KZ_OK;
 }
 
 kz_status kz_fpx_fingerprint_create(uint32_t algorithm, uint32_t format, uint32_t sample_rate,
                                     uint32_t channels, kz_fpx_handle** out_handle) noexcept
 {
-    script().calls.emplace_back("create");
+    note("create");
     script().algorithm = algorithm;
     script().format = format;
     script().rate = sample_rate;
@@ -72,7 +88,7 @@ kz_status kz_fpx_fingerprint_create(uint32_t algorithm, uint32_t format, uint32_
 kz_status kz_fpx_fingerprint_add_audio(kz_fpx_handle* /*handle*/, const void* audio,
                                        uint32_t byte_count, uint8_t* out_complete) noexcept
 {
-    script().calls.emplace_back("add audio");
+    note("add audio");
     script().audio.assign(static_cast<const char*>(audio), byte_count);
     if (script().during_job) {
         script().during_job();
@@ -83,7 +99,7 @@ kz_status kz_fpx_fingerprint_add_audio(kz_fpx_handle* /*handle*/, const void* au
 
 kz_status kz_fpx_fingerprint_serialize(kz_fpx_handle* /*handle*/, char** out_text) noexcept
 {
-    script().calls.emplace_back("serialize");
+    note("serialize");
     *out_text = nullptr;
     if (script().serialize == KZ_OK) {
         *out_text = strdup(script().text.c_str());
@@ -104,7 +120,7 @@ kz_status kz_fpx_fingerprint_serialize_free(char** text_ref) noexcept
 
 kz_status kz_fpx_fingerprint_free(kz_fpx_handle** handle_ref) noexcept
 {
-    script().calls.emplace_back("free");
+    note("free");
     *handle_ref = nullptr;
     return script().free;
 }

@@ -36,7 +36,8 @@ struct Script {
     int texts_out = 0; ///< made and not given back
 };
 
-/// The script in force; a test starts with `script() = {}`. To be touched while no job runs.
+/// The script in force; a test starts with `script() = {}`. To be touched while no job runs. Of
+/// jobs that run at once, only one may get as far as to create a handle.
 Script& script();
 
 } // namespace kz::test
