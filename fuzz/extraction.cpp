@@ -18,6 +18,7 @@ constexpr uint32_t kFixedRates[] = {8000, 11025, 16000, 22050, 24000, 32000, 441
 constexpr uint32_t kOtherRates[] = {0, 1, 1000, 4000, 11024, 12345, 44056, 96000, 192000};
 constexpr size_t kLongest = 3U << 20; ///< bytes of sound, so that every fingerprint gets complete
 constexpr size_t kUsual = 1U << 16;   ///< so that most runs are short
+constexpr size_t kSeconds = 60;       ///< at a rate of 1 Hz a few KB would last for hours
 
 struct Job {
     uint32_t algorithm;
@@ -76,9 +77,10 @@ void add_stretch(Choices& choices, std::vector<uint8_t>& sound, size_t longest)
     }
 }
 
-std::vector<uint8_t> choose_sound(Choices& choices)
+std::vector<uint8_t> choose_sound(Choices& choices, const Job& job)
 {
-    const size_t longest = one_in(choices, 32) ? kLongest : kUsual;
+    const size_t longest =
+        std::min(one_in(choices, 32) ? kLongest : kUsual, kSeconds * job.rate * job.frame_bytes());
     std::vector<uint8_t> sound;
     for (auto stretches = choices.ConsumeIntegralInRange<int>(0, 12); stretches > 0; --stretches) {
         add_stretch(choices, sound, longest);
@@ -156,7 +158,7 @@ void run(Choices& choices)
         expect_refused_calls(handle, job);
     }
     const size_t offset = choices.ConsumeIntegralInRange<size_t>(0, 7);
-    const auto sound = choose_sound(choices);
+    const auto sound = choose_sound(choices, job);
     const auto pieces = choose_pieces(choices, sound.size(), job.frame_bytes());
     const std::string document = document_of(handle, sound, pieces, offset);
     EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
