@@ -168,6 +168,17 @@ TEST_F(DynBuf, TheBlockIsHandedOverAsItIs)
     EXPECT_EQ(KZ_OK, _kzmem_free(data));
 }
 
+TEST_F(DynBuf, ACloneOfAnEmptyBufferIsEmpty)
+{
+    const Buffer buffer = make(16, 4);
+    const Buffer clone(kz_dyn_buf_clone(buffer.get()));
+    ASSERT_TRUE(clone);
+    EXPECT_EQ("", contents(clone.get()));
+    EXPECT_EQ(16u, clone->capacity);
+    ASSERT_EQ(KZ_OK, append(clone, "d"));
+    EXPECT_EQ("d", contents(clone.get()));
+}
+
 TEST_F(DynBuf, ACloneHasItsOwnBytes)
 {
     const Buffer buffer = make(16, 4);

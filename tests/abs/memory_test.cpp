@@ -76,6 +76,18 @@ TEST_F(MemoryOff, BytesCanBeMovedAndComparedWithoutTheManager)
     EXPECT_EQ(0, kzmem_memcmp(bytes.data(), copy.data(), 8));
 }
 
+TEST_F(MemoryOff, NoBytesAreMovedWhereverTheyAre)
+{
+    uint8_t byte = 7;
+    EXPECT_EQ(nullptr, kzmem_memset(nullptr, 1, 0));
+    EXPECT_EQ(nullptr, kzmem_memmove(nullptr, nullptr, 0));
+    EXPECT_EQ(nullptr, kzmem_memcpy(nullptr, nullptr, 0));
+    EXPECT_EQ(&byte, kzmem_memset(&byte, 1, 0));
+    EXPECT_EQ(&byte, kzmem_memmove(&byte, nullptr, 0));
+    EXPECT_EQ(&byte, kzmem_memcpy(&byte, nullptr, 0));
+    EXPECT_EQ(7, byte);
+}
+
 TEST_F(Memory, ComparisonIsFoldedToASign)
 {
     EXPECT_EQ(-1, kzmem_memcmp("ab1", "ab9", 3));

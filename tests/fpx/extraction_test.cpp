@@ -120,6 +120,11 @@ TEST_F(Extraction, AHandleWithoutAnInstanceIsForgotten)
     EXPECT_EQ(nullptr, handle);
     EXPECT_EQ(0, frees);
     EXPECT_EQ(before, live_blocks());
+    record->algorithm = nullptr;
+    handle = record;
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle)) << "nor without an algorithm";
+    EXPECT_EQ(nullptr, handle);
+    EXPECT_EQ(before, live_blocks());
     _kzmem_free(record);
 }
 

@@ -4,12 +4,14 @@
 #include "kzsdk/jni/bridge.hpp"
 
 #include <array>
+#include <cstdlib>
 #include <cstring>
 #include <string>
 #include <thread>
 #include <vector>
 
 #include <errno.h>
+#include <pthread.h>
 
 #include <gtest/gtest.h>
 
@@ -17,6 +19,31 @@
 #include "platform_probe.hpp"
 #include "scripted_core.hpp"
 #include "support/allocation.hpp"
+
+namespace {
+
+// What the system refuses to this thread.
+thread_local bool no_more_keys = false;
+thread_local bool no_more_values = false;
+
+} // namespace
+
+extern "C" {
+
+int __real_pthread_key_create(pthread_key_t* key, void (*at_the_end)(void*));
+int __real_pthread_setspecific(pthread_key_t key, const void* value);
+
+int __wrap_pthread_key_create(pthread_key_t* key, void (*at_the_end)(void*))
+{
+    return no_more_keys ? EAGAIN : __real_pthread_key_create(key, at_the_end);
+}
+
+int __wrap_pthread_setspecific(pthread_key_t key, const void* value)
+{
+    return no_more_values ? ENOMEM : __real_pthread_setspecific(key, value);
+}
+
+} // extern "C"
 
 namespace {
 
@@ -46,7 +73,9 @@ Thing thing(size_t index)
 
 jclass find_class(JNIEnv*, const char* name)
 {
-    return vm_state.answers("class " + std::string(name)) ? thing<jclass>(0) : nullptr;
+    const bool again = !vm_state.calls.empty() && vm_state.fails_at == "class again" &&
+                       vm_state.calls.back().starts_with("field ");
+    return vm_state.answers("class " + std::string(name)) && !again ? thing<jclass>(0) : nullptr;
 }
 
 jobject new_global_reference(JNIEnv*, jobject)
@@ -241,6 +270,12 @@ TEST_F(Registration, FailsWithoutTheField)
                    {{6, "FingerprintJNI", "Can't find Fingerprint.mNativeContext"}, kRefused});
 }
 
+TEST_F(Registration, FailsWhereTheClassIsGoneWhenItsMethodsAreTold)
+{
+    expect_refusal("class again", {kRefused});
+    EXPECT_EQ(kClass, vm_state.calls.back());
+}
+
 // The thread that an event comes on, which no VM knows before.
 TEST(Environment, IsThatOfTheThreadWhenTheVmKnowsIt)
 {
@@ -269,6 +304,34 @@ TEST(Environment, IsNullWhereTheThreadCannotBeAttached)
     android::AndroidRuntime::setJavaVM(&detached_vm);
     std::thread([] { EXPECT_EQ(nullptr, android::AndroidRuntime::getJNIEnv()); }).join();
     EXPECT_EQ(Calls{"attach"}, vm_state.calls);
+}
+
+TEST(Environment, IsNullWhereTheThreadCouldNotBeDetachedAtItsEnd)
+{
+    vm_state = {};
+    android::AndroidRuntime::setJavaVM(&detached_vm);
+    std::thread([] {
+        no_more_values = true;
+        const JNIEnv* const env = android::AndroidRuntime::getJNIEnv();
+        no_more_values = false;
+        EXPECT_EQ(nullptr, env);
+    }).join();
+    EXPECT_EQ((Calls{"attach", "detach"}), vm_state.calls);
+}
+
+// In a process of its own: the key is made once.
+TEST(EnvironmentDeathTest, IsNullAndNothingAttachedWhereNoKeyCanBeMade)
+{
+    GTEST_FLAG_SET(death_test_style, "threadsafe");
+    const auto in_a_new_process = [] {
+        vm_state = {};
+        android::AndroidRuntime::setJavaVM(&detached_vm);
+        no_more_keys = true;
+        const JNIEnv* const env = android::AndroidRuntime::getJNIEnv();
+        no_more_keys = false;
+        std::exit(env == nullptr && vm_state.calls.empty() ? 0 : 1);
+    };
+    EXPECT_EXIT(in_a_new_process(), ::testing::ExitedWithCode(0), "");
 }
 
 jint set_up()
