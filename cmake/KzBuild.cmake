@@ -26,6 +26,15 @@ if(KZ_SANITIZE)
   target_compile_options(kz_settings INTERFACE -fsanitize=${KZ_SANITIZE} -fno-omit-frame-pointer
                                                -fno-sanitize-recover=all)
   target_link_options(kz_settings INTERFACE -fsanitize=${KZ_SANITIZE})
+  if(KZ_SANITIZE MATCHES "integer")
+    # Unsigned numbers may wrap; this sanitizer asks where that is meant.
+    target_compile_options(
+      kz_settings INTERFACE "-fsanitize-ignorelist=${PROJECT_SOURCE_DIR}/cmake/integer_ignorelist.txt")
+  endif()
+endif()
+if(KZ_COVERAGE)
+  target_compile_options(kz_settings INTERFACE -fprofile-instr-generate -fcoverage-mapping)
+  target_link_options(kz_settings INTERFACE -fprofile-instr-generate)
 endif()
 
 # What a compiler and a linker can do against the exploitation of a bug. tests/abi/hardening_test.cpp

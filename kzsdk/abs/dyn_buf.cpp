@@ -18,9 +18,10 @@ constexpr uint32_t kOutside = std::numeric_limits<uint32_t>::max();
 
 uint32_t offset_inside(const kz_dyn_buf& buffer, const void* bytes) noexcept
 {
-    const auto offset =
-        reinterpret_cast<uintptr_t>(bytes) - reinterpret_cast<uintptr_t>(buffer.data);
-    return offset < buffer.capacity ? static_cast<uint32_t>(offset) : kOutside;
+    const auto at = reinterpret_cast<uintptr_t>(bytes);
+    const auto begin = reinterpret_cast<uintptr_t>(buffer.data);
+    const bool inside = at >= begin && at - begin < buffer.capacity;
+    return inside ? static_cast<uint32_t>(at - begin) : kOutside;
 }
 
 bool resize(kz_dyn_buf& buffer, uint32_t capacity) noexcept

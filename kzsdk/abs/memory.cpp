@@ -32,7 +32,7 @@ void* _kzmem_malloc(uint32_t size) noexcept { return is_on() ? std::malloc(size)
 
 void* _kzmem_calloc(uint32_t count, uint32_t size) noexcept
 {
-    const uint32_t bytes = count * size; // wraps: see the header
+    const auto bytes = static_cast<uint32_t>(uint64_t{count} * size); // wraps: see the header
     void* block = _kzmem_malloc(bytes);
     if (block != nullptr) {
         std::memset(block, 0, bytes);

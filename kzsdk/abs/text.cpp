@@ -204,7 +204,7 @@ int32_t kz_isalpha(int32_t character) noexcept
 
 int32_t kz_isdigit(int32_t character) noexcept
 {
-    return static_cast<uint32_t>(character) - 48u <= 9u ? 1 : 0;
+    return character >= '0' && character <= '9' ? 1 : 0;
 }
 
 int32_t kz_isxdigit(int32_t character) noexcept

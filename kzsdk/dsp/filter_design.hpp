@@ -10,6 +10,7 @@
 #include <span>
 
 #include "kzsdk/abs/mathfn.h"
+#include "kzsdk/dsp/fxp_ops.hpp"
 
 namespace kz::dsp {
 
@@ -28,9 +29,9 @@ constexpr FilterLayout filter_layout(uint32_t up, uint32_t down) noexcept
     const uint64_t longest = up > down ? up : down;
     const uint64_t half = 10 * longest;
     // The first term wraps at 32 bits when up is more than twice down.
-    const uint32_t overlap = 2 * down - up;
+    const uint32_t overlap = fxp::wrap_sub(2 * down, up);
     const auto lag = static_cast<uint32_t>(down - half % down);
-    const uint64_t leading = down <= up ? (overlap + lag) % down : down - up;
+    const uint64_t leading = down <= up ? fxp::wrap_add(overlap, lag) % down : down - up;
     const uint64_t taps = 2 * half + 1;
     const uint64_t used = leading + taps;
     return {up, down, leading, taps, used + (up - used % up)};

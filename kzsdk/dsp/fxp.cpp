@@ -59,12 +59,12 @@ constexpr FxpUTypeLong sum(FxpUTypeLong a, FxpUTypeLong b) noexcept
 {
     const uint32_t low_bits = (a.lo & 0x7fffffff) + (b.lo & 0x7fffffff);
     const uint32_t carry = ((a.lo >> 31) + (b.lo >> 31) + (low_bits >> 31)) >> 1;
-    return {.hi = a.hi + b.hi + carry, .lo = a.lo + b.lo};
+    return {.hi = wrap_add(wrap_add(a.hi, b.hi), carry), .lo = wrap_add(a.lo, b.lo)};
 }
 
 constexpr FxpUTypeLong negated(FxpUTypeLong x) noexcept
 {
-    return {.hi = ~x.hi + (x.lo == 0 ? 1u : 0u), .lo = 0u - x.lo};
+    return {.hi = wrap_add(~x.hi, x.lo == 0 ? 1u : 0u), .lo = wrap_sub(0u, x.lo)};
 }
 
 constexpr FxpUTypeLong widened(uint32_t word) noexcept { return {.hi = 0, .lo = word}; }
@@ -138,8 +138,8 @@ constexpr uint32_t reciprocal(uint32_t x) noexcept
 {
     uint32_t y = kReciprocalSeeds[(x & 0x7fffffff) >> 25];
     for (int step = 0; step < 3; ++step) {
-        const uint32_t residue = 0u - product_high(x, y); // 2 - XY, in units of 2^-31
-        y = 2 * product_high(residue, y);
+        const uint32_t residue = wrap_sub(0u, product_high(x, y)); // 2 - XY, in units of 2^-31
+        y = shift_left(product_high(residue, y), 1);
     }
     return y;
 }
@@ -233,7 +233,7 @@ FxpUTypeLong KZDSP_UMUL_FxpUTypeLong2(uint32_t hi, uint32_t lo, FxpUType b) noex
 FxpType KZDSP_SMUL_HIGH_FxpType(FxpType a, FxpType b) noexcept
 {
     const uint32_t high = product_high(magnitude(a), magnitude(b));
-    return static_cast<FxpType>((a ^ b) < 0 ? 0u - high : high);
+    return static_cast<FxpType>((a ^ b) < 0 ? wrap_sub(0u, high) : high);
 }
 
 FxpUType KZDSP_UMUL_HIGH_FxpUType(FxpUType a, FxpUType b) noexcept { return product_high(a, b); }

@@ -12,19 +12,25 @@
 
 namespace kz::fxp {
 
+constexpr uint32_t wrap_add(uint32_t a, uint32_t b) noexcept { return a + b; }
+
+constexpr uint32_t wrap_sub(uint32_t a, uint32_t b) noexcept { return a - b; }
+
+constexpr uint32_t wrap_mul(uint32_t a, uint32_t b) noexcept { return a * b; }
+
 constexpr int32_t wrap_add(int32_t a, int32_t b) noexcept
 {
-    return static_cast<int32_t>(static_cast<uint32_t>(a) + static_cast<uint32_t>(b));
+    return static_cast<int32_t>(wrap_add(static_cast<uint32_t>(a), static_cast<uint32_t>(b)));
 }
 
 constexpr int32_t wrap_sub(int32_t a, int32_t b) noexcept
 {
-    return static_cast<int32_t>(static_cast<uint32_t>(a) - static_cast<uint32_t>(b));
+    return static_cast<int32_t>(wrap_sub(static_cast<uint32_t>(a), static_cast<uint32_t>(b)));
 }
 
 constexpr int32_t wrap_mul(int32_t a, int32_t b) noexcept
 {
-    return static_cast<int32_t>(static_cast<uint32_t>(a) * static_cast<uint32_t>(b));
+    return static_cast<int32_t>(wrap_mul(static_cast<uint32_t>(a), static_cast<uint32_t>(b)));
 }
 
 constexpr int32_t wrap_negate(int32_t a) noexcept { return wrap_sub(0, a); }
@@ -32,7 +38,7 @@ constexpr int32_t wrap_negate(int32_t a) noexcept { return wrap_sub(0, a); }
 /// |a| as an unsigned word; -2^31 gives 2^31.
 constexpr uint32_t magnitude(int32_t a) noexcept
 {
-    return a < 0 ? 0u - static_cast<uint32_t>(a) : static_cast<uint32_t>(a);
+    return a < 0 ? wrap_sub(0u, static_cast<uint32_t>(a)) : static_cast<uint32_t>(a);
 }
 
 /// Shifts by a count that is taken modulo 256, as the ARM's register shifts do: 32 and more give 0,
@@ -78,7 +84,7 @@ constexpr uint32_t umul_high(uint32_t a, uint32_t b) noexcept
 constexpr int32_t smul_high(int32_t a, int32_t b) noexcept
 {
     const uint32_t high = umul_high(magnitude(a), magnitude(b));
-    return static_cast<int32_t>((a ^ b) < 0 ? 0u - high : high);
+    return static_cast<int32_t>((a ^ b) < 0 ? wrap_sub(0u, high) : high);
 }
 
 /// The low 32 bits of a 64-bit value.
@@ -97,7 +103,7 @@ constexpr int32_t saturate_abs(int32_t a) noexcept
 /// The smallest power of two that is not below `word`; 0 for 0 and above 2^31.
 constexpr uint32_t next_power_of_two(uint32_t word) noexcept
 {
-    const uint32_t below = word - 1;
+    const uint32_t below = wrap_sub(word, 1u);
     return shift_left(uint32_t{1}, 32 - leading_zeros(below));
 }
 

@@ -83,8 +83,8 @@ int32_t add_products(int32_t sum, Samples samples, const Taps& taps, size_t firs
         const int64_t product = smul(samples[samples.size() - 1 - k], tap);
         const auto high = static_cast<uint32_t>(static_cast<uint64_t>(product) >> 32);
         const auto low = static_cast<uint32_t>(low_word(product));
-        sum = static_cast<int32_t>(static_cast<uint32_t>(sum) + shift_left(high, shift) +
-                                   shift_right(low, 32 - shift));
+        const uint32_t shifted = wrap_add(shift_left(high, shift), shift_right(low, 32 - shift));
+        sum = wrap_add(sum, static_cast<int32_t>(shifted));
     }
     return sum;
 }

@@ -64,7 +64,7 @@ Registered** Registry::find(int32_t number) noexcept
 int32_t Registry::next_number() noexcept
 {
     do {
-        last_number_ = static_cast<int32_t>(static_cast<uint32_t>(last_number_) + 1);
+        last_number_ = static_cast<int32_t>(int64_t{last_number_} + 1);
     } while (last_number_ == 0 || *find(last_number_) != nullptr);
     return last_number_;
 }

@@ -89,11 +89,11 @@ void rank_values(std::span<const uint32_t> histogram, std::span<uint32_t> ranks)
     uint32_t total = 0;
     for (size_t i = 0; i < histogram.size(); ++i) {
         cumulative += histogram[i];
-        total += histogram[i] * cumulative;
+        total = wrap_add(total, wrap_mul(histogram[i], cumulative));
         ranks[i] = cumulative;
     }
     for (uint32_t& rank : ranks) {
-        rank = (rank << 15) - total;
+        rank = wrap_sub(shift_left(rank, 15), total);
     }
 }
 

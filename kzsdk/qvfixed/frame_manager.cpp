@@ -38,7 +38,7 @@ void make_parts(Manager& m, const kzqvfixed_config& config) noexcept
 {
     m.frame_length = shift_left(1U, static_cast<int32_t>(config.frame_length_log2));
     m.half_length = m.frame_length / 2;
-    m.dct = KZDSP_DCT_fixed_create(static_cast<int32_t>(config.frame_length_log2 - 1));
+    m.dct = KZDSP_DCT_fixed_create(static_cast<int32_t>(int64_t{config.frame_length_log2} - 1));
     if (m.dct == nullptr) {
         return; // before a frame of an absurd length is allocated
     }
@@ -205,7 +205,7 @@ int32_t deviation_shift(int32_t largest) noexcept
 void take_spreads(const Manager& m, Statistics& s) noexcept
 {
     const int32_t shift = deviation_shift(s.largest_deviation);
-    const int32_t reciprocal = normalised_reciprocal(m.frame_count - 1);
+    const int32_t reciprocal = normalised_reciprocal(wrap_sub(m.frame_count, 1U));
     for (uint32_t band = 0; band < m.band_count; ++band) {
         int32_t squares = 0;
         for (const Record* r = m.records; r != nullptr; r = r->next) {

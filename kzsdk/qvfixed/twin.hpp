@@ -6,6 +6,7 @@
 #include <span>
 
 #include "kzsdk/dsp/convert.h"
+#include "kzsdk/dsp/fxp_ops.hpp"
 #include "kzsdk/qv/fingerprinter.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
@@ -83,7 +84,7 @@ struct Twin {
     /// In 32 bits: wraps beyond 4.29 million samples (390 s).
     static uint32_t milliseconds(const Object& o, uint32_t samples) noexcept
     {
-        return samples * 1000 / (o.working_rate >> 12);
+        return fxp::wrap_mul(samples, 1000U) / (o.working_rate >> 12);
     }
 };
 

@@ -179,7 +179,7 @@ float amplitude_spread(const QVFM& m, uint32_t band) noexcept
         const float deviation = r->amplitude[band] - average;
         squares += deviation * deviation;
     }
-    return root(squares / static_cast<float>(m.frame_count - 1));
+    return root(squares / static_cast<float>(kz::fxp::wrap_sub(m.frame_count, 1U)));
 }
 
 // Each value as its share of their sum. 32768 is the whole, and wraps in 16 bits to -32768; a share

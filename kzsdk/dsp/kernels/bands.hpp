@@ -15,7 +15,7 @@ template <class Simd>
 void apply_ramp(int32_t* words, uint32_t count, int32_t gain, int32_t step) noexcept
 {
     const auto lane = [](size_t k, int32_t unit) noexcept {
-        return static_cast<int32_t>(static_cast<uint32_t>(k) * static_cast<uint32_t>(unit));
+        return static_cast<int32_t>(static_cast<int64_t>(k) * unit);
     };
     int32_t offsets[Simd::kLanes];
     for (size_t k = 0; k < Simd::kLanes; ++k) {

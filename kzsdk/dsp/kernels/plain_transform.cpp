@@ -76,7 +76,8 @@ void dct_fixed(int32_t* x, const int32_t* factors, int32_t order) noexcept
 {
     const std::span<int32_t> words(x, size_t{1} << order);
     transform(
-        words, order, [&](int32_t stage) { run_stage(words, factors, stage); }, wrap_add);
+        words, order, [&](int32_t stage) { run_stage(words, factors, stage); },
+        [](int32_t a, int32_t b) noexcept { return wrap_add(a, b); });
 }
 
 void dct_float(float* x, const float* factors, int32_t order) noexcept
