@@ -1,8 +1,8 @@
 #!/bin/sh
 # Installs what is missing to build and test the library on Debian 12.
 #
-#   scripts/setup.sh [build] [java] [tools] [test] [clips] [bench] [lint] [clang] [fuzz] [arch]
-#                                                  default: all of them but arch, the cross compilers
+#   scripts/setup.sh [build] [java] [tools] [test] [clips] [bench] [lint] [clang] [fuzz] [coverage] [arch]
+#                                 default: all of them but coverage, and arch, the cross compilers
 #
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
 set -eu
@@ -20,6 +20,7 @@ packages_of() {
     fuzz) echo "libexpat1-dev python3" ;; # a parser to read what is rendered, and the seeds
     lint) echo "clang-format-14 clang-tidy-14 cppcheck mandoc" ;;
     clang) echo "clang-14 libclang-rt-14-dev" ;;
+    coverage) echo "llvm-14" ;; # what counts
     arch) echo "g++-aarch64-linux-gnu g++-arm-linux-gnueabihf g++-arm-linux-gnueabi g++-s390x-linux-gnu g++-i686-linux-gnu qemu-user" ;;
     *)
         echo "setup: no such group: $1" >&2
