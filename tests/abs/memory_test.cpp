@@ -125,6 +125,15 @@ TEST_F(Memory, AZeroSizeIsPassedToTheHeap)
     EXPECT_EQ(KZ_OK, _kzmem_free(b));
 }
 
+// Whether the heap then gives null (most do) or an empty block, the old block is gone.
+TEST_F(Memory, ResizingToNothingFreesTheBlock)
+{
+    const int64_t before = live_blocks();
+    void* resized = _kzmem_realloc(_kzmem_malloc(8), 0);
+    EXPECT_EQ(before + (resized != nullptr ? 1 : 0), live_blocks());
+    EXPECT_EQ(KZ_OK, _kzmem_free(resized));
+}
+
 TEST_F(Memory, FreeingNullSucceeds) { EXPECT_EQ(KZ_OK, _kzmem_free(nullptr)); }
 
 TEST_F(Memory, AFailedReallocLeavesTheOldBlock)

@@ -110,6 +110,16 @@ TEST_F(ResamplerFixed, RefusesUnknownPairs)
     EXPECT_FALSE(make(44100, 22050));
 }
 
+TEST_F(ResamplerFixed, FractionsOfAHertzAreDropped)
+{
+    KZDSP_resampler_fixed* const r =
+        KZDSP_resampler_fixed_create((44100U << 15) + 32767, (kWorkingRate << 15) + 32767);
+    ASSERT_NE(nullptr, r);
+    EXPECT_EQ(4U, r->down);
+    KZDSP_resampler_fixed_destroy(r);
+    EXPECT_EQ(nullptr, KZDSP_resampler_fixed_create(32767, 32767)); // 0.99997 Hz counts as none
+}
+
 // Every output of a stream must be the one dot product that its place in the stream asks for,
 // however the stream is cut and however little room the caller has: nothing lost, nothing twice.
 TEST_F(ResamplerFixed, CutsShowInTheLastBitsOnly)

@@ -80,6 +80,17 @@ TEST_F(Extraction, AFailedCreateReturnsTheFingerprintersStatusAndKeepsTheHandle)
     EXPECT_EQ(untouched, handle);
 }
 
+// The place is looked at last: what fails before it returns its status. Blocks are not counted
+// here: the test framework frees some of its own for each death.
+TEST(ExtractionDeath, FollowsANullPlaceForTheHandleOnSuccessOnly)
+{
+    ASSERT_EQ(KZ_OK, kzmem_initialize(0, 0));
+    EXPECT_EQ(0x90080606U, kz_fpx_fingerprint_create(3, 2, 44100, 1, nullptr));
+    EXPECT_EQ(0x900f0004U, kz_fpx_fingerprint_create(1, 5, 44100, 1, nullptr));
+    EXPECT_DEATH(static_cast<void>(kz_fpx_fingerprint_create(1, 2, 44100, 1, nullptr)), "");
+    EXPECT_EQ(KZ_OK, kzmem_shutdown());
+}
+
 TEST_F(Extraction, AddAudioRefusesNullsWithoutCallingTheFingerprinter)
 {
     kz_fpx_handle* handle = counting_handle(&frees);
@@ -153,6 +164,26 @@ TEST_F(Extraction, OnlyTheFloatingPointAlgorithmTakesOtherRates)
         EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_create(2, 2, rate, 1, &handle));
         EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
     }
+}
+
+// What is freed while the memory manager is off is not: nothing tells so, and the caller's pointer
+// is gone. It is freed here by a copy of that pointer.
+TEST_F(Extraction, FreeingWithMemoryOffReportsSuccessAndFreesNothing)
+{
+    kz_fpx_handle* handle = create();
+    kz_fpx_handle* kept_handle = handle;
+    char* text = static_cast<char*>(_kzmem_malloc(8));
+    char* kept_text = text;
+    const int64_t before = live_blocks();
+    kzmem_shutdown();
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_serialize_free(&text));
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
+    kzmem_initialize(0, 0);
+    EXPECT_EQ(before, live_blocks());
+    EXPECT_EQ(nullptr, text);
+    EXPECT_EQ(nullptr, handle);
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_serialize_free(&kept_text));
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&kept_handle));
 }
 
 TEST_F(Extraction, NothingWorksBeforeTheLibraryIsStarted)

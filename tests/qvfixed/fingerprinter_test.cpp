@@ -69,6 +69,26 @@ TEST_F(FixedFingerprinter, CutsLoseNoSampleAtAnyRate)
     }
 }
 
+// The detector judges what the conversion and the resampler leave: the same tone is signal at one
+// channel count or rate and silence at another.
+TEST_F(FixedFingerprinter, TheStartOfTheSignalDependsOnChannelsAndRate)
+{
+    const auto hears = [](uint32_t rate, uint32_t channels, int16_t level) {
+        std::vector<int16_t> square(size_t{rate} * channels);
+        for (size_t i = 0; i < square.size(); ++i) {
+            const bool high = i / channels * 200 / rate % 2 == 0; // 100 Hz
+            square[i] = static_cast<int16_t>(high ? level : -level);
+        }
+        const auto object = make_fingerprinter<Fixed>(rate, kPcm16, channels);
+        feed(*object, square, 0, square.size());
+        return object->searching_for_signal == 0;
+    };
+    EXPECT_FALSE(hears(11025, 1, 40));
+    EXPECT_TRUE(hears(11025, 2, 40));
+    EXPECT_TRUE(hears(11025, 1, 80));
+    EXPECT_FALSE(hears(44100, 1, 80));
+}
+
 // Times are for callers inside the library; the document does not hold them.
 TEST_F(FixedFingerprinter, TimesWrapAt32Bits)
 {

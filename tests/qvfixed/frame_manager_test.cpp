@@ -165,6 +165,19 @@ TEST_F(FixedFrameManager, SpreadsAreStandardDeviationsForEightToFifteenFrames)
     }
 }
 
+TEST_F(FixedFrameManager, TheConfiguredScaleIsNotRead)
+{
+    const auto none =
+        make_manager<Fixed>([](kzqvfixed_config& config) { config.fingerprint_scale = 0; });
+    const auto usual = make_manager<Fixed>();
+    for (uint32_t number = 0; number < 3; ++number) {
+        append(*none, tune_frame(number));
+        append(*usual, tune_frame(number));
+    }
+    EXPECT_EQ(fingerprint(*usual), fingerprint(*none));
+    EXPECT_NE(0, fingerprint(*none)[0]);
+}
+
 // The whole range of deviations, the largest included, for which the shift would be negative.
 TEST_F(FixedFrameManager, ExtremeFeaturesWrapAndReturn)
 {

@@ -52,6 +52,7 @@ void* __wrap_realloc(void* block, size_t size)
     }
     void* resized = __real_realloc(block, size);
     blocks += (block == nullptr && resized != nullptr);
+    blocks -= (block != nullptr && resized == nullptr && size == 0); // freed, not failed
     return resized;
 }
 
