@@ -61,11 +61,12 @@ KZ_API void* _kzmem_malloc(uint32_t size) KZ_NOEXCEPT;
 KZ_API void* _kzmem_calloc(uint32_t count, uint32_t size) KZ_NOEXCEPT;
 
 /**
- * Resizes a block as `realloc` does, a size of 0 included.
+ * Resizes a block as `realloc` does, a size of 0 included: that frees the block and mostly returns
+ * null, so the block must not be freed again. Use _kzmem_free() instead.
  *
  * @param block  A block of the library's, or null.
  * @return The resized block; null when the manager is off or the heap fails, with the old block
- *         untouched and still the caller's.
+ *         untouched and still the caller's (unless the size was 0).
  */
 KZ_API void* _kzmem_realloc(void* block, uint32_t size) KZ_NOEXCEPT;
 

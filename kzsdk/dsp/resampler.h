@@ -31,7 +31,7 @@ typedef struct KZDSP_resampler_fixed {
 } KZDSP_resampler_fixed;
 
 /**
- * Makes a resampler between two rates.
+ * Makes a resampler between two rates, of which fractions of a hertz are dropped.
  *
  * @param input_rate   Q15: hertz times 32768. 8000, 16000, 22050, 24000, 32000, 44100 or 48000 Hz.
  * @param output_rate  Q15: 11025 Hz. Two further pairs are known: 2 and 1 "Hz", which halves any

@@ -34,7 +34,8 @@ enum {
 };
 
 /**
- * Makes a fingerprint in the making.
+ * Makes a fingerprint in the making. Note the order: the format comes before the rate here, and
+ * after it in the fingerprinters' own constructors.
  *
  * @param algorithm    One of the algorithm numbers.
  * @param format       One of the input formats.
@@ -70,7 +71,8 @@ KZ_API kz_status kz_fpx_fingerprint_add_audio(kz_fpx_handle* handle, const void*
                                               uint8_t* out_complete) KZ_NOEXCEPT;
 
 /**
- * Renders the query document of a complete fingerprint: UTF-8 XML, NUL-terminated.
+ * Renders the query document of a complete fingerprint: UTF-8 XML, NUL-terminated. When memory runs
+ * short, a text that lacks the version or the name, or is malformed, may come out as a success.
  *
  * @param[out] out_text  The text, which the caller frees with kz_fpx_fingerprint_serialize_free();
  *                       null on failure.
@@ -82,12 +84,16 @@ KZ_API kz_status kz_fpx_fingerprint_serialize(kz_fpx_handle* handle, char** out_
 /**
  * Frees a text of kz_fpx_fingerprint_serialize() and sets the caller's pointer to null.
  *
+ * While the memory manager is off nothing is freed: the text is lost, and 0 is returned.
+ *
  * @return 0, also when *text_ref is null; 0x90080004 when @p text_ref is null.
  */
 KZ_API kz_status kz_fpx_fingerprint_serialize_free(char** text_ref) KZ_NOEXCEPT;
 
 /**
  * Frees a handle and sets the caller's pointer to null, whatever the outcome.
+ *
+ * While the memory manager is off nothing is freed: the handle is lost, and 0 is returned.
  *
  * @return 0, also when *handle_ref is null; 0x90080004 when @p handle_ref is null; else the
  *         fingerprinter's status.

@@ -71,6 +71,8 @@ KZ_API kz_status kzqvfixed_config_copy_freq_table(const kzqvfixed_config* config
  *
  * @param table  @p count bins, in pairs; a last odd one is ignored. Null leaves no table. May be
  *               the record's own. Bins outside the spectrum are cut to it when a frame is analysed.
+ *               Amplitudes are weighted by a band's number, for the default widths; those beyond
+ *               the fifteenth are 0.
  * @return 0 in every case; when memory is short the record is left without a table.
  */
 KZ_API kz_status kzqvfixed_config_set_freq_table(kzqvfixed_config* config, const int32_t* table,
@@ -112,6 +114,9 @@ KZ_API kz_status kzqvfixed_signal_detector_reset(kzqvfixed_signal_detector* dete
 
 /**
  * Looks for the start of the signal in the next block of a stream.
+ *
+ * What counts as signal depends on the level that conversion and resampling have left: stereo
+ * counts twice what mono does, 22050 and 44100 Hz half of what other rates do.
  *
  * The first block after a reset serves twice: its first W samples fill the rings (zeros where it is
  * shorter), and are then scanned like all others.

@@ -261,9 +261,8 @@ KZ_API kz_status SetXMLTagNameFromStr(XMLTag* tag, const char* name) KZ_NOEXCEPT
  *   GetXMLSubTagFromPath     a sub-tag of the tag    matches nothing      a sub-tag
  *   GetXMLSubTagData         a sub-tag of the tag    matches nothing      a sub-tag
  *   SetXMLSubTagDataFromStr  a sub-tag of the tag    is refused           a sub-tag
- *   XMLGetDataAtPath         the tag's own name      any number skipped   an attribute, else a
- * sub-tag XMLSetValueAtPath        a sub-tag of the tag    one skipped          what the resolver
- * says
+ *   XMLGetDataAtPath         the tag's own name      any number skipped   attribute or sub-tag
+ *   XMLSetValueAtPath        a sub-tag of the tag    one skipped          what the resolver says
  */
 
 /**
@@ -430,7 +429,8 @@ KZ_API kz_status SetMapXMLAttrValue(XMLMapAttrValue function) KZ_NOEXCEPT;
  *
  * Every element has a start tag and an end tag; attributes stand in double quotes, in list order. A
  * tag with data and no sub-tags takes one line; with sub-tags its data comes first, on a line of
- * its own. In data and values `<`, `>`, `&`, `'` and `"` are written as entities.
+ * its own, and so gains white space with @p indent or @p newlines on. In data and values `<`, `>`,
+ * `&`, `'` and `"` are written as entities.
  *
  * With @p indent on, a failure inside an element (memory, or a sub-tag without a name) is forgotten
  * when the element's own end tag is indented: the text is then malformed but not null. Where that

@@ -333,6 +333,20 @@ TEST(Convert, NoFramesWriteNothing)
     }
 }
 
+// A count below 0 is read as one of billions.
+TEST(ConvertDeath, ANegativeFrameCountRunsOverTheOutput)
+{
+    const std::vector<uint8_t> input(64, 0x81);
+    std::vector<FxpType> words(16);
+    for (const auto& converter : fixed_converters()) {
+        EXPECT_DEATH(converter.convert(1, input.data(), words.data(), -1), "") << converter.name;
+    }
+    std::vector<float> floats(16);
+    for (const auto& converter : float_converters()) {
+        EXPECT_DEATH(converter.convert(1, input.data(), floats.data(), -1), "") << converter.name;
+    }
+}
+
 TEST(Convert, NoChannelsReadNothingAndGiveZeros)
 {
     constexpr int32_t kLeast = std::numeric_limits<int32_t>::min();
