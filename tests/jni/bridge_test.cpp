@@ -285,6 +285,14 @@ TEST(Environment, IsThatOfTheThreadWhenTheVmKnowsIt)
     EXPECT_EQ(Calls{"environment"}, vm_state.calls);
 }
 
+TEST(Environment, IsNullWithoutAVm)
+{
+    vm_state = {};
+    android::AndroidRuntime::setJavaVM(nullptr);
+    EXPECT_EQ(nullptr, android::AndroidRuntime::getJNIEnv());
+    EXPECT_EQ(Calls{}, vm_state.calls);
+}
+
 TEST(Environment, AttachesAnUnknownThreadAndDetachesItAtItsEnd)
 {
     vm_state = {};

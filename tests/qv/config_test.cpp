@@ -109,6 +109,20 @@ TYPED_TEST(Config, AFailedCopyLeavesNoTable)
     EXPECT_EQ(nullptr, TypeParam::create_frame_manager(config.get()));
 }
 
+TYPED_TEST(Config, ATableMayBeEmpty)
+{
+    const int64_t before = live_blocks();
+    {
+        const auto config = make_config<TypeParam>();
+        const typename TypeParam::Edge table[] = {1, 2};
+        EXPECT_EQ(KZ_OK, TypeParam::set_freq_table(config.get(), table, 0));
+        EXPECT_EQ(0U, config->freq_table_count);
+        const OwnedManager<TypeParam> manager(TypeParam::create_frame_manager(config.get()));
+        EXPECT_TRUE(manager) << "of frames without bands";
+    }
+    EXPECT_EQ(before, live_blocks());
+}
+
 TYPED_TEST(Config, NullsAreIgnored)
 {
     typename TypeParam::Edge* table = nullptr;
