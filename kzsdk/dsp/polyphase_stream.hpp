@@ -205,15 +205,15 @@ BlockCounts resample_block(Resampler& r, std::span<const Sample> input, std::spa
     uint64_t oldest = 0; // first sample of the block that is still needed
     auto left = output;  // outputs that are not made yet
     const auto take_outputs = [&](uint64_t wanted) {
-        const auto taken = left.first(std::min<uint64_t>(left.size(), wanted));
+        const auto taken = left.first(static_cast<size_t>(std::min<uint64_t>(left.size(), wanted)));
         left = left.subspan(taken.size());
         return taken;
     };
     if (pending != 0 && !left.empty() && needed <= available) {
         const auto outputs = take_outputs(
             std::min(outputs_beginning_before(r, pending), outputs_inside(r, available - needed)));
-        across(std::span<const Sample>(r.history + r.history_start, pending), input, r.phase,
-               outputs);
+        across(std::span<const Sample>(r.history + r.history_start, static_cast<size_t>(pending)),
+               input, r.phase, outputs);
         const uint64_t moved = advance(r, outputs.size());
         needed += moved;
         if (moved < pending) {
@@ -232,7 +232,8 @@ BlockCounts resample_block(Resampler& r, std::span<const Sample> input, std::spa
         oldest += moved;
     }
     const uint64_t consumed = std::min(needed, available);
-    keep_tail(r, input.subspan(oldest, consumed - oldest));
+    keep_tail(r,
+              input.subspan(static_cast<size_t>(oldest), static_cast<size_t>(consumed - oldest)));
     return {static_cast<uint32_t>(consumed), static_cast<uint32_t>(output.size() - left.size())};
 }
 
