@@ -18,6 +18,8 @@ if [ $# -eq 0 ]; then
 fi
 
 mkdir -p "$home"
+home=$(cd "$home" && pwd)
+programs=$(cd "$programs" && pwd)
 fuzz/seeds.py "$home/seeds"
 failed=0
 for target in "$@"; do

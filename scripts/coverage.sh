@@ -12,6 +12,11 @@ build=$PWD/build/coverage
 jobs=${JOBS:-$(getconf _NPROCESSORS_ONLN)}
 corpus=${FUZZ_HOME:-$PWD/build/fuzz/home}/corpus
 [ $# -gt 0 ] || set -- tests corpus
+if [ "${SETUP:-yes}" != no ]; then
+    scripts/setup.sh build java tools test clips clang fuzz coverage
+fi
+mkdir -p "$corpus"
+corpus=$(cd "$corpus" && pwd)
 
 # The counters change the built files; the tests that read those are left out.
 run_tests() {

@@ -1,6 +1,6 @@
 /**
  * @file
- * Discrete cosine transform, type II, in place.
+ * Discrete cosine transform, type II, in place. A call needs up to 100 KB of stack.
  */
 #ifndef KZSDK_DSP_DCT_H
 #define KZSDK_DSP_DCT_H

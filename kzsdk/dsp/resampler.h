@@ -6,7 +6,8 @@
  * still need. It is a polyphase filter: with L the up and M the down factor of the ratio, each
  * output is one dot product of the newest P samples with every L-th tap of a low-pass prototype.
  *
- * Threads: one thread per resampler at a time; the tables are constants and shared.
+ * Threads: one thread per resampler at a time; the tables are constants and shared. A call needs up
+ * to 100 KB of stack.
  */
 #ifndef KZSDK_DSP_RESAMPLER_H
 #define KZSDK_DSP_RESAMPLER_H

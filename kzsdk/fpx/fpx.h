@@ -5,7 +5,8 @@
  * Order of calls: create; add audio, once or in pieces, until the complete flag is set; serialize;
  * serialize_free; free. The library must have been started (kzinit_initialize_vesk()).
  *
- * Threads: handles are independent of each other; one handle belongs to one thread at a time.
+ * Threads: handles are independent of each other; one handle belongs to one thread at a time. A
+ * call needs up to 100 KB of stack.
  */
 #ifndef KZSDK_FPX_FPX_H
 #define KZSDK_FPX_FPX_H

@@ -56,8 +56,7 @@ public:
         return std::clamp(level, 0, top_level_);
     }
 
-    // The same, for the samples from whose extremes this was made, as bytes. There are at most 256
-    // levels; none comes out below 0, because no sample lies below the bottom.
+    // The same as bytes: there are at most 256 levels.
     void write_levels(Samples samples, uint8_t* levels) const noexcept
     {
         kz::dsp::kernels().word_levels({bottom_, scale_, shift_, top_level_}, samples.data(),

@@ -90,6 +90,20 @@ TEST_F(FixedEqualiser, NoLevelFallsOutsideForAnyNumberOfLevels)
     }
 }
 
+// The levels of the first piece are written over the second before that one is read.
+TEST_F(FixedEqualiser, PiecesThatOverlapTheOutputStayInsideTheTables)
+{
+    constexpr uint32_t kLevels = 16;
+    Words words(47);
+    for (int32_t i = 0; i < 47; ++i) {
+        words[static_cast<size_t>(i)] = (1 << 30) + (i % 2) * (1 << 29) + 1000 * i;
+    }
+    std::vector<uint32_t> histogram(kLevels);
+    kzqvfixed_hist_eq_dual(words.data() + 37, 10, words.data(), 27, words.data(), 37,
+                           histogram.data(), kLevels);
+    EXPECT_EQ(37U, std::accumulate(histogram.begin(), histogram.end(), 0U));
+}
+
 TEST_F(FixedEqualiser, ASpreadOf256LevelsTouchesBothEnds)
 {
     Words frame = random_frame(32768, 29, 4);

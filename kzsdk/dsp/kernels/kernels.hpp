@@ -2,11 +2,12 @@
 /// The inner loops that exist in several variants, and the choice among them.
 ///
 /// A variant is one table of functions, compiled for one instruction set. Every variant gives the
-/// same words as the plain one for every input; tests/dsp/kernels holds all of them to that. The
-/// best one that the processor has is taken at the first use and kept.
+/// same words as the plain one for every input, the bits of NaNs apart; tests/dsp/kernels holds all
+/// of them to that. The best one that the processor has is taken at the first use and kept.
 ///
 /// For tests and measurements the environment variable KZSDK_KERNELS pins a variant by its name.
-/// A name that the build or the processor does not know is ignored.
+/// A name that the build or the processor does not know is ignored. It is read once, at the first
+/// use; a host that changes its environment meanwhile races with that as with any getenv().
 #pragma once
 
 #include <array>

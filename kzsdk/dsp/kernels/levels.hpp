@@ -69,7 +69,8 @@ uint32_t write_levels(uint8_t* levels, uint32_t count, LevelOf level_of) noexcep
     return whole;
 }
 
-// Neither factor is negative, so the product's upper half is truncated and rounded down alike.
+// Where neither factor is negative, the product's upper half is truncated and rounded down alike;
+// where one is, both give a level that is raised to 0.
 template <class Simd>
 void word_levels(const kz::dsp::WordLevels& rule, const int32_t* samples, uint8_t* levels,
                  uint32_t count) noexcept
@@ -80,7 +81,8 @@ void word_levels(const kz::dsp::WordLevels& rule, const int32_t* samples, uint8_
     const uint32_t done = write_levels<Simd>(levels, count, [&](size_t i) noexcept {
         const auto halved = Simd::template shift_right<1>(Simd::load(samples + i));
         const auto scaled = Simd::template product_bits<32>(Simd::sub(halved, bottom), scale);
-        return Simd::smaller(Simd::shift_right(scaled, rule.shift), top);
+        const auto level = Simd::smaller(Simd::shift_right(scaled, rule.shift), top);
+        return Simd::larger(level, Simd::all(0));
     });
     kz::dsp::plain::word_levels(rule, samples + done, levels + done, count - done);
 }

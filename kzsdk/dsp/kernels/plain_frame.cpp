@@ -30,7 +30,7 @@ void word_levels(const WordLevels& rule, const int32_t* samples, uint8_t* levels
     for (uint32_t i = 0; i < count; ++i) {
         const int32_t level =
             smul_high(wrap_sub(samples[i] >> 1, rule.bottom), rule.scale) >> rule.shift;
-        levels[i] = static_cast<uint8_t>(std::min(level, rule.top));
+        levels[i] = static_cast<uint8_t>(std::clamp(level, 0, rule.top));
     }
 }
 

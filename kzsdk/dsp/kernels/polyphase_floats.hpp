@@ -198,12 +198,12 @@ private:
         for (size_t r = 0; r < Count; ++r) {
             taps[r] = rows[r].taps + (rows[r].newest - from) * stride;
         }
-        for (size_t step = from; step != to; --step) {
+        size_t tap_at = 0; // not a pointer: the one behind the last tap may be far outside
+        for (size_t step = from; step != to; --step, tap_at += stride) {
             const float* samples = columns_ + step * kWidth;
 #pragma GCC unroll 8
             for (size_t r = 0; r < Count; ++r) {
-                const Floats tap = Simd::all(*taps[r]);
-                taps[r] += stride;
+                const Floats tap = Simd::all(taps[r][tap_at]);
                 for (size_t v = 0; v < Vectors; ++v) {
                     const Floats sample = Simd::load(samples + v * kLanes);
                     sums[r][v] = Simd::add(sums[r][v], Simd::mul(sample, tap));

@@ -121,12 +121,14 @@ TEST_P(FrameVariants, GiveWordsTheSameLevels)
 {
     for (const int shift : {0, 1, 6, 24}) {
         const auto samples = noise_of(kMost, shift, 3);
-        const int32_t bottom = *std::ranges::min_element(samples) >> 1;
+        const int32_t lowest = *std::ranges::min_element(samples) >> 1;
         for (const int32_t scale : {0, 1, 255 << 22, 0x55555555, kHighest}) {
             for (const int32_t down : {0, 3, 21, 31}) {
                 for (const int32_t top : {0, 1, 200, 255}) {
-                    expect_levels(variant().word_levels, plain().word_levels,
-                                  {bottom, scale, down, top}, samples);
+                    for (const int32_t bottom : {lowest, lowest / 2, 1 << 20}) {
+                        expect_levels(variant().word_levels, plain().word_levels,
+                                      {bottom, scale, down, top}, samples);
+                    }
                 }
             }
         }
