@@ -212,7 +212,11 @@ TEST_F(Threads, MaySwitchTheDiscFamiliesWhileOthersUseThem)
                 }
             }
         }
+        if (i == 0) { // what others still have open is closed while it is on
+            EXPECT_EQ(KZ_OK, kzdvdfs_initialize());
+        }
     });
+    EXPECT_EQ(KZ_OK, kzdvdfs_shutdown());
 }
 
 } // namespace

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <algorithm>
+#include <bit>
 #include <cstddef>
 #include <cstdint>
 #include <span>
@@ -40,6 +41,9 @@ static_assert(inverted_alaw_value(0xaa) == -32256 && inverted_alaw_value(0xd5) =
 
 constexpr size_t bytes_per_sample(Format format) { return format == Format::pcm16 ? 2 : 1; }
 
+/// Which byte of a 16-bit sample is the low one, in the processor's order.
+inline constexpr size_t kLowByte = std::endian::native == std::endian::little ? 0 : 1;
+
 /// One sample as an integer; 8-bit samples below the middle come out as 128..255.
 constexpr int32_t sample_value(Format format, std::span<const uint8_t> bytes)
 {
@@ -47,7 +51,8 @@ constexpr int32_t sample_value(Format format, std::span<const uint8_t> bytes)
     case Format::pcm8:
         return bytes[0] ^ 0x80;
     case Format::pcm16:
-        return static_cast<int16_t>(static_cast<uint16_t>(bytes[0] | bytes[1] << 8));
+        return static_cast<int16_t>(
+            static_cast<uint16_t>(bytes[kLowByte] | bytes[1 - kLowByte] << 8));
     case Format::alaw:
         return inverted_alaw_value(bytes[0]);
     case Format::ulaw:

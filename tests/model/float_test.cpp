@@ -3,6 +3,7 @@
 #include "model/float_frame.hpp"
 
 #include <algorithm>
+#include <array>
 #include <bit>
 #include <memory>
 
@@ -29,6 +30,15 @@ std::vector<uint32_t> bits(std::span<const float> samples)
     std::transform(samples.begin(), samples.end(), words.begin(),
                    [](float sample) { return std::bit_cast<uint32_t>(sample); });
     return words;
+}
+
+/// The word whose bytes lie from the lowest to the highest, as those of frame data do.
+uint32_t little_endian(uint32_t word)
+{
+    const std::array<uint8_t, 4> bytes = {
+        static_cast<uint8_t>(word), static_cast<uint8_t>(word >> 8),
+        static_cast<uint8_t>(word >> 16), static_cast<uint8_t>(word >> 24)};
+    return std::bit_cast<uint32_t>(bytes);
 }
 
 struct FloatMaterial {
@@ -288,6 +298,7 @@ TEST_F(ModelFloat, ValuesAgreeForRandomFeatures)
                 data.push_back(bits(frame.amplitude)[band]);
             }
         }
+        std::ranges::transform(data, data.begin(), little_endian);
         ASSERT_EQ(1u, QVFM_AppendFrameData(manager.get(), data.data(),
                                            static_cast<uint32_t>(data.size() * 4)));
         Values values{};
