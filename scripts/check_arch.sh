@@ -130,7 +130,7 @@ check() {
 groups="build"
 case $ways in *clang*) groups="$groups clang" ;; esac
 case $ways in *aarch64* | *arm* | *s390x* | *i686*) groups="$groups arch" ;; esac
-case $ways in *-tests*) groups="$groups test" ;; esac
+case $ways in *-tests*) groups="$groups test wide" ;; esac
 if [ "${SETUP:-yes}" != no ]; then
     # shellcheck disable=SC2086 # likewise
     scripts/setup.sh $groups

@@ -1,8 +1,8 @@
 #!/bin/sh
 # Installs what is missing to build and test the library on Debian 12.
 #
-#   scripts/setup.sh [build] [java] [tools] [test] [clips] [bench] [lint] [clang] [fuzz] [coverage] [arch]
-#                                 default: all of them but coverage, and arch, the cross compilers
+#   scripts/setup.sh [build] [java] [tools] [test] [clips] [bench] [lint] [clang] [fuzz] [coverage] [arch] [wide]
+#                                 default: all of them but the last three
 #
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
 set -eu
@@ -21,7 +21,9 @@ packages_of() {
     lint) echo "clang-format-14 clang-tidy-14 cppcheck mandoc" ;;
     clang) echo "clang-14 libclang-rt-14-dev" ;;
     coverage) echo "llvm-14" ;; # what counts
+    # Cross compilers, and what runs their programs.
     arch) echo "g++-aarch64-linux-gnu g++-arm-linux-gnueabihf g++-arm-linux-gnueabi g++-s390x-linux-gnu g++-i686-linux-gnu qemu-user" ;;
+    wide) echo "libboost-dev" ;; # 128-bit numbers for tests on processors whose compilers have none
     *)
         echo "setup: no such group: $1" >&2
         exit 2

@@ -9,12 +9,12 @@
 
 #include "kzsdk/dsp/fxp_ops.hpp"
 #include "support/signals.hpp"
+#include "support/wide.hpp"
 
 namespace {
 
 using kz::test::Random;
-
-__extension__ typedef __int128 Wide;
+using kz::test::Wide;
 
 constexpr int32_t kLeast = std::numeric_limits<int32_t>::min();
 constexpr int32_t kMost = std::numeric_limits<int32_t>::max();

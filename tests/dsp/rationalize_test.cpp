@@ -6,6 +6,7 @@
 
 #include "kzsdk/dsp/resampler.h"
 #include "support/signals.hpp"
+#include "support/wide.hpp"
 
 namespace kz::test {
 
@@ -42,8 +43,8 @@ Fraction reduced(uint32_t numerator, uint32_t denominator)
 // |f - p/q| < 1 / scale, in whole numbers.
 bool closer_than(const Fraction& f, int64_t p, int64_t q, int64_t scale)
 {
-    const __int128 distance = __int128{f.numerator} * q - __int128{p} * f.denominator;
-    return (distance < 0 ? -distance : distance) * scale < __int128{f.denominator} * q;
+    const Wide distance = Wide{f.numerator} * q - Wide{p} * f.denominator;
+    return (distance < 0 ? -distance : distance) * scale < Wide{f.denominator} * q;
 }
 
 constexpr double kInfinity = std::numeric_limits<double>::infinity();
@@ -203,7 +204,7 @@ TEST(Rationalize, AgreesWithConvergentsInExactArithmetic)
             h = std::exchange(h_before, h) + a * h_before;
             k = std::exchange(k_before, k) + a * k_before;
             const int64_t rest = dividend - a * divisor;
-            const __int128 distance = __int128{h} * q - __int128{p} * k;
+            const Wide distance = Wide{h} * q - Wide{p} * k;
             const auto off = static_cast<double>(distance < 0 ? -distance : distance) /
                              (std::abs(static_cast<double>(k)) * static_cast<double>(q));
             sure = sure && std::abs(off * static_cast<double>(scale) - 1) > 1e-6;

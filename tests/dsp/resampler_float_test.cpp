@@ -36,13 +36,13 @@ Samples expected_outputs_of(const KZDSP_resampler& fresh, const Samples& input)
     padded.insert(padded.end(), input.begin(), input.end());
     Samples outputs;
     for (uint64_t n = 0;; ++n) {
-        const uint64_t oldest = n * fresh.down / fresh.up;
-        const uint64_t phase = (n + 1) * fresh.down % fresh.up;
+        const auto oldest = static_cast<size_t>(n * fresh.down / fresh.up);
+        const auto phase = static_cast<size_t>((n + 1) * fresh.down % fresh.up);
         if (oldest + fresh.taps_per_phase > padded.size()) {
             return outputs;
         }
         float sum = 0;
-        for (uint64_t k = 0; k < fresh.taps_per_phase; ++k) {
+        for (size_t k = 0; k < fresh.taps_per_phase; ++k) {
             sum += padded[oldest + fresh.taps_per_phase - 1 - k] * fresh.taps[phase + k * fresh.up];
         }
         outputs.push_back(sum);
@@ -174,7 +174,7 @@ void expect_short_filter(std::span<const float> taps, size_t down, size_t zeros,
         }
     }
     const auto layout = dsp::filter_layout(1, static_cast<uint32_t>(down));
-    Samples sinc(layout.length);
+    Samples sinc(static_cast<size_t>(layout.length));
     dsp::design_windowed_sinc(layout, sinc);
     ASSERT_EQ(taps.size() + 1, sinc.size());
     EXPECT_EQ(0.0F, sinc.back());
@@ -458,8 +458,8 @@ TEST_F(ResamplerFloat, RandomRatesAreSafeAndExact)
         const auto r = make(in, out);
         ASSERT_TRUE(r) << in << ' ' << out;
         const uint64_t cost = uint64_t{r->taps_per_phase} * r->up / r->down;
-        const size_t count =
-            std::min<uint64_t>(r->taps_per_phase * 4 + 10, 200000 / (cost + 1) + 30);
+        const auto count = static_cast<size_t>(
+            std::min<uint64_t>(r->taps_per_phase * 4 + 10, 200000 / (cost + 1) + 30));
         const auto input = random_stream<FloatTwin>(count, random.next64());
         const auto expected = expected_outputs_of(*r, input);
         const uint32_t largest = 1 + random.below(static_cast<uint32_t>(count));

@@ -119,7 +119,7 @@ TEST(Tables, DesignedFiltersAreWhatTheDesignGivesHereToTheBit)
     for (const dsp::DesignedFilter& filter : dsp::designed_filters) {
         const auto layout = dsp::filter_layout(filter.up, filter.down);
         ASSERT_EQ(layout.length, uint64_t{filter.up} * filter.taps_per_phase);
-        std::vector<float> taps(layout.length);
+        std::vector<float> taps(static_cast<size_t>(layout.length));
         dsp::design_windowed_sinc(layout, taps);
         for (size_t i = 0; i < taps.size(); ++i) {
             const size_t at = i % filter.up * filter.taps_per_phase + i / filter.up;

@@ -40,9 +40,8 @@ public:
         if (!primed_) {
             levels_.assign(window_, 0);
             deviations_.assign(window_, 0);
-            std::transform(block.begin(),
-                           block.begin() + std::min(count(), int64_t{std::ssize(block)}),
-                           levels_.begin(), scaled);
+            std::ranges::transform(block.first(std::min(window_, block.size())), levels_.begin(),
+                                   scaled);
             level_sum_ = std::accumulate(levels_.begin(), levels_.end(), int64_t{0});
             deviation_sum_ = 0;
             primed_ = true;

@@ -23,7 +23,8 @@ using Manager = OwnedManager<Float>;
 Samples tune_frame(uint32_t number)
 {
     static const auto music = tune(11025, 1, 20.0);
-    return {music.begin() + number * 11264, music.begin() + number * 11264 + kFrame};
+    const auto* const first = music.data() + number * 11264;
+    return {first, first + kFrame};
 }
 
 void append_dual(const Manager& manager, const Samples& frame, size_t cut = kFrame)

@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <cstring>
+#include <iterator>
 #include <limits>
 
 #include "kzsdk/abs/memory.h"
@@ -312,7 +313,7 @@ TEST_F(TagTree, ASubTagCanBeTakenOutOfAnyPlace)
     for (uint32_t place = 0; place < 3; ++place) {
         const Tree root = example();
         ModelTag expected = model_of(root);
-        expected.sub_tags.erase(expected.sub_tags.begin() + place);
+        expected.sub_tags.erase(std::next(expected.sub_tags.begin(), static_cast<int>(place)));
         const Tree taken(GetXMLSubTag(root.get(), place));
         EXPECT_EQ(KZ_OK, RemoveXMLSubTag(root.get(), taken.get(), 0));
         EXPECT_EQ(nullptr, taken->next_sibling);

@@ -87,7 +87,8 @@ std::vector<Filter> all_filters()
 /// Exactly the samples that the windows hold: more must not be read.
 size_t samples_for(const FloatPhases& phases, uint32_t phase, uint32_t outputs)
 {
-    return (phase + uint64_t{outputs - 1} * phases.down) / phases.up + phases.taps_per_phase;
+    const uint64_t first = (phase + uint64_t{outputs - 1} * phases.down) / phases.up;
+    return static_cast<size_t>(first) + phases.taps_per_phase;
 }
 
 // A level that keeps all that single precision rounds away in view.

@@ -89,7 +89,7 @@ std::vector<Words> signals(size_t count)
 
 size_t samples_for(const Rate& rate, uint32_t outputs)
 {
-    return uint64_t{outputs} * rate.down / rate.rows.up + rate.taps + 1;
+    return static_cast<size_t>(uint64_t{outputs} * rate.down / rate.rows.up + rate.taps + 1);
 }
 
 // The outputs, and one word beyond them that must stay.
