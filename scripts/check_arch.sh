@@ -27,6 +27,7 @@ case ${1:-quick} in
 quick) ways=$quick ;;
 all) ways="$quick $rest" ;;
 list)
+    # shellcheck disable=SC2086 # the ways are meant to be split
     printf '%s\n' $quick $rest
     exit 0
     ;;

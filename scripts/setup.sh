@@ -18,7 +18,7 @@ packages_of() {
     # What counts instructions and prints tables, and the peers, each of which may be missing.
     bench) echo "valgrind python3 pkg-config libcli11-dev nlohmann-json3-dev libchromaprint-dev libfftw3-dev libswresample-dev libavutil-dev libsoxr-dev libspeexdsp-dev libpugixml-dev libtinyxml2-dev libxml2-dev" ;;
     fuzz) echo "libexpat1-dev python3" ;; # a parser to read what is rendered, and the seeds
-    lint) echo "clang-format-14 clang-tidy-14 cppcheck mandoc" ;;
+    lint) echo "clang-format-14 clang-tidy-14 cppcheck mandoc shellcheck" ;;
     clang) echo "clang-14 libclang-rt-14-dev" ;;
     coverage) echo "llvm-14" ;; # what counts
     # Cross compilers, and what runs their programs.

@@ -7,7 +7,6 @@
 #include "dsp/resampler_twins.hpp"
 #include "kzsdk/dsp/convert.h"
 #include "kzsdk/dsp/fxp_ops.hpp"
-#include "support/wide.hpp"
 
 namespace kz::test {
 
@@ -230,7 +229,7 @@ TEST(DualConvolveFixed, AddsBitsOfExactProducts)
             uint32_t expected = 0;
             for (size_t k = 0; k < samples.size(); ++k) {
                 const int64_t tap = msb[k * stride] * 65536LL + lsb[k * stride];
-                const auto product = static_cast<Wide>(tap) * samples[samples.size() - 1 - k];
+                const int64_t product = tap * samples[samples.size() - 1 - k];
                 expected += static_cast<uint32_t>(product >> (32 - shift));
             }
             EXPECT_EQ(static_cast<int32_t>(expected),

@@ -5,16 +5,17 @@
 
 namespace {
 
-std::atomic<int64_t> blocks{0};
-std::atomic<uint64_t> allocations{0};
-std::atomic<uint64_t> fail_at{0}; // 0: never
+// As wide as every processor can change at once, without a library to help.
+std::atomic<ptrdiff_t> blocks{0};
+std::atomic<size_t> allocations{0};
+std::atomic<size_t> fail_at{0}; // 0: never
 std::atomic<bool> keep_failing{false};
 std::atomic<bool> has_fired{false};
 
 bool must_fail()
 {
-    const uint64_t nth = ++allocations;
-    const uint64_t at = fail_at;
+    const size_t nth = ++allocations;
+    const size_t at = fail_at;
     const bool fails = at != 0 && (nth == at || (keep_failing && nth > at));
     if (fails) {
         has_fired = true;
@@ -74,7 +75,7 @@ AllocationFault::AllocationFault(uint64_t nth, Mode mode)
 {
     has_fired = false;
     keep_failing = mode == FromThenOn;
-    fail_at = allocations + nth;
+    fail_at = allocations + static_cast<size_t>(nth);
 }
 
 AllocationFault::~AllocationFault() { fail_at = 0; }

@@ -24,10 +24,18 @@ std::vector<std::string> lines_of(const std::string& command)
 
 class VariantObject : public testing::TestWithParam<const char*> {};
 
+// 32-bit x86 code asks such a function, which every compiled file may bring, where it lies: a load
+// and a return, the same for all processors.
+bool tells_where_it_lies(const std::string& symbol)
+{
+    return symbol.find(" __x86.get_pc_thunk.") != std::string::npos;
+}
+
 TEST_P(VariantObject, DefinesNothingBesideItsTable)
 {
-    const auto symbols =
+    auto symbols =
         lines_of(std::string("nm --demangle --extern-only --defined-only ") + GetParam());
+    std::erase_if(symbols, tells_where_it_lies);
     ASSERT_LE(symbols.size(), 1U) << symbols[1];
     if (!symbols.empty()) {
         EXPECT_NE(std::string::npos, symbols[0].find("Kernels")) << symbols[0];

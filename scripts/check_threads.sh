@@ -1,0 +1,14 @@
+#!/bin/sh
+# Runs the tests that have threads under the thread sanitizer; the others have nothing to show to it.
+#
+#   scripts/check_threads.sh
+set -eu
+cd "$(dirname "$0")/.."
+
+jobs=${JOBS:-$(getconf _NPROCESSORS_ONLN)}
+if [ "${SETUP:-yes}" != no ]; then
+    scripts/setup.sh build java test
+fi
+cmake --preset tsan -DKZ_WERROR=ON -DKZ_BUILD_TOOLS=OFF
+cmake --build --preset tsan --parallel "$jobs" --target abi_threads_test soak jni_tests
+ctest --preset tsan --parallel "$jobs" --tests-regex '^(abi_threads_test|soak|jni_.*)\.'
