@@ -1,9 +1,9 @@
 #!/usr/bin/env python3
 """Lists the lines and branches of kzsdk/ that did not run, and what share of each room did.
 
-scripts/coverage.py EXPORT.json, an export of llvm-cov. A line or branch that several programs or
-instances of a template hold counts once, and has run when one of its copies has. A branch that the
-compiler has decided is none.
+scripts/coverage.py EXPORT.json..., the exports of llvm-cov, one of each program. A line or branch that
+several programs or instances of a template hold counts once, and has run when one of its copies has. A
+branch that the compiler has decided is none.
 """
 import collections
 import json
@@ -34,10 +34,9 @@ def lines_of(segments):
     return found
 
 
-def collect(export):
-    """{(file, line): times}, {(file, line, column): [times true, times false]}"""
-    lines = collections.Counter()
-    branches = collections.defaultdict(lambda: [0, 0])
+def collect(export, lines, branches):
+    """Adds to `lines`, {(file, line): times}, and `branches`, {(file, line, column): [times true, times
+    false]}."""
     for data in export["data"]:
         for file in data["files"]:
             name = file["filename"].removeprefix(ROOT)
@@ -52,7 +51,6 @@ def collect(export):
                     counts = branches[names[file], line, column]
                     counts[0] += true
                     counts[1] += false
-    return lines, branches
 
 
 def percent(ran, of):
@@ -64,8 +62,11 @@ def room_of(name):
 
 
 def main():
-    with open(sys.argv[1]) as export:
-        lines, branches = collect(json.load(export))
+    lines = collections.Counter()
+    branches = collections.defaultdict(lambda: [0, 0])
+    for name in sys.argv[1:]:
+        with open(name) as export:
+            collect(json.load(export), lines, branches)
     # Where neither side ran though the line did, the condition was none at run time.
     branches = {at: counts for at, counts in branches.items() if any(counts) or not lines[at[:2]]}
     text = {}

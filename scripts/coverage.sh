@@ -41,9 +41,17 @@ run_corpus() {
 objects() {
     find "$build" -type f -perm -u+x -not -path '*/CMakeFiles/*' -not -name '*.py' -not -name '*.sh' |
         while read -r file; do
-            ! readelf -S "$file" 2>/dev/null | grep -q __llvm_covmap || printf -- '-object=%s\n' "$file"
+            ! readelf -S "$file" 2>/dev/null | grep -q __llvm_covmap || printf '%s\n' "$file"
         done
 }
+
+# Each program is read by itself: of functions that share a name in several, llvm-cov would take one
+# program's for all.
+export_one() {
+    llvm-cov-14 export -instr-profile="$profile" \
+        -ignore-filename-regex='/(tests|fuzz|tools|tables|build)/|^/usr' "$1" >"$exports/$(echo "$1" | tr / _).json"
+}
+export -f export_one
 
 cmake --preset coverage >/dev/null
 cmake --build --preset coverage --parallel "$jobs" >"$build/build.log" || { tail -n 30 "$build/build.log" && exit 1; }
@@ -52,11 +60,14 @@ for which in "$@"; do
     rm -rf "$build/raw"
     # The processes of one program add up in its files.
     LLVM_PROFILE_FILE="$build/raw/%4m.profraw" "run_$which"
-    llvm-profdata-14 merge -sparse -o "$build/$which.profdata" "$build"/raw/*.profraw
-    llvm-cov-14 export -instr-profile="$build/$which.profdata" \
-        -ignore-filename-regex='/(tests|fuzz|tools|tables|build)/|^/usr' "${programs[@]}" \
-        >"$build/$which.json" 2>"$build/$which.warnings"
-    scripts/coverage.py "$build/$which.json" >"$build/$which.txt"
+    export profile=$build/$which.profdata exports=$build/exports/$which
+    llvm-profdata-14 merge -sparse -o "$profile" "$build"/raw/*.profraw
+    rm -rf "$exports"
+    mkdir -p "$exports"
+    # shellcheck disable=SC2016 # the inner shell expands it
+    printf '%s\0' "${programs[@]}" | xargs -0 -n 1 -P "$jobs" bash -c 'export_one "$1"' export_one \
+        2>"$build/$which.warnings"
+    scripts/coverage.py "$exports"/*.json >"$build/$which.txt"
     echo "$which ($build/$which.txt):"
     sed -n '/^room/,$p' "$build/$which.txt"
 done
