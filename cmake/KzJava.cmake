@@ -1,7 +1,8 @@
 # The Java front: whether it is built, over which platform, and which names leave the library.
 #
-#   KZ_JNI       build the front into the library. Default: on when a jni.h is at hand; it costs a
-#                few kilobytes, and makes the library one that Java can load
+#   KZ_JNI       build the front into the library: it costs a few kilobytes, and makes the library one
+#                that Java can load. Default: AUTO, when a jni.h is at hand
+#   KZ_JAVA      build kzsdk.jar. Default: AUTO, when the front is built and a JDK is at hand
 #   KZ_PLATFORM  what the front logs to and starts threads with: see
 #                kzsdk/jni/platform/platform.hpp. Default: portable, which needs nothing and so loads
 #                anywhere; ndk when building for Android
@@ -25,11 +26,16 @@ find_path(
   DOC "Where the jni_md.h that jni.h includes is")
 mark_as_advanced(KZ_JNI_INCLUDE_DIR KZ_JNI_MD_INCLUDE_DIR)
 
-set(jni_default OFF)
-if(KZ_JNI_INCLUDE_DIR)
-  set(jni_default ON)
+# What a machine has is looked at each time: a JDK that is installed after the first build is used by the
+# next.
+set(KZ_JNI AUTO CACHE STRING "Build the front that a Java VM loads: ON, OFF, or AUTO, where there is a jni.h")
+set_property(CACHE KZ_JNI PROPERTY STRINGS AUTO ON OFF)
+if(KZ_JNI STREQUAL "AUTO")
+  set(KZ_JNI OFF)
+  if(KZ_JNI_INCLUDE_DIR)
+    set(KZ_JNI ON)
+  endif()
 endif()
-option(KZ_JNI "Build the front that a Java VM loads" ${jni_default})
 option(KZ_SMALL_MAP "Export only the extraction interface, start-up and JNI_OnLoad" ${ANDROID})
 
 set(platform_default portable)
@@ -86,11 +92,14 @@ function(kz_symbol_map variable)
   set(${variable} "${map}" PARENT_SCOPE)
 endfunction()
 
-set(java_default OFF)
-if(KZ_JNI AND Java_JAVAC_EXECUTABLE AND Java_JAR_EXECUTABLE AND NOT CMAKE_CROSSCOMPILING)
-  set(java_default ON)
+set(KZ_JAVA AUTO CACHE STRING "Build kzsdk.jar, the front's Java side: ON, OFF, or AUTO, where there is a JDK")
+set_property(CACHE KZ_JAVA PROPERTY STRINGS AUTO ON OFF)
+if(KZ_JAVA STREQUAL "AUTO")
+  set(KZ_JAVA OFF)
+  if(KZ_JNI AND Java_JAVAC_EXECUTABLE AND Java_JAR_EXECUTABLE AND NOT CMAKE_CROSSCOMPILING)
+    set(KZ_JAVA ON)
+  endif()
 endif()
-option(KZ_JAVA "Build kzsdk.jar, the Java side of the front" ${java_default})
 
 # A jar tells when each class was written, unless the tool (of JDK 17 and later) is told what to say.
 set(KZ_JAR_DATE "")
