@@ -1,0 +1,157 @@
+#!/usr/bin/env python3
+"""Puts faults into the library, one at a time, and tells which ones no unit test notices.
+
+scripts/mutate.py [COUNT] [SEED]
+
+COUNT faults (30) are drawn by SEED (1): a comparison, an operator, a constant or a condition changed, or a
+statement left out. Works on a copy of the tree in build/mutants. A fault that survives asks for a test, or
+changes nothing that a caller can see: a larger buffer, a bound that only a slower path needs. Of what
+sanitizers alone would see, such as a buffer too small, nothing is seen here.
+"""
+import pathlib
+import random
+import re
+import shutil
+import subprocess
+import sys
+import time
+
+ROOT = pathlib.Path(__file__).resolve().parent.parent
+TREE = ROOT / "build/mutants/tree"
+BUILD = ROOT / "build/mutants/build"
+ROOMS = ["abs", "xml", "dsp", "disc", "qv", "qvfixed", "qvfloat", "fpx"]
+# Whose tests see a fault in a room, most likely first.
+SEEN_FROM = {
+    "abs": ["abs", "xml", "fpx", "failures"],
+    "xml": ["xml", "qv", "fpx", "failures"],
+    "dsp": ["dsp", "qv", "qvfixed", "qvfloat", "model", "fpx", "failures"],
+    "disc": ["disc", "failures"],
+    "qv": ["qv", "qvfixed", "qvfloat", "model", "fpx", "failures"],
+    "qvfixed": ["qvfixed", "qv", "model", "fpx", "failures"],
+    "qvfloat": ["qvfloat", "qv", "model", "fpx", "failures"],
+    "fpx": ["fpx", "failures"],
+}
+# Not this machine's loops, and which of them are chosen: all give the same words.
+LEFT_OUT = ("neon", "select.cpp")
+# Trees of a million levels, and what reads the built files, which are built otherwise here.
+TESTS = "-DeepTree.*:*DefinesNothingBesideItsTable*:EveryAllocatingFunction*"
+SWAPS = [
+    (" < ", " <= "), (" <= ", " < "), (" > ", " >= "), (" >= ", " > "), (" == ", " != "), (" != ", " == "),
+    (" + ", " - "), (" - ", " + "), (" * ", " + "), (" && ", " || "), (" || ", " && "), ("<< ", ">> "),
+    (">> ", "<< "), ("std::min", "std::max"), ("std::max", "std::min"), ("true", "false"), ("false", "true"),
+    ("++", ""),
+]
+SOURCE = re.compile(rf"kzsdk/({'|'.join(ROOMS)})/.*\.[ch]pp$")
+STATEMENT = re.compile(r"\s+[\w:.>*\[\]()-]+(\(.*\)| [-+*/|&^<>]*= .*);$")
+DECLARATION = re.compile(r"\s*(const|auto|return|u?int\w+_t|size_t|float|double)\b")
+
+
+def code_lines(text):
+    """The indices of lines that are neither comments nor checked while compiling."""
+    comment = False
+    for index, line in enumerate(text):
+        bare = line.strip()
+        if comment or bare.startswith("/*"):
+            comment = "*/" not in bare
+        elif bare and not bare.startswith(("//", "#", "namespace", "using", "template", "}")):
+            if "static_assert" not in bare:
+                yield index
+
+
+def faults_of(line):
+    """Every line that one fault makes of this one."""
+    code = line.split("//")[0].rstrip()
+    for old, new in SWAPS:
+        for at in re.finditer(re.escape(old), code):
+            yield code[:at.start()] + new + code[at.end():]
+    for number in re.finditer(r"(?<![\w.])\d+\b", code):
+        yield code[:number.start()] + str(int(number[0]) + 1) + code[number.end():]
+    condition = re.fullmatch(r"(.*\bif \()(.*)(\) \{)", code)
+    if condition:
+        yield f"{condition[1]}!({condition[2]}){condition[3]}"
+    if STATEMENT.fullmatch(code) and not DECLARATION.match(code):
+        yield ""
+
+
+def draw(chance, places):
+    while True:
+        file, index = chance.choice(places)
+        text = (TREE / file).read_text().splitlines(keepends=True)
+        faults = list(faults_of(text[index]))
+        if faults:
+            fault = chance.choice(faults)
+            return file, index, text, fault
+
+
+def runs(command, seconds, **options):
+    try:
+        return subprocess.run(command, stdout=subprocess.PIPE, stderr=subprocess.STDOUT, timeout=seconds,
+                              **options).returncode == 0
+    except subprocess.TimeoutExpired:
+        return False
+
+
+def builds():
+    return runs(["cmake", "--build", str(BUILD)], 1800)
+
+
+def first_to_fail(places):
+    """The first test program of these folders that fails, or None."""
+    for place in places:
+        for program in sorted((BUILD / "tests" / place).glob("*_test")):
+            if not runs([program, "--gtest_fail_fast", f"--gtest_filter={TESTS}"], 300, cwd=program.parent):
+                return program.name
+    return None
+
+
+def bring(file):
+    """Copies one file of the tree, unless it is there: then what was built of it holds."""
+    there = TREE / file
+    if not there.exists() or there.read_bytes() != (ROOT / file).read_bytes():
+        there.parent.mkdir(parents=True, exist_ok=True)
+        shutil.copy(ROOT / file, there)
+
+
+def prepare(files):
+    for file in files:
+        bring(file)
+    subprocess.run(["cmake", "-S", TREE, "-B", BUILD, "-G", "Ninja", "-DCMAKE_BUILD_TYPE=None",
+                    "-DCMAKE_CXX_FLAGS=-O1", "-DKZ_BUILD_TOOLS=OFF", "-DKZ_JNI=OFF", "-DKZ_HARDEN=OFF"],
+                   stdout=subprocess.DEVNULL, check=True)
+    if not builds():
+        sys.exit(f"mutate: {BUILD} does not build")
+    subprocess.run([TREE / "scripts/make_disc_images.sh", BUILD / "disc_images"],
+                   stdout=subprocess.DEVNULL, check=True)
+    failing = first_to_fail(ROOMS + ["model", "failures"])
+    if failing:
+        sys.exit(f"mutate: {failing} fails without a fault")
+
+
+def main():
+    count, seed = (int(word) for word in (sys.argv[1:] + ["30", "1"][len(sys.argv) - 1:])[:2])
+    files = subprocess.check_output(["git", "ls-files"], cwd=ROOT, text=True).splitlines()
+    prepare(files)
+    places = []
+    for file in files:
+        if SOURCE.match(file) and not any(name in file for name in LEFT_OUT):
+            lines = (TREE / file).read_text().splitlines()
+            places += [(file, index) for index in code_lines(lines)]
+    chance = random.Random(seed)
+    noticed = survived = 0
+    while noticed + survived < count:
+        file, index, text, fault = draw(chance, places)
+        begun = time.monotonic()
+        (TREE / file).write_text("".join(text[:index] + [fault + "\n"] + text[index + 1:]))
+        if builds():
+            by = first_to_fail(SEEN_FROM[file.split("/")[1]])
+            noticed += by is not None
+            survived += by is None
+            print(f"{'noticed' if by else 'SURVIVED'} {file}:{index + 1}: {text[index].strip()}  =>  "
+                  f"{fault.strip() or 'nothing'}  [{by or 'no test'}, {time.monotonic() - begun:.0f} s]",
+                  flush=True)
+        (TREE / file).write_text("".join(text))
+    print(f"{noticed} of {count} faults noticed, {survived} survived (seed {seed})")
+
+
+if __name__ == "__main__":
+    main()
