@@ -147,6 +147,11 @@ function(kz_register_test target)
   if(ARGN)
     set(fixture FIXTURES_REQUIRED ${ARGN})
   endif()
-  gtest_discover_tests(${target} TEST_PREFIX "${target}." DISCOVERY_TIMEOUT 60 PROPERTIES TIMEOUT 600
+  # An emulator takes up to fifty times as long.
+  set(timeout 600)
+  if(CMAKE_CROSSCOMPILING)
+    set(timeout 7200)
+  endif()
+  gtest_discover_tests(${target} TEST_PREFIX "${target}." DISCOVERY_TIMEOUT 60 PROPERTIES TIMEOUT ${timeout}
                                                                                           ${fixture})
 endfunction()
