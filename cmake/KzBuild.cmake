@@ -37,7 +37,7 @@ if(KZ_COVERAGE)
   target_link_options(kz_settings INTERFACE -fprofile-instr-generate)
 endif()
 
-# What a compiler and a linker can do against the exploitation of a bug. tests/abi/hardening_test.cpp
+# What a compiler and a linker can do against the exploitation of a bug. tests/whole/abi/hardening_test.cpp
 # looks for it in the built files. A sanitizer sees more, and some of its checks do not go with these.
 option(KZ_HARDEN "Compile and link with the usual protections" ON)
 if(KZ_HARDEN AND NOT KZ_SANITIZE)
@@ -103,19 +103,18 @@ function(kz_room name)
   set_property(GLOBAL APPEND PROPERTY KZ_PUBLIC_HEADERS ${room_HEADERS})
 endfunction()
 
-# kz_test(<room>/<file>_test [ROOMS <room>...] [LIBS <target>...] [FIXTURE <name>])
+# kz_test(<file>_test [ROOMS <room>...] [LIBS <target>...] [FIXTURE <name>])
 #
-# Builds tests/<room>/<file>_test.cpp over the room's objects and everything below, with the
+# Builds <file>_test.cpp of this folder over its room's objects and everything below, with the
 # allocator wrapped so that tests can count blocks and make the n-th allocation fail, and registers
-# each of its test cases with CTest. ROOMS replaces the room taken from the path; FIXTURE names what
-# has to be set up first.
-function(kz_test path)
+# each of its test cases with CTest. The folder's name is the room's, unless ROOMS names others, and
+# the target is <folder>_<file>_test. FIXTURE names what has to be set up first.
+function(kz_test file)
   cmake_parse_arguments(PARSE_ARGV 1 test "" "FIXTURE" "ROOMS;LIBS;SOURCES")
-  get_filename_component(room "${path}" DIRECTORY)
-  get_filename_component(file "${path}" NAME)
-  string(REPLACE "/" "_" target "${room}/${file}")
+  cmake_path(GET CMAKE_CURRENT_SOURCE_DIR FILENAME folder)
+  set(target ${folder}_${file})
   if(NOT test_ROOMS)
-    set(test_ROOMS ${room})
+    set(test_ROOMS ${folder})
   endif()
   set(objects "")
   foreach(name IN LISTS test_ROOMS)
@@ -124,18 +123,19 @@ function(kz_test path)
   endforeach()
   list(REMOVE_DUPLICATES objects)
   list(TRANSFORM objects PREPEND "kz_")
-  add_executable(${target} "${PROJECT_SOURCE_DIR}/tests/${path}.cpp" ${test_SOURCES})
+  add_executable(${target} ${file}.cpp ${test_SOURCES})
   target_link_libraries(${target} PRIVATE kz_settings ${objects} kz_test_support ${test_LIBS})
   kz_register_test(${target} ${test_FIXTURE})
 endfunction()
 
-# kz_public_test(<dir>/<file>_test [LIBS <target>...] [SOURCES <file>...])
+# kz_public_test(<file>_test [LIBS <target>...] [SOURCES <file>...])
 #
 # A test that sees the library as a user does: linked against the shared library, public names only.
-function(kz_public_test path)
+function(kz_public_test file)
   cmake_parse_arguments(PARSE_ARGV 1 test "" "" "LIBS;SOURCES")
-  string(REPLACE "/" "_" target "${path}")
-  add_executable(${target} "${PROJECT_SOURCE_DIR}/tests/${path}.cpp" ${test_SOURCES})
+  cmake_path(GET CMAKE_CURRENT_SOURCE_DIR FILENAME folder)
+  set(target ${folder}_${file})
+  add_executable(${target} ${file}.cpp ${test_SOURCES})
   target_link_libraries(${target} PRIVATE kz_settings kzsdk_shared GTest::gtest_main ${test_LIBS})
   target_include_directories(${target} PRIVATE "${PROJECT_SOURCE_DIR}/tests")
   kz_register_test(${target})

@@ -26,7 +26,7 @@ install(
   NAMESPACE kzsdk::
   DESTINATION "${package_dir}")
 configure_package_config_file(
-  "${CMAKE_CURRENT_LIST_DIR}/kzsdkConfig.cmake.in" "${PROJECT_BINARY_DIR}/kzsdkConfig.cmake"
+  "${PROJECT_SOURCE_DIR}/packaging/kzsdkConfig.cmake.in" "${PROJECT_BINARY_DIR}/kzsdkConfig.cmake"
   INSTALL_DESTINATION "${package_dir}" NO_SET_AND_CHECK_MACRO)
 write_basic_package_version_file("${PROJECT_BINARY_DIR}/kzsdkConfigVersion.cmake"
                                  COMPATIBILITY SameMajorVersion)
@@ -46,7 +46,7 @@ else()
   set(KZ_PC_LIBDIR "\${prefix}/${CMAKE_INSTALL_LIBDIR}")
   set(KZ_PC_INCLUDEDIR "\${prefix}/${CMAKE_INSTALL_INCLUDEDIR}")
 endif()
-configure_file("${CMAKE_CURRENT_LIST_DIR}/kzsdk.pc.in" "${PROJECT_BINARY_DIR}/kzsdk.pc" @ONLY)
+configure_file("${PROJECT_SOURCE_DIR}/packaging/kzsdk.pc.in" "${PROJECT_BINARY_DIR}/kzsdk.pc" @ONLY)
 install(FILES "${PROJECT_BINARY_DIR}/kzsdk.pc" DESTINATION "${pkgconfig_dir}")
 
 install(FILES "${PROJECT_SOURCE_DIR}/LICENSE" DESTINATION "${CMAKE_INSTALL_DOCDIR}")

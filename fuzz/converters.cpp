@@ -4,7 +4,7 @@
 
 #include "fuzz.hpp"
 #include "kzsdk/dsp/convert.h"
-#include "model/convert.hpp"
+#include "whole/model/convert.hpp"
 
 namespace kz::fuzz {
 

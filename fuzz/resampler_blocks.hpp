@@ -6,7 +6,7 @@
 
 #include "fuzz.hpp"
 #include "kzsdk/dsp/resampler.h"
-#include "model/resampler.hpp"
+#include "whole/model/resampler.hpp"
 
 namespace kz::fuzz {
 

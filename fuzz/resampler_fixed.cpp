@@ -1,9 +1,9 @@
 // The fixed-point resampler at every rate, in blocks and rooms of any size: no sample is lost or
 // repeated, and every word is the model's.
 
-#include "model/library_taps.hpp"
 #include "resampler_blocks.hpp"
 #include "support/signals.hpp"
+#include "whole/model/library_taps.hpp"
 
 namespace kz::fuzz {
 

@@ -3,7 +3,7 @@
 #pragma once
 
 #include "fuzz.hpp"
-#include "xml/tree_model.hpp"
+#include "library/xml/tree_model.hpp"
 
 namespace kz::fuzz {
 

@@ -16,7 +16,7 @@ tests() {
 }
 
 step "g++: all tests" tests release
-step "the same bytes in another folder" scripts/check_reproducible.sh build/release
+step "the same bytes in another folder" packaging/check_reproducible.sh build/release
 step "clang++: all tests" tests release-clang
 step "address, undefined-behaviour, integer and leak sanitizers: all tests" tests asan-clang
 step "thread sanitizer: the tests that have threads" scripts/check_threads.sh

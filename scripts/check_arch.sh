@@ -1,6 +1,6 @@
 #!/bin/sh
 # Builds the library in several ways, for several processors, and compares what it makes of some sixty
-# pieces of sound with tests/golden/documents.txt. Prints one line for each way; any difference fails.
+# pieces of sound with tests/whole/golden/documents.txt. Prints one line for each way; any difference fails.
 #
 #   scripts/check_arch.sh          g++ at -O0 and clang++ at -O3; at -O2 64-bit ARM, S/390, 32-bit x86
 #   scripts/check_arch.sh all      also the other levels, -march=native, 32-bit ARM with and without
@@ -17,7 +17,7 @@ set -eu
 cd "$(dirname "$0")/.."
 
 jobs=${JOBS:-$(getconf _NPROCESSORS_ONLN)}
-golden=tests/golden/documents.txt
+golden=tests/whole/golden/documents.txt
 quick="g++-O0 clang++-O3 aarch64-O2 s390x-O2 i686-O2"
 rest="g++-O1 g++-O2 g++-O3 g++-O3-native clang++-O0 clang++-O1 clang++-O2 clang++-O3-native \
 aarch64-O0 aarch64-O3 armhf-O0 armhf-O2 armhf-O3 armel-O2 s390x-O0 s390x-O3 i686-O0 i686-O3 \
@@ -91,7 +91,7 @@ variants() {
 compare_documents() {
     for variant in $(variants "$1"); do
         # shellcheck disable=SC2046 # the words are meant to be split
-        if KZSDK_KERNELS=$variant $(emulator "$1") "$2/tests/golden/golden_documents" "$golden" \
+        if KZSDK_KERNELS=$variant $(emulator "$1") "$2/tests/whole/golden/golden_documents" "$golden" \
             >"$2/result"; then
             echo "$1, $variant: $(wc -l <"$golden") digests, all the same"
         else

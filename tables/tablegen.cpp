@@ -2,7 +2,7 @@
 /// Writes the library's coefficient tables as C++ source: tablegen <output file>
 ///
 /// The formulas stand where the library uses them, in kzsdk/dsp/filter_design.hpp and
-/// kzsdk/dsp/butterfly.hpp. A machine whose mathematics rounds otherwise must not make another
+/// kzsdk/kernels/butterfly.hpp. A machine whose mathematics rounds otherwise must not make another
 /// library: the words are compared with a digest, and a difference fails the build.
 
 #include <algorithm>
@@ -17,8 +17,8 @@
 #include <string_view>
 #include <vector>
 
-#include "kzsdk/dsp/butterfly.hpp"
 #include "kzsdk/dsp/filter_design.hpp"
+#include "kzsdk/kernels/butterfly.hpp"
 #include "tables/short_filters.hpp"
 
 namespace {
@@ -73,9 +73,11 @@ private:
 
 constexpr uint64_t kKnownDigest = 0x6c676693ad4e4d42U;
 
-// The source file that is written, and the digest of what is in it.
+// The source files that are written, and the digest of what is in them: what the inner loops read, and
+// the fixed-point prototypes that callers can ask for.
 struct Source {
     std::ostream& text;
+    std::ostream& prototypes;
     Digest digest;
 };
 
@@ -93,13 +95,20 @@ void write_array(std::ostream& out, std::string_view type, std::string_view name
 }
 
 template <class Value>
+void write_array(std::ostream& out, Digest& digest, std::string_view type, std::string_view name,
+                 const std::vector<Value>& values)
+{
+    write_array(out, type, name, values);
+    for (const Value value : values) {
+        digest.take(value);
+    }
+}
+
+template <class Value>
 void write_array(Source& out, std::string_view type, std::string_view name,
                  const std::vector<Value>& values)
 {
-    write_array(out.text, type, name, values);
-    for (const Value value : values) {
-        out.digest.take(value);
-    }
+    write_array(out.text, out.digest, type, name, values);
 }
 
 // The taps in two halves, which is how fixed-point inner loops multiply them, and their accessors.
@@ -111,13 +120,13 @@ void write_filter(Source& out, uint32_t hertz, const std::vector<int32_t>& words
         msb.push_back(static_cast<int16_t>(word >> 16));
         lsb.push_back(static_cast<uint16_t>(word & 0xffff));
     }
-    out.text << "namespace hertz_" << hertz << " {\n";
-    write_array(out, "int16_t", "msb", msb);
-    write_array(out, "uint16_t", "lsb", lsb);
-    out.text << "} // namespace hertz_" << hertz << "\n\n";
+    out.prototypes << "namespace hertz_" << hertz << " {\n";
+    write_array(out.prototypes, out.digest, "int16_t", "msb", msb);
+    write_array(out.prototypes, out.digest, "uint16_t", "lsb", lsb);
+    out.prototypes << "} // namespace hertz_" << hertz << "\n\n";
     const auto accessor = [&](std::string_view type, std::string_view what) -> std::ostream& {
-        return out.text << type << " kzdsp_get_" << hertz << "_11025_fixed_coeff_" << what
-                        << "() noexcept";
+        return out.prototypes << type << " kzdsp_get_" << hertz << "_11025_fixed_coeff_" << what
+                              << "() noexcept";
     };
     accessor("const int16_t*", "msb") << " { return hertz_" << hertz << "::msb; }\n";
     accessor("const uint16_t*", "lsb") << " { return hertz_" << hertz << "::lsb; }\n";
@@ -228,21 +237,22 @@ std::vector<float> dct_factors(uint32_t length)
 
 int main(int argc, char** argv)
 {
-    if (argc != 2) {
-        std::cerr << "usage: tablegen <output file>\n";
+    if (argc != 3) {
+        std::cerr << "usage: tablegen <tables for the inner loops> <prototypes for callers>\n";
         return 2;
     }
-    std::ofstream file(argv[1]);
-    file << "// Written by tables/tablegen.cpp.\n\n"
-            "#include \"kzsdk/dsp/resampler.h\"\n"
-            "#include \"kzsdk/dsp/tables.hpp\"\n\n";
-    Source out{file, {}};
+    std::ofstream tables(argv[1]);
+    tables << "// Written by tables/tablegen.cpp.\n\n#include \"kzsdk/kernels/tables.hpp\"\n\n";
+    std::ofstream prototypes(argv[2]);
+    prototypes << "// Written by tables/tablegen.cpp.\n\n#include \"kzsdk/dsp/resampler.h\"\n\n";
+    Source out{tables, prototypes, {}};
     write_filters(out);
     write_array(out, "int32_t", "kz::dsp::kDctCoefficients", dct_coefficients(32768));
     write_array(out, "float", "kz::dsp::kDctFactors", dct_factors(32768));
-    file.close();
-    if (!file) {
-        std::cerr << "tablegen: cannot write " << argv[1] << '\n';
+    tables.close();
+    prototypes.close();
+    if (!tables || !prototypes) {
+        std::cerr << "tablegen: cannot write " << argv[tables ? 2 : 1] << '\n';
         return 1;
     }
     if (out.digest.value() != kKnownDigest) {

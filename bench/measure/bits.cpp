@@ -4,7 +4,7 @@
 #include <map>
 #include <sstream>
 
-#include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/kernels/kernels.hpp"
 #include "support/process.hpp"
 
 namespace kz::bench {

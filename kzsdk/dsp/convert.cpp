@@ -1,9 +1,9 @@
 #include "kzsdk/dsp/convert.h"
 
-#include "kzsdk/dsp/fxp_ops.hpp"
-#include "kzsdk/dsp/g711.hpp"
-#include "kzsdk/dsp/kernels/kernels.hpp"
-#include "kzsdk/dsp/mix.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
+#include "kzsdk/kernels/g711.hpp"
+#include "kzsdk/kernels/kernels.hpp"
+#include "kzsdk/kernels/mix.hpp"
 
 namespace {
 

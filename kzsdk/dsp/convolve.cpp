@@ -1,16 +1,10 @@
 #include "kzsdk/dsp/convolve.h"
 
+#include "kzsdk/kernels/kernels.hpp"
+
 namespace {
 
-// The order of the additions is part of the result: one sum, newest sample first.
-float add_products(float sum, const float* newest, const float* taps, size_t count,
-                   size_t stride) noexcept
-{
-    for (size_t k = 0; k < count; ++k) {
-        sum += *(newest - k) * taps[k * stride];
-    }
-    return sum;
-}
+using kz::dsp::add_products;
 
 bool missing(const float* samples, uint32_t count) noexcept
 {

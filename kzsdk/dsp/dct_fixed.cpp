@@ -1,9 +1,9 @@
 #include "kzsdk/dsp/dct.h"
 
 #include "kzsdk/abs/owned.hpp"
-#include "kzsdk/dsp/fxp_ops.hpp"
-#include "kzsdk/dsp/kernels/kernels.hpp"
-#include "kzsdk/dsp/tables.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
+#include "kzsdk/kernels/kernels.hpp"
+#include "kzsdk/kernels/tables.hpp"
 
 namespace {
 

@@ -2,10 +2,10 @@
 #include <span>
 
 #include "kzsdk/abs/owned.hpp"
-#include "kzsdk/dsp/butterfly.hpp"
 #include "kzsdk/dsp/dct.h"
-#include "kzsdk/dsp/kernels/kernels.hpp"
-#include "kzsdk/dsp/tables.hpp"
+#include "kzsdk/kernels/butterfly.hpp"
+#include "kzsdk/kernels/kernels.hpp"
+#include "kzsdk/kernels/tables.hpp"
 
 namespace {
 

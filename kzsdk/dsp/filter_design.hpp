@@ -10,7 +10,7 @@
 #include <span>
 
 #include "kzsdk/abs/mathfn.h"
-#include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
 
 namespace kz::dsp {
 

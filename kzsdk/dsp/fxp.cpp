@@ -2,7 +2,7 @@
 
 #include <array>
 
-#include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
 
 // The exported operations stay within 32-bit words and 16 by 16 bit products. Inner loops use the
 // inline forms of fxp_ops.hpp, which may take wider products and give the same words.

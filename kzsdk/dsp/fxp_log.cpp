@@ -1,6 +1,6 @@
 #include "kzsdk/dsp/fxp.h"
-#include "kzsdk/dsp/fxp_ops.hpp"
 #include "kzsdk/dsp/log_segments.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
 
 namespace {
 

@@ -3,10 +3,10 @@
 #include <span>
 
 #include "kzsdk/abs/owned.hpp"
-#include "kzsdk/dsp/fxp_ops.hpp"
-#include "kzsdk/dsp/kernels/kernels.hpp"
 #include "kzsdk/dsp/polyphase_stream.hpp"
-#include "kzsdk/dsp/tables.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
+#include "kzsdk/kernels/kernels.hpp"
+#include "kzsdk/kernels/tables.hpp"
 
 namespace {
 

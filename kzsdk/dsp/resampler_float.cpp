@@ -5,10 +5,10 @@
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/dsp/convolve.h"
 #include "kzsdk/dsp/filter_design.hpp"
-#include "kzsdk/dsp/kernels/kernels.hpp"
 #include "kzsdk/dsp/polyphase_stream.hpp"
 #include "kzsdk/dsp/resampler.h"
-#include "kzsdk/dsp/tables.hpp"
+#include "kzsdk/kernels/kernels.hpp"
+#include "kzsdk/kernels/tables.hpp"
 
 namespace {
 

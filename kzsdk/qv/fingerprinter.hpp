@@ -16,7 +16,7 @@
 #include <memory>
 
 #include "kzsdk/abs/owned.hpp"
-#include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
 #include "kzsdk/qv/frame_pump.hpp"
 #include "kzsdk/qv/query_document.hpp"
 

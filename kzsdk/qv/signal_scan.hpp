@@ -11,8 +11,8 @@
 #include <span>
 
 #include "kzsdk/abs/owned.hpp"
-#include "kzsdk/dsp/fxp_ops.hpp"
-#include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
+#include "kzsdk/kernels/kernels.hpp"
 
 namespace kz::qv {
 

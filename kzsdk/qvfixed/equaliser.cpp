@@ -3,8 +3,8 @@
 #include <span>
 
 #include "kzsdk/dsp/fxp.h"
-#include "kzsdk/dsp/fxp_ops.hpp"
-#include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
+#include "kzsdk/kernels/kernels.hpp"
 #include "kzsdk/qv/byte_levels.hpp"
 #include "kzsdk/qv/equalise.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"

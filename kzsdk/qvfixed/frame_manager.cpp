@@ -4,8 +4,8 @@
 
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/dsp/fxp.h"
-#include "kzsdk/dsp/fxp_ops.hpp"
-#include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
+#include "kzsdk/kernels/kernels.hpp"
 #include "kzsdk/qv/frame_list.hpp"
 #include "kzsdk/qv/frame_pieces.hpp"
 #include "kzsdk/qvfixed/band_tables.hpp"

@@ -1,7 +1,7 @@
 #include <algorithm>
 #include <span>
 
-#include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/kernels/kernels.hpp"
 #include "kzsdk/qv/signal_scan.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 

@@ -1,4 +1,4 @@
-#include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
 using kz::fxp::shift_left;

@@ -6,7 +6,7 @@
 #include <span>
 
 #include "kzsdk/dsp/convert.h"
-#include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
 #include "kzsdk/qv/fingerprinter.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 

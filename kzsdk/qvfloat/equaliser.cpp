@@ -3,7 +3,7 @@
 
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/abs/saturate.hpp"
-#include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/kernels/kernels.hpp"
 #include "kzsdk/qv/byte_levels.hpp"
 #include "kzsdk/qv/equalise.hpp"
 #include "kzsdk/qvfloat/qvfloat.h"

@@ -5,7 +5,7 @@
 #include "kzsdk/abs/mathfn.h"
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/abs/saturate.hpp"
-#include "kzsdk/dsp/fxp_ops.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
 #include "kzsdk/qv/frame_list.hpp"
 #include "kzsdk/qv/frame_pieces.hpp"
 #include "kzsdk/qvfloat/qvfloat.h"

@@ -1,6 +1,6 @@
 #include <span>
 
-#include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/kernels/kernels.hpp"
 #include "kzsdk/qv/signal_scan.hpp"
 #include "kzsdk/qvfloat/qvfloat.h"
 

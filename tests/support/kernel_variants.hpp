@@ -6,7 +6,7 @@
 
 #include <gtest/gtest.h>
 
-#include "kzsdk/dsp/kernels/kernels.hpp"
+#include "kzsdk/kernels/kernels.hpp"
 #include "support/allocation.hpp"
 
 namespace kz::test {

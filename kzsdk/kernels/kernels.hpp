@@ -1,0 +1,177 @@
+/// @file
+/// The inner loops that exist in several variants, and the choice among them.
+///
+/// A variant is one table of functions, compiled for one instruction set. Every variant gives the
+/// same words as the plain one for every input, the bits of NaNs apart; tests/library/kernels holds all
+/// of them to that. The best one that the processor has is taken at the first use and kept.
+///
+/// For tests and measurements the environment variable KZSDK_KERNELS pins a variant by its name.
+/// A name that the build or the processor does not know is ignored. It is read once, at the first
+/// use; a host that changes its environment meanwhile races with that as with any getenv().
+#pragma once
+
+#include <array>
+#include <cstddef>
+#include <cstdint>
+
+namespace kz::dsp {
+
+/// Makes one word of each frame of interleaved bytes: the sum of the channels, shifted left by
+/// 0 .. 31 bits. The number of frames counts as unsigned.
+template <class Word>
+using Converter = void(const void* input, Word* output, int32_t frames, int32_t shift) noexcept;
+
+template <class Word>
+struct Converters {
+    Converter<Word>* pcm16_mono;
+    Converter<Word>* pcm16_stereo;
+    Converter<Word>* pcm8_mono; ///< bytes count as 0 .. 255, their top bit inverted
+    Converter<Word>* pcm8_stereo;
+};
+
+/// Two moving means over the last 2^window_log2 samples: of their levels, and of the deviations of
+/// the levels from their mean, none of which counts for more than max_deviation. The arrays are
+/// rings, given from the oldest entry on.
+struct MovingMeans {
+    int32_t* levels;
+    int32_t* deviations;
+    int32_t level_sum;
+    int32_t deviation_sum;
+    int32_t window_log2;
+    int32_t max_deviation;
+    uint32_t limit; ///< a sum of deviations that reaches this, as an unsigned number, is not quiet
+};
+
+/// The smallest and the largest sample so far.
+template <class Sample>
+struct Extremes {
+    Sample low;
+    Sample high;
+};
+
+/// Level of a word x: bits 32 and up of (x / 2 - bottom) * scale, shifted right by `shift`, at most
+/// `top`. No x is below 2 * bottom, and the scale is not negative.
+struct WordLevels {
+    int32_t bottom;
+    int32_t scale;
+    int32_t shift;
+    int32_t top; ///< at most 255
+};
+
+/// Level of a value x: (x - bottom) * scale as a whole number, 0 to `top`; NaN counts as 0.
+struct FloatLevels {
+    float bottom;
+    float scale;
+    int32_t top; ///< at most 255
+};
+
+struct PhaseRows;
+
+/// A stream of outputs whose windows all lie in one block.
+struct Windows {
+    const int32_t* oldest; ///< first sample of the first window
+    uint32_t taps;         ///< samples of a window
+    uint32_t down;
+    uint32_t phase; ///< before the first output; it advances by `down`, modulo `up`, before each
+};
+
+/// A floating-point polyphase filter. Tap k of phase p belongs to the k-th newest sample of a
+/// window and is taps[p * phase_stride + k * tap_stride].
+struct FloatPhases {
+    const float* taps;
+    size_t phase_stride;
+    size_t tap_stride;
+    uint32_t taps_per_phase;
+    uint32_t up;
+    uint32_t down;
+};
+
+struct Kernels {
+    /// "plain", "sse41", "avx2" or "neon".
+    const char* name;
+
+    /// The transform of dct_fixed.cpp without the last scaling, 2^order words in place.
+    void (*dct_fixed)(int32_t* x, const int32_t* factors, int32_t order) noexcept;
+
+    /// The transform of dct_float.cpp without its scalings, 2^order values in place.
+    void (*dct_float)(float* x, const float* factors, int32_t order) noexcept;
+
+    Converters<int32_t> words;
+    Converters<float> floats;
+
+    /// Divides by 2^shift, 0 <= shift <= 31, towards zero.
+    void (*shift_towards_zero)(const int32_t* input, int32_t* output, uint32_t count,
+                               int32_t shift) noexcept;
+
+    /// kz::to_int32 of each value.
+    void (*truncate)(const float* input, int32_t* output, uint32_t count) noexcept;
+
+    /// Takes samples into both means until one might not be quiet, or fewer are left than the
+    /// variant takes at a time.
+    ///
+    /// @return How many were taken; the means are as they are after these, and the rings are not
+    ///         moved on.
+    uint32_t (*pass_quiet)(MovingMeans& means, const int32_t* samples, uint32_t count) noexcept;
+
+    /// Makes `count` outputs of a polyphase filter, the direct rule of resampler_fixed.cpp.
+    void (*polyphase)(const PhaseRows& rows, const Windows& windows, int32_t* output,
+                      uint32_t count) noexcept;
+
+    /// Makes `count` outputs of one of the two symmetric filters, `down` being 2 or 4.
+    void (*symmetric)(const PhaseRows& rows, const Windows& windows, int32_t* output,
+                      uint32_t count) noexcept;
+
+    /// The sum of bits 31 to 62, or 32 to 63, of the exact products of a row of taps and as many
+    /// samples.
+    int32_t (*convolve_from_bit_31)(const int32_t* samples, const int32_t* row,
+                                    uint32_t count) noexcept;
+    int32_t (*convolve_from_bit_32)(const int32_t* samples, const int32_t* row,
+                                    uint32_t count) noexcept;
+
+    /// Makes `count` outputs of a polyphase filter, each in the order of add_products(), from
+    /// windows that all lie in one block. `oldest` is the first sample of the first window, `phase`
+    /// the one before the first output.
+    void (*polyphase_floats)(const FloatPhases& phases, const float* oldest, uint32_t phase,
+                             float* output, uint32_t count) noexcept;
+
+    /// Widens the extremes by samples. NaN is passed over.
+    void (*widen_words)(Extremes<int32_t>& extremes, const int32_t* samples,
+                        uint32_t count) noexcept;
+    void (*widen_floats)(Extremes<float>& extremes, const float* samples, uint32_t count) noexcept;
+
+    /// Writes the level of each sample.
+    void (*word_levels)(const WordLevels& rule, const int32_t* samples, uint8_t* levels,
+                        uint32_t count) noexcept;
+    void (*float_levels)(const FloatLevels& rule, const float* samples, uint8_t* levels,
+                         uint32_t count) noexcept;
+
+    /// Multiplies each word by a gain that grows by `step` from word to word: 4 times the product's
+    /// upper 32 bits, which are truncated towards zero.
+    void (*apply_ramp)(int32_t* words, uint32_t count, int32_t gain, int32_t step) noexcept;
+
+    /// The sum of the squares, each shifted right by 16 bits; modulo 2^64.
+    uint64_t (*sum_squares)(const int32_t* words, uint32_t count) noexcept;
+};
+
+/// Adds the products of samples, walked backwards from the newest, and taps, walked forwards, to `sum`
+/// one by one. The order of the additions is part of the result, so there is only this one.
+float add_products(float sum, const float* newest, const float* taps, size_t count,
+                   size_t stride) noexcept;
+
+/// The variant that all of the library uses.
+const Kernels& kernels() noexcept;
+
+/// The variants of this build that this processor can run, the plain one first, the best one last.
+struct RunnableKernels {
+    std::array<const Kernels*, 3> tables{};
+    size_t count = 0;
+
+    const Kernels* const* begin() const noexcept { return tables.data(); }
+    const Kernels* const* end() const noexcept { return tables.data() + count; }
+};
+
+RunnableKernels runnable_kernels() noexcept;
+
+extern const Kernels kPlainKernels;
+
+} // namespace kz::dsp

@@ -1,0 +1,46 @@
+#include <algorithm>
+
+#include "kzsdk/abs/saturate.hpp"
+#include "kzsdk/kernels/fxp_ops.hpp"
+#include "kzsdk/kernels/plain.hpp"
+
+namespace kz::dsp::plain {
+
+using namespace fxp;
+
+void widen_words(Extremes<int32_t>& extremes, const int32_t* samples, uint32_t count) noexcept
+{
+    for (uint32_t i = 0; i < count; ++i) {
+        extremes.low = std::min(extremes.low, samples[i]);
+        extremes.high = std::max(extremes.high, samples[i]);
+    }
+}
+
+void widen_floats(Extremes<float>& extremes, const float* samples, uint32_t count) noexcept
+{
+    for (uint32_t i = 0; i < count; ++i) {
+        extremes.low = samples[i] < extremes.low ? samples[i] : extremes.low;
+        extremes.high = samples[i] > extremes.high ? samples[i] : extremes.high;
+    }
+}
+
+void word_levels(const WordLevels& rule, const int32_t* samples, uint8_t* levels,
+                 uint32_t count) noexcept
+{
+    for (uint32_t i = 0; i < count; ++i) {
+        const int32_t level =
+            smul_high(wrap_sub(samples[i] >> 1, rule.bottom), rule.scale) >> rule.shift;
+        levels[i] = static_cast<uint8_t>(std::clamp(level, 0, rule.top));
+    }
+}
+
+void float_levels(const FloatLevels& rule, const float* samples, uint8_t* levels,
+                  uint32_t count) noexcept
+{
+    for (uint32_t i = 0; i < count; ++i) {
+        const int32_t level = to_int32((samples[i] - rule.bottom) * rule.scale);
+        levels[i] = static_cast<uint8_t>(std::clamp(level, 0, rule.top));
+    }
+}
+
+} // namespace kz::dsp::plain

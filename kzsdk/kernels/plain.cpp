@@ -1,0 +1,39 @@
+#include "kzsdk/kernels/plain.hpp"
+
+namespace kz::dsp {
+
+namespace {
+
+template <class Word>
+constexpr Converters<Word> kPlainConverters = {
+    .pcm16_mono = plain::pcm16_mono,
+    .pcm16_stereo = plain::pcm16_stereo,
+    .pcm8_mono = plain::pcm8_mono,
+    .pcm8_stereo = plain::pcm8_stereo,
+};
+
+} // namespace
+
+const Kernels kPlainKernels = {
+    .name = "plain",
+    .dct_fixed = plain::dct_fixed,
+    .dct_float = plain::dct_float,
+    .words = kPlainConverters<int32_t>,
+    .floats = kPlainConverters<float>,
+    .shift_towards_zero = plain::shift_towards_zero,
+    .truncate = plain::truncate,
+    .pass_quiet = plain::pass_quiet,
+    .polyphase = plain::polyphase,
+    .symmetric = plain::symmetric,
+    .convolve_from_bit_31 = plain::convolve_from_bit_31,
+    .convolve_from_bit_32 = plain::convolve_from_bit_32,
+    .polyphase_floats = plain::polyphase_floats,
+    .widen_words = plain::widen_words,
+    .widen_floats = plain::widen_floats,
+    .word_levels = plain::word_levels,
+    .float_levels = plain::float_levels,
+    .apply_ramp = plain::apply_ramp,
+    .sum_squares = plain::sum_squares,
+};
+
+} // namespace kz::dsp

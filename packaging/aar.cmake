@@ -1,0 +1,52 @@
+# Packs an AAR: classes for Java, a library for each ABI, and a Prefab package for native users.
+#
+#   cmake -D JAR=kzsdk.jar -D "LIBRARIES=arm64-v8a=path/libkzsdk.so;x86_64=path/libkzsdk.so"
+#         -D VERSION=1.0.0 -D NDK=27 -D WORK_DIR=scratch -D OUT=kzsdk.aar -P aar.cmake
+cmake_minimum_required(VERSION 3.25)
+
+set(MIN_SDK 24)
+set(abis arm64-v8a armeabi-v7a x86_64 x86)
+# What a native user of the small list of names needs.
+set(headers abs/base.h abs/startup.h abs/status.h abs/version.h fpx/fpx.h)
+
+foreach(variable JAR LIBRARIES VERSION NDK WORK_DIR OUT)
+  if(NOT DEFINED ${variable})
+    message(FATAL_ERROR "aar.cmake: ${variable} is missing")
+  endif()
+endforeach()
+
+cmake_path(ABSOLUTE_PATH OUT)
+cmake_path(GET CMAKE_CURRENT_LIST_DIR PARENT_PATH root)
+file(REMOVE_RECURSE "${WORK_DIR}")
+configure_file("${root}/bindings/android/AndroidManifest.xml" "${WORK_DIR}/AndroidManifest.xml" @ONLY)
+configure_file("${root}/bindings/android/consumer-rules.pro" "${WORK_DIR}/proguard.txt" COPYONLY)
+configure_file("${JAR}" "${WORK_DIR}/classes.jar" COPYONLY)
+configure_file("${root}/LICENSE" "${WORK_DIR}/LICENSE" COPYONLY)
+file(WRITE "${WORK_DIR}/R.txt" "")
+
+set(prefab "${WORK_DIR}/prefab")
+set(module "${prefab}/modules/kzsdk")
+file(WRITE "${prefab}/prefab.json"
+     "{\"schema_version\": 2, \"name\": \"kzsdk\", \"version\": \"${VERSION}\", \"dependencies\": []}\n")
+file(WRITE "${module}/module.json" "{\"export_libraries\": [], \"library_name\": \"libkzsdk\"}\n")
+foreach(header IN LISTS headers)
+  configure_file("${root}/kzsdk/${header}" "${module}/include/kzsdk/${header}" COPYONLY)
+endforeach()
+
+foreach(entry IN LISTS LIBRARIES)
+  if(NOT entry MATCHES "^([^=]+)=(.+)$" OR NOT CMAKE_MATCH_1 IN_LIST abis)
+    message(FATAL_ERROR "aar.cmake: not <abi>=<library>: ${entry}")
+  endif()
+  set(abi ${CMAKE_MATCH_1})
+  set(library "${CMAKE_MATCH_2}")
+  configure_file("${library}" "${WORK_DIR}/jni/${abi}/libkzsdk.so" COPYONLY)
+  configure_file("${library}" "${module}/libs/android.${abi}/libkzsdk.so" COPYONLY)
+  # No C++ type crosses the interface, and no C++ run-time library is needed: any will do.
+  file(WRITE "${module}/libs/android.${abi}/abi.json"
+       "{\"abi\": \"${abi}\", \"api\": ${MIN_SDK}, \"ndk\": ${NDK}, \"stl\": \"none\", \"static\": false}\n")
+endforeach()
+
+execute_process(
+  COMMAND "${CMAKE_COMMAND}" -E tar cf "${OUT}" --format=zip AndroidManifest.xml LICENSE R.txt
+          classes.jar jni prefab proguard.txt
+  WORKING_DIRECTORY "${WORK_DIR}" COMMAND_ERROR_IS_FATAL ANY)

@@ -1,0 +1,152 @@
+#!/usr/bin/env python3
+"""Lists what the built library and kzfp are linked with, as CycloneDX 1.5 (JSON).
+
+packaging/sbom.py [BUILD_DIRECTORY]     build/release if not given; prints to standard output
+
+Read from the built files, not from what the build asked for: the libraries that they name, and those
+that these name in turn, each by the Debian package that it came in. Headers that leave no name behind
+are in INCLUDED. Nothing in it depends on when or where it is made.
+"""
+import functools
+import hashlib
+import json
+import os
+import pathlib
+import re
+import subprocess
+import sys
+from urllib.parse import quote
+
+# What we link or include ourselves. Another one has to be entered here, with its licence.
+LICENCES = {
+    "libc6": "LGPL-2.1-or-later",
+    "libgcc-s1": "GPL-3.0-or-later WITH GCC-exception-3.1",
+    "libstdc++6": "GPL-3.0-or-later WITH GCC-exception-3.1",
+    "libsndfile1": "LGPL-2.1-or-later",
+    "libsoxr0": "LGPL-2.1-or-later",
+    "libcli11-dev": "BSD-3-Clause",
+    "nlohmann-json3-dev": "MIT",
+}
+INCLUDED = {"kzfp": ["libcli11-dev", "nlohmann-json3-dev"]}
+
+
+def output(*command):
+    return subprocess.run(command, check=True, capture_output=True, text=True,
+                          env={**os.environ, "LC_ALL": "C"}).stdout
+
+
+def needed(file):
+    """The libraries that a file names: ["libm.so.6", ...]"""
+    return re.findall(r"\(NEEDED\).*\[(.*)\]", output("readelf", "-d", str(file)))
+
+
+def places_of(file):
+    """Where the loader finds all libraries that a file needs: {"libm.so.6": "/lib/.../libm.so.6"}"""
+    return dict(re.findall(r"(\S+) => (/\S+)", output("ldd", str(file))))
+
+
+@functools.cache
+def package_of(place):
+    """The Debian package that a file came in. It may know the file by its name from before /usr was
+    merged."""
+    place = os.path.realpath(place)
+    for name in (place, place.removeprefix("/usr")):
+        found = subprocess.run(["dpkg-query", "-S", name], capture_output=True, text=True)
+        if found.returncode == 0:
+            return found.stdout.split(":")[0]
+    sys.exit(f"sbom: no Debian package holds {place}; build with Debian's own libraries")
+
+
+def packaged(package):
+    version, architecture = output(
+        "dpkg-query", "-W", "-f", "${Version} ${Architecture}\n", package).splitlines()[0].split()
+    component = {
+        "type": "library",
+        "bom-ref": f"deb:{package}",
+        "name": package,
+        "version": version,
+        "purl": f"pkg:deb/debian/{quote(package)}@{quote(version)}?arch={architecture}",
+    }
+    if package in LICENCES:
+        component["licenses"] = [{"expression": LICENCES[package]}]
+    return component
+
+
+def our_own(kind, name, version, file):
+    return {
+        "type": kind,
+        "bom-ref": name,
+        "name": name,
+        "version": version,
+        "hashes": [{"alg": "SHA-256", "content": hashlib.sha256(file.read_bytes()).hexdigest()}],
+        "licenses": [{"expression": "MIT"}],
+        "purl": f"pkg:generic/{name}@{version}",
+    }
+
+
+class List:
+    def __init__(self):
+        self.packages = {}
+        self.links = {}
+        self.seen = set()
+
+    def add(self, package):
+        if package not in self.packages:
+            self.packages[package] = packaged(package)
+            self.links.setdefault(self.packages[package]["bom-ref"], set())
+        return self.packages[package]["bom-ref"]
+
+    def add_linked(self, file, ref, places):
+        """What a file names, and what that names in turn."""
+        refs = self.links.setdefault(ref, set())
+        for soname in needed(file):
+            if soname not in places:  # the loader itself
+                continue
+            package = package_of(places[soname])
+            below = self.add(package)
+            if ref in ("libkzsdk", "kzfp"):
+                self.expect_licence(ref, package)
+            refs.add(below)
+            if places[soname] not in self.seen:
+                self.seen.add(places[soname])
+                self.add_linked(places[soname], below, places)
+
+    def add_included(self, ref):
+        for package in INCLUDED.get(ref, []):
+            self.expect_licence(ref, package)
+            self.links[ref].add(self.add(package))
+
+    @staticmethod
+    def expect_licence(ref, package):
+        if package not in LICENCES:
+            sys.exit(f"sbom: {ref} uses {package}, which has no licence in packaging/sbom.py: enter it there")
+
+
+def main():
+    build = pathlib.Path(sys.argv[1] if len(sys.argv) > 1 else "build/release")
+    library, program = build / "kzsdk/libkzsdk.so", build / "tools/kzfp/kzfp"
+    for file in (library, program):
+        if not file.exists():
+            sys.exit(f"sbom: {file} is not there; ./run build makes it")
+    version = re.search(r"^CMAKE_PROJECT_VERSION:STATIC=(.*)$", (build / "CMakeCache.txt").read_text(),
+                        re.MULTILINE).group(1)
+
+    found = List()
+    for ref, file in (("libkzsdk", library), ("kzfp", program)):
+        found.add_linked(file, ref, places_of(file))
+        found.add_included(ref)
+    found.links["kzfp"].add("libkzsdk")  # its static form
+    document = {
+        "bomFormat": "CycloneDX",
+        "specVersion": "1.5",
+        "version": 1,
+        "metadata": {"component": our_own("library", "libkzsdk", version, library)},
+        "components": [our_own("application", "kzfp", version, program)]
+                      + [found.packages[name] for name in sorted(found.packages)],
+        "dependencies": [{"ref": ref, "dependsOn": sorted(found.links[ref] - {ref})}
+                         for ref in sorted(found.links)],
+    }
+    print(json.dumps(document, indent=2))
+
+
+main()

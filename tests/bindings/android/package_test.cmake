@@ -1,0 +1,99 @@
+# Packs an AAR and looks into it.
+cmake_minimum_required(VERSION 3.25)
+
+function(expect text pattern what)
+  if(NOT text MATCHES "${pattern}")
+    message(SEND_ERROR "${what}: no \"${pattern}\" in\n${text}")
+  endif()
+endfunction()
+
+function(output_of variable)
+  execute_process(COMMAND ${ARGN} OUTPUT_VARIABLE output COMMAND_ERROR_IS_FATAL ANY)
+  set(${variable} "${output}" PARENT_SCOPE)
+endfunction()
+
+set(aar "${WORK_DIR}/not_for_devices.aar")
+file(MAKE_DIRECTORY "${WORK_DIR}")
+output_of(ignored "${CMAKE_COMMAND}" -D "JAR=${JAR}" -D "LIBRARIES=x86_64=${LIBRARY}" -D
+          "VERSION=${VERSION}" -D NDK=27 -D "WORK_DIR=${WORK_DIR}/scratch" -D "OUT=${aar}" -P
+          "${ROOT}/packaging/aar.cmake")
+
+set(tree "${WORK_DIR}/unpacked")
+file(REMOVE_RECURSE "${tree}")
+file(ARCHIVE_EXTRACT INPUT "${aar}" DESTINATION "${tree}")
+file(GLOB_RECURSE files RELATIVE "${tree}" "${tree}/*")
+list(SORT files)
+set(module prefab/modules/kzsdk)
+set(expected
+    AndroidManifest.xml
+    LICENSE
+    R.txt
+    classes.jar
+    jni/x86_64/libkzsdk.so
+    ${module}/include/kzsdk/abs/base.h
+    ${module}/include/kzsdk/abs/startup.h
+    ${module}/include/kzsdk/abs/status.h
+    ${module}/include/kzsdk/abs/version.h
+    ${module}/include/kzsdk/fpx/fpx.h
+    ${module}/libs/android.x86_64/abi.json
+    ${module}/libs/android.x86_64/libkzsdk.so
+    ${module}/module.json
+    prefab/prefab.json
+    proguard.txt)
+list(SORT expected)
+if(NOT files STREQUAL expected)
+  message(SEND_ERROR "The package holds\n${files}\nand not\n${expected}")
+endif()
+
+file(READ "${tree}/AndroidManifest.xml" manifest)
+expect("${manifest}" "package=\"com.orvanta.android.kzsdk\"" manifest)
+expect("${manifest}" "minSdkVersion=\"24\"" manifest)
+file(READ "${tree}/${module}/libs/android.x86_64/abi.json" abi)
+string(JSON stl GET "${abi}" stl)
+string(JSON api GET "${abi}" api)
+expect("${stl} ${api}" "^none 24$" "abi.json")
+file(READ "${tree}/prefab/prefab.json" package)
+string(JSON schema GET "${package}" schema_version)
+string(JSON name GET "${package}" name)
+expect("${schema} ${name}" "^2 kzsdk$" "prefab.json")
+file(READ "${tree}/${module}/module.json" about)
+string(JSON library GET "${about}" library_name)
+expect("${library}" "^libkzsdk$" "module.json")
+
+# Every member that the native side binds stands in the keep rules as the class declares it.
+file(READ "${tree}/proguard.txt" rules)
+output_of(members "${JAVAP}" -p -classpath "${tree}/classes.jar" com.orvanta.android.kzsdk.Fingerprint)
+string(REGEX MATCHALL "[^;\n]*(native|mNativeContext|postEventFromNative)[^;\n]*" bound "${members}")
+list(LENGTH bound count)
+if(NOT count EQUAL 7)
+  message(SEND_ERROR "the class binds ${count} members:\n${bound}")
+endif()
+foreach(member IN LISTS bound)
+  string(REGEX REPLACE "^ *private " "" member "${member}")
+  string(FIND "${rules}" "    ${member};" found)
+  if(found EQUAL -1)
+    message(SEND_ERROR "no keep rule for: ${member}")
+  endif()
+endforeach()
+
+# The library exports the small list, and nothing else.
+file(READ "${MAP}" map)
+string(REGEX REPLACE "#[^\n]*" "" map "${map}")
+string(REGEX REPLACE "local:.*" "" map "${map}")
+string(REGEX REPLACE ".*global:" "" map "${map}")
+string(REGEX MATCHALL "[A-Za-z_0-9]+" names "${map}")
+list(SORT names)
+output_of(exported "${NM}" -D --defined-only --format=posix "${tree}/jni/x86_64/libkzsdk.so")
+string(REGEX MATCHALL "[^\n]+" exported "${exported}")
+list(TRANSFORM exported REPLACE " .*" "")
+list(SORT exported)
+if(NOT exported STREQUAL names)
+  message(SEND_ERROR "The library exports\n${exported}\nand not\n${names}")
+endif()
+
+# It loads where pages have 16 KiB.
+output_of(segments "${READELF}" -lW "${tree}/jni/x86_64/libkzsdk.so")
+string(REGEX MATCHALL "LOAD [^\n]*" loads "${segments}")
+foreach(load IN LISTS loads)
+  expect("${load}" "0x4000 *$" "alignment")
+endforeach()

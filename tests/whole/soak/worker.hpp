@@ -1,0 +1,52 @@
+/// @file
+/// One thread's work: several fingerprints at once, a piece for this and a piece for that.
+#pragma once
+
+#include <atomic>
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "kzsdk/fpx/fpx.h"
+#include "whole/soak/recordings.hpp"
+
+namespace kz::soak {
+
+/// A fingerprint in the making.
+class Job {
+public:
+    Job(const Recording& recording, uint32_t way);
+
+    /// Feeds the next piece; true when the fingerprint is complete or the recording at its end.
+    bool step();
+
+    /// The document, or what went wrong.
+    std::string document() const;
+
+    bool is_as_alone() const { return document() == recording_->documents[way_]; }
+    const Recording& recording() const { return *recording_; }
+
+private:
+    struct Free {
+        void operator()(kz_fpx_handle* handle) const { kz_fpx_fingerprint_free(&handle); }
+    };
+
+    const Recording* recording_;
+    uint32_t way_;
+    Cutter cutter_;
+    uint32_t fed_ = 0;
+    std::unique_ptr<kz_fpx_handle, Free> handle_;
+};
+
+struct Tally {
+    std::atomic<uint64_t> documents{0};
+    std::atomic<uint64_t> abandoned{0};
+    std::atomic<uint64_t> wrong{0};
+};
+
+/// Works until `stop`.
+void work(const std::vector<Recording>& recordings, uint64_t seed, const std::atomic<bool>& stop,
+          Tally& tally);
+
+} // namespace kz::soak
