@@ -49,6 +49,8 @@ typedef uint32_t kz_status;
 #define KZ_FPX_ERROR_MEMORY UINT32_C(0x90080001)
 #define KZ_FPX_ERROR_INVALID_ARGUMENT UINT32_C(0x90080004)
 #define KZ_FPX_ERROR_RENDER UINT32_C(0x9008000b)
+/** The caller's array is too small for the values; their count has been reported. */
+#define KZ_FPX_ERROR_ROOM UINT32_C(0x90080010)
 #define KZ_FPX_ERROR_NO_ALGORITHM UINT32_C(0x90080606)
 
 /* Fingerprinters, both algorithms (module 0x0F). */

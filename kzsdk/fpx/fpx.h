@@ -92,6 +92,75 @@ KZ_API kz_status kz_fpx_fingerprint_serialize(kz_fpx_handle* handle, char** out_
 KZ_API kz_status kz_fpx_fingerprint_serialize_free(char** text_ref) KZ_NOEXCEPT;
 
 /**
+ * Copies the values of a complete fingerprint: those that the document holds, with their sign.
+ *
+ * @param values     Room for @p capacity values. May be null when @p capacity is 0, to read the
+ *                   count alone.
+ * @param capacity   Values that fit; a default fingerprint has 30: the means of 15 bands from low
+ *                   to high, then their spreads, each a share of its half's sum in units of
+ *                   2^-15. A share of 1 wraps to -32768.
+ * @param[out] out_count  The number of values there are, also when they are not copied.
+ * @return 0; KZ_FPX_ERROR_INVALID_ARGUMENT when a pointer is null; KZ_QV_ERROR_INCOMPLETE when the
+ *         fingerprint is not complete; KZ_FPX_ERROR_ROOM when @p capacity is below the count;
+ *         KZ_FPX_ERROR_MEMORY when memory is short. Nothing is copied on failure.
+ */
+KZ_API kz_status kz_fpx_fingerprint_get_values(kz_fpx_handle* handle, int16_t* values,
+                                               uint32_t capacity, uint32_t* out_count) KZ_NOEXCEPT;
+
+/**
+ * Reports how much leading silence was skipped so far, at any time. A pointer may be null when its
+ * number is not wanted.
+ *
+ * @param[out] out_samples  Samples at the working rate, 11025 Hz, counted modulo 2^32 (4.5 days).
+ * @param[out] out_seconds  The same in seconds.
+ * @param[out] out_found    1 once the end of the silence was found: the other two are final then;
+ *                          else 0.
+ * @return 0; KZ_FPX_ERROR_INVALID_ARGUMENT when @p handle is null.
+ */
+KZ_API kz_status kz_fpx_fingerprint_get_signal_offset(const kz_fpx_handle* handle,
+                                                      uint32_t* out_samples, double* out_seconds,
+                                                      uint8_t* out_found) KZ_NOEXCEPT;
+
+/**
+ * Reports the times of the frames collected so far, at any time. A pointer may be null when its
+ * time is not wanted. They are not part of the document.
+ *
+ * @param[out] out_start     Milliseconds of leading silence that were skipped.
+ * @param[out] out_duration  Milliseconds from the start of the first frame to the end of the last;
+ *                           0 before the first frame is full, 14210 once a default fingerprint is
+ *                           complete.
+ *
+ * The fixed-point algorithm computes in 32 bits, which wrap beyond 390 s; the floating-point one
+ * in single precision, which keeps 24 bits.
+ *
+ * @return 0; KZ_FPX_ERROR_INVALID_ARGUMENT when @p handle is null.
+ */
+KZ_API kz_status kz_fpx_fingerprint_get_times(const kz_fpx_handle* handle, uint32_t* out_start,
+                                              uint32_t* out_duration) KZ_NOEXCEPT;
+
+/**
+ * Reports how far the fingerprint is, at any time.
+ *
+ * @param[out] out_percent  0 .. 100: the share of the frames that are needed; 100 exactly when it
+ *                          is complete.
+ * @return 0; KZ_FPX_ERROR_INVALID_ARGUMENT when a pointer is null.
+ */
+KZ_API kz_status kz_fpx_fingerprint_get_progress(const kz_fpx_handle* handle,
+                                                 uint32_t* out_percent) KZ_NOEXCEPT;
+
+/**
+ * Reports how many frames the next piece should have. A stream that is fed in exactly such pieces
+ * gives the same document, to the bit, as one call with the whole of it; only the last piece may
+ * be shorter.
+ *
+ * @param[out] out_frames  Never 0. Below 150000 for rates up to 48000 Hz, about 3 s of audio in
+ *                         general.
+ * @return 0; KZ_FPX_ERROR_INVALID_ARGUMENT when a pointer is null.
+ */
+KZ_API kz_status kz_fpx_fingerprint_get_next_frames(const kz_fpx_handle* handle,
+                                                    uint32_t* out_frames) KZ_NOEXCEPT;
+
+/**
  * Frees a handle and sets the caller's pointer to null, whatever the outcome.
  *
  * While the memory manager is off nothing is freed: the handle is lost, and 0 is returned.

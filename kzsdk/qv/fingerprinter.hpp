@@ -9,7 +9,7 @@
 ///     create_frame_manager, destroy_frame_manager, reset_frame_manager, get_fingerprint_size,
 ///     get_fingerprint, get_frame_count, get_percent_progress
 ///     create_detector, destroy_detector, reset_detector
-///     milliseconds(object, samples)                        at the working rate
+///     milliseconds(object, samples), seconds(object, samples)  of samples at the working rate
 #pragma once
 
 #include <cstdint>
@@ -96,7 +96,7 @@ public:
         }
         const FingerprintSource source{.name = kAlgorithmName,
                                        .version = kAlgorithmVersion,
-                                       .size = Twin::get_fingerprint_size(object->frame_manager),
+                                       .size = result_size(*object),
                                        .object = object,
                                        .extract = extract};
         return build_query_document(source, out_tree);
@@ -114,18 +114,41 @@ public:
             return KZ_QV_ERROR_INVALID_ARGUMENT;
         }
         const Object& o = *static_cast<const Object*>(object);
-        if (size < Twin::get_fingerprint_size(o.frame_manager)) {
+        if (size < result_size(o)) {
             return KZ_QV_ERROR_INVALID_ARGUMENT;
         }
-        if (o.frame_limit != 0 && !Twin::reached_limit(o)) {
+        if (!is_complete(o)) {
             return KZ_QV_ERROR_INCOMPLETE;
         }
         const uint32_t written = Twin::get_fingerprint(o.frame_manager, buffer, size);
-        const uint32_t frames = Twin::get_frame_count(o.frame_manager);
-        times.start = Twin::milliseconds(o, o.signal_offset);
-        times.duration =
-            frames == 0 ? 0 : Twin::milliseconds(o, (frames - 1) * o.hop + o.frame_length);
+        times = Fingerprinter::times(o);
         return written != 0 ? KZ_OK : KZ_QV_ERROR_INCOMPLETE;
+    }
+
+    /// Bytes of the fingerprint.
+    static uint32_t result_size(const Object& o) noexcept
+    {
+        return Twin::get_fingerprint_size(o.frame_manager);
+    }
+
+    /// Whether a result may be read. Without a frame limit it always may.
+    static bool is_complete(const Object& o) noexcept
+    {
+        return o.frame_limit == 0 || Twin::reached_limit(o);
+    }
+
+    /// The times of the frames collected so far.
+    static FingerprintTimes times(const Object& o) noexcept
+    {
+        const uint32_t frames = Twin::get_frame_count(o.frame_manager);
+        return {.start = Twin::milliseconds(o, o.signal_offset),
+                .duration =
+                    frames == 0 ? 0 : Twin::milliseconds(o, (frames - 1) * o.hop + o.frame_length)};
+    }
+
+    static double seconds(const Object& o, uint32_t samples) noexcept
+    {
+        return Twin::seconds(o, samples);
     }
 
     static kz_status get_percent_progress(const Object* object, uint32_t* out_percent) noexcept

@@ -86,6 +86,11 @@ struct Twin {
     {
         return fxp::wrap_mul(samples, 1000U) / (o.working_rate >> 12);
     }
+
+    static double seconds(const Object& o, uint32_t samples) noexcept
+    {
+        return static_cast<double>(samples) / (o.working_rate >> 12);
+    }
 };
 
 using Fingerprinter = qv::Fingerprinter<Twin>;

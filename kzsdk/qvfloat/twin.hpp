@@ -79,6 +79,11 @@ struct Twin {
     {
         return to_uint32(static_cast<float>(samples) * 1000.0F / o.working_rate);
     }
+
+    static double seconds(const Object& o, uint32_t samples) noexcept
+    {
+        return static_cast<double>(samples) / static_cast<double>(o.working_rate);
+    }
 };
 
 using Fingerprinter = qv::Fingerprinter<Twin>;

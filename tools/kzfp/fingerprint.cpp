@@ -1,14 +1,11 @@
 #include "fingerprint.hpp"
 
-#include <charconv>
 #include <cmath>
 #include <cstdio>
 #include <memory>
-#include <string_view>
 
 #include "kzsdk/abs/startup.h"
 #include "kzsdk/fpx/fpx.h"
-#include "kzsdk/fpx/inspect.hpp"
 
 namespace kzfp {
 
@@ -69,20 +66,42 @@ Handle create(const StreamFormat& format, Algorithm algorithm)
     return Handle(handle);
 }
 
+/// Leading silence, skipped so far.
+struct Silence {
+    uint32_t samples = 0; ///< at kWorkingRate
+    double seconds = 0;
+    uint8_t has_ended = 0;
+};
+
+Silence silence_of(const kz_fpx_handle& handle)
+{
+    Silence silence;
+    kz_fpx_fingerprint_get_signal_offset(&handle, &silence.samples, &silence.seconds,
+                                         &silence.has_ended);
+    return silence;
+}
+
+uint32_t next_frames(const kz_fpx_handle& handle)
+{
+    uint32_t frames = 0;
+    kz_fpx_fingerprint_get_next_frames(&handle, &frames);
+    return frames;
+}
+
 /// Why `frames` of a stream that has ended made no fingerprint.
 std::string too_little(const kz_fpx_handle& handle, const AudioSource& source, uint64_t frames)
 {
     const double seconds = static_cast<double>(frames) / source.format().rate;
-    const double silence = static_cast<double>(kz::fpx::signal_offset(handle)) / kWorkingRate;
+    const Silence silence = silence_of(handle);
     std::string text;
     if (frames == 0) {
         text = "no sound";
-    } else if (!kz::fpx::signal_found(handle)) {
+    } else if (silence.has_ended == 0) {
         text = "nothing but silence in " + had(seconds);
     } else {
-        text = had(std::max(0.0, seconds - silence)) + " of sound";
-        if (silence >= 0.1) {
-            text += " after " + had(silence) + " of silence";
+        text = had(std::max(0.0, seconds - silence.seconds)) + " of sound";
+        if (silence.seconds >= 0.1) {
+            text += " after " + had(silence.seconds) + " of silence";
         }
     }
     if (const std::string trouble = source.trouble(); !trouble.empty()) {
@@ -101,7 +120,7 @@ void feed(kz_fpx_handle& handle, AudioSource& source)
     uint64_t fed = 0;
     uint8_t complete = 0;
     while (complete == 0) {
-        const size_t wanted = kz::fpx::next_block_frames(handle);
+        const size_t wanted = next_frames(handle);
         block.resize(wanted * frame_bytes);
         const size_t got = source.read(block);
         if (got > 0) {
@@ -133,26 +152,14 @@ std::string to_document(kz_fpx_handle& handle)
     return document;
 }
 
-/// The document writes the values unsigned, though it calls them signed, which they are.
-std::vector<int16_t> values_of(std::string_view document)
+std::vector<int16_t> values_of(kz_fpx_handle& handle)
 {
-    std::vector<int16_t> values;
-    const size_t element = document.find("<FP_BLOCK ");
-    const size_t start = document.find('>', element);
-    const size_t end = document.find('<', start);
-    if (element == std::string_view::npos || end == std::string_view::npos) {
-        throw FileError("the library's document holds no values");
-    }
-    std::string_view text = document.substr(start + 1, end - start - 1);
-    while (!text.empty()) {
-        uint16_t word = 0;
-        const auto [stop, error] = std::from_chars(text.data(), text.data() + text.size(), word);
-        if (error == std::errc{}) {
-            values.push_back(static_cast<int16_t>(word));
-            text.remove_prefix(static_cast<size_t>(stop - text.data()));
-        } else {
-            text.remove_prefix(1);
-        }
+    uint32_t count = 0;
+    kz_fpx_fingerprint_get_values(&handle, nullptr, 0, &count);
+    std::vector<int16_t> values(count);
+    const kz_status status = kz_fpx_fingerprint_get_values(&handle, values.data(), count, &count);
+    if (status != KZ_OK) {
+        fail("reading the values", status);
     }
     return values;
 }
@@ -176,8 +183,8 @@ Fingerprint take_fingerprint(AudioSource& source, Algorithm algorithm)
     feed(*handle, source);
     Fingerprint fingerprint;
     fingerprint.document = to_document(*handle);
-    fingerprint.values = values_of(fingerprint.document);
-    fingerprint.signal_offset = kz::fpx::signal_offset(*handle);
+    fingerprint.values = values_of(*handle);
+    fingerprint.signal_offset = silence_of(*handle).samples;
     return fingerprint;
 }
 

@@ -17,6 +17,7 @@
 #include "kzsdk/abs/dyn_buf.h"
 #include "kzsdk/abs/text.h"
 #include "kzsdk/disc/disc.h"
+#include "kzsdk/fpx/algorithm.hpp"
 #include "kzsdk/fpx/fpx.h"
 #include "library/xml/tree_model.hpp"
 #include "support/allocation.hpp"
@@ -565,6 +566,19 @@ Attempt serializes()
     return [handle] { return serialize(handle.get()); };
 }
 
+template <uint32_t algorithm, class Object>
+Attempt copies_values()
+{
+    const std::shared_ptr handle(make_handle(algorithm));
+    EXPECT_TRUE(feed_handle(handle.get(), noise(size_t{11025} * 15, 0.5, 5)));
+    return [handle] {
+        static_cast<Object*>(handle->instance)->frame_manager->fingerprint_ready = 0;
+        int16_t values[30];
+        uint32_t count = 0;
+        return kz_fpx_fingerprint_get_values(handle.get(), values, 30, &count) == KZ_OK;
+    };
+}
+
 const Case kFpxCases[] = {
     {"kz_fpx_fingerprint_create", Reports, creates_handle<KZ_FPX_ALGORITHM_FIXED>},
     {"kz_fpx_fingerprint_create", Reports, creates_handle<KZ_FPX_ALGORITHM_FLOAT>},
@@ -572,6 +586,9 @@ const Case kFpxCases[] = {
     {"kz_fpx_fingerprint_add_audio", Conceals, feeds_handle<KZ_FPX_ALGORITHM_FLOAT>},
     {"kz_fpx_fingerprint_serialize", Conceals, serializes<KZ_FPX_ALGORITHM_FIXED>},
     {"kz_fpx_fingerprint_serialize", Conceals, serializes<KZ_FPX_ALGORITHM_FLOAT>},
+    {"kz_fpx_fingerprint_get_values", Reports,
+     copies_values<KZ_FPX_ALGORITHM_FIXED, kzqvfixed_fingerprinter>},
+    {"kz_fpx_fingerprint_get_values", Reports, copies_values<KZ_FPX_ALGORITHM_FLOAT, QVFP>},
 };
 
 // ---- disc

@@ -1,6 +1,9 @@
-#include "kzsdk/fpx/inspect.hpp"
+// The numbers of a fingerprint context: each is that of its object, and pieces of the size that it
+// reports do not show.
 
 #include <algorithm>
+#include <cstring>
+#include <string>
 #include <vector>
 
 #include "kzsdk/fpx/algorithm.hpp"
@@ -14,6 +17,12 @@ namespace {
 constexpr uint32_t kRates[] = {8000, 11025, 16000, 22050, 24000, 32000, 44100, 48000};
 // What only the floating-point algorithm takes: near-copies, rates with large terms, a multiple.
 constexpr uint32_t kOddRates[] = {11024, 12345, 44056, 96000};
+
+struct Signal {
+    uint32_t samples = 0;
+    double seconds = 0;
+    uint8_t found = 0;
+};
 
 // A handle of one of the algorithms, its fingerprinter in view.
 template <class Twin>
@@ -35,7 +44,29 @@ public:
                                                       &complete));
         return complete == 1;
     }
-    const kz_fpx_handle& operator*() const { return *handle_; }
+    uint32_t next_frames() const
+    {
+        uint32_t frames = 0;
+        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_get_next_frames(handle_, &frames));
+        return frames;
+    }
+
+    uint32_t progress() const
+    {
+        uint32_t percent = 200;
+        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_get_progress(handle_, &percent));
+        return percent;
+    }
+
+    Signal signal() const
+    {
+        Signal signal;
+        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_get_signal_offset(handle_, &signal.samples,
+                                                              &signal.seconds, &signal.found));
+        return signal;
+    }
+
+    kz_fpx_handle* get() const { return handle_; }
 
     typename Twin::Object& object() const
     {
@@ -72,7 +103,7 @@ bool feed_blocks(Handle<Twin>& handle, const std::vector<int16_t>& music, size_t
 {
     bool complete = false;
     for (size_t at = from; !complete && at < frames;) {
-        const uint32_t next = fpx::next_block_frames(*handle);
+        const uint32_t next = handle.next_frames();
         EXPECT_GT(next, 0U);
         EXPECT_LT(next, handle.object().input_rate > 48000 ? 300000U : 150000U);
         if (next == 0) {
@@ -98,13 +129,13 @@ std::vector<uint32_t> rates()
 } // namespace
 
 template <class T>
-class Inspect : public TwinTest<T> {
+class Numbers : public TwinTest<T> {
 };
-TYPED_TEST_SUITE(Inspect, Twins, TwinNames);
+TYPED_TEST_SUITE(Numbers, Twins, TwinNames);
 
 // The promise that lets a file be streamed: not only the document, every working-rate sample and
 // every feature must be the same word as from one call.
-TYPED_TEST(Inspect, FeedingBlockByBlockGivesTheSameWordsAsOneCall)
+TYPED_TEST(Numbers, PiecesOfTheNextFramesNeverShow)
 {
     for (const uint32_t rate : rates<TypeParam>()) {
         for (const double silence : {0.0, 0.01, 2.9, 7.3}) {
@@ -123,7 +154,7 @@ TYPED_TEST(Inspect, FeedingBlockByBlockGivesTheSameWordsAsOneCall)
 
 // The same from any state that odd pieces leave behind, the states included in which the last
 // sample of room needs no input of its own.
-TYPED_TEST(Inspect, TheNextBlockIsExactFromAnyState)
+TYPED_TEST(Numbers, NextFramesAreExactFromAnyState)
 {
     std::vector<uint32_t> some{8000, 48000, 22050, 11025};
     if (TypeParam::kAlgorithm == KZ_FPX_ALGORITHM_FLOAT) {
@@ -148,7 +179,7 @@ TYPED_TEST(Inspect, TheNextBlockIsExactFromAnyState)
 // When upsampling, a step can make a sample without taking any input: when one sample of room is
 // left just after the room before was filled. (A signal found one sample into a full ring gets
 // there.) The feed must go on, not end, and the block to feed next is that of the step after.
-TYPED_TEST(Inspect, AStepThatOnlyProducesDoesNotEndTheFeed)
+TYPED_TEST(Numbers, AStepThatOnlyProducesKeepsTheFeedGoing)
 {
     const auto music = noise(8000 * 15, 0.5, 1);
     const std::vector<int16_t> silence(8000 * 30, 0);
@@ -158,7 +189,7 @@ TYPED_TEST(Inspect, AStepThatOnlyProducesDoesNotEndTheFeed)
         Handle<TypeParam> pieces(8000, 1);
         for (Handle<TypeParam>* handle : {&whole, &pieces}) {
             for (uint32_t i = 0; i < blocks; ++i) {
-                handle->feed(silence, 0, fpx::next_block_frames(**handle));
+                handle->feed(silence, 0, handle->next_frames());
             }
             handle->object().searching_for_signal = 0;
             handle->object().write_position = 32767;
@@ -172,20 +203,110 @@ TYPED_TEST(Inspect, AStepThatOnlyProducesDoesNotEndTheFeed)
     EXPECT_GT(met, 0U);
 }
 
-TYPED_TEST(Inspect, TellsSilenceAndProgress)
+TYPED_TEST(Numbers, ReportSilenceAndProgress)
 {
     auto music = noise(11025 * 20, 0.5, 3);
     std::fill_n(music.begin(), 11025, int16_t{0});
     Handle<TypeParam> handle(11025, 1);
-    EXPECT_FALSE(fpx::signal_found(*handle));
-    EXPECT_EQ(0U, fpx::percent_progress(*handle));
+    EXPECT_EQ(0, handle.signal().found);
+    EXPECT_EQ(0U, handle.progress());
     handle.feed(music, 0, 5000);
-    EXPECT_EQ(5000U, fpx::signal_offset(*handle));
-    EXPECT_FALSE(fpx::signal_found(*handle));
+    EXPECT_EQ(5000U, handle.signal().samples);
+    EXPECT_EQ(5000.0 / 11025, handle.signal().seconds);
+    EXPECT_EQ(0, handle.signal().found);
     handle.feed(music, 5000, music.size() - 5000);
-    EXPECT_TRUE(fpx::signal_found(*handle));
-    EXPECT_NEAR(11025 - 64.0, fpx::signal_offset(*handle), 40);
-    EXPECT_EQ(100U, fpx::percent_progress(*handle));
+    EXPECT_EQ(1, handle.signal().found);
+    EXPECT_NEAR(11025 - 64.0, handle.signal().samples, 40);
+    EXPECT_EQ(100U, handle.progress());
+}
+
+TYPED_TEST(Numbers, TimesFollowTheFrames)
+{
+    auto music = noise(11025 * 20, 0.5, 3);
+    std::fill_n(music.begin(), 11025, int16_t{0});
+    Handle<TypeParam> handle(11025, 1);
+    uint32_t start = 9;
+    uint32_t duration = 9;
+    ASSERT_EQ(KZ_OK, kz_fpx_fingerprint_get_times(handle.get(), &start, &duration));
+    EXPECT_EQ(0U, start);
+    EXPECT_EQ(0U, duration) << "before the first frame";
+    handle.feed(music, 0, 11025 + 32768 + 11264);
+    ASSERT_EQ(KZ_OK, kz_fpx_fingerprint_get_times(handle.get(), &start, &duration));
+    const double offset = handle.signal().samples;
+    EXPECT_EQ(static_cast<uint32_t>(offset * 1000 / 11025), start);
+    EXPECT_EQ(3993U, duration) << "two frames: 44032 samples";
+    handle.feed(music, 11025 + 32768 + 11264, 11025 * 12);
+    ASSERT_EQ(KZ_OK, kz_fpx_fingerprint_get_times(handle.get(), nullptr, &duration));
+    EXPECT_EQ(14210U, duration) << "twelve frames: 156672 samples";
+}
+
+// The document writes the sixteen bits of each value without a sign.
+TYPED_TEST(Numbers, ValuesAreThoseOfTheDocument)
+{
+    Handle<TypeParam> handle(11025, 1);
+    handle.feed(noise(11025 * 15, 0.5, 3), 0, 11025 * 15);
+    std::vector<int16_t> values(31, 77);
+    uint32_t count = 0;
+    ASSERT_EQ(KZ_OK, kz_fpx_fingerprint_get_values(handle.get(), values.data(), 31, &count));
+    EXPECT_EQ(30U, count);
+    EXPECT_EQ(77, values[30]) << "written behind the values";
+    std::string printed;
+    for (uint32_t i = 0; i < count; ++i) {
+        printed += i == 0 ? ">" : " ";
+        printed += std::to_string(static_cast<uint16_t>(values[i]));
+    }
+    char* document = nullptr;
+    ASSERT_EQ(KZ_OK, kz_fpx_fingerprint_serialize(handle.get(), &document));
+    EXPECT_NE(nullptr, std::strstr(document, (printed + "<").c_str())) << document;
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_serialize_free(&document));
+}
+
+TYPED_TEST(Numbers, ValuesAreRefusedWithTheirCount)
+{
+    int16_t values[30] = {77};
+    uint32_t count = 0;
+    Handle<TypeParam> handle(11025, 1);
+    EXPECT_EQ(KZ_QV_ERROR_INCOMPLETE,
+              kz_fpx_fingerprint_get_values(handle.get(), values, 30, &count));
+    EXPECT_EQ(30U, count);
+    handle.feed(noise(11025 * 15, 0.5, 3), 0, 11025 * 15);
+    count = 0;
+    EXPECT_EQ(KZ_FPX_ERROR_ROOM, kz_fpx_fingerprint_get_values(handle.get(), values, 29, &count));
+    EXPECT_EQ(30U, count);
+    EXPECT_EQ(KZ_FPX_ERROR_ROOM, kz_fpx_fingerprint_get_values(handle.get(), nullptr, 0, &count));
+    EXPECT_EQ(77, values[0]) << "copied on failure";
+}
+
+TYPED_TEST(Numbers, RefuseNullPointers)
+{
+    const Handle<TypeParam> handle(11025, 1);
+    uint32_t number = 0;
+    int16_t value = 0;
+    constexpr kz_status kRefused = KZ_FPX_ERROR_INVALID_ARGUMENT;
+    EXPECT_EQ(kRefused, kz_fpx_fingerprint_get_values(nullptr, &value, 1, &number));
+    EXPECT_EQ(kRefused, kz_fpx_fingerprint_get_values(handle.get(), nullptr, 1, &number));
+    EXPECT_EQ(kRefused, kz_fpx_fingerprint_get_values(handle.get(), &value, 1, nullptr));
+    EXPECT_EQ(kRefused, kz_fpx_fingerprint_get_signal_offset(nullptr, &number, nullptr, nullptr));
+    EXPECT_EQ(kRefused, kz_fpx_fingerprint_get_times(nullptr, &number, &number));
+    EXPECT_EQ(kRefused, kz_fpx_fingerprint_get_progress(nullptr, &number));
+    EXPECT_EQ(kRefused, kz_fpx_fingerprint_get_progress(handle.get(), nullptr));
+    EXPECT_EQ(kRefused, kz_fpx_fingerprint_get_next_frames(nullptr, &number));
+    EXPECT_EQ(kRefused, kz_fpx_fingerprint_get_next_frames(handle.get(), nullptr));
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_get_signal_offset(handle.get(), nullptr, nullptr, nullptr));
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_get_times(handle.get(), nullptr, nullptr));
+}
+
+TYPED_TEST(Numbers, ValuesSurviveEveryFailedAllocation)
+{
+    Handle<TypeParam> handle(11025, 1);
+    handle.feed(noise(11025 * 15, 0.5, 3), 0, 11025 * 15);
+    for_every_failed_allocation([&](auto fired) {
+        handle.object().frame_manager->fingerprint_ready = 0;
+        int16_t values[30];
+        uint32_t count = 0;
+        const kz_status status = kz_fpx_fingerprint_get_values(handle.get(), values, 30, &count);
+        EXPECT_EQ(fired() ? KZ_FPX_ERROR_MEMORY : KZ_OK, status);
+    });
 }
 
 } // namespace kz::test
