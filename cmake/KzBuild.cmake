@@ -1,4 +1,4 @@
-# Compiler settings shared by all targets, and the two functions in which rooms and tests are declared.
+# Compiler settings shared by all targets, and the functions in which tests are declared.
 
 if(NOT CMAKE_BUILD_TYPE AND NOT CMAKE_CONFIGURATION_TYPES)
   set(CMAKE_BUILD_TYPE Release CACHE STRING "Build type" FORCE)
@@ -83,26 +83,6 @@ function(kz_library_objects target)
                          VISIBILITY_INLINES_HIDDEN ON)
 endfunction()
 
-# kz_room(<name> [BELOW <room>...] HEADERS <public headers> SOURCES <files>)
-#
-# A room of the library becomes an object library. A room sees, and its tests link, only what is
-# named in BELOW and what lies below that: a call upwards does not link.
-function(kz_room name)
-  cmake_parse_arguments(PARSE_ARGV 1 room "" "" "BELOW;HEADERS;SOURCES")
-  set(target kz_${name})
-  kz_library_objects(${target} ${room_SOURCES})
-  set(closure ${name})
-  foreach(below IN LISTS room_BELOW)
-    get_property(lower GLOBAL PROPERTY KZ_ROOM_${below}_CLOSURE)
-    list(APPEND closure ${lower})
-  endforeach()
-  list(REMOVE_DUPLICATES closure)
-  set_property(GLOBAL PROPERTY KZ_ROOM_${name}_CLOSURE ${closure})
-  set_property(GLOBAL APPEND PROPERTY KZ_ROOMS ${name})
-  list(TRANSFORM room_HEADERS PREPEND "${CMAKE_CURRENT_SOURCE_DIR}/")
-  set_property(GLOBAL APPEND PROPERTY KZ_PUBLIC_HEADERS ${room_HEADERS})
-endfunction()
-
 # kz_test(<file>_test [ROOMS <room>...] [LIBS <target>...] [FIXTURE <name>])
 #
 # Builds <file>_test.cpp of this folder over its room's objects and everything below, with the
@@ -116,13 +96,9 @@ function(kz_test file)
   if(NOT test_ROOMS)
     set(test_ROOMS ${folder})
   endif()
-  set(objects "")
-  foreach(name IN LISTS test_ROOMS)
-    get_property(closure GLOBAL PROPERTY KZ_ROOM_${name}_CLOSURE)
-    list(APPEND objects ${closure})
-  endforeach()
-  list(REMOVE_DUPLICATES objects)
-  list(TRANSFORM objects PREPEND "kz_")
+  kz_room_closure(rooms ${test_ROOMS})
+  kz_room_objects(objects ${test_ROOMS})
+  kz_record_test(${target} ${rooms})
   add_executable(${target} ${file}.cpp ${test_SOURCES})
   target_link_libraries(${target} PRIVATE kz_settings ${objects} kz_test_support ${test_LIBS})
   kz_register_test(${target} ${test_FIXTURE})
@@ -135,6 +111,8 @@ function(kz_public_test file)
   cmake_parse_arguments(PARSE_ARGV 1 test "" "" "LIBS;SOURCES")
   cmake_path(GET CMAKE_CURRENT_SOURCE_DIR FILENAME folder)
   set(target ${folder}_${file})
+  get_property(rooms GLOBAL PROPERTY KZ_ROOMS)
+  kz_record_test(${target} ${rooms})
   add_executable(${target} ${file}.cpp ${test_SOURCES})
   target_link_libraries(${target} PRIVATE kz_settings kzsdk_shared GTest::gtest_main ${test_LIBS})
   target_include_directories(${target} PRIVATE "${PROJECT_SOURCE_DIR}/tests")

@@ -19,19 +19,8 @@ import time
 ROOT = pathlib.Path(__file__).resolve().parent.parent
 TREE = ROOT / "build/mutants/tree"
 BUILD = ROOT / "build/mutants/build"
-ROOMS = ["abs", "kernels", "xml", "dsp", "disc", "qv", "qvfixed", "qvfloat", "fpx"]
-# Whose tests see a fault in a room, most likely first.
-SEEN_FROM = {
-    "abs": ["abs", "xml", "fpx", "failures"],
-    "xml": ["xml", "qv", "fpx", "failures"],
-    "kernels": ["kernels", "dsp", "qv", "qvfixed", "qvfloat", "model", "fpx", "failures"],
-    "dsp": ["dsp", "qv", "qvfixed", "qvfloat", "model", "fpx", "failures"],
-    "disc": ["disc", "failures"],
-    "qv": ["qv", "qvfixed", "qvfloat", "model", "fpx", "failures"],
-    "qvfixed": ["qvfixed", "qv", "model", "fpx", "failures"],
-    "qvfloat": ["qvfloat", "qv", "model", "fpx", "failures"],
-    "fpx": ["fpx", "failures"],
-}
+# Tests that read the built files, which are built otherwise here, or the sources.
+NOT_RUN = ("tests/whole/abi/",)
 # Not this machine's loops, and which of them are chosen: all give the same words.
 LEFT_OUT = ("neon", "select.cpp")
 # Trees of a million levels, and what reads the built files, which are built otherwise here.
@@ -42,7 +31,7 @@ SWAPS = [
     (">> ", "<< "), ("std::min", "std::max"), ("std::max", "std::min"), ("true", "false"), ("false", "true"),
     ("++", ""),
 ]
-SOURCE = re.compile(rf"kzsdk/({'|'.join(ROOMS)})/.*\.[ch]pp$")
+SOURCE = re.compile(r"(kzsdk/\w+)/.*\.[ch]pp$")
 STATEMENT = re.compile(r"\s+[\w:.>*\[\]()-]+(\(.*\)| [-+*/|&^<>]*= .*);$")
 DECLARATION = re.compile(r"\s*(const|auto|return|u?int\w+_t|size_t|float|double)\b")
 
@@ -96,12 +85,27 @@ def builds():
     return runs(["cmake", "--build", str(BUILD)], 1800)
 
 
-def first_to_fail(places):
-    """The first test program of these folders that fails, or None."""
-    for place in places:
-        for program in sorted(BUILD.glob(f"tests/*/{place}/*_test")):
-            if not runs([program, "--gtest_fail_fast", f"--gtest_filter={TESTS}"], 900, cwd=program.parent):
-                return program.name
+def read_tests():
+    """{test program: the rooms whose code it runs}, as the build has written them down."""
+    lines = (line.split() for line in (BUILD / "layers.txt").read_text().splitlines())
+    return {line[1]: line[2].removeprefix("rooms=").split(",") for line in lines
+            if line[0] == "test" and not line[1].startswith(NOT_RUN)}
+
+
+def tests_of(room, tests):
+    """The tests that run a room's code, most likely to see a fault first: its own, then the others as declared,
+    from the lowest room to the whole library."""
+    own = f"tests/library/{room.split('/')[1]}/"
+    return sorted((test for test, rooms in tests.items() if room in rooms),
+                  key=lambda test: not test.startswith(own))
+
+
+def first_to_fail(tests):
+    """The first of these test programs that fails, or None."""
+    for test in tests:
+        program = BUILD / test
+        if not runs([program, "--gtest_fail_fast", f"--gtest_filter={TESTS}"], 900, cwd=program.parent):
+            return program.name
     return None
 
 
@@ -123,18 +127,22 @@ def prepare(files):
         sys.exit(f"mutate: {BUILD} does not build")
     subprocess.run([TREE / "scripts/make_disc_images.sh", BUILD / "disc_images"],
                    stdout=subprocess.DEVNULL, check=True)
-    failing = first_to_fail(ROOMS + ["model", "failures"])
+    tests = read_tests()
+    failing = first_to_fail(tests)
     if failing:
         sys.exit(f"mutate: {failing} fails without a fault, or takes 15 minutes")
+    return tests
 
 
 def main():
     count, seed = (int(word) for word in (sys.argv[1:] + ["30", "1"][len(sys.argv) - 1:])[:2])
     files = subprocess.check_output(["git", "ls-files"], cwd=ROOT, text=True).splitlines()
-    prepare(files)
+    tests = prepare(files)
+    rooms = set().union(*tests.values())
     places = []
     for file in files:
-        if SOURCE.match(file) and not any(name in file for name in LEFT_OUT):
+        source = SOURCE.match(file)
+        if source and source[1] in rooms and not any(name in file for name in LEFT_OUT):
             lines = (TREE / file).read_text().splitlines()
             places += [(file, index) for index in code_lines(lines)]
     chance = random.Random(seed)
@@ -144,7 +152,7 @@ def main():
         begun = time.monotonic()
         (TREE / file).write_text("".join(text[:index] + [fault + "\n"] + text[index + 1:]))
         if builds():
-            by = first_to_fail(SEEN_FROM[file.split("/")[1]])
+            by = first_to_fail(tests_of(SOURCE.match(file)[1], tests))
             noticed += by is not None
             survived += by is None
             print(f"{'noticed' if by else 'SURVIVED'} {file}:{index + 1}: {text[index].strip()}  =>  "

@@ -1,0 +1,273 @@
+#include "whole/layers/layers.hpp"
+
+#include <algorithm>
+#include <fstream>
+#include <regex>
+#include <sstream>
+
+namespace layers {
+namespace {
+
+namespace fs = std::filesystem;
+
+Names split(std::string_view list)
+{
+    Names names;
+    std::istringstream in{std::string(list)};
+    for (std::string name; std::getline(in, name, ',');) {
+        names.insert(name);
+    }
+    return names;
+}
+
+/// "key=a,b" of a line gives {a, b}.
+Names list_of(const std::string& line, const std::string& key)
+{
+    const auto start = line.find(" " + key + "=");
+    if (start == std::string::npos) {
+        return {};
+    }
+    const auto value = start + key.size() + 2;
+    return split(std::string_view(line).substr(value, line.find(' ', value) - value));
+}
+
+bool is_below(const std::string& path, const std::string& folder)
+{
+    return path.starts_with(folder + "/");
+}
+
+/// The longest of the folders that holds this file; empty if none does.
+template <class Folders>
+std::string place_of(const std::string& path, const Folders& folders)
+{
+    std::string place;
+    for (const auto& [folder, ignored] : folders) {
+        if (is_below(path, folder) && folder.size() > place.size()) {
+            place = folder;
+        }
+    }
+    return place;
+}
+
+/// The file of the tree that an include brings in; empty if it is none of the tree's.
+std::string target_of(const Include& include, const Tree& tree)
+{
+    const fs::path beside = fs::path(include.file).parent_path() / include.what;
+    for (const auto& path :
+         {beside, fs::path(include.what), "tests" / fs::path(include.what),
+          "bench" / fs::path(include.what), "tools/kzfp" / fs::path(include.what)}) {
+        const auto name = path.lexically_normal().generic_string();
+        if (tree.files.contains(name)) {
+            return name;
+        }
+    }
+    return {};
+}
+
+std::string complaint(const Include& include)
+{
+    return include.file + ":" + std::to_string(include.line) + " includes " + include.what;
+}
+
+bool is_header(const std::string& file) { return file.ends_with(".h"); }
+
+/// The folders that are written by the library's rules.
+bool is_of_a_library(const std::string& file)
+{
+    return is_below(file, "kzsdk") || is_below(file, "catalogue");
+}
+
+/// Complains of each include for which the rule says no. The rule is given the include and its target.
+template <class Rule>
+Complaints complaints_of(const Tree& tree, Rule allowed)
+{
+    Complaints found;
+    for (const auto& include : tree.includes) {
+        if (!allowed(include, target_of(include, tree))) {
+            found.push_back(complaint(include));
+        }
+    }
+    return found;
+}
+
+/// Folders that hold no sources of ours: what was built, and what git keeps.
+bool is_skipped(const fs::directory_entry& entry)
+{
+    const auto name = entry.path().filename().string();
+    return name.starts_with('.') || name == "build" || fs::exists(entry.path() / "CMakeCache.txt");
+}
+
+bool is_source(const fs::path& path)
+{
+    static const Names kExtensions = {".c", ".cpp", ".h", ".hpp"};
+    return kExtensions.contains(path.extension().string());
+}
+
+/// Beside the C library's headers, those of the C++ library that are templates and constants alone:
+/// containers, strings and streams would allocate behind the allocator's back.
+const Names kEverywhere = {
+    "assert.h", "ctype.h",     "errno.h",  "float.h",  "inttypes.h", "limits.h", "math.h",
+    "stdarg.h", "stdbool.h",   "stddef.h", "stdint.h", "stdio.h",    "stdlib.h", "string.h",
+    "cassert",  "cctype",      "cerrno",   "cfloat",   "cinttypes",  "climits",  "cmath",
+    "cstdarg",  "cstddef",     "cstdint",  "cstdio",   "cstdlib",    "cstring",  "algorithm",
+    "array",    "atomic",      "bit",      "compare",  "concepts",   "iterator", "limits",
+    "memory",   "new",         "numbers",  "numeric",  "ranges",     "span",     "string_view",
+    "tuple",    "type_traits", "utility",
+};
+
+const std::map<std::string, Names> kOfRooms = {
+    {"kzsdk/kernels", {"arm_neon.h", "immintrin.h", "smmintrin.h"}},
+    {"kzsdk/disc", {"dirent.h", "fcntl.h", "sys/stat.h", "unistd.h"}},
+    {"kzsdk/jni",
+     {"android/log.h", "ctime", "jni.h", "pthread.h", "sys/resource.h", "unistd.h",
+      "utils/AndroidThreads.h"}},
+};
+
+} // namespace
+
+Plan read_plan(std::istream& in)
+{
+    Plan plan;
+    for (std::string line; std::getline(in, line);) {
+        std::string kind, name;
+        std::istringstream(line) >> kind >> name;
+        if (kind == "house") {
+            plan.houses[name] = {list_of(line, "public"), list_of(line, "sees"),
+                                 list_of(line, "inside")};
+        } else if (kind == "room") {
+            plan.rooms[name] = {list_of(line, "below"), list_of(line, "door"),
+                                list_of(line, "headers")};
+        }
+    }
+    return plan;
+}
+
+void read_includes(const std::string& file, std::istream& in, Tree& tree)
+{
+    static const std::regex kInclude(R"(^\s*#\s*include\s*([<"])([^>"]+)[>"])");
+    tree.files.insert(file);
+    std::string line;
+    for (int number = 1; std::getline(in, line); ++number) {
+        std::smatch match;
+        if (std::regex_search(line, match, kInclude)) {
+            tree.includes.push_back({file, number, match[2], match[1] == "\""});
+        }
+    }
+}
+
+Tree read_tree(const fs::path& root)
+{
+    Tree tree;
+    for (auto entry = fs::recursive_directory_iterator(root); entry != fs::end(entry); ++entry) {
+        if (entry->is_directory() && is_skipped(*entry)) {
+            entry.disable_recursion_pending();
+        } else if (entry->is_regular_file() && is_source(entry->path())) {
+            std::ifstream in(entry->path());
+            read_includes(fs::relative(entry->path(), root).generic_string(), in, tree);
+        }
+    }
+    return tree;
+}
+
+Complaints undeclared_folders(const Plan& plan, const Tree& tree)
+{
+    Complaints found;
+    for (const auto& file : tree.files) {
+        const bool in_a_room = file == "kzsdk/kzsdk.h" || !place_of(file, plan.rooms).empty();
+        if (place_of(file, plan.houses).empty() || (is_below(file, "kzsdk") && !in_a_room)) {
+            found.push_back(file);
+        }
+    }
+    return found;
+}
+
+Complaints folders_seeing_too_much(const Plan& plan, const Tree& tree)
+{
+    return complaints_of(tree, [&](const Include& include, const std::string& target) {
+        const auto from = place_of(include.file, plan.houses);
+        const auto to = place_of(target, plan.houses);
+        if (from.empty() || to.empty() || from == to) {
+            return true;
+        }
+        const auto& house = plan.houses.at(from);
+        return house.inside.contains(to) || house.sees.contains(to) ||
+               (house.public_of.contains(to) && is_header(target));
+    });
+}
+
+Complaints rooms_including_upwards(const Plan& plan, const Tree& tree)
+{
+    return complaints_of(tree, [&](const Include& include, const std::string& target) {
+        const auto from = place_of(include.file, plan.rooms);
+        const auto to = place_of(target, plan.rooms);
+        if (from.empty() || target.empty() || from == to) {
+            return true;
+        }
+        return plan.rooms.at(from).below.contains(to);
+    });
+}
+
+Complaints ways_around_doors(const Plan& plan, const Tree& tree)
+{
+    return complaints_of(tree, [&](const Include& include, const std::string& target) {
+        const auto to = place_of(target, plan.rooms);
+        const auto house = plan.houses.find(place_of(include.file, plan.houses));
+        if (to.empty() || place_of(include.file, plan.rooms) == to ||
+            plan.rooms.at(to).door.empty()) {
+            return true;
+        }
+        if (house != plan.houses.end() &&
+            house->second.inside.contains(place_of(target, plan.houses))) {
+            return true;
+        }
+        return plan.rooms.at(to).door.contains(target.substr(to.size() + 1));
+    });
+}
+
+Complaints includes_not_from_the_root(const Tree& tree)
+{
+    return complaints_of(tree, [&](const Include& include, const std::string& target) {
+        return !include.quoted || !is_of_a_library(include.file) || include.what == target;
+    });
+}
+
+Complaints private_headers_in_public_ones(const Tree& tree)
+{
+    return complaints_of(tree, [&](const Include& include, const std::string&) {
+        return !is_of_a_library(include.file) || !is_header(include.file) ||
+               is_header(include.what);
+    });
+}
+
+Complaints public_headers_not_declared(const Plan& plan, const Tree& tree)
+{
+    Names declared = {"kzsdk/kzsdk.h"};
+    for (const auto& [name, room] : plan.rooms) {
+        for (const auto& header : room.headers) {
+            declared.insert(name + "/" + header);
+        }
+    }
+    Complaints found;
+    for (const auto& file : tree.files) {
+        if (is_below(file, "kzsdk") && is_header(file) != declared.contains(file)) {
+            found.push_back(file);
+        }
+    }
+    return found;
+}
+
+Complaints foreign_headers(const Tree& tree)
+{
+    return complaints_of(tree, [&](const Include& include, const std::string& target) {
+        if (!is_below(include.file, "kzsdk") || kEverywhere.contains(include.what)) {
+            return true;
+        }
+        if (include.quoted) {
+            return is_below(target, "kzsdk");
+        }
+        const auto room = kOfRooms.find(place_of(include.file, kOfRooms));
+        return room != kOfRooms.end() && room->second.contains(include.what);
+    });
+}
+
+} // namespace layers
