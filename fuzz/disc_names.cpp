@@ -10,9 +10,6 @@ namespace kz::fuzz {
 
 namespace {
 
-constexpr kz_status kBadArgument = 0x90060004;
-constexpr kz_status kCut = 0x90060001;
-
 struct Request {
     std::string root;
     uint32_t number;
@@ -55,11 +52,11 @@ void check_bluray(const Request& request, const std::string& text, bool tells, B
     const Room room(request.size);
     const kz_status status = build(request.size > 0 ? room.data() : &none);
     if (request.size == 0) {
-        ASSERT_EQ(kBadArgument, status);
+        ASSERT_EQ(KZ_DISC_ERROR_INVALID_ARGUMENT, status);
         return;
     }
     const bool cut = request.size <= text.size() % 65536;
-    ASSERT_EQ(tells && cut ? kCut : KZ_OK, status);
+    ASSERT_EQ(tells && cut ? KZ_DISC_ERROR_MEMORY : KZ_OK, status);
     ASSERT_EQ(text.substr(0, request.size - 1), room.text());
     ASSERT_EQ('\0', room.last());
 }

@@ -84,7 +84,7 @@ void call(Choices& choices, kz_dyn_buf*& buffer, Model& model)
     default: // would pass 2^32 - 1, which is seen before a byte is read
         if (!model.bytes.empty()) {
             const auto* bytes = kz_dyn_buf_get_data(buffer);
-            ASSERT_EQ(kz_status{0x90030001}, kz_dyn_buf_append_buf(buffer, bytes, UINT32_MAX));
+            ASSERT_EQ(KZ_DYN_BUF_ERROR_MEMORY, kz_dyn_buf_append_buf(buffer, bytes, UINT32_MAX));
         }
     }
 }

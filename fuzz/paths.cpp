@@ -6,9 +6,6 @@ namespace kz::fuzz {
 
 namespace {
 
-constexpr kz_status kMissing = 0x90020002;
-constexpr kz_status kBadArgument = 0x90020004;
-
 /// Mostly a path of known names, sometimes any bytes.
 std::string choose_path(Choices& choices)
 {
@@ -102,11 +99,11 @@ kz_status set(ModelTag* tag, const std::string& path, const std::string& data, b
 {
     for (const std::string& part : split(path)) {
         if (part.empty()) {
-            return kBadArgument;
+            return KZ_XML_ERROR_INVALID_ARGUMENT;
         }
         ModelTag* sub_tag = tag->sub_tag(part);
         if (sub_tag == nullptr && !create) {
-            return kMissing;
+            return KZ_XML_ERROR_NOT_FOUND;
         }
         tag = sub_tag != nullptr ? sub_tag : &tag->add(part);
     }

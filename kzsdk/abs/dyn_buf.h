@@ -61,8 +61,8 @@ KZ_API uint8_t* kz_dyn_buf_dispose_and_return_buffer(kz_dyn_buf* buffer) KZ_NOEX
  * step and what is missing.
  *
  * @param bytes  May lie in the buffer itself. Not null, even when @p count is 0.
- * @return 0; 0x90030004 when a pointer is null; 0x90030001 when memory is short or the capacity
- *         would pass 2^32 - 1.
+ * @return 0; KZ_DYN_BUF_ERROR_INVALID_ARGUMENT when a pointer is null; KZ_DYN_BUF_ERROR_MEMORY when
+ *         memory is short or the capacity would pass 2^32 - 1.
  */
 KZ_API kz_status kz_dyn_buf_append_buf(kz_dyn_buf* buffer, const void* bytes,
                                        uint32_t count) KZ_NOEXCEPT;
@@ -70,14 +70,15 @@ KZ_API kz_status kz_dyn_buf_append_buf(kz_dyn_buf* buffer, const void* bytes,
 /**
  * Appends a text without its NUL, as kz_dyn_buf_append_buf() does.
  *
- * @return As kz_dyn_buf_append_buf(); 0x90030004 when @p text is null.
+ * @return As kz_dyn_buf_append_buf(); KZ_DYN_BUF_ERROR_INVALID_ARGUMENT when @p text is null.
  */
 KZ_API kz_status kz_dyn_buf_append_str(kz_dyn_buf* buffer, const char* text) KZ_NOEXCEPT;
 
 /**
  * Gives back what is not in use: the capacity becomes the length. An empty buffer stays usable.
  *
- * @return 0; 0x90030004 for null; 0x90030001 when the heap fails.
+ * @return 0; KZ_DYN_BUF_ERROR_INVALID_ARGUMENT for null; KZ_DYN_BUF_ERROR_MEMORY when the heap
+ *         fails.
  */
 KZ_API kz_status kz_dyn_buf_compact(kz_dyn_buf* buffer) KZ_NOEXCEPT;
 

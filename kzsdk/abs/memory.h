@@ -23,21 +23,21 @@ KZ_C_BEGIN
  *
  * @param first   Accepted and ignored.
  * @param second  Accepted and ignored.
- * @return 0, or 0x90040005 when it is already on (nothing changes).
+ * @return 0, or KZ_MEM_ALREADY_ON when it is already on (nothing changes).
  */
 KZ_API kz_status kzmem_initialize(uint32_t first, int32_t second) KZ_NOEXCEPT;
 
 /**
  * Switches the memory manager off. Blocks that are still out are neither freed nor tracked.
  *
- * @return 0, or 0x90040006 when it is already off.
+ * @return 0, or KZ_MEM_NOT_ON when it is already off.
  */
 KZ_API kz_status kzmem_shutdown(void) KZ_NOEXCEPT;
 
 /**
  * Tells whether the memory manager is on.
  *
- * @return 0x90040005 when it is on, 0x90040006 when it is off; never 0.
+ * @return KZ_MEM_ALREADY_ON when it is on, KZ_MEM_NOT_ON when it is off; never 0.
  */
 KZ_API kz_status kzmem_query_availability(void) KZ_NOEXCEPT;
 
@@ -74,7 +74,7 @@ KZ_API void* _kzmem_realloc(void* block, uint32_t size) KZ_NOEXCEPT;
  * Gives a block back.
  *
  * @param block  A block of the library's, or null, which does nothing.
- * @return 0, or 0x90040006 while the manager is off: then nothing is freed.
+ * @return 0, or KZ_MEM_NOT_ON while the manager is off: then nothing is freed.
  */
 KZ_API kz_status _kzmem_free(void* block) KZ_NOEXCEPT;
 

@@ -30,14 +30,14 @@ typedef struct kzconf_configuration {
 /**
  * Clears a start-up record.
  *
- * @return 0; 0x90000004 when @p record is null.
+ * @return 0; KZ_ERROR_INVALID_ARGUMENT when @p record is null.
  */
 KZ_API kz_status kzconf_initialize_configuration(kzconf_configuration* record) KZ_NOEXCEPT;
 
 /**
  * Starts the library: switches the memory manager on. May be repeated while it is on.
  *
- * @return 0; 0x90050990 when @p record is null (the memory manager stays as it was).
+ * @return 0; KZ_INIT_ERROR_NO_RECORD when @p record is null (the memory manager stays as it was).
  */
 KZ_API kz_status kzinit_initialize_vesk(const kzconf_configuration* record) KZ_NOEXCEPT;
 
@@ -45,8 +45,8 @@ KZ_API kz_status kzinit_initialize_vesk(const kzconf_configuration* record) KZ_N
  * Starts the library as kzinit_initialize_vesk() does, with a check argument.
  *
  * @param check  Any value but 0.
- * @return 0; 0x90050990 when @p record is null; 0x90000004 when @p check is 0: the memory manager
- *         is on all the same then, and a shut-down is due.
+ * @return 0; KZ_INIT_ERROR_NO_RECORD when @p record is null; KZ_ERROR_INVALID_ARGUMENT when @p
+ *         check is 0: the memory manager is on all the same then, and a shut-down is due.
  */
 KZ_API kz_status kzinit_initialize_vesk_safe(const kzconf_configuration* record,
                                              uint32_t check) KZ_NOEXCEPT;

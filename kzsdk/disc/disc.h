@@ -9,18 +9,20 @@
  * Each family has a switch, off at first, and a last error. Both are the process's, atomic and
  * without a lock: another thread's failure may be the one that get_error tells, so look at what a
  * call returns. While a family is off, open, seek, read, read_at, close, read_vol_label and
- * kzdvdfs_exists() do nothing but fail with 0x90060006. The names are built, and directories
+ * kzdvdfs_exists() do nothing but fail with KZ_DISC_NOT_ON. The names are built, and directories
  * listed, whether it is on or off.
  *
  * Status codes. A failed system call gives, by its `errno`:
  *
- *   ENOENT 0x90060048   EACCES 0x90060047   EMFILE 0x9006004B   any other 0x90060009
- *   EBADF  0x9006004C   EINVAL 0x90060004   ENOSPC 0x9006004A
+ *   ENOENT  KZ_DISC_ERROR_NOT_FOUND         EMFILE  KZ_DISC_ERROR_TOO_MANY_FILES
+ *   EACCES  KZ_DISC_ERROR_ACCESS_DENIED     EBADF   KZ_DISC_ERROR_BAD_DESCRIPTOR
+ *   EINVAL  KZ_DISC_ERROR_INVALID_ARGUMENT  ENOSPC  KZ_DISC_ERROR_NO_SPACE
+ *   any other  KZ_DISC_ERROR_SYSTEM
  *
- * and there are 0x90060001 (memory is short; a directory cannot be opened; a name does not fit),
- * 0x90060004 (invalid argument), 0x90060005 (already on) and 0x90060006 (not on). Every failure
- * becomes the family's last error, unless a function says otherwise; a success leaves the last
- * error as it was, unless a function says otherwise.
+ * Beside these there are KZ_DISC_ERROR_MEMORY (memory is short, a directory cannot be opened, or a
+ * name does not fit), KZ_DISC_ALREADY_ON and KZ_DISC_NOT_ON. Every failure becomes the family's
+ * last error, unless a function says otherwise; a success leaves the last error as it was, unless a
+ * function says otherwise.
  *
  * Not a security boundary: a link may take a file's place between a look and the opening, links are
  * followed wherever `open` follows them, and opening a pipe waits for its other end.
@@ -33,24 +35,28 @@
 
 KZ_C_BEGIN
 
-/* ---- Blu-ray: switch and last error -----------------------------------------------------------
- */
+/* ---- Blu-ray: switch and last error --------------------------------------------------------- */
 
-/** Switches the family on. @return 0, and no last error is left; 0x90060005 when it was on. */
+/**
+ * Switches the family on.
+ *
+ * @return 0, and no last error is left; KZ_DISC_ALREADY_ON when it was on.
+ */
 KZ_API kz_status kzbdfs_initialize(void) KZ_NOEXCEPT;
 
-/** Switches the family off; what is open stays so. @return 0; 0x90060006 when it was off. */
+/** Switches the family off; what is open stays so. @return 0; KZ_DISC_NOT_ON when it was off. */
 KZ_API kz_status kzbdfs_shutdown(void) KZ_NOEXCEPT;
 
-/** @return 0x90060005 when the family is on, 0x90060006 when it is off; never 0. Neither is kept.
+/**
+ * @return KZ_DISC_ALREADY_ON when the family is on, KZ_DISC_NOT_ON when it is off; never 0. Neither
+ *         is kept.
  */
 KZ_API kz_status kzbdfs_query_availability(void) KZ_NOEXCEPT;
 
 /** Takes the last error: the next call returns 0. */
 KZ_API kz_status kzbdfs_get_error(void) KZ_NOEXCEPT;
 
-/* ---- Blu-ray: files ---------------------------------------------------------------------------
- */
+/* ---- Blu-ray: files ------------------------------------------------------------------------- */
 
 /**
  * Opens a file for reading, following links.
@@ -66,7 +72,7 @@ KZ_API int32_t kzbdfs_open(const char* path) KZ_NOEXCEPT;
  * @param offset  Bytes.
  * @param whence  From where: 0 the beginning, 1 the place, 2 the end.
  * @return The new place, in bytes from the beginning; -1 on failure. Any other @p whence fails with
- *         0x90060048.
+ *         KZ_DISC_ERROR_NOT_FOUND.
  */
 KZ_API int64_t kzbdfs_seek(int32_t descriptor, int64_t offset, int32_t whence) KZ_NOEXCEPT;
 
@@ -109,8 +115,8 @@ KZ_API kz_status kzbdfs_close(int32_t descriptor) KZ_NOEXCEPT;
  * @param capacity     Bytes of room at @p label. A longer label is cut, and nothing tells so.
  * @param[out] length  Takes the bytes written, 0 .. 32; 0 on failure.
  * @param[out] label   Takes the label, without a NUL.
- * @return 0, and no last error is left; 0x90060004 when a pointer is null (@p length is not touched
- *         then); else why the device cannot be opened or read.
+ * @return 0, and no last error is left; KZ_DISC_ERROR_INVALID_ARGUMENT when a pointer is null (@p
+ *         length is not touched then); else why the device cannot be opened or read.
  */
 KZ_API kz_status kzbdfs_read_vol_label(const char* root, uint32_t capacity, uint32_t* length,
                                        char* label) KZ_NOEXCEPT;
@@ -138,9 +144,10 @@ KZ_API char kzbdfs_dir_get_delim(void) KZ_NOEXCEPT;
  * kzbdfs_get_error() first.
  *
  * @param[out] handle  Takes the directory, which the caller closes; not touched on failure.
- * @return The pending last error, normally 0, when @p handle was set. Else 0x90060004 when a
- *         pointer is null, or 0x90060001 when memory is short or the directory cannot be opened,
- *         for whatever reason; these do not become the last error.
+ * @return The pending last error, normally 0, when @p handle was set. Else
+ *         KZ_DISC_ERROR_INVALID_ARGUMENT when a pointer is null, or KZ_DISC_ERROR_MEMORY when
+ *         memory is short or the directory cannot be opened, for whatever reason; these do not
+ *         become the last error.
  */
 KZ_API kz_status kzbdfs_open_dir(const char* path, kzbdfs_dir** handle) KZ_NOEXCEPT;
 
@@ -193,9 +200,9 @@ KZ_API void kzbdfs_close_dir(kzbdfs_dir* handle) KZ_NOEXCEPT;
  * where the disc is mounted, with or without a "/" at its end; the root "/" gives "//BDMV/..." and
  * an empty one "/BDMV/...". The two must not overlap.
  *
- * They return 0, and no last error is left; 0x90060004 when a pointer is null or `size` is 0. A
- * text that was cut names another file, and only kzbdfs_get_cert_dirname() may tell: give more room
- * than the root's length and 64 bytes.
+ * They return 0, and no last error is left; KZ_DISC_ERROR_INVALID_ARGUMENT when a pointer is null
+ * or `size` is 0. A text that was cut names another file, and only kzbdfs_get_cert_dirname() may
+ * tell: give more room than the root's length and 64 bytes.
  */
 
 /** "Content003.cer" for the number 3. At least three digits; no directory. */
@@ -205,8 +212,8 @@ KZ_API kz_status kzbdfs_get_cert_filename(char* destination, uint32_t number,
 /**
  * "ROOT/AACS/".
  *
- * @return As its sisters; and 0x90060001 when @p size is not above the text's length modulo 65536.
- *         Of a text longer than 65535 bytes 0 may be returned although it was cut.
+ * @return As its sisters; and KZ_DISC_ERROR_MEMORY when @p size is not above the text's length
+ *         modulo 65536. Of a text longer than 65535 bytes 0 may be returned although it was cut.
  */
 KZ_API kz_status kzbdfs_get_cert_dirname(const char* root, char* destination,
                                          uint32_t size) KZ_NOEXCEPT;

@@ -45,9 +45,10 @@ enum {
  * @param channels     1 or 2.
  * @param[out] out_handle  The handle, which the caller frees with kz_fpx_fingerprint_free(). Left
  *                     untouched on failure: set it to null first. Must not be null.
- * @return 0; 0x90080606 for an unknown algorithm; 0x90080001 when memory is short; else the
- *         fingerprinter's status: 0x900f0004 for a bad format, a rate of 0 or a bad channel count,
- *         0x900f0001 for an unsupported rate or when memory is short.
+ * @return 0; KZ_FPX_ERROR_NO_ALGORITHM for an unknown algorithm; KZ_FPX_ERROR_MEMORY when memory is
+ *         short; else the fingerprinter's status: KZ_QV_ERROR_INVALID_ARGUMENT for a bad format, a
+ *         rate of 0 or a bad channel count, KZ_QV_ERROR_MEMORY for an unsupported rate or when
+ *         memory is short.
  */
 KZ_API kz_status kz_fpx_fingerprint_create(uint32_t algorithm, uint32_t format,
                                            uint32_t sample_rate, uint32_t channels,
@@ -64,8 +65,8 @@ KZ_API kz_status kz_fpx_fingerprint_create(uint32_t algorithm, uint32_t format,
  * @param audio       Interleaved samples at any address; read only during the call.
  * @param byte_count  Bytes in @p audio: a whole number of frames, not 0.
  * @param[out] out_complete  Set to 1 once the fingerprint is complete, else to 0.
- * @return 0; 0x90080004 when a pointer is null; 0x900f0004 for a byte count that is 0 or not a
- *         whole number of frames (nothing is consumed then).
+ * @return 0; KZ_FPX_ERROR_INVALID_ARGUMENT when a pointer is null; KZ_QV_ERROR_INVALID_ARGUMENT for
+ *         a byte count that is 0 or not a whole number of frames (nothing is consumed then).
  */
 KZ_API kz_status kz_fpx_fingerprint_add_audio(kz_fpx_handle* handle, const void* audio,
                                               uint32_t byte_count,
@@ -77,8 +78,9 @@ KZ_API kz_status kz_fpx_fingerprint_add_audio(kz_fpx_handle* handle, const void*
  *
  * @param[out] out_text  The text, which the caller frees with kz_fpx_fingerprint_serialize_free();
  *                       null on failure.
- * @return 0; 0x90080004 when a pointer is null; 0x900f0961 when the fingerprint is not complete;
- *         0x900f0001 when memory is short; 0x9008000b when the text could not be rendered.
+ * @return 0; KZ_FPX_ERROR_INVALID_ARGUMENT when a pointer is null; KZ_QV_ERROR_INCOMPLETE when the
+ *         fingerprint is not complete; KZ_QV_ERROR_MEMORY when memory is short; KZ_FPX_ERROR_RENDER
+ *         when the text could not be rendered.
  */
 KZ_API kz_status kz_fpx_fingerprint_serialize(kz_fpx_handle* handle, char** out_text) KZ_NOEXCEPT;
 
@@ -87,7 +89,7 @@ KZ_API kz_status kz_fpx_fingerprint_serialize(kz_fpx_handle* handle, char** out_
  *
  * While the memory manager is off nothing is freed: the text is lost, and 0 is returned.
  *
- * @return 0, also when *text_ref is null; 0x90080004 when @p text_ref is null.
+ * @return 0, also when *text_ref is null; KZ_FPX_ERROR_INVALID_ARGUMENT when @p text_ref is null.
  */
 KZ_API kz_status kz_fpx_fingerprint_serialize_free(char** text_ref) KZ_NOEXCEPT;
 
@@ -165,8 +167,8 @@ KZ_API kz_status kz_fpx_fingerprint_get_next_frames(const kz_fpx_handle* handle,
  *
  * While the memory manager is off nothing is freed: the handle is lost, and 0 is returned.
  *
- * @return 0, also when *handle_ref is null; 0x90080004 when @p handle_ref is null; else the
- *         fingerprinter's status.
+ * @return 0, also when *handle_ref is null; KZ_FPX_ERROR_INVALID_ARGUMENT when @p handle_ref is
+ *         null; else the fingerprinter's status.
  */
 KZ_API kz_status kz_fpx_fingerprint_free(kz_fpx_handle** handle_ref) KZ_NOEXCEPT;
 

@@ -11,9 +11,6 @@ namespace android {
 
 namespace {
 
-constexpr kz_status kNoInputFormat = 0x9008000f;
-constexpr kz_status kNotEnoughAudio = 0x90080602;
-
 /// Set while the core is up by our doing. Two first jobs may both start it; the second start finds
 /// it up and succeeds.
 constinit std::atomic<uint8_t> core_is_up{0};
@@ -183,7 +180,7 @@ kz_status Fingerprint::fpx_generate_fingerprint(unsigned char** serialized) noex
     const uint32_t format = input_format(translateWaveFormatCode(
         static_cast<uint16_t>(wave_format_code_), static_cast<uint16_t>(bits_per_sample_)));
     if (format == 0) {
-        return kNoInputFormat;
+        return KZ_FPX_ERROR_NO_INPUT_FORMAT;
     }
     if (audio_ == nullptr || audio_length_ == 0) {
         log_error("audio_buffer is null or audio_buffer_len is 0.");
@@ -216,7 +213,7 @@ kz_status Fingerprint::feed_and_serialize(kz_fpx_handle* handle, char** text) no
         return status;
     }
     if (complete == 0) {
-        return kNotEnoughAudio;
+        return KZ_FPX_ERROR_NOT_ENOUGH_AUDIO;
     }
     status = kz_fpx_fingerprint_serialize(handle, text);
     if (status != KZ_OK) {

@@ -50,7 +50,8 @@ typedef struct QVConfig {
  * Makes a configuration with the defaults given at its fields.
  *
  * @param[out] out  The record, which the caller frees with QVConfig_Destroy().
- * @return 0; 0x900f0004 when @p out is null; 0x900f0001 when memory is short (*out is untouched).
+ * @return 0; KZ_QV_ERROR_INVALID_ARGUMENT when @p out is null; KZ_QV_ERROR_MEMORY when memory is
+ *         short (*out is untouched).
  */
 KZ_API kz_status QVConfig_Create(QVConfig** out) KZ_NOEXCEPT;
 
@@ -339,13 +340,14 @@ typedef struct QVFP {
  * @param channels     1 or 2.
  * @param[out] out_object  The fingerprinter, which the caller frees with QVFP_Destructor();
  *                         untouched on failure.
- * @return 0; 0x900f0004 for a rate of 0, a bad format or channel count, or a null pointer;
- *         0x900f0001 for a rate that the resampler refuses or when memory is short.
+ * @return 0; KZ_QV_ERROR_INVALID_ARGUMENT for a rate of 0, a bad format or channel count, or a null
+ *         pointer; KZ_QV_ERROR_MEMORY for a rate that the resampler refuses or when memory is
+ *         short.
  */
 KZ_API kz_status QVFP_Constructor(uint32_t algorithm, uint32_t sample_rate, uint32_t format,
                                   uint32_t channels, QVFP** out_object) KZ_NOEXCEPT;
 
-/** Frees a fingerprinter. Returns 0, or 0x900f0004 for null. */
+/** Frees a fingerprinter. Returns 0, or KZ_QV_ERROR_INVALID_ARGUMENT for null. */
 KZ_API kz_status QVFP_Destructor(QVFP* object) KZ_NOEXCEPT;
 
 /**
@@ -354,7 +356,8 @@ KZ_API kz_status QVFP_Destructor(QVFP* object) KZ_NOEXCEPT;
  * @param bytes       At any address; read only during the call.
  * @param byte_count  A whole number of frames, not 0.
  * @param[out] out_complete  Set to 1 once the frame limit is reached, else to 0.
- * @return 0; 0x900f0004 for a null pointer or a bad byte count (nothing is consumed then).
+ * @return 0; KZ_QV_ERROR_INVALID_ARGUMENT for a null pointer or a bad byte count (nothing is
+ *         consumed then).
  */
 KZ_API kz_status QVFP_AddSamples(QVFP* object, const void* bytes, uint32_t byte_count,
                                  uint8_t* out_complete) KZ_NOEXCEPT;
@@ -364,8 +367,8 @@ KZ_API kz_status QVFP_AddSamples(QVFP* object, const void* bytes, uint32_t byte_
  *
  * @param[out] out_tree  The document's root, which the caller frees with DisposeXMLTag(); untouched
  *                       on failure.
- * @return 0; 0x900f0004 for a null pointer; 0x900f0961 when the fingerprint is not complete;
- *         0x900f0001 when memory is short.
+ * @return 0; KZ_QV_ERROR_INVALID_ARGUMENT for a null pointer; KZ_QV_ERROR_INCOMPLETE when the
+ *         fingerprint is not complete; KZ_QV_ERROR_MEMORY when memory is short.
  */
 KZ_API kz_status QVFP_GetResult(QVFP* object, XMLTag** out_tree) KZ_NOEXCEPT;
 
@@ -373,7 +376,7 @@ KZ_API kz_status QVFP_GetResult(QVFP* object, XMLTag** out_tree) KZ_NOEXCEPT;
  * Tells how far the fingerprint is.
  *
  * @param[out] out_percent  0 .. 100.
- * @return 0, or 0x900f0004 for a null pointer.
+ * @return 0, or KZ_QV_ERROR_INVALID_ARGUMENT for a null pointer.
  */
 KZ_API kz_status QVFP_GetPercentProgress(const QVFP* object, uint32_t* out_percent) KZ_NOEXCEPT;
 

@@ -32,10 +32,10 @@
  *   - disposing of, cloning, mutating, copying, comparing and rendering visit each tag once (a copy
  *     of a tag with n attributes takes n squared steps for these);
  *   - counting, finding by name, index or path, adding, removing and setting an attribute take up
- * to n steps each. Building n sub-tags with AddXMLSubTag(), or going through them by index, takes n
- *     squared: go on with GetXMLSiblingTag(), which takes one.
+ *     to n steps each. Building n sub-tags with AddXMLSubTag(), or going through them by index,
+ *     takes n squared: go on with GetXMLSiblingTag(), which takes one.
  *
- * Status codes: 0x90020001 memory is short, 0x90020002 not found, 0x90020004 invalid argument. A
+ * Status codes: KZ_XML_ERROR_MEMORY, KZ_XML_ERROR_NOT_FOUND and KZ_XML_ERROR_INVALID_ARGUMENT. A
  * function that returns a pointer returns null for every failure. All memory comes from the
  * library's allocator, so trees live between start-up and shut-down.
  *
@@ -65,8 +65,7 @@ typedef struct XMLTag {
     struct XMLTag* next_sibling; /**< next under the same parent, whose list owns it */
 } XMLTag;
 
-/* ---- Making, copying and disposing ------------------------------------------------------------
- */
+/* ---- Making, copying and disposing ---------------------------------------------------------- */
 
 /** Makes a tag with nothing in it, no name either. The caller disposes of it. */
 KZ_API XMLTag* CreateEmptyXMLTag(void) KZ_NOEXCEPT;
@@ -102,10 +101,11 @@ KZ_API XMLTag* CloneXMLTag(const XMLTag* tag, uint8_t deep) KZ_NOEXCEPT;
  * siblings stays. Copying a tag onto itself does nothing. Either may lie below the other: the copy
  * is of @p source as it was before the call.
  *
- * @return 0; 0x90020004 when a tag is null, or an attribute of the source has no name; 0x90020001
- *         when memory is short. A failure leaves @p destination a valid tag, half copied: without
- *         name and data when those failed (its attributes and sub-tags as before), else with the
- *         attributes copied so far (its sub-tags as before), else with the sub-tags copied so far.
+ * @return 0; KZ_XML_ERROR_INVALID_ARGUMENT when a tag is null, or an attribute of the source has no
+ *         name; KZ_XML_ERROR_MEMORY when memory is short. A failure leaves @p destination a valid
+ *         tag, half copied: without name and data when those failed (its attributes and sub-tags as
+ *         before), else with the attributes copied so far (its sub-tags as before), else with the
+ *         sub-tags copied so far.
  */
 KZ_API kz_status CopyXMLTag(XMLTag* destination, const XMLTag* source) KZ_NOEXCEPT;
 
@@ -125,8 +125,7 @@ KZ_API kz_status DisposeXMLTag(XMLTag* tag) KZ_NOEXCEPT;
  */
 KZ_API kz_status SmartDisposeXMLTag(XMLTag** tag) KZ_NOEXCEPT;
 
-/* ---- Attributes -------------------------------------------------------------------------------
- */
+/* ---- Attributes ----------------------------------------------------------------------------- */
 
 /** Number of attributes; 0 for null. */
 KZ_API uint32_t GetXMLTagAttrCount(const XMLTag* tag) KZ_NOEXCEPT;
@@ -151,8 +150,9 @@ KZ_API const char* GetXMLTagAttrFromStr(const XMLTag* tag, const char* name) KZ_
  * A value whose count is not 0 but whose first byte is NUL is stored and reads as an empty text;
  * CloneXMLTag() and CopyXMLTag() drop such an attribute.
  *
- * @return 0, also when there was nothing to take out; 0x90020004 when the tag is null or the name
- *         empty; 0x90020001 when memory is short. A failure changes nothing.
+ * @return 0, also when there was nothing to take out; KZ_XML_ERROR_INVALID_ARGUMENT when the tag is
+ *         null or the name empty; KZ_XML_ERROR_MEMORY when memory is short. A failure changes
+ *         nothing.
  */
 KZ_API kz_status SetXMLTagAttrFromBuf(XMLTag* tag, const char* name, uint32_t name_count,
                                       const char* value, uint32_t value_count) KZ_NOEXCEPT;
@@ -166,8 +166,7 @@ KZ_API kz_status SetXMLTagAttrFromInt(XMLTag* tag, const char* name, int32_t val
 /** SetXMLTagAttrFromStr() with a number in decimal. */
 KZ_API kz_status SetXMLTagAttrFromUInt(XMLTag* tag, const char* name, uint32_t value) KZ_NOEXCEPT;
 
-/* ---- Sub-tags ---------------------------------------------------------------------------------
- */
+/* ---- Sub-tags ------------------------------------------------------------------------------- */
 
 /** Number of sub-tags; 0 for null. */
 KZ_API uint32_t GetXMLSubTagCount(const XMLTag* tag) KZ_NOEXCEPT;
@@ -223,8 +222,7 @@ KZ_API kz_status AddXMLSubTag(XMLTag* parent, XMLTag* child) KZ_NOEXCEPT;
  */
 KZ_API kz_status RemoveXMLSubTag(XMLTag* parent, XMLTag* child, uint8_t dispose) KZ_NOEXCEPT;
 
-/* ---- Name and data ----------------------------------------------------------------------------
- */
+/* ---- Name and data -------------------------------------------------------------------------- */
 
 /** Data of a tag; null when it has none, or for null. */
 KZ_API const char* GetXMLTagData(const XMLTag* tag) KZ_NOEXCEPT;
@@ -235,7 +233,8 @@ KZ_API const char* GetXMLTagName(const XMLTag* tag) KZ_NOEXCEPT;
 /**
  * Sets a tag's data; empty data leaves it without.
  *
- * @return 0; 0x90020004 for a null tag; 0x90020001 when memory is short: the old data is gone then.
+ * @return 0; KZ_XML_ERROR_INVALID_ARGUMENT for a null tag; KZ_XML_ERROR_MEMORY when memory is
+ *         short: the old data is gone then.
  */
 KZ_API kz_status SetXMLTagDataFromBuf(XMLTag* tag, const char* data, uint32_t count) KZ_NOEXCEPT;
 
@@ -245,8 +244,8 @@ KZ_API kz_status SetXMLTagDataFromStr(XMLTag* tag, const char* data) KZ_NOEXCEPT
 /**
  * Sets a tag's name.
  *
- * @return 0; 0x90020004 for a null tag or an empty name (the old name stays); 0x90020001 when
- *         memory is short: the tag has no name then.
+ * @return 0; KZ_XML_ERROR_INVALID_ARGUMENT for a null tag or an empty name (the old name stays);
+ *         KZ_XML_ERROR_MEMORY when memory is short: the tag has no name then.
  */
 KZ_API kz_status SetXMLTagNameFromBuf(XMLTag* tag, const char* name, uint32_t count) KZ_NOEXCEPT;
 
@@ -286,9 +285,9 @@ KZ_API const char* GetXMLSubTagData(const XMLTag* tag, const char* path) KZ_NOEX
  *
  * @param path    Not empty, with no "/" at its beginning or end and no two in a row.
  * @param create  0: every tag of the path must be there; else those that are missing are made.
- * @return 0; 0x90020004 for a null tag or a bad path; 0x90020002 when a tag is missing;
- *         0x90020001 when memory is short. Tags made on the way stay after a failure, also when a
- *         bad place of the path comes only after them.
+ * @return 0; KZ_XML_ERROR_INVALID_ARGUMENT for a null tag or a bad path; KZ_XML_ERROR_NOT_FOUND
+ *         when a tag is missing; KZ_XML_ERROR_MEMORY when memory is short. Tags made on the way
+ *         stay after a failure, also when a bad place of the path comes only after them.
  */
 KZ_API kz_status SetXMLSubTagDataFromStr(XMLTag* tag, const char* path, const char* data,
                                          uint8_t create) KZ_NOEXCEPT;
@@ -347,8 +346,7 @@ typedef int32_t (*XMLPathResolver)(XMLTag* tag, const char* segment, uint32_t le
 KZ_API int32_t XMLSetValueAtPath(XMLTag* tag, const char* path, const char* value,
                                  uintptr_t context, XMLPathResolver resolver) KZ_NOEXCEPT;
 
-/* ---- Comparing and mapping --------------------------------------------------------------------
- */
+/* ---- Comparing and mapping ------------------------------------------------------------------ */
 
 /**
  * Tells whether two trees are the same: name, data, attributes in their order, and sub-tags in
@@ -421,8 +419,7 @@ KZ_API kz_status SetMapXMLAttrName(XMLMapAttrName function) KZ_NOEXCEPT;
 /** Installs a map for the process. Null is ignored. @return 0. */
 KZ_API kz_status SetMapXMLAttrValue(XMLMapAttrValue function) KZ_NOEXCEPT;
 
-/* ---- Rendering --------------------------------------------------------------------------------
- */
+/* ---- Rendering ------------------------------------------------------------------------------ */
 
 /**
  * Renders a tag and all below it as text.

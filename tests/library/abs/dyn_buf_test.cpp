@@ -102,12 +102,12 @@ TEST_F(DynBuf, NothingAppendedChangesNothing)
 TEST_F(DynBuf, NullPointersAreRefused)
 {
     const Buffer buffer = make(8, 8);
-    EXPECT_EQ(0x90030004u, kz_dyn_buf_append_buf(nullptr, "x", 1));
-    EXPECT_EQ(0x90030004u, kz_dyn_buf_append_buf(buffer.get(), nullptr, 1));
-    EXPECT_EQ(0x90030004u, kz_dyn_buf_append_buf(buffer.get(), nullptr, 0));
-    EXPECT_EQ(0x90030004u, kz_dyn_buf_append_str(nullptr, "x"));
-    EXPECT_EQ(0x90030004u, kz_dyn_buf_append_str(buffer.get(), nullptr));
-    EXPECT_EQ(0x90030004u, kz_dyn_buf_compact(nullptr));
+    EXPECT_EQ(KZ_DYN_BUF_ERROR_INVALID_ARGUMENT, kz_dyn_buf_append_buf(nullptr, "x", 1));
+    EXPECT_EQ(KZ_DYN_BUF_ERROR_INVALID_ARGUMENT, kz_dyn_buf_append_buf(buffer.get(), nullptr, 1));
+    EXPECT_EQ(KZ_DYN_BUF_ERROR_INVALID_ARGUMENT, kz_dyn_buf_append_buf(buffer.get(), nullptr, 0));
+    EXPECT_EQ(KZ_DYN_BUF_ERROR_INVALID_ARGUMENT, kz_dyn_buf_append_str(nullptr, "x"));
+    EXPECT_EQ(KZ_DYN_BUF_ERROR_INVALID_ARGUMENT, kz_dyn_buf_append_str(buffer.get(), nullptr));
+    EXPECT_EQ(KZ_DYN_BUF_ERROR_INVALID_ARGUMENT, kz_dyn_buf_compact(nullptr));
     EXPECT_EQ(nullptr, kz_dyn_buf_clone(nullptr));
     EXPECT_EQ(nullptr, kz_dyn_buf_get_data(nullptr));
     EXPECT_EQ(0u, kz_dyn_buf_get_length(nullptr));
@@ -152,7 +152,7 @@ TEST_F(DynBuf, AFailedCompactionChangesNothing)
     ASSERT_EQ(KZ_OK, append(buffer, "abc"));
     {
         AllocationFault fault(1);
-        EXPECT_EQ(0x90030001u, kz_dyn_buf_compact(buffer.get()));
+        EXPECT_EQ(KZ_DYN_BUF_ERROR_MEMORY, kz_dyn_buf_compact(buffer.get()));
     }
     EXPECT_EQ(256u, buffer->capacity);
     EXPECT_EQ("abc", contents(buffer.get()));
@@ -197,14 +197,14 @@ TEST_F(DynBuf, ACapacityThatWouldWrapIsOutOfMemory)
 {
     const Buffer buffer = make(256, std::numeric_limits<uint32_t>::max());
     const uint64_t before = allocation_count();
-    EXPECT_EQ(0x90030001u, append(buffer, std::string(300, 'x')));
+    EXPECT_EQ(KZ_DYN_BUF_ERROR_MEMORY, append(buffer, std::string(300, 'x')));
     EXPECT_EQ(before, allocation_count());
     EXPECT_EQ(256u, buffer->capacity);
     EXPECT_EQ(0u, buffer->length);
     EXPECT_EQ(KZ_OK, append(buffer, std::string(256, 'x')));
     const Buffer small = make(16, 1);
     ASSERT_EQ(KZ_OK, append(small, "x"));
-    EXPECT_EQ(0x90030001u, kz_dyn_buf_append_buf(small.get(), "x", 0xffffffffu));
+    EXPECT_EQ(KZ_DYN_BUF_ERROR_MEMORY, kz_dyn_buf_append_buf(small.get(), "x", 0xffffffffu));
     EXPECT_EQ("x", contents(small.get()));
 }
 
@@ -268,7 +268,7 @@ TEST_F(DynBuf, EveryFailedAllocationIsReported)
             return;
         }
         const kz_status status = append(buffer, std::string(40, 'x'));
-        EXPECT_EQ(fired() ? 0x90030001u : 0u, status);
+        EXPECT_EQ(fired() ? KZ_DYN_BUF_ERROR_MEMORY : 0u, status);
         EXPECT_EQ(fired() ? 16u : 40u, buffer->capacity);
         EXPECT_EQ(fired() ? 0u : 40u, buffer->length);
         if (status == KZ_OK) {
@@ -283,7 +283,7 @@ TEST_F(DynBuf, WithMemoryOffOnlyGrowthFails)
     Buffer buffer = make(4, 4);
     ASSERT_EQ(KZ_OK, kzmem_shutdown());
     EXPECT_EQ(KZ_OK, append(buffer, "abcd"));
-    EXPECT_EQ(0x90030001u, append(buffer, "e"));
+    EXPECT_EQ(KZ_DYN_BUF_ERROR_MEMORY, append(buffer, "e"));
     EXPECT_EQ("abcd", contents(buffer.get()));
     EXPECT_EQ(nullptr, kz_dyn_buf_clone(buffer.get()));
     EXPECT_EQ(nullptr, kz_dyn_buf_create(4, 4));

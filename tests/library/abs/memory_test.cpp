@@ -32,13 +32,13 @@ TEST_F(MemoryOff, FreeRefusesEvenNull) { EXPECT_EQ(KZ_MEM_NOT_ON, _kzmem_free(nu
 
 TEST_F(MemoryOff, TheSwitchReportsWhatItFound)
 {
-    EXPECT_EQ(0x90040006u, kzmem_shutdown());
-    EXPECT_EQ(0x90040006u, kzmem_query_availability());
+    EXPECT_EQ(KZ_MEM_NOT_ON, kzmem_shutdown());
+    EXPECT_EQ(KZ_MEM_NOT_ON, kzmem_query_availability());
     EXPECT_EQ(0u, kzmem_initialize(7, -7));
-    EXPECT_EQ(0x90040005u, kzmem_query_availability());
-    EXPECT_EQ(0x90040005u, kzmem_initialize(0, 0));
+    EXPECT_EQ(KZ_MEM_ALREADY_ON, kzmem_query_availability());
+    EXPECT_EQ(KZ_MEM_ALREADY_ON, kzmem_initialize(0, 0));
     EXPECT_EQ(0u, kzmem_shutdown());
-    EXPECT_EQ(0x90040006u, kzmem_query_availability());
+    EXPECT_EQ(KZ_MEM_NOT_ON, kzmem_query_availability());
 }
 
 // One user's shut-down is every user's: his blocks wait until memory is on again.

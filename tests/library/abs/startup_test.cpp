@@ -41,7 +41,7 @@ TEST_F(Startup, TheRecordIsClearedWhole)
 
 TEST_F(Startup, ClearingNoRecordIsRefused)
 {
-    EXPECT_EQ(0x90000004u, kzconf_initialize_configuration(nullptr));
+    EXPECT_EQ(KZ_ERROR_INVALID_ARGUMENT, kzconf_initialize_configuration(nullptr));
 }
 
 TEST_F(Startup, SwitchesMemoryOn)
@@ -63,19 +63,19 @@ TEST_F(Startup, MayBeRepeated)
 
 TEST_F(Startup, WithoutARecordLeavesMemoryAsItWas)
 {
-    EXPECT_EQ(0x90050990u, kzinit_initialize_vesk(nullptr));
-    EXPECT_EQ(0x90050990u, kzinit_initialize_vesk_safe(nullptr, 1));
-    EXPECT_EQ(0x90050990u, kzinit_initialize_vesk_safe(nullptr, 0));
+    EXPECT_EQ(KZ_INIT_ERROR_NO_RECORD, kzinit_initialize_vesk(nullptr));
+    EXPECT_EQ(KZ_INIT_ERROR_NO_RECORD, kzinit_initialize_vesk_safe(nullptr, 1));
+    EXPECT_EQ(KZ_INIT_ERROR_NO_RECORD, kzinit_initialize_vesk_safe(nullptr, 0));
     EXPECT_FALSE(is_on());
     ASSERT_EQ(KZ_OK, kzinit_initialize_vesk(&record_));
-    EXPECT_EQ(0x90050990u, kzinit_initialize_vesk(nullptr));
+    EXPECT_EQ(KZ_INIT_ERROR_NO_RECORD, kzinit_initialize_vesk(nullptr));
     EXPECT_TRUE(is_on());
 }
 
 // The check comes after the memory manager: a caller who is refused has a shut-down to make.
 TEST_F(Startup, AZeroCheckIsRefusedWithMemoryOn)
 {
-    EXPECT_EQ(0x90000004u, kzinit_initialize_vesk_safe(&record_, 0));
+    EXPECT_EQ(KZ_ERROR_INVALID_ARGUMENT, kzinit_initialize_vesk_safe(&record_, 0));
     EXPECT_TRUE(is_on());
 }
 

@@ -140,8 +140,8 @@ TEST_F(DiscDirectory, TheFullPathHasTwoSlashesBeforeTheName)
 TEST_F(DiscDirectory, NullArgumentsAreRefused)
 {
     kzbdfs_dir* dir = nullptr;
-    EXPECT_EQ(0x90060004u, kzbdfs_open_dir(nullptr, &dir));
-    EXPECT_EQ(0x90060004u, kzbdfs_open_dir("/", nullptr));
+    EXPECT_EQ(KZ_DISC_ERROR_INVALID_ARGUMENT, kzbdfs_open_dir(nullptr, &dir));
+    EXPECT_EQ(KZ_DISC_ERROR_INVALID_ARGUMENT, kzbdfs_open_dir("/", nullptr));
     EXPECT_EQ(nullptr, dir);
     EXPECT_EQ(0u, kzbdfs_get_error());
 }
@@ -151,7 +151,7 @@ TEST_F(DiscDirectory, WhateverKeepsADirectoryFromOpeningIsReportedAsShortMemory)
     const auto expect_refused = [](const std::string& path) {
         auto* const untouched = reinterpret_cast<kzbdfs_dir*>(&kzbdfs_dir_get_delim);
         kzbdfs_dir* dir = untouched;
-        EXPECT_EQ(0x90060001u, kzbdfs_open_dir(path.c_str(), &dir)) << path;
+        EXPECT_EQ(KZ_DISC_ERROR_MEMORY, kzbdfs_open_dir(path.c_str(), &dir)) << path;
         EXPECT_EQ(untouched, dir);
         EXPECT_EQ(0u, kzbdfs_get_error()) << "it does not become the last error";
     };
@@ -170,9 +170,9 @@ TEST_F(DiscDirectory, WhateverKeepsADirectoryFromOpeningIsReportedAsShortMemory)
 // Who looks at what is returned, and not at the handle, loses the handle.
 TEST_F(DiscDirectory, SuccessReturnsThePendingLastErrorAndTakesIt)
 {
-    EXPECT_EQ(0x90060006u, kzbdfs_shutdown());
+    EXPECT_EQ(KZ_DISC_NOT_ON, kzbdfs_shutdown());
     kzbdfs_dir* dir = nullptr;
-    EXPECT_EQ(0x90060006u, kzbdfs_open_dir("/", &dir));
+    EXPECT_EQ(KZ_DISC_NOT_ON, kzbdfs_open_dir("/", &dir));
     EXPECT_NE(nullptr, dir);
     kzbdfs_close_dir(dir);
     EXPECT_EQ(0u, kzbdfs_get_error());
@@ -223,9 +223,9 @@ TEST_F(DiscDirectory, AnEntryThatIsGoneIsNothing)
     const Entry file = entry_named(dir, "file");
     fs::remove(scratch_.path("file"));
     EXPECT_EQ(0, kzbdfs_dirent_is_file(file.get()));
-    EXPECT_EQ(0x90060048u, kzbdfs_get_error());
+    EXPECT_EQ(KZ_DISC_ERROR_NOT_FOUND, kzbdfs_get_error());
     EXPECT_EQ(0, bnbdfs_dirent_is_dir(file.get()));
-    EXPECT_EQ(0x90060048u, kzbdfs_get_error());
+    EXPECT_EQ(KZ_DISC_ERROR_NOT_FOUND, kzbdfs_get_error());
 }
 
 // A look and an opening are two things: what was a file may be a link by then.
@@ -256,7 +256,7 @@ TEST_F(DiscDirectory, AnEntryThatMayNotBeLookedAtIsNothing)
         const Directory dir = open_directory(scratch_.path());
         const Entry file = entry_named(dir, "file");
         EXPECT_EQ(0, kzbdfs_dirent_is_file(file.get()));
-        EXPECT_EQ(0x90060047u, kzbdfs_get_error());
+        EXPECT_EQ(KZ_DISC_ERROR_ACCESS_DENIED, kzbdfs_get_error());
     });
     ASSERT_EQ(0, ::chmod(scratch_.path().c_str(), 0700));
 }
@@ -301,7 +301,7 @@ TEST_F(DiscDirectory, AnEntryWhosePathIsTooLongForTheSystemIsListedButNothing)
         const Entry entry = entry_named(dir, name);
         EXPECT_EQ(path + "//" + name, entry->path);
         EXPECT_EQ(0, kzbdfs_dirent_is_file(entry.get()));
-        EXPECT_EQ(0x90060009u, kzbdfs_get_error());
+        EXPECT_EQ(KZ_DISC_ERROR_SYSTEM, kzbdfs_get_error());
     }
     {
         const Directory dir = open_directory(".");
@@ -329,7 +329,7 @@ TEST_F(DiscDirectory, ShortMemoryWhenOpeningLeavesNothing)
     for_every_failed_allocation([&](auto fired) {
         kzbdfs_dir* dir = nullptr;
         const kz_status status = kzbdfs_open_dir("/", &dir);
-        EXPECT_EQ(fired() ? 0x90060001u : 0u, status);
+        EXPECT_EQ(fired() ? KZ_DISC_ERROR_MEMORY : 0u, status);
         EXPECT_EQ(fired(), dir == nullptr);
         kzbdfs_close_dir(dir);
     });

@@ -47,20 +47,20 @@ INSTANTIATE_TEST_SUITE_P(Each, DiscFamilyOff, ::testing::Values(kBluray, kDvd), 
 
 TEST_P(DiscFamilyOff, TheSwitchReportsWhatItFound)
 {
-    EXPECT_EQ(0x90060006u, family().query_availability());
+    EXPECT_EQ(KZ_DISC_NOT_ON, family().query_availability());
     EXPECT_EQ(0u, family().initialize());
-    EXPECT_EQ(0x90060005u, family().query_availability());
-    EXPECT_EQ(0x90060005u, family().initialize());
-    EXPECT_EQ(0x90060005u, family().get_error());
+    EXPECT_EQ(KZ_DISC_ALREADY_ON, family().query_availability());
+    EXPECT_EQ(KZ_DISC_ALREADY_ON, family().initialize());
+    EXPECT_EQ(KZ_DISC_ALREADY_ON, family().get_error());
     EXPECT_EQ(0u, family().shutdown());
     EXPECT_EQ(0u, family().get_error());
-    EXPECT_EQ(0x90060006u, family().shutdown());
-    EXPECT_EQ(0x90060006u, family().get_error());
+    EXPECT_EQ(KZ_DISC_NOT_ON, family().shutdown());
+    EXPECT_EQ(KZ_DISC_NOT_ON, family().get_error());
 }
 
 TEST_P(DiscFamilyOff, AskingForTheSwitchKeepsNoError)
 {
-    EXPECT_EQ(0x90060006u, family().query_availability());
+    EXPECT_EQ(KZ_DISC_NOT_ON, family().query_availability());
     EXPECT_EQ(0u, family().get_error());
 }
 
@@ -76,7 +76,7 @@ TEST_P(DiscFamilyOff, SwitchingOffLeavesTheLastError)
     ASSERT_EQ(0u, family().initialize());
     EXPECT_EQ(-1, family().seek(0, 0, 3));
     EXPECT_EQ(0u, family().shutdown());
-    EXPECT_EQ(0x90060048u, family().get_error());
+    EXPECT_EQ(KZ_DISC_ERROR_NOT_FOUND, family().get_error());
 }
 
 TEST_P(DiscFamilyOff, NothingTouchesAFile)
@@ -86,7 +86,7 @@ TEST_P(DiscFamilyOff, NothingTouchesAFile)
     const AtEnd close_file([file] { ::close(file); });
     char buffer[8] = "before";
     uint32_t length = 77;
-    const auto expect_refused = [&] { EXPECT_EQ(0x90060006u, family().get_error()); };
+    const auto expect_refused = [&] { EXPECT_EQ(KZ_DISC_NOT_ON, family().get_error()); };
 
     EXPECT_EQ(-1, family().open(directory.path("file").c_str()));
     expect_refused();
@@ -98,9 +98,9 @@ TEST_P(DiscFamilyOff, NothingTouchesAFile)
     expect_refused();
     EXPECT_EQ(-1, family().read_at(file, 1, buffer, 4));
     expect_refused();
-    EXPECT_EQ(0x90060006u, family().close(file));
+    EXPECT_EQ(KZ_DISC_NOT_ON, family().close(file));
     expect_refused();
-    EXPECT_EQ(0x90060006u, family().read_vol_label("/", 8, &length, buffer));
+    EXPECT_EQ(KZ_DISC_NOT_ON, family().read_vol_label("/", 8, &length, buffer));
     expect_refused();
     EXPECT_EQ(0u, length);
     EXPECT_STREQ("before", buffer);
@@ -111,7 +111,7 @@ TEST(DvdFamilyOff, NothingExists)
 {
     kzdvdfs_shutdown();
     EXPECT_EQ(0, kzdvdfs_exists("/"));
-    EXPECT_EQ(0x90060006u, kzdvdfs_get_error());
+    EXPECT_EQ(KZ_DISC_NOT_ON, kzdvdfs_get_error());
 }
 
 // ---- On
@@ -122,10 +122,10 @@ INSTANTIATE_TEST_SUITE_P(Each, DiscFamily, ::testing::Values(kBluray, kDvd), fam
 TEST_P(DiscFamily, SharesNothingWithTheOther)
 {
     const DiscFamilyCalls& other = family().open == kBluray.open ? kDvd : kBluray;
-    EXPECT_EQ(0x90060006u, other.query_availability());
+    EXPECT_EQ(KZ_DISC_NOT_ON, other.query_availability());
     EXPECT_EQ(-1, family().seek(0, 0, 3));
     EXPECT_EQ(0u, other.get_error());
-    EXPECT_EQ(0x90060048u, family().get_error());
+    EXPECT_EQ(KZ_DISC_ERROR_NOT_FOUND, family().get_error());
 }
 
 TEST_P(DiscFamily, NeedsNoMemoryManager)
@@ -184,7 +184,7 @@ TEST_P(DiscFamily, SuccessLeavesTheLastErrorOfAnEarlierFailure)
     const int32_t file = family().open("/");
     EXPECT_GE(file, 0);
     EXPECT_EQ(0u, family().close(file));
-    expect_error(0x90060048);
+    expect_error(KZ_DISC_ERROR_NOT_FOUND);
 }
 
 // A descriptor may be handed over on purpose.
@@ -210,7 +210,7 @@ TEST_P(DiscFamily, AnUnknownWhenceIsReportedAsNotFound)
 {
     for (const int32_t whence : {3, -1, 4, 1000}) {
         EXPECT_EQ(-1, family().seek(0, 0, whence));
-        expect_error(0x90060048);
+        expect_error(KZ_DISC_ERROR_NOT_FOUND);
     }
 }
 
@@ -218,9 +218,9 @@ TEST_P(DiscFamily, AMissingFileIsNotFound)
 {
     const ScratchDirectory directory;
     EXPECT_EQ(-1, family().open(directory.path("missing").c_str()));
-    expect_error(0x90060048);
+    expect_error(KZ_DISC_ERROR_NOT_FOUND);
     EXPECT_EQ(-1, family().open(""));
-    expect_error(0x90060048);
+    expect_error(KZ_DISC_ERROR_NOT_FOUND);
 }
 
 TEST_P(DiscFamily, ALinkThatLeadsNowhereIsNotFound)
@@ -228,7 +228,7 @@ TEST_P(DiscFamily, ALinkThatLeadsNowhereIsNotFound)
     const ScratchDirectory directory;
     std::filesystem::create_symlink("missing", directory.path("link"));
     EXPECT_EQ(-1, family().open(directory.path("link").c_str()));
-    expect_error(0x90060048);
+    expect_error(KZ_DISC_ERROR_NOT_FOUND);
 }
 
 TEST_P(DiscFamily, AClosedDescriptorIsBad)
@@ -236,13 +236,13 @@ TEST_P(DiscFamily, AClosedDescriptorIsBad)
     char buffer[4];
     for (const int32_t descriptor : {-1, 100'000'000}) {
         EXPECT_EQ(-1, family().seek(descriptor, 0, 0));
-        expect_error(0x9006004c);
+        expect_error(KZ_DISC_ERROR_BAD_DESCRIPTOR);
         EXPECT_EQ(-1, family().read(descriptor, buffer, 4));
-        expect_error(0x9006004c);
+        expect_error(KZ_DISC_ERROR_BAD_DESCRIPTOR);
         EXPECT_EQ(-1, family().read_at(descriptor, 0, buffer, 4));
-        expect_error(0x9006004c);
-        EXPECT_EQ(0x9006004cu, family().close(descriptor));
-        expect_error(0x9006004c);
+        expect_error(KZ_DISC_ERROR_BAD_DESCRIPTOR);
+        EXPECT_EQ(KZ_DISC_ERROR_BAD_DESCRIPTOR, family().close(descriptor));
+        expect_error(KZ_DISC_ERROR_BAD_DESCRIPTOR);
     }
 }
 
@@ -253,7 +253,7 @@ TEST_P(DiscFamily, AnUnreadableFileIsDenied)
     ASSERT_EQ(0, ::chmod(directory.path().c_str(), 0755));
     ASSERT_EQ(0, ::chmod(path.c_str(), 0));
     as_nobody([&] { EXPECT_EQ(-1, family().open(path.c_str())); });
-    expect_error(0x90060047);
+    expect_error(KZ_DISC_ERROR_ACCESS_DENIED);
 }
 
 TEST_P(DiscFamily, APlaceBeforeTheBeginningIsInvalid)
@@ -261,9 +261,9 @@ TEST_P(DiscFamily, APlaceBeforeTheBeginningIsInvalid)
     const ScratchDirectory directory;
     const int32_t file = family().open(directory.write("file", "0123").c_str());
     EXPECT_EQ(-1, family().seek(file, -1, 0));
-    expect_error(0x90060004);
+    expect_error(KZ_DISC_ERROR_INVALID_ARGUMENT);
     EXPECT_EQ(-1, family().seek(file, -5, 2));
-    expect_error(0x90060004);
+    expect_error(KZ_DISC_ERROR_INVALID_ARGUMENT);
     EXPECT_EQ(0u, family().close(file));
 }
 
@@ -275,7 +275,7 @@ TEST_P(DiscFamily, ReadingAtMinusOneReadsNothing)
     char buffer[4] = {'a', 'b', 'c', 'd'};
     for (const int64_t offset : {int64_t{-1}, int64_t{-2}, INT64_MIN}) {
         EXPECT_EQ(-1, family().read_at(file, offset, buffer, 4));
-        expect_error(0x90060004);
+        expect_error(KZ_DISC_ERROR_INVALID_ARGUMENT);
     }
     EXPECT_EQ(0, std::memcmp("abcd", buffer, 4));
     EXPECT_EQ(0u, family().close(file));
@@ -286,7 +286,7 @@ TEST_P(DiscFamily, TooManyFilesAreTold)
     int32_t file = 0;
     without_descriptors([&] { file = family().open("/"); });
     EXPECT_EQ(-1, file);
-    expect_error(0x9006004b);
+    expect_error(KZ_DISC_ERROR_TOO_MANY_FILES);
 }
 
 // No call here writes, so the system never says "no space" by itself: a filter says it.
@@ -309,9 +309,9 @@ TEST_P(DiscFamily, AFullDiskIsTold)
         GTEST_SKIP() << kNoFilter;
     }
     EXPECT_EQ(-1, sought);
-    EXPECT_EQ(0x9006004au, after_seek);
+    EXPECT_EQ(KZ_DISC_ERROR_NO_SPACE, after_seek);
     EXPECT_EQ(-1, read);
-    expect_error(0x9006004a);
+    expect_error(KZ_DISC_ERROR_NO_SPACE);
 }
 
 // What an earlier call has left in `errno` must not be taken for the reason.
@@ -331,7 +331,7 @@ TEST_P(DiscFamily, AnArrivalElsewhereIsNotBlamedOnAnEarlierError)
         GTEST_SKIP() << kNoFilter;
     }
     EXPECT_EQ(-1, read);
-    expect_error(0x90060009);
+    expect_error(KZ_DISC_ERROR_SYSTEM);
 }
 
 TEST_P(DiscFamily, EveryOtherFailureIsOneOfTheSystem)
@@ -340,26 +340,26 @@ TEST_P(DiscFamily, EveryOtherFailureIsOneOfTheSystem)
     const std::string file = directory.write("file", "x");
     std::filesystem::create_symlink("loop", directory.path("loop"));
     EXPECT_EQ(-1, family().open((file + "/below").c_str())) << "no directory";
-    expect_error(0x90060009);
+    expect_error(KZ_DISC_ERROR_SYSTEM);
     EXPECT_EQ(-1, family().open(directory.path("loop").c_str()));
-    expect_error(0x90060009);
+    expect_error(KZ_DISC_ERROR_SYSTEM);
     EXPECT_EQ(-1, family().open(std::string(5000, 'x').c_str())) << "too long";
-    expect_error(0x90060009);
+    expect_error(KZ_DISC_ERROR_SYSTEM);
     EXPECT_EQ(-1, family().open(nullptr));
-    expect_error(0x90060009);
+    expect_error(KZ_DISC_ERROR_SYSTEM);
 
     const int32_t opened = family().open(directory.path().c_str());
     char buffer[4];
     EXPECT_EQ(-1, family().read(opened, buffer, 4)) << "a directory";
-    expect_error(0x90060009);
+    expect_error(KZ_DISC_ERROR_SYSTEM);
     EXPECT_EQ(0u, family().close(opened));
 
     int ends[2];
     ASSERT_EQ(0, ::pipe(ends));
     EXPECT_EQ(-1, family().seek(ends[0], 0, 0)) << "a pipe has no places";
-    expect_error(0x90060009);
+    expect_error(KZ_DISC_ERROR_SYSTEM);
     EXPECT_EQ(-1, family().read_at(ends[0], 0, buffer, 4));
-    expect_error(0x90060009);
+    expect_error(KZ_DISC_ERROR_SYSTEM);
     ::close(ends[0]);
     ::close(ends[1]);
 }
@@ -367,25 +367,25 @@ TEST_P(DiscFamily, EveryOtherFailureIsOneOfTheSystem)
 TEST(DiscErrors, EveryErrnoHasItsCode)
 {
     for (int error = 0; error < 200; ++error) {
-        kz_status expected = 0x90060009;
+        kz_status expected = KZ_DISC_ERROR_SYSTEM;
         switch (error) {
         case 2:
-            expected = 0x90060048;
+            expected = KZ_DISC_ERROR_NOT_FOUND;
             break;
         case 9:
-            expected = 0x9006004c;
+            expected = KZ_DISC_ERROR_BAD_DESCRIPTOR;
             break;
         case 13:
-            expected = 0x90060047;
+            expected = KZ_DISC_ERROR_ACCESS_DENIED;
             break;
         case 22:
-            expected = 0x90060004;
+            expected = KZ_DISC_ERROR_INVALID_ARGUMENT;
             break;
         case 24:
-            expected = 0x9006004b;
+            expected = KZ_DISC_ERROR_TOO_MANY_FILES;
             break;
         case 28:
-            expected = 0x9006004a;
+            expected = KZ_DISC_ERROR_NO_SPACE;
             break;
         default:
             break;
@@ -398,8 +398,8 @@ TEST(DiscErrors, EveryErrnoHasItsCode)
 TEST_P(DiscFamily, TheLastErrorMayBeAnotherThreads)
 {
     EXPECT_EQ(-1, family().seek(0, 0, 3));
-    std::thread([&] { EXPECT_EQ(0x9006004cu, family().close(-1)); }).join();
-    expect_error(0x9006004c);
+    std::thread([&] { EXPECT_EQ(KZ_DISC_ERROR_BAD_DESCRIPTOR, family().close(-1)); }).join();
+    expect_error(KZ_DISC_ERROR_BAD_DESCRIPTOR);
 }
 
 // The thread sanitizer sees a race here if there is one.
@@ -409,7 +409,7 @@ TEST_P(DiscFamily, CanFailInSeveralThreadsAtOnce)
         for (int i = 0; i < 500; ++i) {
             EXPECT_EQ(-1, family().seek(0, 0, 3));
             const kz_status status = family().get_error();
-            EXPECT_TRUE(status == 0 || status == 0x90060048) << status;
+            EXPECT_TRUE(status == 0 || status == KZ_DISC_ERROR_NOT_FOUND) << status;
             static_cast<void>(family().query_availability());
         }
     };
@@ -451,7 +451,7 @@ TEST_P(DvdExists, IsNotSeenInAClosedDirectory)
         exists = kzdvdfs_exists(file.c_str());
     }).join();
     EXPECT_EQ(0, exists);
-    expect_error(0x90060047);
+    expect_error(KZ_DISC_ERROR_ACCESS_DENIED);
     ASSERT_EQ(0, ::chmod(directory.path().c_str(), 0700));
 }
 
@@ -461,12 +461,12 @@ TEST_P(DvdExists, SaysWhyNot)
     std::filesystem::create_symlink("missing", directory.path("link"));
     for (const char* name : {"missing", "link", "missing/below"}) {
         EXPECT_EQ(0, kzdvdfs_exists(directory.path(name).c_str())) << name;
-        expect_error(0x90060048);
+        expect_error(KZ_DISC_ERROR_NOT_FOUND);
     }
     EXPECT_EQ(0, kzdvdfs_exists((directory.write("file", "") + "/below").c_str()));
-    expect_error(0x90060009);
+    expect_error(KZ_DISC_ERROR_SYSTEM);
     EXPECT_EQ(0, kzdvdfs_exists(nullptr));
-    expect_error(0x90060009);
+    expect_error(KZ_DISC_ERROR_SYSTEM);
 }
 
 } // namespace

@@ -215,9 +215,9 @@ TEST_F(DiscNames, WriteNothingOutsideTheirSizeWhateverItIs)
                 if (builder.is_dvd) {
                     ASSERT_EQ(text.size(), result);
                 } else if (size == 0) {
-                    ASSERT_EQ(0x90060004u, result);
+                    ASSERT_EQ(KZ_DISC_ERROR_INVALID_ARGUMENT, result);
                 } else if (builder.name == "certificates" && size <= text.size()) {
-                    ASSERT_EQ(0x90060001u, result);
+                    ASSERT_EQ(KZ_DISC_ERROR_MEMORY, result);
                 } else {
                     ASSERT_EQ(0u, result);
                 }
@@ -263,14 +263,14 @@ TEST_F(DiscNames, TheCertificateFolderSeesALengthModulo65536)
         return kzbdfs_get_cert_dirname(root.c_str(), name, sizeof name);
     };
     EXPECT_EQ(0u, status_for_length(63));
-    EXPECT_EQ(0x90060001u, status_for_length(64));
-    EXPECT_EQ(0x90060001u, kzbdfs_get_error());
-    EXPECT_EQ(0x90060001u, status_for_length(65'535));
+    EXPECT_EQ(KZ_DISC_ERROR_MEMORY, status_for_length(64));
+    EXPECT_EQ(KZ_DISC_ERROR_MEMORY, kzbdfs_get_error());
+    EXPECT_EQ(KZ_DISC_ERROR_MEMORY, status_for_length(65'535));
     EXPECT_EQ(0u, status_for_length(65'536)) << "a length of 0, it seems";
     EXPECT_EQ(0u, kzbdfs_get_error());
     EXPECT_EQ(std::string(63, 'r'), name) << "though it was cut";
     EXPECT_EQ(0u, status_for_length(65'536 + 63));
-    EXPECT_EQ(0x90060001u, status_for_length(65'536 + 64));
+    EXPECT_EQ(KZ_DISC_ERROR_MEMORY, status_for_length(65'536 + 64));
 }
 
 // ---- Arguments and the last error
@@ -279,8 +279,8 @@ TEST_F(DiscNames, NullOrNoSizeIsRefusedByBluray)
 {
     char name[64] = "before";
     const auto expect_refused = [&](kz_status status) {
-        EXPECT_EQ(0x90060004u, status);
-        EXPECT_EQ(0x90060004u, kzbdfs_get_error());
+        EXPECT_EQ(KZ_DISC_ERROR_INVALID_ARGUMENT, status);
+        EXPECT_EQ(KZ_DISC_ERROR_INVALID_ARGUMENT, kzbdfs_get_error());
         EXPECT_STREQ("before", name);
     };
     for (const BlurayBuild build :
@@ -317,7 +317,7 @@ TEST_F(DiscNames, ABlurayNameForgetsTheLastErrorAndADvdNameDoesNot)
     kzdvdfs_shutdown();
     kzdvdfs_shutdown();
     EXPECT_EQ(23, kzdvdfs_get_video_ts_ifoname("/", name, sizeof name));
-    EXPECT_EQ(0x90060006u, kzdvdfs_get_error());
+    EXPECT_EQ(KZ_DISC_NOT_ON, kzdvdfs_get_error());
 }
 
 } // namespace

@@ -135,16 +135,16 @@ TEST_P(DiscLabelArguments, NullIsRefused)
 {
     char label[32];
     uint32_t length = 77;
-    EXPECT_EQ(0x90060004u, family().read_vol_label(nullptr, 32, &length, label));
-    expect_error(0x90060004);
-    EXPECT_EQ(0x90060004u, family().read_vol_label("/", 32, nullptr, label));
-    expect_error(0x90060004);
-    EXPECT_EQ(0x90060004u, family().read_vol_label("/", 32, &length, nullptr));
-    expect_error(0x90060004);
+    EXPECT_EQ(KZ_DISC_ERROR_INVALID_ARGUMENT, family().read_vol_label(nullptr, 32, &length, label));
+    expect_error(KZ_DISC_ERROR_INVALID_ARGUMENT);
+    EXPECT_EQ(KZ_DISC_ERROR_INVALID_ARGUMENT, family().read_vol_label("/", 32, nullptr, label));
+    expect_error(KZ_DISC_ERROR_INVALID_ARGUMENT);
+    EXPECT_EQ(KZ_DISC_ERROR_INVALID_ARGUMENT, family().read_vol_label("/", 32, &length, nullptr));
+    expect_error(KZ_DISC_ERROR_INVALID_ARGUMENT);
     EXPECT_EQ(77u, length);
     EXPECT_EQ(KZ_OK, family().shutdown());
-    EXPECT_EQ(0x90060004u, family().read_vol_label(nullptr, 32, &length, label));
-    expect_error(0x90060004);
+    EXPECT_EQ(KZ_DISC_ERROR_INVALID_ARGUMENT, family().read_vol_label(nullptr, 32, &length, label));
+    expect_error(KZ_DISC_ERROR_INVALID_ARGUMENT);
 }
 
 // ---- Through the device's path
@@ -281,10 +281,10 @@ TEST_P(DiscDevice, RunsTheProcessOutOfDescriptors)
         ++labels;
     }
     ASSERT_EQ(0, ::setrlimit(RLIMIT_NOFILE, &before));
-    EXPECT_EQ(0x9006004bu, status);
+    EXPECT_EQ(KZ_DISC_ERROR_TOO_MANY_FILES, status);
     EXPECT_GT(labels, 50u);
     EXPECT_LT(labels, 100u);
-    expect_error(0x9006004b);
+    expect_error(KZ_DISC_ERROR_TOO_MANY_FILES);
 }
 
 TEST_P(DiscDevice, AllocatesNothing)
@@ -299,13 +299,13 @@ TEST_P(DiscDevice, AllocatesNothing)
 
 // ---- Failures of the device
 
-TEST_P(DiscDevice, ThatIsNotThereIsNotFound) { expect_failure(0x90060048); }
+TEST_P(DiscDevice, ThatIsNotThereIsNotFound) { expect_failure(KZ_DISC_ERROR_NOT_FOUND); }
 
 TEST_P(DiscDevice, IsNotReadWhileTheFamilyIsOff)
 {
     PrivateDevices::insert(kImages + "dvd.iso");
     EXPECT_EQ(KZ_OK, family().shutdown());
-    expect_failure(0x90060006);
+    expect_failure(KZ_DISC_NOT_ON);
 }
 
 TEST_P(DiscDevice, ThatMayNotBeReadIsDenied)
@@ -320,16 +320,16 @@ TEST_P(DiscDevice, ThatMayNotBeReadIsDenied)
     const AtEnd restore([before = ::getuid()] { EXPECT_EQ(0, ::seteuid(before)); });
     char text[32];
     uint32_t length = 0;
-    EXPECT_EQ(0x90060047u, family().read_vol_label("/", 32, &length, text));
-    expect_error(0x90060047);
+    EXPECT_EQ(KZ_DISC_ERROR_ACCESS_DENIED, family().read_vol_label("/", 32, &length, text));
+    expect_error(KZ_DISC_ERROR_ACCESS_DENIED);
 }
 
 TEST_P(DiscDevice, ThatCannotBeReadIsClosedAgain)
 {
     PrivateDevices::insert(scratch_.path()); // a directory
-    expect_failure(0x90060009);
+    expect_failure(KZ_DISC_ERROR_SYSTEM);
     PrivateDevices::insert("/proc/self/mem"); // nothing is mapped so low
-    expect_failure(0x90060009);
+    expect_failure(KZ_DISC_ERROR_SYSTEM);
 }
 
 TEST_P(DiscDevice, ThatHasNoPlacesIsClosedAgain)
@@ -337,7 +337,7 @@ TEST_P(DiscDevice, ThatHasNoPlacesIsClosedAgain)
     int ends[2];
     ASSERT_EQ(0, ::pipe(ends));
     PrivateDevices::insert("/proc/self/fd/" + std::to_string(ends[0]));
-    expect_failure(0x90060009);
+    expect_failure(KZ_DISC_ERROR_SYSTEM);
     ::close(ends[0]);
     ::close(ends[1]);
 }

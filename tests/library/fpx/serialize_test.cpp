@@ -71,16 +71,16 @@ TEST_F(Serialize, AnIncompleteFingerprintIsRefusedWithoutAText)
 {
     int marker = 0;
     char* text = reinterpret_cast<char*>(&marker);
-    EXPECT_EQ(0x900f0961U, kz_fpx_fingerprint_serialize(handle_, &text));
+    EXPECT_EQ(KZ_QV_ERROR_INCOMPLETE, kz_fpx_fingerprint_serialize(handle_, &text));
     EXPECT_EQ(nullptr, text);
 }
 
 TEST_F(Serialize, NullsAreRefused)
 {
     char* text = nullptr;
-    EXPECT_EQ(0x90080004U, kz_fpx_fingerprint_serialize(nullptr, &text));
-    EXPECT_EQ(0x90080004U, kz_fpx_fingerprint_serialize(handle_, nullptr));
-    EXPECT_EQ(0x90080004U, kz_fpx_fingerprint_serialize_free(nullptr));
+    EXPECT_EQ(KZ_FPX_ERROR_INVALID_ARGUMENT, kz_fpx_fingerprint_serialize(nullptr, &text));
+    EXPECT_EQ(KZ_FPX_ERROR_INVALID_ARGUMENT, kz_fpx_fingerprint_serialize(handle_, nullptr));
+    EXPECT_EQ(KZ_FPX_ERROR_INVALID_ARGUMENT, kz_fpx_fingerprint_serialize_free(nullptr));
 }
 
 TEST_F(Serialize, FreeingANullTextDoesNothing)

@@ -171,7 +171,7 @@ TEST_F(Job, RefusesOtherEncodingsWithoutAWord)
         expect_failure(nullptr);
         EXPECT_EQ(0, std::count(script().calls.begin(), script().calls.end(), "create")) << code;
         unsigned char* serialized = nullptr;
-        EXPECT_EQ(0x9008000fU, job_.fpx_generate_fingerprint(&serialized));
+        EXPECT_EQ(KZ_FPX_ERROR_NO_INPUT_FORMAT, job_.fpx_generate_fingerprint(&serialized));
         EXPECT_EQ(nullptr, serialized);
     }
 }
@@ -203,18 +203,18 @@ TEST_F(Job, ThatWasNeverConfiguredFails)
 
 TEST_F(Job, LogsAFailedCreateAndFreesNothing)
 {
-    script().create = 0x900f0004;
+    script().create = KZ_QV_ERROR_INVALID_ARGUMENT;
     expect_failure("kz_fpx_fingerprint_create() failed. error=900F0004");
     EXPECT_EQ("create", script().calls.back());
 }
 
 TEST_F(Job, LogsAudioThatIsRefusedAndFreesTheHandle)
 {
-    script().add_audio = 0x900f0004;
+    script().add_audio = KZ_QV_ERROR_INVALID_ARGUMENT;
     expect_failure("kz_fpx_fingerprint_add_audio() failed error=900F0004");
     EXPECT_EQ("free", script().calls.back());
     unsigned char* serialized = nullptr;
-    EXPECT_EQ(0x900f0004U, job_.fpx_generate_fingerprint(&serialized));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, job_.fpx_generate_fingerprint(&serialized));
 }
 
 TEST_F(Job, SaysNothingOfTooLittleAudioAndDoesNotSerialize)
@@ -223,38 +223,38 @@ TEST_F(Job, SaysNothingOfTooLittleAudioAndDoesNotSerialize)
     expect_failure(nullptr);
     EXPECT_EQ((Calls{"configure", "start", "create", "add audio", "free"}), script().calls);
     unsigned char* serialized = nullptr;
-    EXPECT_EQ(0x90080602U, job_.fpx_generate_fingerprint(&serialized));
+    EXPECT_EQ(KZ_FPX_ERROR_NOT_ENOUGH_AUDIO, job_.fpx_generate_fingerprint(&serialized));
 }
 
 TEST_F(Job, LogsAFailedSerialisationAndFreesTheHandle)
 {
-    script().serialize = 0x9008000b;
+    script().serialize = KZ_FPX_ERROR_RENDER;
     expect_failure("kz_fpx_fingerprint_serialize() failed error=9008000B");
     EXPECT_EQ("free", script().calls.back());
 }
 
 TEST_F(Job, LogsZeroForTheStatusOfAFailedFree)
 {
-    script().free = 0x900f0004;
+    script().free = KZ_QV_ERROR_INVALID_ARGUMENT;
     expect_failure("kz_fpx_fingerprint_free() failed error =0");
     unsigned char* serialized = nullptr;
-    EXPECT_EQ(0x900f0004U, job_.fpx_generate_fingerprint(&serialized));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, job_.fpx_generate_fingerprint(&serialized));
     std::free(serialized);
     --script().texts_out;
 }
 
 TEST_F(Job, DropsAFailedFreeAfterAnEarlierFailure)
 {
-    script().free = 0x900f0004;
-    script().add_audio = 0x900f0009;
+    script().free = KZ_QV_ERROR_INVALID_ARGUMENT;
+    script().add_audio = KZ_QV_ERROR_EMPTY;
     expect_failure("kz_fpx_fingerprint_add_audio() failed error=900F0009");
     unsigned char* serialized = nullptr;
-    EXPECT_EQ(0x900f0009U, job_.fpx_generate_fingerprint(&serialized));
+    EXPECT_EQ(KZ_QV_ERROR_EMPTY, job_.fpx_generate_fingerprint(&serialized));
 }
 
 TEST_F(Job, SucceedsThoughTheTextCannotBeFreed)
 {
-    script().serialize_free = 0x90080004;
+    script().serialize_free = KZ_FPX_ERROR_INVALID_ARGUMENT;
     const CapturedLog captured;
     TextBuffer buffer;
     EXPECT_EQ(0, job_.generate(buffer.address()));
@@ -311,7 +311,7 @@ TEST_F(Job, StartsTheCoreOnceForAllJobsOfTheProcess)
 
 TEST_F(Job, ShutsTheCoreDownAndStartsItOnceMoreWhenTheStartFails)
 {
-    script().starts = {0x90050990};
+    script().starts = {KZ_INIT_ERROR_NO_RECORD};
     const CapturedLog captured;
     TextBuffer buffer;
     EXPECT_EQ(0, job_.generate(buffer.address()));
@@ -324,7 +324,7 @@ TEST_F(Job, ShutsTheCoreDownAndStartsItOnceMoreWhenTheStartFails)
 
 TEST_F(Job, FailsWhenTheSecondStartFailsToo)
 {
-    script().starts = {0x90050990, 0x90040005};
+    script().starts = {KZ_INIT_ERROR_NO_RECORD, KZ_MEM_ALREADY_ON};
     const CapturedLog captured;
     TextBuffer buffer;
     EXPECT_EQ(-5, job_.generate(buffer.address()));
@@ -336,7 +336,7 @@ TEST_F(Job, FailsWhenTheSecondStartFailsToo)
 
 TEST_F(Job, LogsZeroForTheStatusOfAFailedConfiguration)
 {
-    script().configuration = 0x90000004;
+    script().configuration = KZ_ERROR_INVALID_ARGUMENT;
     const CapturedLog captured;
     TextBuffer buffer;
     EXPECT_EQ(-5, job_.generate(buffer.address()));

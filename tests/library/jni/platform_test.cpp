@@ -30,7 +30,7 @@ TEST(PlatformLog, WritesPriorityTagAndMessage)
 TEST(PlatformLog, PrintsAStatusInUpperCaseHexadecimal)
 {
     const CapturedLog captured;
-    kz::platform::log(kLogError, "tag", "error=%X", 0x90080602);
+    kz::platform::log(kLogError, "tag", "error=%X", KZ_FPX_ERROR_NOT_ENOUGH_AUDIO);
     kz::platform::log(kLogError, "tag", "error=%X", 0);
     EXPECT_EQ((LogLines{{6, "tag", "error=90080602"}, {6, "tag", "error=0"}}), captured.lines());
 }

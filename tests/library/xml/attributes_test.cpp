@@ -94,14 +94,14 @@ TEST_F(Attributes, OutOfRangeIsNull)
 TEST_F(Attributes, NullAndEmptyArgumentsAreRefused)
 {
     set("a", "1");
-    EXPECT_EQ(0x90020004u, SetXMLTagAttrFromStr(nullptr, "a", "2"));
-    EXPECT_EQ(0x90020004u, SetXMLTagAttrFromStr(tag(), "", "2"));
-    EXPECT_EQ(0x90020004u, SetXMLTagAttrFromStr(tag(), nullptr, "2"));
-    EXPECT_EQ(0x90020004u, SetXMLTagAttrFromBuf(tag(), "a", 0, "2", 1));
-    EXPECT_EQ(0x90020004u, SetXMLTagAttrFromBuf(tag(), "\0a", 2, "2", 1));
-    EXPECT_EQ(0x90020004u, SetXMLTagAttrFromBuf(tag(), nullptr, 1, "2", 1));
-    EXPECT_EQ(0x90020004u, SetXMLTagAttrFromInt(nullptr, "a", 1));
-    EXPECT_EQ(0x90020004u, SetXMLTagAttrFromUInt(tag(), nullptr, 1));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagAttrFromStr(nullptr, "a", "2"));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagAttrFromStr(tag(), "", "2"));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagAttrFromStr(tag(), nullptr, "2"));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagAttrFromBuf(tag(), "a", 0, "2", 1));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagAttrFromBuf(tag(), "\0a", 2, "2", 1));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagAttrFromBuf(tag(), nullptr, 1, "2", 1));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagAttrFromInt(nullptr, "a", 1));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagAttrFromUInt(tag(), nullptr, 1));
     EXPECT_EQ((Pairs{{"a", "1"}}), pairs());
 
     EXPECT_EQ(0u, GetXMLTagAttrCount(nullptr));
@@ -168,7 +168,7 @@ TEST_F(Attributes, AFailedSetChangesNothing)
     for_every_failed_allocation([&](auto fired) {
         const Pairs before = pairs();
         const kz_status status = SetXMLTagAttrFromStr(tag(), "a", "3");
-        EXPECT_EQ(fired() ? 0x90020001u : 0u, status);
+        EXPECT_EQ(fired() ? KZ_XML_ERROR_MEMORY : 0u, status);
         if (fired()) {
             EXPECT_EQ(before, pairs());
         }
@@ -177,7 +177,7 @@ TEST_F(Attributes, AFailedSetChangesNothing)
     for_every_failed_allocation([&](auto fired) {
         const kz_status a = SetXMLTagAttrFromInt(tag(), "a", -7);
         const kz_status b = SetXMLTagAttrFromUInt(tag(), "b", 8);
-        EXPECT_EQ(fired(), a == 0x90020001u || b == 0x90020001u);
+        EXPECT_EQ(fired(), a == KZ_XML_ERROR_MEMORY || b == KZ_XML_ERROR_MEMORY);
     });
     EXPECT_EQ((Pairs{{"a", "-7"}, {"b", "8"}}), pairs());
 }

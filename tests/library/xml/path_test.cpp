@@ -96,14 +96,14 @@ TEST_F(Paths, DataIsSetWhereThePathLeads)
 TEST_F(Paths, AMissingTagIsNotFoundUnlessItMayBeMade)
 {
     const Tree lone = make_tag("R");
-    EXPECT_EQ(0x90020002u, SetXMLSubTagDataFromStr(lone.get(), "A/B", "1", 0));
+    EXPECT_EQ(KZ_XML_ERROR_NOT_FOUND, SetXMLSubTagDataFromStr(lone.get(), "A/B", "1", 0));
     EXPECT_EQ(0u, GetXMLSubTagCount(lone.get()));
     for (const uint8_t create : {uint8_t{1}, uint8_t{2}}) {
         EXPECT_EQ(KZ_OK, SetXMLSubTagDataFromStr(lone.get(), "A/B", "1", create));
         EXPECT_EQ(1u, GetXMLSubTagCount(lone.get()));
         EXPECT_STREQ("1", GetXMLSubTagData(lone.get(), "A/B"));
     }
-    EXPECT_EQ(0x90020002u, SetXMLSubTagDataFromUInt(lone.get(), "A/C", 1, 0));
+    EXPECT_EQ(KZ_XML_ERROR_NOT_FOUND, SetXMLSubTagDataFromUInt(lone.get(), "A/C", 1, 0));
     EXPECT_EQ(KZ_OK, SetXMLSubTagDataFromUInt(lone.get(), "A/C", 7, 1));
     EXPECT_STREQ("7", GetXMLSubTagData(lone.get(), "A/C"));
 }
@@ -111,12 +111,13 @@ TEST_F(Paths, AMissingTagIsNotFoundUnlessItMayBeMade)
 TEST_F(Paths, ABadPathIsRefused)
 {
     const ModelTag before = model_of(root_);
-    EXPECT_EQ(0x90020004u, SetXMLSubTagDataFromStr(nullptr, "A", "1", 1));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLSubTagDataFromStr(nullptr, "A", "1", 1));
     for (const char* path : {"", "/", "/A", "//A"}) {
-        EXPECT_EQ(0x90020004u, SetXMLSubTagDataFromStr(root(), path, "1", 1)) << path;
+        EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLSubTagDataFromStr(root(), path, "1", 1))
+            << path;
     }
-    EXPECT_EQ(0x90020004u, SetXMLSubTagDataFromStr(root(), nullptr, "1", 1));
-    EXPECT_EQ(0x90020004u, SetXMLSubTagDataFromUInt(root(), "", 1, 1));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLSubTagDataFromStr(root(), nullptr, "1", 1));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLSubTagDataFromUInt(root(), "", 1, 1));
     EXPECT_EQ(before, model_of(root_));
 }
 
@@ -124,7 +125,8 @@ TEST_F(Paths, TagsMadeBeforeABadPlaceStay)
 {
     for (const char* path : {"N/", "N//", "N//M"}) {
         const Tree lone = make_tag("R");
-        EXPECT_EQ(0x90020004u, SetXMLSubTagDataFromStr(lone.get(), path, "1", 1)) << path;
+        EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLSubTagDataFromStr(lone.get(), path, "1", 1))
+            << path;
         ASSERT_EQ(1u, GetXMLSubTagCount(lone.get())) << path;
         EXPECT_EQ(nullptr, GetXMLSubTagData(lone.get(), "N")) << path;
     }
@@ -136,7 +138,7 @@ TEST_F(Paths, SettingByPathReportsShortMemory)
         const Tree lone = make_tag("R");
         if (lone) {
             const kz_status status = SetXMLSubTagDataFromStr(lone.get(), "A/B", "1", 1);
-            EXPECT_EQ(fired() ? 0x90020001u : 0u, status);
+            EXPECT_EQ(fired() ? KZ_XML_ERROR_MEMORY : 0u, status);
         }
     });
 }

@@ -127,12 +127,12 @@ TEST_F(TagTree, NameAndDataCanBeReplaced)
 TEST_F(TagTree, AnEmptyNameIsRefusedAndTheOldOneStays)
 {
     const Tree tag = make_tag("A");
-    EXPECT_EQ(0x90020004u, SetXMLTagNameFromStr(tag.get(), ""));
-    EXPECT_EQ(0x90020004u, SetXMLTagNameFromStr(tag.get(), nullptr));
-    EXPECT_EQ(0x90020004u, SetXMLTagNameFromBuf(tag.get(), "B", 0));
-    EXPECT_EQ(0x90020004u, SetXMLTagNameFromBuf(tag.get(), "\0B", 2));
-    EXPECT_EQ(0x90020004u, SetXMLTagNameFromStr(nullptr, "B"));
-    EXPECT_EQ(0x90020004u, SetXMLTagDataFromStr(nullptr, "B"));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagNameFromStr(tag.get(), ""));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagNameFromStr(tag.get(), nullptr));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagNameFromBuf(tag.get(), "B", 0));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagNameFromBuf(tag.get(), "\0B", 2));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagNameFromStr(nullptr, "B"));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, SetXMLTagDataFromStr(nullptr, "B"));
     EXPECT_STREQ("A", GetXMLTagName(tag.get()));
     EXPECT_EQ(nullptr, GetXMLTagName(nullptr));
     EXPECT_EQ(nullptr, GetXMLTagData(nullptr));
@@ -162,7 +162,7 @@ TEST_F(TagTree, AFailedSetLeavesNoOldDataAndNoOldName)
         const kz_status name = SetXMLTagNameFromStr(tag.get(), "B");
         EXPECT_EQ(optional_text(name == KZ_OK ? "B" : nullptr),
                   optional_text(GetXMLTagName(tag.get())));
-        EXPECT_EQ(fired(), data == 0x90020001u || name == 0x90020001u);
+        EXPECT_EQ(fired(), data == KZ_XML_ERROR_MEMORY || name == KZ_XML_ERROR_MEMORY);
     });
 }
 
@@ -383,7 +383,7 @@ TEST_F(TagTree, WithMemoryOffNothingIsMade)
     EXPECT_EQ(nullptr, CreateXMLTagFromStr("A", nullptr));
     EXPECT_EQ(nullptr, CloneXMLTag(root.get(), 1));
     EXPECT_EQ(nullptr, RenderXMLTagToStr(root.get(), 0));
-    EXPECT_EQ(0x90020001u, SetXMLTagAttrFromStr(root.get(), "a", "1"));
+    EXPECT_EQ(KZ_XML_ERROR_MEMORY, SetXMLTagAttrFromStr(root.get(), "a", "1"));
     ASSERT_EQ(KZ_OK, kzmem_initialize(0, 0));
 }
 
@@ -467,8 +467,8 @@ TEST_F(TagTree, CopyingNeedsTwoTags)
 {
     const Tree tag = example();
     const ModelTag before = model_of(tag);
-    EXPECT_EQ(0x90020004u, CopyXMLTag(tag.get(), nullptr));
-    EXPECT_EQ(0x90020004u, CopyXMLTag(nullptr, tag.get()));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, CopyXMLTag(tag.get(), nullptr));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, CopyXMLTag(nullptr, tag.get()));
     EXPECT_EQ(before, model_of(tag));
 }
 
@@ -534,7 +534,7 @@ TEST_F(TagTree, AFailedCopyLeavesAHalfCopiedTag)
     for (; nth < stages.size(); ++nth) {
         const Tree destination(CloneXMLTag(original.get(), 1));
         AllocationFault fault(nth + 1);
-        EXPECT_EQ(0x90020001u, CopyXMLTag(destination.get(), source.get())) << nth;
+        EXPECT_EQ(KZ_XML_ERROR_MEMORY, CopyXMLTag(destination.get(), source.get())) << nth;
         EXPECT_EQ(stages[nth], model_of(destination)) << nth;
     }
     const Tree destination(CloneXMLTag(original.get(), 1));
@@ -553,7 +553,7 @@ TEST_F(TagTree, AnAttributeWithoutANameStopsACopy)
     source->attributes->next->name = nullptr;
     const Tree destination = make_tag("D");
     add(destination, "OLD");
-    EXPECT_EQ(0x90020004u, CopyXMLTag(destination.get(), source.get()));
+    EXPECT_EQ(KZ_XML_ERROR_INVALID_ARGUMENT, CopyXMLTag(destination.get(), source.get()));
     EXPECT_STREQ("S", GetXMLTagName(destination.get()));
     EXPECT_EQ(1u, GetXMLTagAttrCount(destination.get()));
     EXPECT_EQ(1u, GetXMLNamedSubTagCount(destination.get(), "OLD"));
@@ -568,7 +568,7 @@ TEST_F(TagTree, CopyingLeaksNothingWhenMemoryIsShort)
         const Tree destination(CloneXMLTag(original.get(), 1));
         if (destination) {
             const kz_status status = CopyXMLTag(destination.get(), source.get());
-            EXPECT_EQ(fired() ? 0x90020001u : 0u, status);
+            EXPECT_EQ(fired() ? KZ_XML_ERROR_MEMORY : 0u, status);
         }
     });
     for_every_failed_allocation([&](auto fired) { // from below: the old sub-tags hold the source
@@ -576,7 +576,7 @@ TEST_F(TagTree, CopyingLeaksNothingWhenMemoryIsShort)
         if (destination) {
             const XMLTag* below = GetXMLSubTagFromStr(destination.get(), "B");
             const kz_status status = CopyXMLTag(destination.get(), below);
-            EXPECT_EQ(fired() ? 0x90020001u : 0u, status);
+            EXPECT_EQ(fired() ? KZ_XML_ERROR_MEMORY : 0u, status);
         }
     });
 }

@@ -2,6 +2,7 @@
 
 #include "kzfp.hpp"
 
+#include <cstdio>
 #include <filesystem>
 
 #include <sys/stat.h>
@@ -9,6 +10,8 @@
 
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
+
+#include "kzsdk/abs/status.h"
 
 namespace {
 
@@ -31,6 +34,13 @@ void expect_failure(const std::string& path, const std::string& what)
     EXPECT_EQ(1, result.status);
     EXPECT_EQ("", result.out);
     EXPECT_EQ(path + ": " + what + "\n", result.err);
+}
+
+std::string hexadecimal(kz_status status)
+{
+    char text[16];
+    std::snprintf(text, sizeof text, "0x%08X", static_cast<unsigned>(status));
+    return text;
 }
 
 // ---- Mounted discs
@@ -160,7 +170,8 @@ TEST(KzfpDisc, RefusesWhatIsNoDisc)
     expect_failure(directory.write("empty", ""), what);
     expect_failure(directory.write("noise", std::string(100'000, 'x')), what);
     expect_failure(kImages + "far.udf", what);
-    expect_failure(directory.path("missing"), "cannot be opened (status 0x90060048)");
+    expect_failure(directory.path("missing"),
+                   "cannot be opened (status " + hexadecimal(KZ_DISC_ERROR_NOT_FOUND) + ")");
 }
 
 // ---- The command line
