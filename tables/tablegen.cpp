@@ -165,7 +165,7 @@ void write_rows(std::ostream& out, uint32_t hertz, uint32_t up, uint32_t down,
     write_array(out, "int32_t", "taps", taps);
     write_array(out, "int16_t", "high_parts", high_parts);
     write_array(out, "int32_t", "high_sums", high_sums);
-    out << "} // namespace hertz_" << hertz << "\n\nconst kz::dsp::PhaseRows kz::dsp::rows_"
+    out << "} // namespace hertz_" << hertz << "\n\nconst kz::kernels::PhaseRows kz::kernels::rows_"
         << hertz << " = {" << up << ", " << row_length << ", " << used << ", " << largest_high
         << ", hertz_" << hertz << "::row_of,\n    hertz_" << hertz << "::taps + " << kWidestVector
         << ", hertz_" << hertz << "::high_parts + " << kWidestVector << ", hertz_" << hertz
@@ -200,7 +200,7 @@ void write_filters(Source& out)
         designed << "    {" << rate.up << ", " << rate.down << ", " << taps.size() / rate.up
                  << ", hertz_" << rate.hertz << "::phases},\n";
     }
-    out.text << "const kz::dsp::DesignedFilter kz::dsp::designed_filters[] = {\n"
+    out.text << "const kz::kernels::DesignedFilter kz::kernels::designed_filters[] = {\n"
              << designed.str() << "};\n\n";
     const auto half_band = kz::tables::design_short_filter(kz::tables::kHalfBand);
     const auto quarter_band = kz::tables::design_short_filter(kz::tables::kQuarterBand);
@@ -208,8 +208,8 @@ void write_filters(Source& out)
     write_rows(out.text, 22050, 1, 2, to_q31(half_band, 1.0));
     write_filter(out, 44100, to_q31(quarter_band, 1.0));
     write_rows(out.text, 44100, 1, 4, to_q31(quarter_band, 1.0));
-    write_array(out, "float", "kz::dsp::coefficients_2to1", half_band);
-    write_array(out, "float", "kz::dsp::coefficients_4to1", quarter_band);
+    write_array(out, "float", "kz::kernels::coefficients_2to1", half_band);
+    write_array(out, "float", "kz::kernels::coefficients_4to1", quarter_band);
 }
 
 // Stage s, of half-width h = 2^(s-1), multiplies by a factor of 30 fraction bits over 2^(s-2): so
@@ -219,7 +219,7 @@ std::vector<int32_t> dct_coefficients(uint32_t length)
     std::vector<int32_t> words(length, 0);
     for (uint32_t half_width = 1; half_width < length; half_width *= 2) {
         for (uint32_t j = 0; j < half_width; ++j) {
-            const double factor = kz::dsp::butterfly_factor(half_width, j);
+            const double factor = kz::kernels::butterfly_factor(half_width, j);
             words[half_width + j] = static_cast<int32_t>(factor * 0x1p31 / half_width);
         }
     }
@@ -229,7 +229,7 @@ std::vector<int32_t> dct_coefficients(uint32_t length)
 std::vector<float> dct_factors(uint32_t length)
 {
     std::vector<float> factors(length);
-    kz::dsp::fill_butterfly_factors(factors);
+    kz::kernels::fill_butterfly_factors(factors);
     return factors;
 }
 
@@ -247,8 +247,8 @@ int main(int argc, char** argv)
     prototypes << "// Written by tables/tablegen.cpp.\n\n#include \"kzsdk/dsp/resampler.h\"\n\n";
     Source out{tables, prototypes, {}};
     write_filters(out);
-    write_array(out, "int32_t", "kz::dsp::kDctCoefficients", dct_coefficients(32768));
-    write_array(out, "float", "kz::dsp::kDctFactors", dct_factors(32768));
+    write_array(out, "int32_t", "kz::kernels::kDctCoefficients", dct_coefficients(32768));
+    write_array(out, "float", "kz::kernels::kDctFactors", dct_factors(32768));
     tables.close();
     prototypes.close();
     if (!tables || !prototypes) {

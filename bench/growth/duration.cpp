@@ -38,9 +38,9 @@ size_t bytes_in(double seconds) { return static_cast<size_t>(seconds * kRate) * 
 /// One call, or as few as a call's 32-bit count of bytes allows.
 void feed(Fingerprint& fingerprint, const uint8_t* bytes, size_t size)
 {
-    constexpr size_t kMost = UINT32_MAX / kFrameBytes * kFrameBytes;
+    constexpr size_t kMax = UINT32_MAX / kFrameBytes * kFrameBytes;
     while (size > 0) {
-        const size_t piece = std::min(size, kMost);
+        const size_t piece = std::min(size, kMax);
         fingerprint.feed(bytes, piece);
         bytes += piece;
         size -= piece;

@@ -9,7 +9,7 @@ namespace kz::bench {
 GrowthTable grow_silence(bool thorough)
 {
     constexpr uint32_t kPiece = 10; // seconds
-    constexpr double kMostNanoseconds = 1.6;
+    constexpr double kMaxNanoseconds = 1.6;
     const auto silence = quiet_noise(size_t{kRate} * 2 * kPiece);
     std::vector<uint32_t> durations = {10, 60, 600};
     if (thorough) {
@@ -38,7 +38,7 @@ GrowthTable grow_silence(bool thorough)
         const double nanoseconds = time * 1e9 / (static_cast<double>(seconds) * kRate);
         table.rows.push_back({number(seconds) + " s", in_time(time), number(nanoseconds, 2),
                               number(static_cast<double>(heap)) + " bytes"});
-        table.holds = *table.holds && nanoseconds <= kMostNanoseconds && heap == first_heap;
+        table.holds = *table.holds && nanoseconds <= kMaxNanoseconds && heap == first_heap;
     }
     return table;
 }

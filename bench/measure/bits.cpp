@@ -9,7 +9,7 @@
 
 namespace kz::bench {
 
-std::string variant() { return dsp::kernels().name; }
+std::string variant() { return kernels::active().name; }
 
 namespace {
 

@@ -16,8 +16,8 @@ static_assert(sizeof(off_t) == 8, "build with _FILE_OFFSET_BITS=64");
 /// `read`, with a result that fits 32 bits.
 inline int32_t read_here(int descriptor, void* buffer, uint32_t count) noexcept
 {
-    constexpr uint32_t kMost = std::numeric_limits<int32_t>::max();
-    return static_cast<int32_t>(::read(descriptor, buffer, std::min(count, kMost)));
+    constexpr uint32_t kMax = std::numeric_limits<int32_t>::max();
+    return static_cast<int32_t>(::read(descriptor, buffer, std::min(count, kMax)));
 }
 
 /// Moves to the offset and reads there. -1 on failure, with `errno` set: to 0 when the move went

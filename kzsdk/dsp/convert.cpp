@@ -7,7 +7,7 @@
 
 namespace {
 
-using namespace kz::dsp;
+using namespace kz::kernels;
 using kz::fxp::shift_left;
 
 /// Divides a sum of samples by the smallest power of two not below the number of channels and
@@ -26,17 +26,17 @@ float as_it_is(float sum) noexcept { return sum; }
 
 void KZDSP_PCM16ToQ29(const void* input, FxpType* output, int32_t frame_count) noexcept
 {
-    kernels().words.pcm16_mono(input, output, frame_count, 14);
+    active().words.pcm16_mono(input, output, frame_count, 14);
 }
 
 void KZDSP_PCM16ToQ30(const void* input, FxpType* output, int32_t frame_count) noexcept
 {
-    kernels().words.pcm16_mono(input, output, frame_count, 15);
+    active().words.pcm16_mono(input, output, frame_count, 15);
 }
 
 void KZDSP_StereoPCM16ToMonoQ30(const void* input, FxpType* output, int32_t frame_count) noexcept
 {
-    kernels().words.pcm16_stereo(input, output, frame_count, 14);
+    active().words.pcm16_stereo(input, output, frame_count, 14);
 }
 
 void KZDSP_NChannelPCM16ToMonoQ30(int32_t channels, const void* input, FxpType* output,
@@ -47,17 +47,17 @@ void KZDSP_NChannelPCM16ToMonoQ30(int32_t channels, const void* input, FxpType* 
 
 void KZDSP_PCM8ToQ29(const void* input, FxpType* output, int32_t frame_count) noexcept
 {
-    kernels().words.pcm8_mono(input, output, frame_count, 22);
+    active().words.pcm8_mono(input, output, frame_count, 22);
 }
 
 void KZDSP_PCM8ToQ30(const void* input, FxpType* output, int32_t frame_count) noexcept
 {
-    kernels().words.pcm8_mono(input, output, frame_count, 23);
+    active().words.pcm8_mono(input, output, frame_count, 23);
 }
 
 void KZDSP_StereoPCM8ToMonoQ30(const void* input, FxpType* output, int32_t frame_count) noexcept
 {
-    kernels().words.pcm8_stereo(input, output, frame_count, 22);
+    active().words.pcm8_stereo(input, output, frame_count, 22);
 }
 
 void KZDSP_NChannelPCM8ToMonoQ30(int32_t channels, const void* input, FxpType* output,
@@ -100,12 +100,12 @@ void KZDSP_NChanneluLawToMonoQ30(int32_t channels, const void* input, FxpType* o
 
 void KZDSP_ShortToFloat(const void* input, float* output, int32_t frame_count) noexcept
 {
-    kernels().floats.pcm16_mono(input, output, frame_count, 0);
+    active().floats.pcm16_mono(input, output, frame_count, 0);
 }
 
 void KZDSP_StereoShortToMonoFloat(const void* input, float* output, int32_t frame_count) noexcept
 {
-    kernels().floats.pcm16_stereo(input, output, frame_count, 0);
+    active().floats.pcm16_stereo(input, output, frame_count, 0);
 }
 
 void KZDSP_NChannelShortToMonoFloat(int32_t channels, const void* input, float* output,
@@ -116,13 +116,13 @@ void KZDSP_NChannelShortToMonoFloat(int32_t channels, const void* input, float* 
 
 void KZDSP_Offset128ToFloat(const void* input, float* output, int32_t frame_count) noexcept
 {
-    kernels().floats.pcm8_mono(input, output, frame_count, 8);
+    active().floats.pcm8_mono(input, output, frame_count, 8);
 }
 
 void KZDSP_StereoOffset128ToMonoFloat(const void* input, float* output,
                                       int32_t frame_count) noexcept
 {
-    kernels().floats.pcm8_stereo(input, output, frame_count, 8);
+    active().floats.pcm8_stereo(input, output, frame_count, 8);
 }
 
 void KZDSP_NChannelOffset128ToMonoFloat(int32_t channels, const void* input, float* output,

@@ -4,7 +4,7 @@
 
 namespace {
 
-using kz::dsp::add_products;
+using kz::kernels::add_products;
 
 bool missing(const float* samples, uint32_t count) noexcept
 {

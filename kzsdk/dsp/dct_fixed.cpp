@@ -27,7 +27,7 @@ KZDSP_DCT_fixed* KZDSP_DCT_fixed_create(int32_t order) noexcept
     // The factors of a shorter transform are the first ones of a longer transform.
     *dct = {.order = order,
             .length = 1U << order,
-            .coefficients = kz::dsp::kDctCoefficients,
+            .coefficients = kz::kernels::kDctCoefficients,
             .owns_coefficients = 0};
     return dct.release();
 }
@@ -42,6 +42,6 @@ void KZDSP_DCT_fixed_compute(const KZDSP_DCT_fixed* dct, int32_t* data, int32_t 
     if (dct == nullptr || data == nullptr) {
         return;
     }
-    kz::dsp::kernels().dct_fixed(data, dct->coefficients, dct->order);
+    kz::kernels::active().dct_fixed(data, dct->coefficients, dct->order);
     data[0] = kz::fxp::smul_high(data[0], kDcScale);
 }

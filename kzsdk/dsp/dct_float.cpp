@@ -3,7 +3,6 @@
 
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/dsp/dct.h"
-#include "kzsdk/kernels/butterfly.hpp"
 #include "kzsdk/kernels/kernels.hpp"
 #include "kzsdk/kernels/tables.hpp"
 
@@ -34,15 +33,15 @@ KZDSP_DCT* KZDSP_CreateDCT(int32_t order) noexcept
     }
     dct->order = order;
     dct->length = 1U << order;
-    if (dct->length <= std::size(kz::dsp::kDctFactors)) {
-        dct->coefficients = kz::dsp::kDctFactors;
+    if (dct->length <= std::size(kz::kernels::kDctFactors)) {
+        dct->coefficients = kz::kernels::kDctFactors;
         return dct.release();
     }
     auto factors = kz::make_array<float>(dct->length);
     if (!factors) {
         return nullptr;
     }
-    kz::dsp::fill_butterfly_factors({factors.get(), dct->length});
+    kz::kernels::fill_dct_factors({factors.get(), dct->length});
     dct->coefficients = factors.release();
     dct->owns_coefficients = 1;
     return dct.release();
@@ -62,7 +61,7 @@ void KZDSP_ComputeDCT(const KZDSP_DCT* dct, float* data, int32_t normalise) noex
     if (dct == nullptr || data == nullptr) {
         return;
     }
-    kz::dsp::kernels().dct_float(data, dct->coefficients, dct->order);
+    kz::kernels::active().dct_float(data, dct->coefficients, dct->order);
     if (normalise != 0) {
         scale({data, dct->length}, 2.0F / static_cast<float>(dct->length));
     }

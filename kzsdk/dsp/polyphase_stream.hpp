@@ -241,14 +241,14 @@ BlockCounts resample_block(Resampler& r, std::span<const Sample> input, std::spa
 template <class Sample>
 class JoinedSamples {
 public:
-    static constexpr size_t kMostTaps = 96;
+    static constexpr size_t kMaxTaps = 96;
     static constexpr size_t kPadding = 8; // for sums that are made in whole vectors
 
-    /// @param taps  At most kMostTaps.
+    /// @param taps  At most kMaxTaps.
     JoinedSamples(std::span<const Sample> older, std::span<const Sample> newer,
                   size_t taps) noexcept
     {
-        assert(older.size() <= taps && taps <= kMostTaps);
+        assert(older.size() <= taps && taps <= kMaxTaps);
         auto* const end = std::copy(older.begin(), older.end(), samples_);
         std::fill_n(std::copy_n(newer.begin(), std::min(newer.size(), taps), end), kPadding, 0);
     }
@@ -256,7 +256,7 @@ public:
     const Sample* begin() const noexcept { return samples_; }
 
 private:
-    Sample samples_[2 * kMostTaps + kPadding];
+    Sample samples_[2 * kMaxTaps + kPadding];
 };
 
 } // namespace kz::dsp

@@ -13,7 +13,7 @@ constexpr Fraction kNone{0, 0};
 
 // Terms of at least 2 in magnitude double both parts: long before this many they leave the range
 // of int32_t.
-constexpr int kMostTerms = 64;
+constexpr int kMaxTerms = 64;
 
 // The convergents h / k of the continued fraction of x, whose terms are the nearest integers.
 Fraction nearest_convergent(double x, double tolerance) noexcept
@@ -21,7 +21,7 @@ Fraction nearest_convergent(double x, double tolerance) noexcept
     Fraction previous{0, 1};
     Fraction current{1, 0};
     double r = x;
-    for (int term = 0; term < kMostTerms; ++term) {
+    for (int term = 0; term < kMaxTerms; ++term) {
         const double a = kz_floor(r + 0.5);
         const Fraction next{a * current.numerator + previous.numerator,
                             a * current.denominator + previous.denominator};

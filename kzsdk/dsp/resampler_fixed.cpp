@@ -12,7 +12,7 @@ namespace {
 
 using namespace kz::fxp;
 
-struct Conversion {
+struct RatePair {
     uint32_t input_rate;
     uint32_t output_rate;
     uint32_t up;
@@ -20,46 +20,46 @@ struct Conversion {
     const int16_t* (*msb)() noexcept;
     const uint16_t* (*lsb)() noexcept;
     uint32_t (*length)() noexcept;
-    const kz::dsp::PhaseRows* rows;
+    const kz::kernels::PhaseRows* rows;
 };
 
-constexpr Conversion kCopy{1, 1, 1, 1, nullptr, nullptr, nullptr, nullptr};
+constexpr RatePair kCopy{1, 1, 1, 1, nullptr, nullptr, nullptr, nullptr};
 
-constexpr Conversion kConversions[] = {
+constexpr RatePair kRatePairs[] = {
     kCopy,
     {48000, 11025, 147, 640, kzdsp_get_48000_11025_fixed_coeff_msb,
      kzdsp_get_48000_11025_fixed_coeff_lsb, kzdsp_get_48000_11025_fixed_coeff_length,
-     &kz::dsp::rows_48000},
+     &kz::kernels::rows_48000},
     {44100, 11025, 1, 4, kzdsp_get_44100_11025_fixed_coeff_msb,
      kzdsp_get_44100_11025_fixed_coeff_lsb, kzdsp_get_44100_11025_fixed_coeff_length,
-     &kz::dsp::rows_44100},
+     &kz::kernels::rows_44100},
     {32000, 11025, 441, 1280, kzdsp_get_32000_11025_fixed_coeff_msb,
      kzdsp_get_32000_11025_fixed_coeff_lsb, kzdsp_get_32000_11025_fixed_coeff_length,
-     &kz::dsp::rows_32000},
+     &kz::kernels::rows_32000},
     {24000, 11025, 147, 320, kzdsp_get_24000_11025_fixed_coeff_msb,
      kzdsp_get_24000_11025_fixed_coeff_lsb, kzdsp_get_24000_11025_fixed_coeff_length,
-     &kz::dsp::rows_24000},
+     &kz::kernels::rows_24000},
     {22050, 11025, 1, 2, kzdsp_get_22050_11025_fixed_coeff_msb,
      kzdsp_get_22050_11025_fixed_coeff_lsb, kzdsp_get_22050_11025_fixed_coeff_length,
-     &kz::dsp::rows_22050},
+     &kz::kernels::rows_22050},
     {2, 1, 1, 2, kzdsp_get_22050_11025_fixed_coeff_msb, kzdsp_get_22050_11025_fixed_coeff_lsb,
-     kzdsp_get_22050_11025_fixed_coeff_length, &kz::dsp::rows_22050},
+     kzdsp_get_22050_11025_fixed_coeff_length, &kz::kernels::rows_22050},
     {16000, 11025, 441, 640, kzdsp_get_16000_11025_fixed_coeff_msb,
      kzdsp_get_16000_11025_fixed_coeff_lsb, kzdsp_get_16000_11025_fixed_coeff_length,
-     &kz::dsp::rows_16000},
+     &kz::kernels::rows_16000},
     {8000, 11025, 441, 320, kzdsp_get_8000_11025_fixed_coeff_msb,
      kzdsp_get_8000_11025_fixed_coeff_lsb, kzdsp_get_8000_11025_fixed_coeff_length,
-     &kz::dsp::rows_8000},
+     &kz::kernels::rows_8000},
 };
 
-const Conversion* find_conversion(uint32_t input_rate, uint32_t output_rate) noexcept
+const RatePair* find_rate_pair(uint32_t input_rate, uint32_t output_rate) noexcept
 {
     if (input_rate == 0 || output_rate == 0) {
         return nullptr;
     }
-    for (const Conversion& conversion : kConversions) {
-        if (conversion.input_rate == input_rate && conversion.output_rate == output_rate) {
-            return &conversion;
+    for (const RatePair& pair : kRatePairs) {
+        if (pair.input_rate == input_rate && pair.output_rate == output_rate) {
+            return &pair;
         }
     }
     return input_rate == output_rate ? &kCopy : nullptr;
@@ -95,22 +95,22 @@ int32_t dual_convolve(Samples newer, Samples older, const Taps& taps, int32_t sh
     return add_products(sum, older, taps, newer.size(), shift);
 }
 
-const kz::dsp::PhaseRows& rows_of(const KZDSP_resampler_fixed& r) noexcept
+const kz::kernels::PhaseRows& rows_of(const KZDSP_resampler_fixed& r) noexcept
 {
-    for (const Conversion& conversion : kConversions) {
-        if (conversion.up == r.up && conversion.down == r.down && conversion.rows != nullptr) {
-            return *conversion.rows;
+    for (const RatePair& pair : kRatePairs) {
+        if (pair.up == r.up && pair.down == r.down && pair.rows != nullptr) {
+            return *pair.rows;
         }
     }
-    return *kConversions[1].rows; // not reached: every resampler is made from the table
+    return *kRatePairs[1].rows; // not reached: every resampler is made from the table
 }
 
 // Windows that reach into the history: each product is exact.
-void make_across(const KZDSP_resampler_fixed& r, const kz::dsp::PhaseRows& rows, Samples older,
+void make_across(const KZDSP_resampler_fixed& r, const kz::kernels::PhaseRows& rows, Samples older,
                  Samples newer, uint32_t phase, std::span<int32_t> outputs) noexcept
 {
-    const auto& kernels = kz::dsp::kernels();
-    const auto convolve = r.up == 1 ? kernels.convolve_from_bit_32 : kernels.convolve_from_bit_31;
+    const auto& variant = kz::kernels::active();
+    const auto convolve = r.up == 1 ? variant.convolve_from_bit_32 : variant.convolve_from_bit_31;
     const kz::dsp::JoinedSamples<int32_t> joined(older, newer, r.taps_per_phase);
     const int32_t* window = joined.begin();
     for (int32_t& output : outputs) {
@@ -128,9 +128,9 @@ kz::dsp::BlockCounts resample(KZDSP_resampler_fixed& r, Samples input,
     if (kz::dsp::copies(r)) {
         return kz::dsp::copy_block(input, output);
     }
-    const kz::dsp::PhaseRows& rows = rows_of(r);
-    const auto& kernels = kz::dsp::kernels();
-    const auto run = r.up == 1 ? kernels.symmetric : kernels.polyphase;
+    const kz::kernels::PhaseRows& rows = rows_of(r);
+    const auto& variant = kz::kernels::active();
+    const auto run = r.up == 1 ? variant.symmetric : variant.polyphase;
     return kz::dsp::resample_block(
         r, input, output,
         [&](Samples older, Samples newer, uint32_t phase, std::span<int32_t> outputs) {
@@ -147,20 +147,20 @@ kz::dsp::BlockCounts resample(KZDSP_resampler_fixed& r, Samples input,
 KZDSP_resampler_fixed* KZDSP_resampler_fixed_create(uint32_t input_rate,
                                                     uint32_t output_rate) noexcept
 {
-    const Conversion* conversion = find_conversion(input_rate >> 15, output_rate >> 15);
-    if (conversion == nullptr) {
+    const RatePair* pair = find_rate_pair(input_rate >> 15, output_rate >> 15);
+    if (pair == nullptr) {
         return nullptr;
     }
     auto resampler = kz::make_record<KZDSP_resampler_fixed>();
     if (!resampler) {
         return nullptr;
     }
-    resampler->up = conversion->up;
-    resampler->down = conversion->down;
-    if (conversion->length != nullptr) {
-        resampler->length = conversion->length();
-        resampler->msb = conversion->msb();
-        resampler->lsb = conversion->lsb();
+    resampler->up = pair->up;
+    resampler->down = pair->down;
+    if (pair->length != nullptr) {
+        resampler->length = pair->length();
+        resampler->msb = pair->msb();
+        resampler->lsb = pair->lsb();
     }
     if (!kz::dsp::make_history(*resampler)) {
         return nullptr;

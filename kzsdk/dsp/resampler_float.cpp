@@ -37,9 +37,9 @@ bool use_stored(KZDSP_resampler& r, const float (&taps)[Length]) noexcept
     return true;
 }
 
-const kz::dsp::DesignedFilter* find_designed(const KZDSP_resampler& r) noexcept
+const kz::kernels::DesignedFilter* find_designed(const KZDSP_resampler& r) noexcept
 {
-    for (const kz::dsp::DesignedFilter& filter : kz::dsp::designed_filters) {
+    for (const kz::kernels::DesignedFilter& filter : kz::kernels::designed_filters) {
         if (filter.up == r.up && filter.down == r.down) {
             return &filter;
         }
@@ -48,7 +48,7 @@ const kz::dsp::DesignedFilter* find_designed(const KZDSP_resampler& r) noexcept
 }
 
 // Lays the taps of all phases together again: what design_windowed_sinc() would write.
-void copy_designed(const kz::dsp::DesignedFilter& filter, float* taps) noexcept
+void copy_designed(const kz::kernels::DesignedFilter& filter, float* taps) noexcept
 {
     const float* tap = filter.taps;
     for (uint32_t phase = 0; phase < filter.up; ++phase) {
@@ -75,7 +75,7 @@ bool design(KZDSP_resampler& r) noexcept
         return false;
     }
     r.length = static_cast<uint32_t>(layout.length);
-    if (const kz::dsp::DesignedFilter* filter = find_designed(r)) {
+    if (const kz::kernels::DesignedFilter* filter = find_designed(r)) {
         copy_designed(*filter, taps.get());
     } else {
         kz::dsp::design_windowed_sinc(layout, {taps.get(), r.length});
@@ -91,28 +91,28 @@ bool choose_filter(KZDSP_resampler& r) noexcept
         return true;
     }
     if (r.up == 1 && r.down == 4) {
-        return use_stored(r, kz::dsp::coefficients_4to1);
+        return use_stored(r, kz::kernels::coefficients_4to1);
     }
     if (r.up == 1 && r.down == 2) {
-        return use_stored(r, kz::dsp::coefficients_2to1);
+        return use_stored(r, kz::kernels::coefficients_2to1);
     }
     return design(r);
 }
 
 using Samples = std::span<const float>;
 
-// Shared tables serve better than the taps of the resampler, which are dealt out over all phases.
-kz::dsp::FloatPhases phases_of(const KZDSP_resampler& r) noexcept
+// Shared tables serve better than the taps of the resampler, which are interleaved phase by phase.
+kz::kernels::FloatPhases phases_of(const KZDSP_resampler& r) noexcept
 {
-    if (const kz::dsp::DesignedFilter* filter = find_designed(r)) {
+    if (const kz::kernels::DesignedFilter* filter = find_designed(r)) {
         return {filter->taps, filter->taps_per_phase, 1, r.taps_per_phase, r.up, r.down};
     }
     return {r.taps, 1, r.up, r.taps_per_phase, r.up, r.down};
 }
 
 // Windows that reach into the history and are too long to be joined.
-void make_across(const kz::dsp::FloatPhases& phases, Samples older, Samples newer, uint32_t phase,
-                 std::span<float> outputs) noexcept
+void make_across(const kz::kernels::FloatPhases& phases, Samples older, Samples newer,
+                 uint32_t phase, std::span<float> outputs) noexcept
 {
     size_t begin = 0; // of the window, in the history
     for (float& output : outputs) {
@@ -133,17 +133,17 @@ kz::dsp::BlockCounts resample(KZDSP_resampler& r, Samples input, std::span<float
     if (kz::dsp::copies(r)) {
         return kz::dsp::copy_block(input, output);
     }
-    const kz::dsp::FloatPhases phases = phases_of(r);
+    const kz::kernels::FloatPhases phases = phases_of(r);
     const auto make = [&](const float* oldest, uint32_t phase, std::span<float> outputs) {
-        kz::dsp::kernels().polyphase_floats(phases, oldest, phase, outputs.data(),
-                                            static_cast<uint32_t>(outputs.size()));
+        kz::kernels::active().polyphase_floats(phases, oldest, phase, outputs.data(),
+                                               static_cast<uint32_t>(outputs.size()));
     };
     // All sums run over the same products in the same order, so that a cut does not show.
     return kz::dsp::resample_block(
         r, input, output,
         [&](Samples older, Samples newer, uint32_t phase, std::span<float> outputs) {
             using Joined = kz::dsp::JoinedSamples<float>;
-            if (r.taps_per_phase > Joined::kMostTaps) {
+            if (r.taps_per_phase > Joined::kMaxTaps) {
                 return make_across(phases, older, newer, phase, outputs);
             }
             make(Joined(older, newer, r.taps_per_phase).begin(), phase, outputs);

@@ -1,7 +1,7 @@
 #include "kzsdk/kernels/fxp_ops.hpp"
 #include "kzsdk/kernels/plain.hpp"
 
-namespace kz::dsp::plain {
+namespace kz::kernels::plain {
 
 using namespace fxp;
 
@@ -22,4 +22,4 @@ uint64_t sum_squares(const int32_t* words, uint32_t count) noexcept
     return sum;
 }
 
-} // namespace kz::dsp::plain
+} // namespace kz::kernels::plain

@@ -21,8 +21,8 @@ void apply_ramp(int32_t* words, uint32_t count, int32_t gain, int32_t step) noex
     for (size_t k = 0; k < Simd::kLanes; ++k) {
         offsets[k] = lane(k, step);
     }
-    auto gains = Simd::add(Simd::all(gain), Simd::load(offsets));
-    const auto advance = Simd::all(lane(Simd::kLanes, step));
+    auto gains = Simd::add(Simd::set(gain), Simd::load(offsets));
+    const auto advance = Simd::set(lane(Simd::kLanes, step));
     const uint32_t left = count % Simd::kLanes;
     const uint32_t whole = count - left;
     for (size_t i = 0; i < whole; i += Simd::kLanes) {
@@ -30,7 +30,7 @@ void apply_ramp(int32_t* words, uint32_t count, int32_t gain, int32_t step) noex
         Simd::store(words + i, Simd::shift_left(product, 2));
         gains = Simd::add(gains, advance);
     }
-    kz::dsp::plain::apply_ramp(words + whole, left, Simd::first_lane(gains), step);
+    kz::kernels::plain::apply_ramp(words + whole, left, Simd::first_lane(gains), step);
 }
 
 template <class Simd>
@@ -42,7 +42,7 @@ uint64_t sum_squares(const int32_t* words, uint32_t count) noexcept
     for (size_t i = 0; i < whole; i += Simd::kLanes) {
         Simd::template add_shifted_squares<16>(sums, Simd::load(words + i));
     }
-    return Simd::sum_of_wide_lanes(sums) + kz::dsp::plain::sum_squares(words + whole, left);
+    return Simd::sum_of_wide_lanes(sums) + kz::kernels::plain::sum_squares(words + whole, left);
 }
 
 } // namespace

@@ -15,7 +15,7 @@
 
 #include "kzsdk/abs/mathfn.h"
 
-namespace kz::dsp {
+namespace kz::kernels {
 
 /// 1 / (2 cos((4j + 1) pi / (4h))), the factor of butterfly j in the stage of half-width h.
 inline float butterfly_factor(uint32_t half_width, uint32_t j) noexcept
@@ -102,4 +102,4 @@ void transform(std::span<T> x, int32_t order, RunStage run_stage, Add add) noexc
     add_recursively(x, order, add);
 }
 
-} // namespace kz::dsp
+} // namespace kz::kernels

@@ -1,7 +1,7 @@
 #include "kzsdk/kernels/mix.hpp"
 #include "kzsdk/kernels/plain.hpp"
 
-namespace kz::dsp::plain {
+namespace kz::kernels::plain {
 namespace {
 
 template <class Encoding, class Channels>
@@ -63,4 +63,4 @@ void pcm8_stereo(const void* input, float* output, int32_t frames, int32_t shift
     to_floats<Pcm8>(kStereo, input, output, frames, shift);
 }
 
-} // namespace kz::dsp::plain
+} // namespace kz::kernels::plain

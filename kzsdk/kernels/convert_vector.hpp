@@ -15,7 +15,7 @@ struct Pcm16Mono {
     static constexpr size_t kFrameBytes = 2;
     static auto load(const uint8_t* at) noexcept { return Simd::load_shorts(at); }
     template <class Word>
-    static constexpr kz::dsp::Converter<Word>* plain = kz::dsp::plain::pcm16_mono;
+    static constexpr kz::kernels::Converter<Word>* plain = kz::kernels::plain::pcm16_mono;
 };
 
 template <class Simd>
@@ -23,7 +23,7 @@ struct Pcm16Stereo {
     static constexpr size_t kFrameBytes = 4;
     static auto load(const uint8_t* at) noexcept { return Simd::load_short_pairs(at); }
     template <class Word>
-    static constexpr kz::dsp::Converter<Word>* plain = kz::dsp::plain::pcm16_stereo;
+    static constexpr kz::kernels::Converter<Word>* plain = kz::kernels::plain::pcm16_stereo;
 };
 
 template <class Simd>
@@ -31,7 +31,7 @@ struct Pcm8Mono {
     static constexpr size_t kFrameBytes = 1;
     static auto load(const uint8_t* at) noexcept { return Simd::load_bytes(at); }
     template <class Word>
-    static constexpr kz::dsp::Converter<Word>* plain = kz::dsp::plain::pcm8_mono;
+    static constexpr kz::kernels::Converter<Word>* plain = kz::kernels::plain::pcm8_mono;
 };
 
 template <class Simd>
@@ -39,7 +39,7 @@ struct Pcm8Stereo {
     static constexpr size_t kFrameBytes = 2;
     static auto load(const uint8_t* at) noexcept { return Simd::load_byte_pairs(at); }
     template <class Word>
-    static constexpr kz::dsp::Converter<Word>* plain = kz::dsp::plain::pcm8_stereo;
+    static constexpr kz::kernels::Converter<Word>* plain = kz::kernels::plain::pcm8_stereo;
 };
 
 template <class Simd>
@@ -69,7 +69,7 @@ void convert(const void* input, Word* output, int32_t frames, int32_t shift) noe
 }
 
 template <class Simd, class Word>
-constexpr kz::dsp::Converters<Word> converters() noexcept
+constexpr kz::kernels::Converters<Word> converters() noexcept
 {
     return {
         .pcm16_mono = convert<Simd, Pcm16Mono<Simd>, Word>,

@@ -14,7 +14,7 @@
 #include <cstddef>
 #include <cstdint>
 
-namespace kz::dsp {
+namespace kz::kernels {
 
 /// Makes one word of each frame of interleaved bytes: the sum of the channels, shifted left by
 /// 0 .. 31 bits. The number of frames counts as unsigned.
@@ -86,7 +86,7 @@ struct FloatPhases {
     uint32_t down;
 };
 
-struct Kernels {
+struct Variant {
     /// "plain", "sse41", "avx2" or "neon".
     const char* name;
 
@@ -135,9 +135,10 @@ struct Kernels {
                              float* output, uint32_t count) noexcept;
 
     /// Widens the extremes by samples. NaN is passed over.
-    void (*widen_words)(Extremes<int32_t>& extremes, const int32_t* samples,
-                        uint32_t count) noexcept;
-    void (*widen_floats)(Extremes<float>& extremes, const float* samples, uint32_t count) noexcept;
+    void (*track_word_extremes)(Extremes<int32_t>& extremes, const int32_t* samples,
+                                uint32_t count) noexcept;
+    void (*track_float_extremes)(Extremes<float>& extremes, const float* samples,
+                                 uint32_t count) noexcept;
 
     /// Writes the level of each sample.
     void (*word_levels)(const WordLevels& rule, const int32_t* samples, uint8_t* levels,
@@ -159,19 +160,19 @@ float add_products(float sum, const float* newest, const float* taps, size_t cou
                    size_t stride) noexcept;
 
 /// The variant that all of the library uses.
-const Kernels& kernels() noexcept;
+const Variant& active() noexcept;
 
 /// The variants of this build that this processor can run, the plain one first, the best one last.
-struct RunnableKernels {
-    std::array<const Kernels*, 3> tables{};
+struct RunnableVariants {
+    std::array<const Variant*, 3> tables{};
     size_t count = 0;
 
-    const Kernels* const* begin() const noexcept { return tables.data(); }
-    const Kernels* const* end() const noexcept { return tables.data() + count; }
+    const Variant* const* begin() const noexcept { return tables.data(); }
+    const Variant* const* end() const noexcept { return tables.data() + count; }
 };
 
-RunnableKernels runnable_kernels() noexcept;
+RunnableVariants runnable_variants() noexcept;
 
-extern const Kernels kPlainKernels;
+extern const Variant kPlainVariant;
 
-} // namespace kz::dsp
+} // namespace kz::kernels

@@ -4,11 +4,12 @@
 #include "kzsdk/kernels/fxp_ops.hpp"
 #include "kzsdk/kernels/plain.hpp"
 
-namespace kz::dsp::plain {
+namespace kz::kernels::plain {
 
 using namespace fxp;
 
-void widen_words(Extremes<int32_t>& extremes, const int32_t* samples, uint32_t count) noexcept
+void track_word_extremes(Extremes<int32_t>& extremes, const int32_t* samples,
+                         uint32_t count) noexcept
 {
     for (uint32_t i = 0; i < count; ++i) {
         extremes.low = std::min(extremes.low, samples[i]);
@@ -16,7 +17,7 @@ void widen_words(Extremes<int32_t>& extremes, const int32_t* samples, uint32_t c
     }
 }
 
-void widen_floats(Extremes<float>& extremes, const float* samples, uint32_t count) noexcept
+void track_float_extremes(Extremes<float>& extremes, const float* samples, uint32_t count) noexcept
 {
     for (uint32_t i = 0; i < count; ++i) {
         extremes.low = samples[i] < extremes.low ? samples[i] : extremes.low;
@@ -43,4 +44,4 @@ void float_levels(const FloatLevels& rule, const float* samples, uint8_t* levels
     }
 }
 
-} // namespace kz::dsp::plain
+} // namespace kz::kernels::plain

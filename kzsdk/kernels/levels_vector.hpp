@@ -13,27 +13,27 @@
 namespace {
 
 template <class Simd, class Sample>
-uint32_t widen_vectors(kz::dsp::Extremes<Sample>& extremes, const Sample* samples,
-                       uint32_t count) noexcept
+uint32_t track_extremes(kz::kernels::Extremes<Sample>& extremes, const Sample* samples,
+                        uint32_t count) noexcept
 {
     constexpr size_t kStep = 2 * Simd::kLanes;
     const uint32_t whole = count - static_cast<uint32_t>(count % kStep);
-    auto low = Simd::all(extremes.low);
+    auto low = Simd::set(extremes.low);
     auto low2 = low;
-    auto high = Simd::all(extremes.high);
+    auto high = Simd::set(extremes.high);
     auto high2 = high;
     for (size_t i = 0; i < whole; i += kStep) {
         const auto a = Simd::load(samples + i);
         const auto b = Simd::load(samples + i + Simd::kLanes);
-        low = Simd::smaller(a, low);
-        low2 = Simd::smaller(b, low2);
-        high = Simd::larger(a, high);
-        high2 = Simd::larger(b, high2);
+        low = Simd::min(a, low);
+        low2 = Simd::min(b, low2);
+        high = Simd::max(a, high);
+        high2 = Simd::max(b, high2);
     }
     Sample lows[Simd::kLanes];
     Sample highs[Simd::kLanes];
-    Simd::store(lows, Simd::smaller(low, low2));
-    Simd::store(highs, Simd::larger(high, high2));
+    Simd::store(lows, Simd::min(low, low2));
+    Simd::store(highs, Simd::max(high, high2));
     for (size_t k = 0; k < Simd::kLanes; ++k) {
         extremes.low = lows[k] < extremes.low ? lows[k] : extremes.low;
         extremes.high = highs[k] > extremes.high ? highs[k] : extremes.high;
@@ -42,18 +42,19 @@ uint32_t widen_vectors(kz::dsp::Extremes<Sample>& extremes, const Sample* sample
 }
 
 template <class Simd>
-void widen_words(kz::dsp::Extremes<int32_t>& extremes, const int32_t* samples,
-                 uint32_t count) noexcept
+void track_word_extremes(kz::kernels::Extremes<int32_t>& extremes, const int32_t* samples,
+                         uint32_t count) noexcept
 {
-    const uint32_t done = widen_vectors<Simd>(extremes, samples, count);
-    kz::dsp::plain::widen_words(extremes, samples + done, count - done);
+    const uint32_t done = track_extremes<Simd>(extremes, samples, count);
+    kz::kernels::plain::track_word_extremes(extremes, samples + done, count - done);
 }
 
 template <class Simd>
-void widen_floats(kz::dsp::Extremes<float>& extremes, const float* samples, uint32_t count) noexcept
+void track_float_extremes(kz::kernels::Extremes<float>& extremes, const float* samples,
+                          uint32_t count) noexcept
 {
-    const uint32_t done = widen_vectors<Simd>(extremes, samples, count);
-    kz::dsp::plain::widen_floats(extremes, samples + done, count - done);
+    const uint32_t done = track_extremes<Simd>(extremes, samples, count);
+    kz::kernels::plain::track_float_extremes(extremes, samples + done, count - done);
 }
 
 /// Writes the bytes of whole groups of four vectors; level_of(index) gives a vector's levels.
@@ -72,33 +73,33 @@ uint32_t write_levels(uint8_t* levels, uint32_t count, LevelOf level_of) noexcep
 // Where neither factor is negative, the product's upper half is truncated and rounded down alike;
 // where one is, both give a level that is raised to 0.
 template <class Simd>
-void word_levels(const kz::dsp::WordLevels& rule, const int32_t* samples, uint8_t* levels,
+void word_levels(const kz::kernels::WordLevels& rule, const int32_t* samples, uint8_t* levels,
                  uint32_t count) noexcept
 {
-    const auto bottom = Simd::all(rule.bottom);
-    const auto scale = Simd::all(rule.scale);
-    const auto top = Simd::all(rule.top);
+    const auto bottom = Simd::set(rule.bottom);
+    const auto scale = Simd::set(rule.scale);
+    const auto top = Simd::set(rule.top);
     const uint32_t done = write_levels<Simd>(levels, count, [&](size_t i) noexcept {
         const auto halved = Simd::template shift_right<1>(Simd::load(samples + i));
         const auto scaled = Simd::template product_bits<32>(Simd::sub(halved, bottom), scale);
-        const auto level = Simd::smaller(Simd::shift_right(scaled, rule.shift), top);
-        return Simd::larger(level, Simd::all(0));
+        const auto level = Simd::min(Simd::shift_right(scaled, rule.shift), top);
+        return Simd::max(level, Simd::set(0));
     });
-    kz::dsp::plain::word_levels(rule, samples + done, levels + done, count - done);
+    kz::kernels::plain::word_levels(rule, samples + done, levels + done, count - done);
 }
 
 template <class Simd>
-void float_levels(const kz::dsp::FloatLevels& rule, const float* samples, uint8_t* levels,
+void float_levels(const kz::kernels::FloatLevels& rule, const float* samples, uint8_t* levels,
                   uint32_t count) noexcept
 {
-    const auto bottom = Simd::all(rule.bottom);
-    const auto scale = Simd::all(rule.scale);
-    const auto top = Simd::all(rule.top);
+    const auto bottom = Simd::set(rule.bottom);
+    const auto scale = Simd::set(rule.scale);
+    const auto top = Simd::set(rule.top);
     const uint32_t done = write_levels<Simd>(levels, count, [&](size_t i) noexcept {
         const auto scaled = Simd::mul(Simd::sub(Simd::load(samples + i), bottom), scale);
-        return Simd::larger(Simd::smaller(Simd::truncated(scaled), top), Simd::all(0));
+        return Simd::max(Simd::min(Simd::truncated(scaled), top), Simd::set(0));
     });
-    kz::dsp::plain::float_levels(rule, samples + done, levels + done, count - done);
+    kz::kernels::plain::float_levels(rule, samples + done, levels + done, count - done);
 }
 
 } // namespace

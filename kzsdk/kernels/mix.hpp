@@ -13,7 +13,7 @@
 #include "kzsdk/kernels/fxp_ops.hpp"
 #include "kzsdk/kernels/g711.hpp"
 
-namespace kz::dsp {
+namespace kz::kernels {
 
 struct Pcm16 {
     static constexpr size_t kBytes = 2;
@@ -95,4 +95,4 @@ inline auto shifted_by(int32_t count) noexcept
     return [count](int32_t sum) noexcept { return fxp::shift_left(sum, count); };
 }
 
-} // namespace kz::dsp
+} // namespace kz::kernels

@@ -1,6 +1,6 @@
 #include "kzsdk/kernels/plain.hpp"
 
-namespace kz::dsp {
+namespace kz::kernels {
 
 namespace {
 
@@ -14,7 +14,7 @@ constexpr Converters<Word> kPlainConverters = {
 
 } // namespace
 
-const Kernels kPlainKernels = {
+const Variant kPlainVariant = {
     .name = "plain",
     .dct_fixed = plain::dct_fixed,
     .dct_float = plain::dct_float,
@@ -28,12 +28,12 @@ const Kernels kPlainKernels = {
     .convolve_from_bit_31 = plain::convolve_from_bit_31,
     .convolve_from_bit_32 = plain::convolve_from_bit_32,
     .polyphase_floats = plain::polyphase_floats,
-    .widen_words = plain::widen_words,
-    .widen_floats = plain::widen_floats,
+    .track_word_extremes = plain::track_word_extremes,
+    .track_float_extremes = plain::track_float_extremes,
     .word_levels = plain::word_levels,
     .float_levels = plain::float_levels,
     .apply_ramp = plain::apply_ramp,
     .sum_squares = plain::sum_squares,
 };
 
-} // namespace kz::dsp
+} // namespace kz::kernels

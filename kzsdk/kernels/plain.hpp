@@ -7,7 +7,7 @@
 
 #include "kzsdk/kernels/kernels.hpp"
 
-namespace kz::dsp::plain {
+namespace kz::kernels::plain {
 
 void dct_fixed(int32_t* x, const int32_t* factors, int32_t order) noexcept;
 void dct_float(float* x, const float* factors, int32_t order) noexcept;
@@ -35,8 +35,9 @@ int32_t convolve_from_bit_32(const int32_t* samples, const int32_t* row, uint32_
 void polyphase_floats(const FloatPhases& phases, const float* oldest, uint32_t phase, float* output,
                       uint32_t count) noexcept;
 
-void widen_words(Extremes<int32_t>& extremes, const int32_t* samples, uint32_t count) noexcept;
-void widen_floats(Extremes<float>& extremes, const float* samples, uint32_t count) noexcept;
+void track_word_extremes(Extremes<int32_t>& extremes, const int32_t* samples,
+                         uint32_t count) noexcept;
+void track_float_extremes(Extremes<float>& extremes, const float* samples, uint32_t count) noexcept;
 void word_levels(const WordLevels& rule, const int32_t* samples, uint8_t* levels,
                  uint32_t count) noexcept;
 void float_levels(const FloatLevels& rule, const float* samples, uint8_t* levels,
@@ -44,4 +45,4 @@ void float_levels(const FloatLevels& rule, const float* samples, uint8_t* levels
 void apply_ramp(int32_t* words, uint32_t count, int32_t gain, int32_t step) noexcept;
 uint64_t sum_squares(const int32_t* words, uint32_t count) noexcept;
 
-} // namespace kz::dsp::plain
+} // namespace kz::kernels::plain

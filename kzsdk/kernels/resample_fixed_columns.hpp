@@ -25,17 +25,18 @@ class PolyphaseColumns {
 public:
     static constexpr uint32_t kColumns = kVectors * kLanes;
 
-    PolyphaseColumns(const kz::dsp::PhaseRows& rows, const kz::dsp::Windows& windows) noexcept
+    PolyphaseColumns(const kz::kernels::PhaseRows& rows,
+                     const kz::kernels::Windows& windows) noexcept
         : rows_(rows), windows_(windows)
     {
     }
 
     /// Whether it pays: most lanes are in use, and the rows have room.
-    static bool suits(const kz::dsp::PhaseRows& rows, const kz::dsp::Windows& windows,
+    static bool suits(const kz::kernels::PhaseRows& rows, const kz::kernels::Windows& windows,
                       uint32_t count) noexcept
     {
         return count > uint64_t{rows.up} * (kColumns * 5 / 8) &&
-               uint64_t{windows.down} + rows.used <= kMostRows - 2;
+               uint64_t{windows.down} + rows.used <= kMaxRows - 2;
     }
 
     /// Makes up to kColumns * up outputs.
@@ -55,7 +56,7 @@ public:
     }
 
 private:
-    static constexpr size_t kMostRows = 372;
+    static constexpr size_t kMaxRows = 372;
 
     struct Row {
         int32_t lanes[kColumns];
@@ -65,22 +66,22 @@ private:
     int32_t lay_out(size_t samples) noexcept
     {
         const size_t length = windows_.down + rows_.used + 2;
-        Ints highest = Simd::all(0);
-        Ints lowest = Simd::all(0);
+        Ints highest = Simd::set(0);
+        Ints lowest = Simd::set(0);
         for (size_t v = 0; v < kVectors; ++v) {
             for (size_t i = 0; i < length; i += kLanes) {
                 Ints block[kLanes];
                 load_block(v * kLanes, i, samples, block);
                 for (const Ints samples_of_row : block) {
-                    highest = Simd::larger(highest, samples_of_row);
-                    lowest = Simd::smaller(lowest, samples_of_row);
+                    highest = Simd::max(highest, samples_of_row);
+                    lowest = Simd::min(lowest, samples_of_row);
                 }
                 Simd::transpose(block);
                 store_block(v * kLanes, i, block);
             }
         }
-        const Ints loudest = Simd::larger(highest, Simd::exclusive_or(lowest, Simd::all(-1)));
-        return Simd::largest_lane(loudest) >> 16;
+        const Ints loudest = Simd::max(highest, Simd::bit_xor(lowest, Simd::set(-1)));
+        return Simd::max_of_lanes(loudest) >> 16;
     }
 
     // Samples i .. of as many columns, each column in a vector; zeros beyond the last sample.
@@ -96,7 +97,7 @@ private:
         for (size_t j = 0; j < kLanes; ++j) {
             const size_t at = (column + j) * windows_.down + i;
             if (at >= samples) {
-                block[j] = Simd::all(0);
+                block[j] = Simd::set(0);
             } else if (at + kLanes <= samples) {
                 block[j] = Simd::load(windows_.oldest + at);
             } else {
@@ -113,15 +114,13 @@ private:
     void store_block(size_t column, size_t i, const Ints (&block)[kLanes]) noexcept
     {
         for (size_t k = 0; k < kLanes; ++k) {
-            Simd::store(flipped_[i + k].lanes + column,
-                        Simd::exclusive_or(block[k], Simd::all(0x8000)));
+            Simd::store(flipped_[i + k].lanes + column, Simd::bit_xor(block[k], Simd::set(0x8000)));
         }
         for (size_t k = 0; k < kLanes; k += 2) {
             const Ints low =
-                Simd::bits_and(Simd::template shift_right<15>(block[k]), Simd::all(0xfffe));
-            const Ints high =
-                Simd::bits_and(Simd::shift_left(block[k + 1], 1), Simd::all(-0x20000));
-            Simd::store(highs_[(i + k) / 2].lanes + column, Simd::exclusive_or(low, high));
+                Simd::bit_and(Simd::template shift_right<15>(block[k]), Simd::set(0xfffe));
+            const Ints high = Simd::bit_and(Simd::shift_left(block[k + 1], 1), Simd::set(-0x20000));
+            Simd::store(highs_[(i + k) / 2].lanes + column, Simd::bit_xor(low, high));
         }
     }
 
@@ -139,7 +138,7 @@ private:
                 if (i >= width) {
                     // NOLINTNEXTLINE(modernize-loop-convert): GCC makes better code of the index
                     for (size_t v = 0; v < kVectors; ++v) {
-                        sums[v][i] = Simd::all(0);
+                        sums[v][i] = Simd::set(0);
                     }
                     continue;
                 }
@@ -171,12 +170,12 @@ private:
         const Row* highs = highs_ + (window - odd) / 2;
         Ints sums[kVectors];
         for (Ints& sum : sums) {
-            sum = Simd::all(rows_.high_sums[row]);
+            sum = Simd::set(rows_.high_sums[row]);
         }
         for (size_t pairs = rows_.used / 2 + 1; pairs != 0; --pairs) {
-            const Ints tap0 = Simd::all(taps[0]);
-            const Ints tap1 = Simd::all(taps[1]);
-            const Ints parts = Simd::all_pairs(high_parts);
+            const Ints tap0 = Simd::set(taps[0]);
+            const Ints tap1 = Simd::set(taps[1]);
+            const Ints parts = Simd::set_pairs(high_parts);
             for (size_t v = 0; v < kVectors; ++v) {
                 add_products(sums[v], samples, *highs, v * kLanes, tap0, tap1, parts);
             }
@@ -221,11 +220,11 @@ private:
         }
     }
 
-    const kz::dsp::PhaseRows& rows_;
-    const kz::dsp::Windows windows_;
+    const kz::kernels::PhaseRows& rows_;
+    const kz::kernels::Windows windows_;
     uint32_t count_ = 0;
-    alignas(32) Row flipped_[kMostRows + kLanes];
-    alignas(32) Row highs_[(kMostRows + kLanes) / 2];
+    alignas(32) Row flipped_[kMaxRows + kLanes];
+    alignas(32) Row highs_[(kMaxRows + kLanes) / 2];
 };
 
 } // namespace

@@ -40,7 +40,7 @@ namespace {
 template <class Simd, int Shift>
 int32_t convolve(const int32_t* samples, const int32_t* row, uint32_t count) noexcept
 {
-    auto sums = Simd::all(0);
+    auto sums = Simd::set(0);
     for (size_t k = 0; k < count; k += Simd::kLanes) {
         const auto taps = Simd::swap_halves(Simd::load(row + k));
         Simd::template add_product_bits<Shift>(sums, Simd::load(samples + k), taps);
@@ -51,31 +51,31 @@ int32_t convolve(const int32_t* samples, const int32_t* row, uint32_t count) noe
 /// Samples of a block, as the multiplier takes them.
 template <class Simd>
 struct SplitSamples {
-    static constexpr size_t kMost = 4096 + 128;
+    static constexpr size_t kMaxSamples = 4096 + 128;
     static constexpr size_t kPadding = 16; // read for the zeros at the end of a row
 
-    int32_t flipped[kMost + kPadding];       ///< with the top bit of the low half flipped
-    int16_t doubled_highs[kMost + kPadding]; ///< valid when the high halves have 15 bits
+    int32_t flipped[kMaxSamples + kPadding];       ///< with the top bit of the low half flipped
+    int16_t doubled_highs[kMaxSamples + kPadding]; ///< valid when the high halves have 15 bits
 
     /// @return The largest high half, or the largest complement of a negative one.
     int32_t split(const int32_t* samples, size_t count) noexcept
     {
         constexpr size_t kStep = 2 * Simd::kLanes;
-        const auto flip = Simd::all(kFlip);
-        const auto even = Simd::all(-2);
-        auto loudest = Simd::all(0);
+        const auto flip = Simd::set(kFlip);
+        const auto even = Simd::set(-2);
+        auto loudest = Simd::set(0);
         size_t i = 0;
         for (; i + kStep <= count; i += kStep) {
             const auto a = Simd::load(samples + i);
             const auto b = Simd::load(samples + i + Simd::kLanes);
-            Simd::store(flipped + i, Simd::exclusive_or(a, flip));
-            Simd::store(flipped + i + Simd::kLanes, Simd::exclusive_or(b, flip));
+            Simd::store(flipped + i, Simd::bit_xor(a, flip));
+            Simd::store(flipped + i + Simd::kLanes, Simd::bit_xor(b, flip));
             Simd::store_narrow(doubled_highs + i,
-                               Simd::bits_and(Simd::template shift_right<15>(a), even),
-                               Simd::bits_and(Simd::template shift_right<15>(b), even));
-            loudest = Simd::larger(loudest, Simd::larger(magnitude(a), magnitude(b)));
+                               Simd::bit_and(Simd::template shift_right<15>(a), even),
+                               Simd::bit_and(Simd::template shift_right<15>(b), even));
+            loudest = Simd::max(loudest, Simd::max(magnitude(a), magnitude(b)));
         }
-        int32_t loudest_left = Simd::largest_lane(loudest);
+        int32_t loudest_left = Simd::max_of_lanes(loudest);
         for (; i < count; ++i) {
             const int32_t sample = samples[i];
             flipped[i] = sample ^ kFlip;
@@ -95,7 +95,7 @@ private:
 
     static typename Simd::Ints magnitude(typename Simd::Ints v) noexcept
     {
-        return Simd::exclusive_or(v, Simd::template shift_right<31>(v));
+        return Simd::bit_xor(v, Simd::template shift_right<31>(v));
     }
 };
 
@@ -115,10 +115,10 @@ class Polyphase {
     };
 
 public:
-    static void run(const kz::dsp::PhaseRows& rows, const kz::dsp::Windows& windows,
+    static void run(const kz::kernels::PhaseRows& rows, const kz::kernels::Windows& windows,
                     int32_t* output, uint32_t count) noexcept
     {
-        kz::dsp::Windows place = windows;
+        kz::kernels::Windows place = windows;
         while (count != 0) {
             uint32_t made = run_columns_of(rows, place, output, count);
             if (made == 0) {
@@ -135,8 +135,8 @@ public:
 private:
     // 0 if that would not pay, or not give the same words. Not inlined, so that both kinds of
     // scratch are never on the stack together.
-    [[gnu::noinline]] static uint32_t run_columns_of(const kz::dsp::PhaseRows& rows,
-                                                     const kz::dsp::Windows& windows,
+    [[gnu::noinline]] static uint32_t run_columns_of(const kz::kernels::PhaseRows& rows,
+                                                     const kz::kernels::Windows& windows,
                                                      int32_t* output, uint32_t count) noexcept
     {
         return PolyphaseColumns<Simd>::suits(rows, windows, count)
@@ -144,7 +144,7 @@ private:
                    : 0;
     }
 
-    Polyphase(const kz::dsp::PhaseRows& rows, const kz::dsp::Windows& windows) noexcept
+    Polyphase(const kz::kernels::PhaseRows& rows, const kz::kernels::Windows& windows) noexcept
         : rows_(rows), taps_(windows.taps), whole_step_(windows.down / rows.up),
           phase_step_(windows.down % rows.up), down_(windows.down), phase_(windows.phase),
           oldest_(windows.oldest)
@@ -154,7 +154,7 @@ private:
     // As many outputs as the split samples can serve.
     [[gnu::noinline]] uint32_t run_block(int32_t* output, uint32_t count) noexcept
     {
-        const uint64_t room = Samples::kMost - taps_;
+        const uint64_t room = Samples::kMaxSamples - taps_;
         const uint64_t fitting = ((room + 1) * rows_.up - 1 - phase_) / down_ + 1;
         const auto made = fitting < count ? static_cast<uint32_t>(fitting) : count;
         const uint64_t last = phase_ + uint64_t{made - 1} * down_;
@@ -201,9 +201,9 @@ private:
     template <uint32_t Down>
     void run_quick(Place first, int32_t* output, uint32_t count) noexcept
     {
-        constexpr uint32_t kMostColumns = Down == 640 ? 7 : 4;
+        constexpr uint32_t kMaxColumns = Down == 640 ? 7 : 4;
         const uint32_t columns = (count + rows_.up - 1) / rows_.up;
-        const uint32_t passes = (columns + kMostColumns - 1) / kMostColumns;
+        const uint32_t passes = (columns + kMaxColumns - 1) / kMaxColumns;
         for (uint32_t pass = 0, done = 0; pass < passes; ++pass) {
             const uint32_t width = (columns - done + passes - pass - 1) / (passes - pass);
             const uint32_t left = count - done * rows_.up; // outputs of this and later columns
@@ -211,10 +211,10 @@ private:
             const uint32_t in_all = left < most ? left - (width - 1) * rows_.up : rows_.up;
             Place place = first;
             place.window += size_t{done} * down_;
-            run_columns<Down, kMostColumns>(width, place, output + size_t{done} * rows_.up, 0,
-                                            in_all);
-            run_columns<Down, kMostColumns>(width - 1, place, output + size_t{done} * rows_.up,
-                                            in_all, rows_.up);
+            run_columns<Down, kMaxColumns>(width, place, output + size_t{done} * rows_.up, 0,
+                                           in_all);
+            run_columns<Down, kMaxColumns>(width - 1, place, output + size_t{done} * rows_.up,
+                                           in_all, rows_.up);
             done += width;
         }
     }
@@ -248,7 +248,7 @@ private:
         const int16_t* doubled = samples_.doubled_highs + place.window;
         Ints sums[Width];
         for (Ints& sum : sums) {
-            sum = Simd::all(0);
+            sum = Simd::set(0);
         }
         size_t k = 0;
         for (; k + 2 * kLanes <= length; k += 2 * kLanes) {
@@ -308,14 +308,14 @@ private:
     {
         const int32_t* row = rows_.taps + size_t{place.row} * rows_.row_length;
         const int32_t* flipped = samples_.flipped + place.window;
-        const Ints high_mask = Simd::all(-0x10000);
-        Ints sum = Simd::all(0);
+        const Ints high_mask = Simd::set(-0x10000);
+        Ints sum = Simd::set(0);
         for (size_t k = 0; k < rows_.used; k += kLanes) {
             const Ints taps = Simd::load(row + k);
             const Ints samples = Simd::load(flipped + k);
             const Ints raised = Simd::shift_left(taps, 16); // m 2^16
             const Ints top_bits = Simd::template shift_right<31>(taps);
-            const Ints correction = Simd::bits_and(Simd::bits_and(samples, high_mask), top_bits);
+            const Ints correction = Simd::bit_and(Simd::bit_and(samples, high_mask), top_bits);
             const Ints cross = Simd::add(Simd::add(Simd::pair_products(samples, taps), correction),
                                          Simd::template shift_right<1>(raised));
             const Ints high = Simd::mul(Simd::template shift_right<16>(samples),
@@ -330,7 +330,7 @@ private:
         return static_cast<int32_t>(static_cast<uint32_t>(a) + static_cast<uint32_t>(b));
     }
 
-    const kz::dsp::PhaseRows& rows_;
+    const kz::kernels::PhaseRows& rows_;
     const uint32_t taps_;
     const uint32_t whole_step_;
     const uint32_t phase_step_;

@@ -6,7 +6,7 @@
 /// - Outputs one period of the phases apart have the same taps and windows `down` samples apart.
 ///   With that many outputs to make, the block is cut into columns of `down` samples, which are
 ///   laid side by side once; then a tap serves all lanes.
-/// - Outputs of a decimator all have the same taps. Its samples are dealt out to `down` streams, in
+/// - Outputs of a decimator all have the same taps. Its samples are deinterleaved into `down` streams, in
 ///   which neighbouring outputs have neighbours.
 /// - Else neighbouring outputs share one, and samples and taps are both transposed.
 ///
@@ -24,7 +24,7 @@ namespace {
 /// Walks from output to output.
 class PhaseWalk {
 public:
-    PhaseWalk(const kz::dsp::FloatPhases& phases, uint32_t phase) noexcept
+    PhaseWalk(const kz::kernels::FloatPhases& phases, uint32_t phase) noexcept
         : phases_(phases), whole_step_(phases.down / phases.up),
           phase_step_(phases.down % phases.up), phase_(phase)
     {
@@ -51,7 +51,7 @@ public:
     }
 
 private:
-    const kz::dsp::FloatPhases& phases_;
+    const kz::kernels::FloatPhases& phases_;
     const uint32_t whole_step_;
     const uint32_t phase_step_;
     uint32_t phase_;
@@ -76,7 +76,7 @@ public:
     static constexpr size_t kWidth = kLanes * Vectors;
     static constexpr size_t kSteps = 8192 / kWidth; // samples of a column at a time
 
-    Columns(const kz::dsp::FloatPhases& phases, const float* samples, size_t count) noexcept
+    Columns(const kz::kernels::FloatPhases& phases, const float* samples, size_t count) noexcept
         : phases_(phases), last_tap_(phases.taps_per_phase - 1), samples_(samples), count_(count)
     {
     }
@@ -154,7 +154,7 @@ private:
             return Simd::load(samples_ + at);
         }
         if (at >= count_) {
-            return Simd::all(0.0F);
+            return Simd::set(0.0F);
         }
         float lanes[kLanes] = {};
         for (size_t j = 0; at + j < count_; ++j) {
@@ -172,7 +172,7 @@ private:
 #pragma GCC unroll 8
         for (size_t r = 0; r < Count; ++r) {
             for (Floats& sum : sums[r]) {
-                sum = Simd::all(0.0F);
+                sum = Simd::set(0.0F);
             }
             add_up<1>(&sums[r], rows + r, rows[r].newest, shared_from);
         }
@@ -180,7 +180,7 @@ private:
 #pragma GCC unroll 8
         for (size_t r = 0; r < Count; ++r) {
             add_up<1>(&sums[r], rows + r, shared_to - 1, rows[r].newest - last_tap_ - 1);
-            deal_out(sums[r], output + r, outputs - static_cast<uint32_t>(r));
+            scatter(sums[r], output + r, outputs - static_cast<uint32_t>(r));
         }
     }
 
@@ -203,7 +203,7 @@ private:
             const float* samples = columns_ + step * kWidth;
 #pragma GCC unroll 8
             for (size_t r = 0; r < Count; ++r) {
-                const Floats tap = Simd::all(taps[r][tap_at]);
+                const Floats tap = Simd::set(taps[r][tap_at]);
                 for (size_t v = 0; v < Vectors; ++v) {
                     const Floats sample = Simd::load(samples + v * kLanes);
                     sums[r][v] = Simd::add(sums[r][v], Simd::mul(sample, tap));
@@ -213,7 +213,7 @@ private:
     }
 
     // Every lane to its column, up to the end of the outputs.
-    void deal_out(const Floats (&sums)[Vectors], float* output, uint32_t outputs) const noexcept
+    void scatter(const Floats (&sums)[Vectors], float* output, uint32_t outputs) const noexcept
     {
         float lanes[kWidth];
         for (size_t v = 0; v < Vectors; ++v) {
@@ -224,7 +224,7 @@ private:
         }
     }
 
-    const kz::dsp::FloatPhases& phases_;
+    const kz::kernels::FloatPhases& phases_;
     const size_t last_tap_;
     const float* samples_;
     const size_t count_;
@@ -234,7 +234,7 @@ private:
 
 // As many outputs at a time as fill the columns.
 template <class Simd, size_t Vectors>
-[[gnu::noinline]] void run_columns(const kz::dsp::FloatPhases& phases, const float* samples,
+[[gnu::noinline]] void run_columns(const kz::kernels::FloatPhases& phases, const float* samples,
                                    size_t samples_left, uint32_t phase, float* output,
                                    uint32_t count) noexcept
 {
@@ -261,11 +261,11 @@ class FloatDecimator {
 
     static constexpr size_t kLanes = Simd::kLanes;
     static constexpr size_t kVectors = 4; // that share a tap
-    static constexpr uint32_t kMostOutputs = 512;
+    static constexpr uint32_t kMaxOutputs = 512;
     static constexpr uint32_t kTaps = 21 * Down;
 
 public:
-    static bool suits(const kz::dsp::FloatPhases& phases) noexcept
+    static bool suits(const kz::kernels::FloatPhases& phases) noexcept
     {
         return phases.up == 1 && phases.down == Down && phases.taps_per_phase == kTaps;
     }
@@ -275,8 +275,8 @@ public:
     {
         FloatDecimator decimator;
         while (count != 0) {
-            const uint32_t made = count < kMostOutputs ? count : kMostOutputs;
-            decimator.deal_out(samples, size_t{made - 1} * Down + kTaps);
+            const uint32_t made = count < kMaxOutputs ? count : kMaxOutputs;
+            decimator.deinterleave(samples, size_t{made - 1} * Down + kTaps);
             decimator.make(taps, output, made);
             samples += size_t{made} * Down;
             output += made;
@@ -288,7 +288,7 @@ private:
     FloatDecimator() noexcept = default; // the streams are written before they are read
 
     // Sample i goes to stream i mod Down; zeros follow.
-    void deal_out(const float* samples, size_t count) noexcept
+    void deinterleave(const float* samples, size_t count) noexcept
     {
         constexpr size_t kStep = Down * kLanes;
         size_t i = 0;
@@ -337,11 +337,11 @@ private:
     {
         Floats sums[Vectors];
         for (Floats& sum : sums) {
-            sum = Simd::all(0.0F);
+            sum = Simd::set(0.0F);
         }
         for (size_t at = kTaps / Down; at-- != 0;) {
             for (size_t stream = Down; stream-- != 0;) {
-                const Floats tap = Simd::all(*taps++);
+                const Floats tap = Simd::set(*taps++);
                 const float* samples = streams_[stream] + at + first;
                 for (size_t v = 0; v < Vectors; ++v) {
                     sums[v] = Simd::add(sums[v], Simd::mul(Simd::load(samples + v * kLanes), tap));
@@ -353,7 +353,7 @@ private:
         }
     }
 
-    float streams_[Down][kMostOutputs + 21 + (kVectors + 1) * kLanes];
+    float streams_[Down][kMaxOutputs + 21 + (kVectors + 1) * kLanes];
 };
 
 // ---- neighbouring outputs
@@ -365,12 +365,12 @@ class FloatNeighbours {
     static constexpr size_t kLanes = Simd::kLanes;
 
 public:
-    static bool suits(const kz::dsp::FloatPhases& phases) noexcept
+    static bool suits(const kz::kernels::FloatPhases& phases) noexcept
     {
         return phases.tap_stride == 1 && phases.taps_per_phase >= kLanes;
     }
 
-    [[gnu::noinline]] static void run(const kz::dsp::FloatPhases& phases, const float* oldest,
+    [[gnu::noinline]] static void run(const kz::kernels::FloatPhases& phases, const float* oldest,
                                       uint32_t phase, float* output, uint32_t count) noexcept
     {
         PhaseWalk walk(phases, phase);
@@ -404,7 +404,7 @@ private:
 
     static Floats add_up(const Lane (&lanes)[kLanes], size_t count) noexcept
     {
-        Floats sum = Simd::all(0.0F);
+        Floats sum = Simd::set(0.0F);
         size_t k = 0;
         for (; k + kLanes <= count; k += kLanes) {
             add_products(sum, lanes, count - kLanes - k, k, kLanes);
@@ -440,7 +440,7 @@ private:
 };
 
 template <class Simd>
-void polyphase_floats(const kz::dsp::FloatPhases& phases, const float* oldest, uint32_t phase,
+void polyphase_floats(const kz::kernels::FloatPhases& phases, const float* oldest, uint32_t phase,
                       float* output, uint32_t count) noexcept
 {
     if (count == 0) {
@@ -456,7 +456,7 @@ void polyphase_floats(const kz::dsp::FloatPhases& phases, const float* oldest, u
         return FloatNeighbours<Simd>::run(phases, oldest, phase, output, count);
     }
     if (phases.taps_per_phase > Columns<Simd, 2>::kSteps) {
-        return kz::dsp::plain::polyphase_floats(phases, oldest, phase, output, count);
+        return kz::kernels::plain::polyphase_floats(phases, oldest, phase, output, count);
     }
     const uint64_t last = (phase + uint64_t{count - 1} * phases.down) / phases.up;
     const auto samples = static_cast<size_t>(last) + phases.taps_per_phase;

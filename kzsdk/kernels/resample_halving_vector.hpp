@@ -13,7 +13,7 @@
 /// The centre tap is 2^31 / Down, a power of two: its product is a shift.
 ///
 /// Samples that follow each other in a window are `down` apart in the sums of neighbouring outputs:
-/// so the block is dealt out to `down` streams, in which neighbouring outputs have neighbours.
+/// so the block is deinterleaved into `down` streams, in which neighbouring outputs have neighbours.
 #pragma once
 
 #include <cstddef>
@@ -29,10 +29,10 @@ class Symmetric {
     using Ints = typename Simd::Ints;
 
     static constexpr size_t kLanes = Simd::kLanes;
-    static constexpr uint32_t kMostOutputs = 576;
+    static constexpr uint32_t kMaxOutputs = 576;
 
 public:
-    static void run(const kz::dsp::PhaseRows& rows, const kz::dsp::Windows& windows,
+    static void run(const kz::kernels::PhaseRows& rows, const kz::kernels::Windows& windows,
                     int32_t* output, uint32_t count) noexcept
     {
         if (windows.down == 2) {
@@ -57,7 +57,7 @@ private:
     template <uint32_t Down>
     class Filter {
     public:
-        explicit Filter(const kz::dsp::PhaseRows& rows) noexcept
+        explicit Filter(const kz::kernels::PhaseRows& rows) noexcept
         {
             size_t next = 0;
             for (uint32_t k = 1; k < kCentre; ++k) {
@@ -70,8 +70,8 @@ private:
         void run(const int32_t* input, int32_t* output, uint32_t count) noexcept
         {
             while (count != 0) {
-                const uint32_t made = count < kMostOutputs ? count : kMostOutputs;
-                const int32_t loudest = deal_out(input, size_t{made - 1} * Down + kWindow);
+                const uint32_t made = count < kMaxOutputs ? count : kMaxOutputs;
+                const int32_t loudest = deinterleave(input, size_t{made - 1} * Down + kWindow);
                 // The high half of a sum of two, or its complement, is at most this.
                 const int32_t high = (loudest >> 15) + 1;
                 if (high + largest_high_ < (1 << 15)) {
@@ -90,9 +90,9 @@ private:
         static constexpr int kCentreShift = Down == 2 ? 2 : 3;
         static constexpr size_t kWindow = 21 * Down;
         static constexpr size_t kPairs = 10 * (Down - 1);
-        static constexpr size_t kStream = kMostOutputs + 21 + kLanes;
+        static constexpr size_t kStream = kMaxOutputs + 21 + kLanes;
 
-        Tap make_tap(const kz::dsp::PhaseRows& rows, uint32_t k, uint32_t mirrored) noexcept
+        Tap make_tap(const kz::kernels::PhaseRows& rows, uint32_t k, uint32_t mirrored) noexcept
         {
             const int32_t word = rows.taps[k];
             const auto m = static_cast<int16_t>(word & 0xffff);
@@ -111,9 +111,9 @@ private:
         static constexpr size_t place(size_t i) noexcept { return i % Down * kStream + i / Down; }
 
         // @return The largest sample, or the largest complement of a negative one.
-        int32_t deal_out(const int32_t* input, size_t count) noexcept
+        int32_t deinterleave(const int32_t* input, size_t count) noexcept
         {
-            Ints loudest = Simd::all(0);
+            Ints loudest = Simd::set(0);
             constexpr size_t kStep = Down * kLanes;
             size_t i = 0;
             for (; i + kStep <= count; i += kStep) {
@@ -121,14 +121,14 @@ private:
                 for (size_t k = 0; k < Down; ++k) {
                     v[k] = Simd::load(input + i + k * kLanes);
                     const Ints sign = Simd::template shift_right<31>(v[k]);
-                    loudest = Simd::larger(loudest, Simd::exclusive_or(v[k], sign));
+                    loudest = Simd::max(loudest, Simd::bit_xor(v[k], sign));
                 }
                 separate(v);
                 for (size_t k = 0; k < Down; ++k) {
                     Simd::store(streams_ + place(i + k), v[k]);
                 }
             }
-            int32_t most = Simd::largest_lane(loudest);
+            int32_t most = Simd::max_of_lanes(loudest);
             for (; i < count; ++i) {
                 streams_[place(i)] = input[i];
                 const int32_t size = input[i] ^ (input[i] >> 31);
@@ -208,14 +208,14 @@ private:
         template <bool Quick>
         static void add_product(Ints& sum, Ints sample, const Tap& tap) noexcept
         {
-            const Ints flipped = Simd::exclusive_or(sample, Simd::all(0x8000));
+            const Ints flipped = Simd::bit_xor(sample, Simd::set(0x8000));
             Ints cross =
-                Simd::add(Simd::pair_products(flipped, Simd::all(tap.word)), Simd::all(tap.raised));
+                Simd::add(Simd::pair_products(flipped, Simd::set(tap.word)), Simd::set(tap.raised));
             if constexpr (!Quick) {
-                cross = Simd::add(cross, Simd::bits_and(sample, Simd::all(tap.correction)));
+                cross = Simd::add(cross, Simd::bit_and(sample, Simd::set(tap.correction)));
             }
             const Ints highs =
-                Simd::pair_products(flipped, Simd::all(Quick ? tap.high_part : tap.high));
+                Simd::pair_products(flipped, Simd::set(Quick ? tap.high_part : tap.high));
             sum = Simd::add(sum, Simd::add(highs, Simd::template shift_right<16>(cross)));
         }
 

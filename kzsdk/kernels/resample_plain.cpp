@@ -5,7 +5,7 @@
 #include "kzsdk/kernels/plain.hpp"
 #include "kzsdk/kernels/tables.hpp"
 
-namespace kz::dsp::plain {
+namespace kz::kernels::plain {
 namespace {
 
 using namespace fxp;
@@ -131,9 +131,9 @@ void polyphase_floats(const FloatPhases& phases, const float* oldest, uint32_t p
     }
 }
 
-} // namespace kz::dsp::plain
+} // namespace kz::kernels::plain
 
-namespace kz::dsp {
+namespace kz::kernels {
 
 float add_products(float sum, const float* newest, const float* taps, size_t count,
                    size_t stride) noexcept
@@ -144,4 +144,4 @@ float add_products(float sum, const float* newest, const float* taps, size_t cou
     return sum;
 }
 
-} // namespace kz::dsp
+} // namespace kz::kernels

@@ -4,13 +4,13 @@
 
 #include "kzsdk/kernels/variants.hpp"
 
-namespace kz::dsp {
+namespace kz::kernels {
 namespace {
 
-const Kernels* named(const RunnableKernels& runnable, const char* name) noexcept
+const Variant* named(const RunnableVariants& runnable, const char* name) noexcept
 {
     if (name != nullptr) {
-        for (const Kernels* table : runnable) {
+        for (const Variant* table : runnable) {
             if (std::string_view(table->name) == name) {
                 return table;
             }
@@ -19,10 +19,10 @@ const Kernels* named(const RunnableKernels& runnable, const char* name) noexcept
     return nullptr;
 }
 
-const Kernels& choose() noexcept
+const Variant& choose() noexcept
 {
-    const RunnableKernels runnable = runnable_kernels();
-    const Kernels* pinned = named(runnable, std::getenv("KZSDK_KERNELS"));
+    const RunnableVariants runnable = runnable_variants();
+    const Variant* pinned = named(runnable, std::getenv("KZSDK_KERNELS"));
 #if defined(KZ_KERNELS)
     pinned = pinned != nullptr ? pinned : named(runnable, KZ_KERNELS);
 #endif
@@ -31,11 +31,11 @@ const Kernels& choose() noexcept
 
 } // namespace
 
-const Kernels& kernels() noexcept
+const Variant& active() noexcept
 {
     // Threads that meet here first all choose the same, so it does not matter which one stores it.
-    static std::atomic<const Kernels*> chosen{nullptr};
-    const Kernels* table = chosen.load(std::memory_order_relaxed);
+    static std::atomic<const Variant*> chosen{nullptr};
+    const Variant* table = chosen.load(std::memory_order_relaxed);
     if (table == nullptr) {
         table = &choose();
         chosen.store(table, std::memory_order_relaxed);
@@ -43,23 +43,23 @@ const Kernels& kernels() noexcept
     return *table;
 }
 
-RunnableKernels runnable_kernels() noexcept
+RunnableVariants runnable_variants() noexcept
 {
-    RunnableKernels found;
-    const auto add = [&found](const Kernels& table) { found.tables[found.count++] = &table; };
-    add(kPlainKernels);
+    RunnableVariants found;
+    const auto add = [&found](const Variant& table) { found.tables[found.count++] = &table; };
+    add(kPlainVariant);
 #if defined(KZ_KERNELS_X86)
     __builtin_cpu_init();
     if (__builtin_cpu_supports("sse4.1") != 0) {
-        add(kSse41Kernels);
+        add(kSse41Variant);
     }
     if (__builtin_cpu_supports("avx2") != 0) {
-        add(kAvx2Kernels);
+        add(kAvx2Variant);
     }
 #elif defined(KZ_KERNELS_NEON)
-    add(kNeonKernels); // every processor of this architecture has it
+    add(kNeonVariant); // every processor of this architecture has it
 #endif
     return found;
 }
 
-} // namespace kz::dsp
+} // namespace kz::kernels

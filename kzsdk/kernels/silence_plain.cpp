@@ -2,7 +2,7 @@
 #include "kzsdk/kernels/fxp_ops.hpp"
 #include "kzsdk/kernels/plain.hpp"
 
-namespace kz::dsp::plain {
+namespace kz::kernels::plain {
 
 using namespace fxp;
 
@@ -43,4 +43,4 @@ uint32_t pass_quiet(MovingMeans& m, const int32_t* samples, uint32_t count) noex
     return count;
 }
 
-} // namespace kz::dsp::plain
+} // namespace kz::kernels::plain

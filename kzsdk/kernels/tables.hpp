@@ -3,16 +3,19 @@
 #pragma once
 
 #include <cstdint>
+#include <span>
 
-namespace kz::dsp {
+namespace kz::kernels {
 
 /// Butterfly factors of the 32768-point transform: entry h + j is 2^31 / h times
 /// butterfly_factor(h, j), truncated. The first half serves the 16384-point transform.
 extern const int32_t kDctCoefficients[32768];
 
-/// What fill_butterfly_factors() writes. The first 2^n serve the floating-point transform of as
-/// many points.
+/// What fill_dct_factors() writes. The first 2^n serve the floating-point transform of as many points.
 extern const float kDctFactors[32768];
+
+/// Writes the factors of the floating-point transform of `factors.size()` points, a power of two.
+void fill_dct_factors(std::span<float> factors) noexcept;
 
 /// Prototypes of the floating-point decimators; in Q31 they serve the fixed-point ones. The
 /// half-band filter has its centre tap, 0.5, at index 21; the quarter-band filter its own, 0.25, at
@@ -54,4 +57,4 @@ extern const PhaseRows rows_32000;
 extern const PhaseRows rows_44100;
 extern const PhaseRows rows_48000;
 
-} // namespace kz::dsp
+} // namespace kz::kernels

@@ -4,8 +4,9 @@
 #include "kzsdk/kernels/butterfly.hpp"
 #include "kzsdk/kernels/fxp_ops.hpp"
 #include "kzsdk/kernels/plain.hpp"
+#include "kzsdk/kernels/tables.hpp"
 
-namespace kz::dsp::plain {
+namespace kz::kernels::plain {
 namespace {
 
 using namespace fxp;
@@ -88,4 +89,10 @@ void dct_float(float* x, const float* factors, int32_t order) noexcept
         [](float a, float b) { return a + b; });
 }
 
-} // namespace kz::dsp::plain
+} // namespace kz::kernels::plain
+
+namespace kz::kernels {
+
+void fill_dct_factors(std::span<float> factors) noexcept { fill_butterfly_factors(factors); }
+
+} // namespace kz::kernels

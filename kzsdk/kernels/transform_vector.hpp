@@ -95,7 +95,7 @@ private:
             Lanes b = Simd::load(x + 2 * i + kLanes);
             Simd::deinterleave(a, b);
             Simd::store(x + i, a);
-            Simd::store(odd + kHalf - kLanes - i, Simd::reversed(b));
+            Simd::store(odd + kHalf - kLanes - i, Simd::reverse(b));
         }
     }
 
@@ -233,7 +233,7 @@ private:
         if constexpr (Stage > 0) {
             constexpr size_t kHalfWidth = size_t{1} << (Stage - 1);
             for (size_t j = 0; j < kHalfWidth; ++j) {
-                const Lanes factor = Simd::all(factors[kHalfWidth + j]);
+                const Lanes factor = Simd::set(factors[kHalfWidth + j]);
                 Butterflies::template run<Stage, First>(v[j], v[j + kHalfWidth], factor);
                 for (size_t i = j + 2 * kHalfWidth; i < kLanes; i += 2 * kHalfWidth) {
                     Butterflies::template run<Stage, false>(v[i], v[i + kHalfWidth], factor);

@@ -10,13 +10,13 @@
 #define KZ_KERNELS_NEON 1
 #endif
 
-namespace kz::dsp {
+namespace kz::kernels {
 
 #if defined(KZ_KERNELS_X86)
-extern const Kernels kSse41Kernels;
-extern const Kernels kAvx2Kernels;
+extern const Variant kSse41Variant;
+extern const Variant kAvx2Variant;
 #elif defined(KZ_KERNELS_NEON)
-extern const Kernels kNeonKernels;
+extern const Variant kNeonVariant;
 #endif
 
-} // namespace kz::dsp
+} // namespace kz::kernels

@@ -15,7 +15,7 @@
 
 namespace kz::qv {
 
-inline constexpr size_t kMostByteLevels = 256;
+inline constexpr size_t kMaxByteLevels = 256;
 
 template <class Value>
 class ByteLevels {
@@ -33,7 +33,7 @@ public:
     void count(std::span<uint32_t> histogram) const noexcept
     {
         // Equal levels in a row would wait for one another's counter: so there are four of each.
-        std::array<std::array<uint32_t, kMostByteLevels>, 4> counters{};
+        std::array<std::array<uint32_t, kMaxByteLevels>, 4> counters{};
         size_t i = 0;
         for (; i + kGroup <= frame_.size(); i += kGroup) {
             uint64_t group = load_group(i);

@@ -118,7 +118,7 @@ uint32_t drop_silence(typename Twin::Object& object, uint32_t produced) noexcept
 
 /// Stores what was produced and hands over the frame if it is full.
 template <class Twin>
-void store(typename Twin::Object& object, uint32_t produced) noexcept
+void commit_samples(typename Twin::Object& object, uint32_t produced) noexcept
 {
     RingPosition at{object.frame_start, object.write_position};
     const bool full = advance_writer(at, produced, object.frame_length);
@@ -158,7 +158,7 @@ kz_status feed(typename Twin::Object& object, std::span<const uint8_t> bytes) no
         if (object.searching_for_signal != 0) {
             produced = drop_silence<Twin>(object, produced);
         }
-        store<Twin>(object, produced);
+        commit_samples<Twin>(object, produced);
         if (Twin::reached_limit(object)) {
             return KZ_QV_FRAME_LIMIT_REACHED;
         }

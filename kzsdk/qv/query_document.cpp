@@ -32,14 +32,14 @@ struct FingerprintData {
     }
 };
 
-constexpr size_t kMostDigits = 5;
+constexpr size_t kMaxDigits = 5;
 
 // Writes a number in decimal.
 //
 // @return Behind its last digit.
 char* write_decimal(char* to, uint16_t value) noexcept
 {
-    char digits[kMostDigits];
+    char digits[kMaxDigits];
     size_t count = 0;
     uint32_t rest = value;
     do {
@@ -55,7 +55,7 @@ char* write_decimal(char* to, uint16_t value) noexcept
 // The values are declared signed and printed unsigned: -1 is written 65535.
 kz_status format_values(const FingerprintData& data, kz::owned<char[]>& out_text) noexcept
 {
-    auto text = kz::make_array<char>(uint64_t{data.count()} * (kMostDigits + 1) + 1);
+    auto text = kz::make_array<char>(uint64_t{data.count()} * (kMaxDigits + 1) + 1);
     if (!text) {
         return KZ_QV_ERROR_MEMORY;
     }

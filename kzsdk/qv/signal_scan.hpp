@@ -107,7 +107,7 @@ uint32_t pass_quiet(Detector& detector, std::span<const int32_t> levels) noexcep
     // beyond it, whatever the threshold.
     constexpr uint64_t kNegative = uint64_t{1} << 31;
     const uint64_t limit = (uint64_t{detector.threshold} + 1) * detector.window;
-    dsp::MovingMeans means{
+    kernels::MovingMeans means{
         .levels = detector.levels + detector.position,
         .deviations = detector.deviations + detector.position,
         .level_sum = detector.level_sum,
@@ -118,7 +118,7 @@ uint32_t pass_quiet(Detector& detector, std::span<const int32_t> levels) noexcep
     };
     const uint32_t room = detector.window - detector.position;
     const auto count = static_cast<uint32_t>(std::min<size_t>(levels.size(), room));
-    const uint32_t taken = dsp::kernels().pass_quiet(means, levels.data(), count);
+    const uint32_t taken = kernels::active().pass_quiet(means, levels.data(), count);
     detector.level_sum = means.level_sum;
     detector.deviation_sum = means.deviation_sum;
     detector.position = taken == room ? 0 : detector.position + taken;

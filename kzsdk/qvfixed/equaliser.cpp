@@ -20,12 +20,13 @@ using Pieces = kz::qv::FramePieces<FxpType>;
 constexpr int32_t kSilentRange = 8192;
 
 struct SampleExtremes {
-    kz::dsp::Extremes<int32_t> ends{std::numeric_limits<int32_t>::max(),
-                                    std::numeric_limits<int32_t>::min()};
+    kz::kernels::Extremes<int32_t> ends{std::numeric_limits<int32_t>::max(),
+                                        std::numeric_limits<int32_t>::min()};
 
     void take(Samples samples) noexcept
     {
-        kz::dsp::kernels().widen_words(ends, samples.data(), static_cast<uint32_t>(samples.size()));
+        kz::kernels::active().track_word_extremes(ends, samples.data(),
+                                                  static_cast<uint32_t>(samples.size()));
     }
 
     // Halved before they are subtracted, so that the difference fits.
@@ -59,8 +60,8 @@ public:
     // The same as bytes: there are at most 256 levels.
     void write_levels(Samples samples, uint8_t* levels) const noexcept
     {
-        kz::dsp::kernels().word_levels({bottom_, scale_, shift_, top_level_}, samples.data(),
-                                       levels, static_cast<uint32_t>(samples.size()));
+        kz::kernels::active().word_levels({bottom_, scale_, shift_, top_level_}, samples.data(),
+                                          levels, static_cast<uint32_t>(samples.size()));
     }
 
 private:
@@ -107,7 +108,7 @@ struct Equaliser {
         const Quantiser quantiser(extremes.bottom(), extremes.range(),
                                   static_cast<uint32_t>(histogram.size()));
         const std::span<FxpType> frame(output, pieces.older.size() + pieces.newer.size());
-        if (histogram.size() <= kz::qv::kMostByteLevels) {
+        if (histogram.size() <= kz::qv::kMaxByteLevels) {
             const kz::qv::ByteLevels<FxpType> levels(frame);
             quantiser.write_levels(pieces.older, levels.from(0));
             quantiser.write_levels(pieces.newer, levels.from(pieces.older.size()));

@@ -92,9 +92,9 @@ void correct_tilt(std::span<FxpType> spectrum) noexcept
         if (segment.first_bin > spectrum.size() || segment.end_bin > spectrum.size()) {
             continue;
         }
-        kz::dsp::kernels().apply_ramp(spectrum.data() + segment.first_bin,
-                                      segment.end_bin - segment.first_bin, segment.gain,
-                                      segment.step);
+        kz::kernels::active().apply_ramp(spectrum.data() + segment.first_bin,
+                                         segment.end_bin - segment.first_bin, segment.gain,
+                                         segment.step);
     }
 }
 
@@ -113,7 +113,7 @@ std::span<const FxpType> band_bins(const Manager& m, uint32_t band) noexcept
 int32_t band_energy(std::span<const FxpType> bins) noexcept
 {
     const uint64_t sum =
-        kz::dsp::kernels().sum_squares(bins.data(), static_cast<uint32_t>(bins.size()));
+        kz::kernels::active().sum_squares(bins.data(), static_cast<uint32_t>(bins.size()));
     return static_cast<int32_t>(static_cast<uint32_t>(sum >> 16));
 }
 

@@ -33,8 +33,8 @@ uint32_t kzqvfixed_signal_detector_get_signal_offset(kzqvfixed_signal_detector* 
     return kz::qv::signal_offset(*detector, std::span(samples, count),
                                  [bits](const FxpType* from, uint32_t number, int32_t* levels) {
                                      if (bits < 32) {
-                                         kz::dsp::kernels().shift_towards_zero(from, levels, number,
-                                                                               bits);
+                                         kz::kernels::active().shift_towards_zero(from, levels,
+                                                                                  number, bits);
                                      } else {
                                          std::fill_n(levels, number, 0);
                                      }

@@ -18,12 +18,12 @@ constexpr float kSilentRange = 1.0F;
 
 // The search starts beyond any sample of 16 bits, not at the ends of the type.
 struct SampleExtremes {
-    kz::dsp::Extremes<float> ends{1e6F, -1e6F};
+    kz::kernels::Extremes<float> ends{1e6F, -1e6F};
 
     void take(Samples samples) noexcept
     {
-        kz::dsp::kernels().widen_floats(ends, samples.data(),
-                                        static_cast<uint32_t>(samples.size()));
+        kz::kernels::active().track_float_extremes(ends, samples.data(),
+                                                   static_cast<uint32_t>(samples.size()));
     }
 
     float range() const noexcept { return ends.high - ends.low; }
@@ -49,9 +49,9 @@ public:
     // The same as bytes, of which there are at most 256.
     void write_levels(Samples samples, uint8_t* levels) const noexcept
     {
-        kz::dsp::kernels().float_levels({bottom_, scale_, static_cast<int32_t>(top_level_)},
-                                        samples.data(), levels,
-                                        static_cast<uint32_t>(samples.size()));
+        kz::kernels::active().float_levels({bottom_, scale_, static_cast<int32_t>(top_level_)},
+                                           samples.data(), levels,
+                                           static_cast<uint32_t>(samples.size()));
     }
 
 private:
@@ -104,7 +104,7 @@ struct Equaliser {
         const Quantiser quantiser(extremes, static_cast<uint32_t>(histogram.size()));
         const std::span<float> frame(output, pieces.older.size() + pieces.newer.size());
         const auto count = static_cast<float>(frame.size());
-        if (histogram.size() <= kz::qv::kMostByteLevels) {
+        if (histogram.size() <= kz::qv::kMaxByteLevels) {
             const kz::qv::ByteLevels<float> levels(frame);
             quantiser.write_levels(pieces.older, levels.from(0));
             quantiser.write_levels(pieces.newer, levels.from(pieces.older.size()));

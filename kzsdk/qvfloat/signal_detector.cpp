@@ -20,6 +20,6 @@ uint32_t QVSD_GetSignalOffset(QVSD* detector, const float* samples, uint32_t cou
     }
     return kz::qv::signal_offset(*detector, std::span(samples, count),
                                  [](const float* from, uint32_t number, int32_t* levels) {
-                                     kz::dsp::kernels().truncate(from, levels, number);
+                                     kz::kernels::active().truncate(from, levels, number);
                                  });
 }

@@ -11,19 +11,20 @@
 
 namespace kz::test {
 
-class KernelVariants : public MemoryOn, public testing::WithParamInterface<const dsp::Kernels*> {
+class KernelVariants : public MemoryOn,
+                       public testing::WithParamInterface<const kernels::Variant*> {
 protected:
-    static const dsp::Kernels& variant() { return *GetParam(); }
-    static const dsp::Kernels& plain() { return dsp::kPlainKernels; }
+    static const kernels::Variant& variant() { return *GetParam(); }
+    static const kernels::Variant& plain() { return kernels::kPlainVariant; }
 };
 
 inline auto all_kernel_variants()
 {
-    const dsp::RunnableKernels runnable = dsp::runnable_kernels();
+    const kernels::RunnableVariants runnable = kernels::runnable_variants();
     return testing::ValuesIn(runnable.begin(), runnable.end());
 }
 
-inline std::string kernel_variant_name(const testing::TestParamInfo<const dsp::Kernels*>& info)
+inline std::string kernel_variant_name(const testing::TestParamInfo<const kernels::Variant*>& info)
 {
     return info.param->name;
 }

@@ -29,7 +29,7 @@ constexpr const char* kDescription = "Tells what is on the optical disc that is 
                                      "title sets. Of a device or an image, it\n"
                                      "tells the volume labels.";
 
-constexpr int32_t kMostTitleSets = 99;
+constexpr int32_t kMaxTitleSets = 99;
 
 struct Request {
     std::string path;
@@ -170,7 +170,7 @@ void look_for_dvd(Content& content, const std::string& root)
         return;
     }
     look_for(content, root, manager);
-    for (int32_t set = 1; set <= kMostTitleSets; ++set) {
+    for (int32_t set = 1; set <= kMaxTitleSets; ++set) {
         const auto build = [set](const char* path, char* destination, uint32_t size) {
             kzdvdfs_get_vts_ifoname(path, set, destination, size);
         };

@@ -5,10 +5,10 @@
 #include "kzsdk/kernels/isa/avx2.hpp"
 #include "kzsdk/kernels/isa/vector_table.hpp"
 
-namespace kz::dsp {
+namespace kz::kernels {
 
-constinit const Kernels kAvx2Kernels = vector_kernels<Avx2>("avx2");
+constinit const Variant kAvx2Variant = vector_variant<Avx2>("avx2");
 
-} // namespace kz::dsp
+} // namespace kz::kernels
 
 #endif

@@ -25,13 +25,13 @@ struct Avx2 {
         _mm256_storeu_si256(reinterpret_cast<__m256i*>(to), v);
     }
     static void store(float* to, Floats v) noexcept { _mm256_storeu_ps(to, v); }
-    static Ints all(int32_t value) noexcept { return _mm256_set1_epi32(value); }
+    static Ints set(int32_t value) noexcept { return _mm256_set1_epi32(value); }
     /// Every lane holds the same two 16-bit numbers.
-    static Ints all_pairs(const int16_t* pair) noexcept
+    static Ints set_pairs(const int16_t* pair) noexcept
     {
         return _mm256_broadcastd_epi32(_mm_loadu_si32(pair));
     }
-    static Floats all(float value) noexcept { return _mm256_set1_ps(value); }
+    static Floats set(float value) noexcept { return _mm256_set1_ps(value); }
 
     static Ints load(const int16_t* from) noexcept
     {
@@ -46,7 +46,7 @@ struct Avx2 {
     }
 
     static Ints mul(Ints a, Ints b) noexcept { return _mm256_mullo_epi32(a, b); }
-    static Ints larger(Ints a, Ints b) noexcept { return _mm256_max_epi32(a, b); }
+    static Ints max(Ints a, Ints b) noexcept { return _mm256_max_epi32(a, b); }
 
     /// Adds, and keeps the compiler from regrouping a long sum, for which it would need more
     /// registers than there are.
@@ -93,7 +93,7 @@ struct Avx2 {
         _mm_storeu_si128(reinterpret_cast<__m128i*>(to),
                          _mm_add_epi32(sums, _mm_set1_epi32(offset)));
     }
-    static int32_t largest_lane(Ints v) noexcept
+    static int32_t max_of_lanes(Ints v) noexcept
     {
         __m128i most = _mm_max_epi32(_mm256_castsi256_si128(v), _mm256_extracti128_si256(v, 1));
         most = _mm_max_epi32(most, _mm_shuffle_epi32(most, 0b01001110));
@@ -140,12 +140,12 @@ struct Avx2 {
         return _mm256_srl_epi32(v, _mm_cvtsi32_si128(count));
     }
 
-    static Ints exclusive_or(Ints a, Ints b) noexcept { return _mm256_xor_si256(a, b); }
-    static Ints bits_and(Ints a, Ints b) noexcept { return _mm256_and_si256(a, b); }
-    static Ints smaller(Ints a, Ints b) noexcept { return _mm256_min_epi32(a, b); }
+    static Ints bit_xor(Ints a, Ints b) noexcept { return _mm256_xor_si256(a, b); }
+    static Ints bit_and(Ints a, Ints b) noexcept { return _mm256_and_si256(a, b); }
+    static Ints min(Ints a, Ints b) noexcept { return _mm256_min_epi32(a, b); }
 
     /// Magnitudes; -2^31 stays.
-    static Ints size_of(Ints v) noexcept { return _mm256_abs_epi32(v); }
+    static Ints abs(Ints v) noexcept { return _mm256_abs_epi32(v); }
 
     /// Whether any lane of `v`, as an unsigned number, is no less than that of `limit`.
     static bool any_reaches(Ints v, Ints limit) noexcept
@@ -154,14 +154,14 @@ struct Avx2 {
     }
 
     /// Lane k becomes the sum of lanes 0 to k.
-    static Ints running_sums(Ints v) noexcept
+    static Ints prefix_sums(Ints v) noexcept
     {
         v = _mm256_add_epi32(v, _mm256_slli_si256(v, 4));
         v = _mm256_add_epi32(v, _mm256_slli_si256(v, 8));
         const Ints fourth = _mm256_shuffle_epi32(v, 0b11111111);
         return _mm256_add_epi32(v, _mm256_permute2x128_si256(fourth, fourth, 0x08));
     }
-    static Ints last_lane_to_all(Ints v) noexcept
+    static Ints broadcast_last(Ints v) noexcept
     {
         return _mm256_permutevar8x32_epi32(v, _mm256_set1_epi32(7));
     }
@@ -174,14 +174,14 @@ struct Avx2 {
     /// all that does not fit: right for what is too low, mended for what is too high and for NaN.
     static Ints truncated(Floats v) noexcept
     {
-        const Ints too_high = _mm256_castps_si256(_mm256_cmp_ps(v, all(0x1p31F), _CMP_GE_OQ));
+        const Ints too_high = _mm256_castps_si256(_mm256_cmp_ps(v, set(0x1p31F), _CMP_GE_OQ));
         const Ints number = _mm256_castps_si256(_mm256_cmp_ps(v, v, _CMP_ORD_Q));
-        return bits_and(exclusive_or(_mm256_cvttps_epi32(v), too_high), number);
+        return bit_and(bit_xor(_mm256_cvttps_epi32(v), too_high), number);
     }
 
     /// a < b ? a : b, and a > b ? a : b: b where one is no number.
-    static Floats smaller(Floats a, Floats b) noexcept { return _mm256_min_ps(a, b); }
-    static Floats larger(Floats a, Floats b) noexcept { return _mm256_max_ps(a, b); }
+    static Floats min(Floats a, Floats b) noexcept { return _mm256_min_ps(a, b); }
+    static Floats max(Floats a, Floats b) noexcept { return _mm256_max_ps(a, b); }
 
     /// The lanes, each 0 .. 255, of four vectors as bytes.
     static void store_bytes(uint8_t* to, Ints a, Ints b, Ints c, Ints d) noexcept
@@ -195,13 +195,13 @@ struct Avx2 {
     /// Upper halves of the products, truncated towards zero: the products are of magnitudes.
     static Ints truncated_high_products(Ints a, Ints b) noexcept
     {
-        const Ints x = size_of(a);
-        const Ints y = size_of(b);
+        const Ints x = abs(a);
+        const Ints y = abs(b);
         const Ints even = _mm256_srli_epi64(_mm256_mul_epu32(x, y), 32);
         const Ints odd = _mm256_mul_epu32(odd_lanes(x), odd_lanes(y));
         const Ints high = _mm256_blend_epi32(even, odd, 0b10101010);
-        const Ints sign = shift_right<31>(exclusive_or(a, b));
-        return sub(exclusive_or(high, sign), sign);
+        const Ints sign = shift_right<31>(bit_xor(a, b));
+        return sub(bit_xor(high, sign), sign);
     }
 
     /// Sums of 64 bits.
@@ -262,13 +262,13 @@ struct Avx2 {
     }
 
     /// Lanes in the opposite order.
-    static Ints reversed(Ints v) noexcept
+    static Ints reverse(Ints v) noexcept
     {
         return _mm256_permutevar8x32_epi32(v, _mm256_setr_epi32(7, 6, 5, 4, 3, 2, 1, 0));
     }
-    static Floats reversed(Floats v) noexcept
+    static Floats reverse(Floats v) noexcept
     {
-        return _mm256_castsi256_ps(reversed(_mm256_castps_si256(v)));
+        return _mm256_castsi256_ps(reverse(_mm256_castps_si256(v)));
     }
 
     /// Separates the lanes of even and odd index of the 16 that `a` and `b` hold.

@@ -5,10 +5,10 @@
 #include "kzsdk/kernels/isa/neon.hpp"
 #include "kzsdk/kernels/isa/vector_table.hpp"
 
-namespace kz::dsp {
+namespace kz::kernels {
 
-constinit const Kernels kNeonKernels = vector_kernels<Neon>("neon");
+constinit const Variant kNeonVariant = vector_variant<Neon>("neon");
 
-} // namespace kz::dsp
+} // namespace kz::kernels
 
 #endif

@@ -20,14 +20,14 @@ struct Neon {
     static Floats load(const float* from) noexcept { return vld1q_f32(from); }
     static void store(int32_t* to, Ints v) noexcept { vst1q_s32(to, v); }
     static void store(float* to, Floats v) noexcept { vst1q_f32(to, v); }
-    static Ints all(int32_t value) noexcept { return vdupq_n_s32(value); }
+    static Ints set(int32_t value) noexcept { return vdupq_n_s32(value); }
     /// Every lane holds the same two 16-bit numbers.
-    static Ints all_pairs(const int16_t* pair) noexcept
+    static Ints set_pairs(const int16_t* pair) noexcept
     {
         const int16x4_t two = vset_lane_s16(pair[1], vdup_n_s16(pair[0]), 1);
         return vdupq_lane_s32(vreinterpret_s32_s16(two), 0);
     }
-    static Floats all(float value) noexcept { return vdupq_n_f32(value); }
+    static Floats set(float value) noexcept { return vdupq_n_f32(value); }
 
     static Ints load(const int16_t* from) noexcept
     {
@@ -40,7 +40,7 @@ struct Neon {
     }
 
     static Ints mul(Ints a, Ints b) noexcept { return vmulq_s32(a, b); }
-    static Ints larger(Ints a, Ints b) noexcept { return vmaxq_s32(a, b); }
+    static Ints max(Ints a, Ints b) noexcept { return vmaxq_s32(a, b); }
 
     /// Adds, and keeps the compiler from regrouping a long sum, for which it would need more
     /// registers than there are.
@@ -74,9 +74,9 @@ struct Neon {
     /// `offset` and the sum of the lanes of each of four vectors.
     static void store_sums(int32_t* to, Ints a, Ints b, Ints c, Ints d, int32_t offset) noexcept
     {
-        store(to, add(vpaddq_s32(vpaddq_s32(a, b), vpaddq_s32(c, d)), all(offset)));
+        store(to, add(vpaddq_s32(vpaddq_s32(a, b), vpaddq_s32(c, d)), set(offset)));
     }
-    static int32_t largest_lane(Ints v) noexcept { return vmaxvq_s32(v); }
+    static int32_t max_of_lanes(Ints v) noexcept { return vmaxvq_s32(v); }
 
     static Ints add(Ints a, Ints b) noexcept { return vaddq_s32(a, b); }
     static Floats add(Floats a, Floats b) noexcept { return vaddq_f32(a, b); }
@@ -115,12 +115,12 @@ struct Neon {
         return vreinterpretq_s32_u32(vshlq_u32(vreinterpretq_u32_s32(v), vdupq_n_s32(-count)));
     }
 
-    static Ints exclusive_or(Ints a, Ints b) noexcept { return veorq_s32(a, b); }
-    static Ints bits_and(Ints a, Ints b) noexcept { return vandq_s32(a, b); }
-    static Ints smaller(Ints a, Ints b) noexcept { return vminq_s32(a, b); }
+    static Ints bit_xor(Ints a, Ints b) noexcept { return veorq_s32(a, b); }
+    static Ints bit_and(Ints a, Ints b) noexcept { return vandq_s32(a, b); }
+    static Ints min(Ints a, Ints b) noexcept { return vminq_s32(a, b); }
 
     /// Magnitudes; -2^31 stays.
-    static Ints size_of(Ints v) noexcept { return vabsq_s32(v); }
+    static Ints abs(Ints v) noexcept { return vabsq_s32(v); }
 
     /// Whether any lane of `v`, as an unsigned number, is no less than that of `limit`.
     static bool any_reaches(Ints v, Ints limit) noexcept
@@ -129,13 +129,13 @@ struct Neon {
     }
 
     /// Lane k becomes the sum of lanes 0 to k.
-    static Ints running_sums(Ints v) noexcept
+    static Ints prefix_sums(Ints v) noexcept
     {
         const Ints zero = vdupq_n_s32(0);
         v = vaddq_s32(v, vextq_s32(zero, v, 3));
         return vaddq_s32(v, vextq_s32(zero, v, 2));
     }
-    static Ints last_lane_to_all(Ints v) noexcept { return vdupq_laneq_s32(v, 3); }
+    static Ints broadcast_last(Ints v) noexcept { return vdupq_laneq_s32(v, 3); }
     static int32_t first_lane(Ints v) noexcept { return vgetq_lane_s32(v, 0); }
 
     /// Truncates towards zero as kz::to_int32 does: here the processor saturates and takes NaN for
@@ -143,8 +143,8 @@ struct Neon {
     static Ints truncated(Floats v) noexcept { return vcvtq_s32_f32(v); }
 
     /// a < b ? a : b, and a > b ? a : b: b where one is no number.
-    static Floats smaller(Floats a, Floats b) noexcept { return vbslq_f32(vcltq_f32(a, b), a, b); }
-    static Floats larger(Floats a, Floats b) noexcept { return vbslq_f32(vcgtq_f32(a, b), a, b); }
+    static Floats min(Floats a, Floats b) noexcept { return vbslq_f32(vcltq_f32(a, b), a, b); }
+    static Floats max(Floats a, Floats b) noexcept { return vbslq_f32(vcgtq_f32(a, b), a, b); }
 
     /// The lanes, each 0 .. 255, of four vectors as bytes.
     static void store_bytes(uint8_t* to, Ints a, Ints b, Ints c, Ints d) noexcept
@@ -157,13 +157,13 @@ struct Neon {
     /// Upper halves of the products, truncated towards zero: the products are of magnitudes.
     static Ints truncated_high_products(Ints a, Ints b) noexcept
     {
-        const uint32x4_t x = vreinterpretq_u32_s32(size_of(a));
-        const uint32x4_t y = vreinterpretq_u32_s32(size_of(b));
+        const uint32x4_t x = vreinterpretq_u32_s32(abs(a));
+        const uint32x4_t y = vreinterpretq_u32_s32(abs(b));
         const uint64x2_t low = vmull_u32(vget_low_u32(x), vget_low_u32(y));
         const uint64x2_t upper = vmull_high_u32(x, y);
         const Ints high = vreinterpretq_s32_u32(vshrn_high_n_u64(vshrn_n_u64(low, 32), upper, 32));
-        const Ints sign = shift_right<31>(exclusive_or(a, b));
-        return sub(exclusive_or(high, sign), sign);
+        const Ints sign = shift_right<31>(bit_xor(a, b));
+        return sub(bit_xor(high, sign), sign);
     }
 
     /// Sums of 64 bits.
@@ -214,14 +214,14 @@ struct Neon {
     static int32_t sum_of_product_bits(Ints sums) noexcept { return sum_of_lanes(sums); }
 
     /// Lanes in the opposite order.
-    static Ints reversed(Ints v) noexcept
+    static Ints reverse(Ints v) noexcept
     {
         const Ints swapped = vrev64q_s32(v);
         return vextq_s32(swapped, swapped, 2);
     }
-    static Floats reversed(Floats v) noexcept
+    static Floats reverse(Floats v) noexcept
     {
-        return vreinterpretq_f32_s32(reversed(vreinterpretq_s32_f32(v)));
+        return vreinterpretq_f32_s32(reverse(vreinterpretq_s32_f32(v)));
     }
 
     /// Separates the lanes of even and odd index of the 8 that `a` and `b` hold.

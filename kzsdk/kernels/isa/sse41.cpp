@@ -5,10 +5,10 @@
 #include "kzsdk/kernels/isa/sse41.hpp"
 #include "kzsdk/kernels/isa/vector_table.hpp"
 
-namespace kz::dsp {
+namespace kz::kernels {
 
-constinit const Kernels kSse41Kernels = vector_kernels<Sse41>("sse41");
+constinit const Variant kSse41Variant = vector_variant<Sse41>("sse41");
 
-} // namespace kz::dsp
+} // namespace kz::kernels
 
 #endif

@@ -25,13 +25,13 @@ struct Sse41 {
         _mm_storeu_si128(reinterpret_cast<__m128i*>(to), v);
     }
     static void store(float* to, Floats v) noexcept { _mm_storeu_ps(to, v); }
-    static Ints all(int32_t value) noexcept { return _mm_set1_epi32(value); }
+    static Ints set(int32_t value) noexcept { return _mm_set1_epi32(value); }
     /// Every lane holds the same two 16-bit numbers.
-    static Ints all_pairs(const int16_t* pair) noexcept
+    static Ints set_pairs(const int16_t* pair) noexcept
     {
         return _mm_shuffle_epi32(_mm_loadu_si32(pair), 0);
     }
-    static Floats all(float value) noexcept { return _mm_set1_ps(value); }
+    static Floats set(float value) noexcept { return _mm_set1_ps(value); }
 
     static Ints load(const int16_t* from) noexcept
     {
@@ -45,7 +45,7 @@ struct Sse41 {
     }
 
     static Ints mul(Ints a, Ints b) noexcept { return _mm_mullo_epi32(a, b); }
-    static Ints larger(Ints a, Ints b) noexcept { return _mm_max_epi32(a, b); }
+    static Ints max(Ints a, Ints b) noexcept { return _mm_max_epi32(a, b); }
 
     /// Adds, and keeps the compiler from regrouping a long sum, for which it would need more
     /// registers than there are.
@@ -84,9 +84,9 @@ struct Sse41 {
         const Ints ab = add(_mm_unpacklo_epi32(a, b), _mm_unpackhi_epi32(a, b));
         const Ints cd = add(_mm_unpacklo_epi32(c, d), _mm_unpackhi_epi32(c, d));
         const Ints sums = add(_mm_unpacklo_epi64(ab, cd), _mm_unpackhi_epi64(ab, cd));
-        store(to, add(sums, all(offset)));
+        store(to, add(sums, set(offset)));
     }
-    static int32_t largest_lane(Ints v) noexcept
+    static int32_t max_of_lanes(Ints v) noexcept
     {
         v = _mm_max_epi32(v, _mm_shuffle_epi32(v, 0b01001110));
         v = _mm_max_epi32(v, _mm_shuffle_epi32(v, 0b10110001));
@@ -131,12 +131,12 @@ struct Sse41 {
         return _mm_srl_epi32(v, _mm_cvtsi32_si128(count));
     }
 
-    static Ints exclusive_or(Ints a, Ints b) noexcept { return _mm_xor_si128(a, b); }
-    static Ints bits_and(Ints a, Ints b) noexcept { return _mm_and_si128(a, b); }
-    static Ints smaller(Ints a, Ints b) noexcept { return _mm_min_epi32(a, b); }
+    static Ints bit_xor(Ints a, Ints b) noexcept { return _mm_xor_si128(a, b); }
+    static Ints bit_and(Ints a, Ints b) noexcept { return _mm_and_si128(a, b); }
+    static Ints min(Ints a, Ints b) noexcept { return _mm_min_epi32(a, b); }
 
     /// Magnitudes; -2^31 stays.
-    static Ints size_of(Ints v) noexcept { return _mm_abs_epi32(v); }
+    static Ints abs(Ints v) noexcept { return _mm_abs_epi32(v); }
 
     /// Whether any lane of `v`, as an unsigned number, is no less than that of `limit`.
     static bool any_reaches(Ints v, Ints limit) noexcept
@@ -145,26 +145,26 @@ struct Sse41 {
     }
 
     /// Lane k becomes the sum of lanes 0 to k.
-    static Ints running_sums(Ints v) noexcept
+    static Ints prefix_sums(Ints v) noexcept
     {
         v = _mm_add_epi32(v, _mm_slli_si128(v, 4));
         return _mm_add_epi32(v, _mm_slli_si128(v, 8));
     }
-    static Ints last_lane_to_all(Ints v) noexcept { return _mm_shuffle_epi32(v, 0b11111111); }
+    static Ints broadcast_last(Ints v) noexcept { return _mm_shuffle_epi32(v, 0b11111111); }
     static int32_t first_lane(Ints v) noexcept { return _mm_cvtsi128_si32(v); }
 
     /// Truncates towards zero as kz::to_int32 does. The processor's own conversion gives -2^31 for
     /// all that does not fit: right for what is too low, mended for what is too high and for NaN.
     static Ints truncated(Floats v) noexcept
     {
-        const Ints too_high = _mm_castps_si128(_mm_cmpge_ps(v, all(0x1p31F)));
+        const Ints too_high = _mm_castps_si128(_mm_cmpge_ps(v, set(0x1p31F)));
         const Ints number = _mm_castps_si128(_mm_cmpord_ps(v, v));
-        return bits_and(exclusive_or(_mm_cvttps_epi32(v), too_high), number);
+        return bit_and(bit_xor(_mm_cvttps_epi32(v), too_high), number);
     }
 
     /// a < b ? a : b, and a > b ? a : b: b where one is no number.
-    static Floats smaller(Floats a, Floats b) noexcept { return _mm_min_ps(a, b); }
-    static Floats larger(Floats a, Floats b) noexcept { return _mm_max_ps(a, b); }
+    static Floats min(Floats a, Floats b) noexcept { return _mm_min_ps(a, b); }
+    static Floats max(Floats a, Floats b) noexcept { return _mm_max_ps(a, b); }
 
     /// The lanes, each 0 .. 255, of four vectors as bytes.
     static void store_bytes(uint8_t* to, Ints a, Ints b, Ints c, Ints d) noexcept
@@ -176,13 +176,13 @@ struct Sse41 {
     /// Upper halves of the products, truncated towards zero: the products are of magnitudes.
     static Ints truncated_high_products(Ints a, Ints b) noexcept
     {
-        const Ints x = size_of(a);
-        const Ints y = size_of(b);
+        const Ints x = abs(a);
+        const Ints y = abs(b);
         const Ints even = _mm_srli_epi64(_mm_mul_epu32(x, y), 32);
         const Ints odd = _mm_mul_epu32(odd_lanes(x), odd_lanes(y));
         const Ints high = _mm_blend_epi16(even, odd, 0b11001100);
-        const Ints sign = shift_right<31>(exclusive_or(a, b));
-        return sub(exclusive_or(high, sign), sign);
+        const Ints sign = shift_right<31>(bit_xor(a, b));
+        return sub(bit_xor(high, sign), sign);
     }
 
     /// Sums of 64 bits.
@@ -242,8 +242,8 @@ struct Sse41 {
     }
 
     /// Lanes in the opposite order.
-    static Ints reversed(Ints v) noexcept { return _mm_shuffle_epi32(v, 0b00011011); }
-    static Floats reversed(Floats v) noexcept { return _mm_shuffle_ps(v, v, 0b00011011); }
+    static Ints reverse(Ints v) noexcept { return _mm_shuffle_epi32(v, 0b00011011); }
+    static Floats reverse(Floats v) noexcept { return _mm_shuffle_ps(v, v, 0b00011011); }
 
     /// Separates the lanes of even and odd index of the 8 that `a` and `b` hold.
     static void deinterleave(Ints& a, Ints& b) noexcept

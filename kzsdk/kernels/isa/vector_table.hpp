@@ -24,7 +24,7 @@ template <class Simd>
 void dct_fixed(int32_t* x, const int32_t* factors, int32_t order) noexcept
 {
     if (!transform<Simd, FixedButterflies>(x, factors, order)) {
-        kz::dsp::plain::dct_fixed(x, factors, order);
+        kz::kernels::plain::dct_fixed(x, factors, order);
     }
 }
 
@@ -32,12 +32,12 @@ template <class Simd>
 void dct_float(float* x, const float* factors, int32_t order) noexcept
 {
     if (!transform<Simd, FloatButterflies>(x, factors, order)) {
-        kz::dsp::plain::dct_float(x, factors, order);
+        kz::kernels::plain::dct_float(x, factors, order);
     }
 }
 
 template <class Simd>
-constexpr kz::dsp::Kernels vector_kernels(const char* name) noexcept
+constexpr kz::kernels::Variant vector_variant(const char* name) noexcept
 {
     return {
         .name = name,
@@ -53,8 +53,8 @@ constexpr kz::dsp::Kernels vector_kernels(const char* name) noexcept
         .convolve_from_bit_31 = convolve<Simd, 31>,
         .convolve_from_bit_32 = convolve<Simd, 32>,
         .polyphase_floats = polyphase_floats<Simd>,
-        .widen_words = widen_words<Simd>,
-        .widen_floats = widen_floats<Simd>,
+        .track_word_extremes = track_word_extremes<Simd>,
+        .track_float_extremes = track_float_extremes<Simd>,
         .word_levels = word_levels<Simd>,
         .float_levels = float_levels<Simd>,
         .apply_ramp = apply_ramp<Simd>,

@@ -142,7 +142,7 @@ TEST(Butterfly, BitReversalSwapsMirroredIndexes)
     for (size_t bits = 0; bits < 8; ++bits) {
         std::vector<int> x(size_t{1} << bits);
         std::iota(x.begin(), x.end(), 0);
-        dsp::bit_reverse(std::span(x));
+        kernels::bit_reverse(std::span(x));
         for (size_t i = 0; i < x.size(); ++i) {
             size_t mirrored = 0;
             for (size_t bit = 0; bit < bits; ++bit) {
@@ -158,7 +158,7 @@ TEST(Butterfly, InputOrderIsEvenForwardsOddBackwards)
     for (const size_t length : {4U, 8U, 64U, 16384U}) {
         std::vector<size_t> x(length);
         std::iota(x.begin(), x.end(), size_t{0});
-        dsp::reorder_input(std::span(x));
+        kernels::reorder_input(std::span(x));
         for (size_t i = 0; i < length / 2; ++i) {
             ASSERT_EQ(2 * i, x[i]);
             ASSERT_EQ(2 * i + 1, x[length - 1 - i]);
@@ -176,7 +176,7 @@ TEST(Butterfly, TheFrameOfTheTransformIsExactInRealNumbers)
     std::vector<long double> input(kLength);
     std::generate(input.begin(), input.end(), [&] { return random.unit(); });
     std::vector<long double> x = input;
-    dsp::reorder_input(std::span(x));
+    kernels::reorder_input(std::span(x));
     for (size_t width = kLength; width >= 2; width /= 2) {
         const size_t half = width / 2;
         for (size_t start = 0; start < kLength; start += width) {
@@ -191,8 +191,8 @@ TEST(Butterfly, TheFrameOfTheTransformIsExactInRealNumbers)
             }
         }
     }
-    dsp::bit_reverse(std::span(x));
-    dsp::add_recursively(std::span(x), kOrder, [](auto a, auto b) { return a + b; });
+    kernels::bit_reverse(std::span(x));
+    kernels::add_recursively(std::span(x), kOrder, [](auto a, auto b) { return a + b; });
     for (size_t k = 0; k < kLength; ++k) {
         long double sum = 0;
         for (size_t n = 0; n < kLength; ++n) {

@@ -219,7 +219,7 @@ TEST_F(DctFloat, TwoPointsByHand)
 {
     const Floats x = transform(1, {5, 3});
     EXPECT_EQ(8.0F * 0.70710678F, x[0]);
-    EXPECT_EQ(2.0F * kz::dsp::butterfly_factor(1, 0), x[1]);
+    EXPECT_EQ(2.0F * kz::kernels::butterfly_factor(1, 0), x[1]);
 }
 
 TEST_F(DctFloat, TonesStandInTheirBin)

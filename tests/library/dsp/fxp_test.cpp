@@ -17,7 +17,7 @@ using kz::test::Random;
 using kz::test::Wide;
 
 constexpr int32_t kLeast = std::numeric_limits<int32_t>::min();
-constexpr int32_t kMost = std::numeric_limits<int32_t>::max();
+constexpr int32_t kMax = std::numeric_limits<int32_t>::max();
 
 constexpr uint32_t kEdgeWords[] = {
     0x00000000, 0x00000001, 0x00000002, 0x00000003, 0x00007fff, 0x00008000, 0x00008001, 0x0000fffe,
@@ -26,8 +26,8 @@ constexpr uint32_t kEdgeWords[] = {
     0x80007fff, 0x80008000, 0x8000ffff, 0xaaaaaaaa, 0xbfffffff, 0xc0000000, 0xc0000001, 0xfffeffff,
     0xffff0000, 0xffff0001, 0xffff7fff, 0xffff8000, 0xffff8001, 0xfffffffd, 0xfffffffe, 0xffffffff};
 
-constexpr int32_t kEdgeExponents[] = {kLeast, kLeast + 1, -64, -33, -32, -31,       -30,  -1,
-                                      0,      1,          30,  31,  32,  kMost - 1, kMost};
+constexpr int32_t kEdgeExponents[] = {kLeast, kLeast + 1, -64, -33, -32, -31,      -30, -1,
+                                      0,      1,          30,  31,  32,  kMax - 1, kMax};
 
 int32_t as_signed(uint32_t word) { return std::bit_cast<int32_t>(word); }
 uint32_t as_unsigned(int32_t word) { return std::bit_cast<uint32_t>(word); }
@@ -117,8 +117,8 @@ TEST(FxpProducts, WordTimesHalfwordIsTheFloorOf48Bits)
 
 TEST(FxpProducts, AccumulatedHalfwordProductsWrap)
 {
-    EXPECT_EQ(kLeast, KZDSP_SmulAddWLo_SW_SL(0x10000, 1, kMost));
-    EXPECT_EQ(kLeast, KZDSP_SmulAddWHi_SW_SL(0x10000, 0x10000, kMost));
+    EXPECT_EQ(kLeast, KZDSP_SmulAddWLo_SW_SL(0x10000, 1, kMax));
+    EXPECT_EQ(kLeast, KZDSP_SmulAddWHi_SW_SL(0x10000, 0x10000, kMax));
     Random random(7);
     for_pairs(8, [&random](uint32_t a, uint32_t b) {
         const int32_t sa = as_signed(a);
@@ -133,8 +133,8 @@ TEST(FxpProducts, AccumulatedHalfwordProductsWrap)
 
 TEST(FxpSums, OfWordsWrap)
 {
-    EXPECT_EQ(kLeast, KZDSP_ADD_FxpType(kMost, 1));
-    EXPECT_EQ(kMost, KZDSP_SUB_FxpType(kLeast, 1));
+    EXPECT_EQ(kLeast, KZDSP_ADD_FxpType(kMax, 1));
+    EXPECT_EQ(kMax, KZDSP_SUB_FxpType(kLeast, 1));
     for_pairs(9, [](uint32_t a, uint32_t b) {
         const int64_t sa = as_signed(a);
         const int64_t sb = as_signed(b);
@@ -182,7 +182,7 @@ uint64_t model_left(uint64_t x, int64_t count)
 
 std::vector<int32_t> shift_counts()
 {
-    std::vector<int32_t> counts{kLeast, kLeast + 1, kLeast + 7, kLeast + 32, kMost - 1, kMost};
+    std::vector<int32_t> counts{kLeast, kLeast + 1, kLeast + 7, kLeast + 32, kMax - 1, kMax};
     for (int32_t count = -600; count <= 600; ++count) {
         counts.push_back(count);
     }
@@ -263,11 +263,11 @@ TEST(FxpShifts, OfWordsGive0OrTheSignFillFrom32On)
 
 TEST(FxpMagnitude, SaturatesOnlyWhereItSaysSo)
 {
-    EXPECT_EQ(kMost, KZDSP_SaturateAbsFxpType(kLeast));
+    EXPECT_EQ(kMax, KZDSP_SaturateAbsFxpType(kLeast));
     EXPECT_EQ(kLeast, kz_abs(kLeast));
     for_pairs(13, [](uint32_t a, uint32_t) {
         const int64_t size = std::abs(int64_t{as_signed(a)});
-        EXPECT_EQ(std::min(size, int64_t{kMost}), KZDSP_SaturateAbsFxpType(as_signed(a)));
+        EXPECT_EQ(std::min(size, int64_t{kMax}), KZDSP_SaturateAbsFxpType(as_signed(a)));
         EXPECT_EQ(wrapped(size), kz_abs(as_signed(a)));
         EXPECT_EQ(size, kz::fxp::magnitude(as_signed(a)));
     });
@@ -410,7 +410,7 @@ TEST(FxpComparison, OfOppositeSignsIgnoresTheExponents)
 {
     EXPECT_EQ(1, KZDSP_LESS_FxpType(-1, 100, 1, -100));
     EXPECT_EQ(0, KZDSP_LESS_FxpType(1, -100, -1, 100));
-    EXPECT_EQ(1, KZDSP_LESSEQ_FxpType(-1, kMost, 0, kLeast));
+    EXPECT_EQ(1, KZDSP_LESSEQ_FxpType(-1, kMax, 0, kLeast));
 }
 
 TEST(FxpComparison, ASmallValueIsNotAboveAZeroWithALargeExponent)
@@ -466,7 +466,7 @@ TEST(FxpAlignedDifference, ANegativeValue31OctavesBelowCountsAsZero)
 TEST(FxpAlignedDifference, OfLargeValuesOfOppositeSignWraps)
 {
     int32_t exponent = 0;
-    EXPECT_EQ(-1, KZDSP_ALIGNED_SUB_FxpType(kMost, 5, kLeast, 5, &exponent));
+    EXPECT_EQ(-1, KZDSP_ALIGNED_SUB_FxpType(kMax, 5, kLeast, 5, &exponent));
     EXPECT_EQ(5, exponent);
 }
 

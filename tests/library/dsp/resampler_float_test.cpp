@@ -68,11 +68,11 @@ TEST_F(ResamplerFloat, DecimationByTwoAndFourUsesStoredFilters)
     const float rates[][2] = {{22050, 11025}, {44100, 22050}, {2, 1}, {1e-3F, 5e-4F}};
     for (const auto& [in, out] : rates) {
         const auto half = make(in, out);
-        EXPECT_EQ(dsp::coefficients_2to1, half->taps);
+        EXPECT_EQ(kernels::coefficients_2to1, half->taps);
         EXPECT_EQ(42U, half->length);
         EXPECT_EQ(0U, half->owns_taps);
         const auto quarter = make(in * 2, out);
-        EXPECT_EQ(dsp::coefficients_4to1, quarter->taps);
+        EXPECT_EQ(kernels::coefficients_4to1, quarter->taps);
         EXPECT_EQ(84U, quarter->length);
         EXPECT_EQ(0U, quarter->owns_taps);
     }
@@ -152,7 +152,7 @@ TEST_F(ResamplerFloat, RatesAMillionthApartArePassedThrough)
     EXPECT_EQ(0U, copy->length);
     const auto quarter = make(44100.02F);
     ASSERT_TRUE(quarter);
-    EXPECT_EQ(dsp::coefficients_4to1, quarter->taps);
+    EXPECT_EQ(kernels::coefficients_4to1, quarter->taps);
     const auto other = make(44101);
     ASSERT_TRUE(other);
     EXPECT_NE(1U, other->up);
@@ -187,12 +187,12 @@ void expect_short_filter(std::span<const float> taps, size_t down, size_t zeros,
 
 TEST_F(ResamplerFloat, TheHalfBandFilterIsAsItIsSaidToBe)
 {
-    expect_short_filter(dsp::coefficients_2to1, 2, 1, 0.99948);
+    expect_short_filter(kernels::coefficients_2to1, 2, 1, 0.99948);
 }
 
 TEST_F(ResamplerFloat, TheQuarterBandFilterIsAsItIsSaidToBe)
 {
-    expect_short_filter(dsp::coefficients_4to1, 4, 4, 0.99936);
+    expect_short_filter(kernels::coefficients_4to1, 4, 4, 0.99936);
 }
 
 TEST_F(ResamplerFloat, TheFixedTablesAreTheseFiltersInQ31)

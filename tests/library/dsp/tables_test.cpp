@@ -57,7 +57,7 @@ struct Filter {
 
 TEST(Tables, TransformFactorsAreTheKnownWords)
 {
-    const auto& c = dsp::kDctCoefficients;
+    const auto& c = kernels::kDctCoefficients;
     EXPECT_EQ(0, c[0]);
     EXPECT_EQ(1518500224, c[1]);
     EXPECT_EQ(581104896, c[2]);
@@ -75,8 +75,8 @@ TEST(Tables, TransformFactorsFollowTheirFormula)
             const double exact =
                 0x1p30 / (h * std::cos((4.0 * j + 1) * std::numbers::pi / (4.0 * h)));
             // Rounded to single precision, then truncated.
-            EXPECT_NEAR(exact, dsp::kDctCoefficients[h + j], std::abs(exact) * 0x1p-24 + 1);
-            EXPECT_EQ(j<(h + 1) / 2, dsp::kDctCoefficients[h + j]> 0) << h << ' ' << j;
+            EXPECT_NEAR(exact, kernels::kDctCoefficients[h + j], std::abs(exact) * 0x1p-24 + 1);
+            EXPECT_EQ(j<(h + 1) / 2, kernels::kDctCoefficients[h + j]> 0) << h << ' ' << j;
         }
     }
 }
@@ -116,7 +116,7 @@ TEST(Tables, FilterTapsAreTheKnownWords)
 // The tables stand for what would else be computed when a resampler or a transform is made.
 TEST(Tables, DesignedFiltersAreWhatTheDesignGivesHereToTheBit)
 {
-    for (const dsp::DesignedFilter& filter : dsp::designed_filters) {
+    for (const kernels::DesignedFilter& filter : kernels::designed_filters) {
         const auto layout = dsp::filter_layout(filter.up, filter.down);
         ASSERT_EQ(layout.length, uint64_t{filter.up} * filter.taps_per_phase);
         std::vector<float> taps(static_cast<size_t>(layout.length));
@@ -131,15 +131,15 @@ TEST(Tables, DesignedFiltersAreWhatTheDesignGivesHereToTheBit)
 
 TEST(Tables, FloatTransformFactorsAreWhatTheFormulaGivesHereToTheBit)
 {
-    std::vector<float> factors(std::size(dsp::kDctFactors));
-    dsp::fill_butterfly_factors(factors);
-    EXPECT_EQ(digest_of_floats(factors), digest_of_floats(dsp::kDctFactors));
+    std::vector<float> factors(std::size(kernels::kDctFactors));
+    kernels::fill_butterfly_factors(factors);
+    EXPECT_EQ(digest_of_floats(factors), digest_of_floats(kernels::kDctFactors));
 }
 
 TEST(Tables, DecimatorTapsAreTheKnownFloats)
 {
-    EXPECT_EQ(kDigest2to1, digest_of_floats(dsp::coefficients_2to1));
-    EXPECT_EQ(kDigest4to1, digest_of_floats(dsp::coefficients_4to1));
+    EXPECT_EQ(kDigest2to1, digest_of_floats(kernels::coefficients_2to1));
+    EXPECT_EQ(kDigest4to1, digest_of_floats(kernels::coefficients_4to1));
 }
 
 } // namespace kz::test

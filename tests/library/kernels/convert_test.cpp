@@ -13,7 +13,7 @@
 
 namespace {
 
-using namespace kz::dsp;
+using namespace kz::kernels;
 using namespace kz::test;
 
 class ConvertVariants : public KernelVariants {};
@@ -32,7 +32,7 @@ std::vector<uint8_t> audio(size_t size)
     return bytes;
 }
 
-constexpr int32_t kMostFrames = 70;
+constexpr int32_t kMaxFrames = 70;
 
 // Bits of the words, with one beyond the last that must stay untouched.
 template <class Word>
@@ -50,8 +50,8 @@ std::vector<uint32_t> converted(Converter<Word>* convert, const uint8_t* bytes, 
 template <class Word>
 void expect_equal(Converter<Word>* actual, Converter<Word>* plain, const char* name)
 {
-    const auto bytes = audio(4 * kMostFrames + 3);
-    for (int32_t frames = 0; frames <= kMostFrames; ++frames) {
+    const auto bytes = audio(4 * kMaxFrames + 3);
+    for (int32_t frames = 0; frames <= kMaxFrames; ++frames) {
         for (size_t offset = 0; offset < 4; ++offset) {
             for (const int32_t shift : {0, 8, 14, 15, 22, 23}) {
                 ASSERT_EQ(converted(actual, bytes.data() + offset, frames, shift),

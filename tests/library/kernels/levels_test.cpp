@@ -16,7 +16,7 @@
 
 namespace {
 
-using namespace kz::dsp;
+using namespace kz::kernels;
 using namespace kz::test;
 
 class FrameVariants : public KernelVariants {};
@@ -27,7 +27,7 @@ using FloatLimits = std::numeric_limits<float>;
 
 constexpr auto kLowest = std::numeric_limits<int32_t>::min();
 constexpr auto kHighest = std::numeric_limits<int32_t>::max();
-constexpr uint32_t kMost = 150;
+constexpr uint32_t kMax = 150;
 
 Words noise_of(size_t count, int shift, uint64_t seed)
 {
@@ -41,7 +41,7 @@ Words noise_of(size_t count, int shift, uint64_t seed)
 
 Words with_extremes(int shift, uint64_t seed)
 {
-    auto words = noise_of(kMost, shift, seed);
+    auto words = noise_of(kMax, shift, seed);
     words[0] = kLowest;
     words[9] = kHighest;
     words[10] = kLowest + 1;
@@ -53,7 +53,7 @@ Words with_extremes(int shift, uint64_t seed)
 Floats odd_floats(uint64_t seed)
 {
     Random random(seed);
-    Floats values(kMost);
+    Floats values(kMax);
     for (float& x : values) {
         x = static_cast<float>(random.unit()) * 40000.0F;
     }
@@ -73,14 +73,14 @@ Floats odd_floats(uint64_t seed)
 TEST_P(FrameVariants, FindTheSameExtremesOfWords)
 {
     for (const int shift : {0, 2, 20}) {
-        const auto words = noise_of(kMost, shift, 1);
-        for (uint32_t count = 0; count <= kMost; ++count) {
+        const auto words = noise_of(kMax, shift, 1);
+        for (uint32_t count = 0; count <= kMax; ++count) {
             for (const Extremes<int32_t> start :
                  {Extremes<int32_t>{kHighest, kLowest}, Extremes<int32_t>{-5, 5}}) {
                 auto expected = start;
-                plain().widen_words(expected, words.data(), count);
+                plain().track_word_extremes(expected, words.data(), count);
                 auto actual = start;
-                variant().widen_words(actual, words.data(), count);
+                variant().track_word_extremes(actual, words.data(), count);
                 ASSERT_EQ(expected.low, actual.low);
                 ASSERT_EQ(expected.high, actual.high);
             }
@@ -92,11 +92,11 @@ TEST_P(FrameVariants, FindTheSameExtremesOfFloatsAndPassOverWhatIsNoNumber)
 {
     const auto values = odd_floats(2);
     for (uint32_t first = 0; first < 12; ++first) {
-        for (uint32_t count = 0; count + first <= kMost; ++count) {
+        for (uint32_t count = 0; count + first <= kMax; ++count) {
             Extremes<float> expected{1e6F, -1e6F};
-            plain().widen_floats(expected, values.data() + first, count);
+            plain().track_float_extremes(expected, values.data() + first, count);
             Extremes<float> actual{1e6F, -1e6F};
-            variant().widen_floats(actual, values.data() + first, count);
+            variant().track_float_extremes(actual, values.data() + first, count);
             ASSERT_EQ(expected.low, actual.low);
             ASSERT_EQ(expected.high, actual.high);
         }
@@ -120,7 +120,7 @@ void expect_levels(void (*actual)(const Rule&, const Sample*, uint8_t*, uint32_t
 TEST_P(FrameVariants, GiveWordsTheSameLevels)
 {
     for (const int shift : {0, 1, 6, 24}) {
-        const auto samples = noise_of(kMost, shift, 3);
+        const auto samples = noise_of(kMax, shift, 3);
         const int32_t lowest = *std::ranges::min_element(samples) >> 1;
         for (const int32_t scale : {0, 1, 255 << 22, 0x55555555, kHighest}) {
             for (const int32_t down : {0, 3, 21, 31}) {
@@ -154,7 +154,7 @@ TEST_P(FrameVariants, ApplyTheSameRamp)
         const auto start = with_extremes(shift, 5);
         for (const int32_t gain : {0, 1, -1, 1 << 30, kHighest, kLowest}) {
             for (const int32_t step : {0, 1, -194898, 992760, kLowest}) {
-                for (uint32_t count = 0; count <= kMost; count += 7) {
+                for (uint32_t count = 0; count <= kMax; count += 7) {
                     auto expected = start;
                     plain().apply_ramp(expected.data(), count, gain, step);
                     auto actual = start;
@@ -171,7 +171,7 @@ TEST_P(FrameVariants, SumTheSameSquares)
     for (const int shift : {0, 8, 30}) {
         const auto words = with_extremes(shift, 6);
         for (uint32_t first = 0; first < 12; ++first) {
-            for (uint32_t count = 0; count + first <= kMost; ++count) {
+            for (uint32_t count = 0; count + first <= kMax; ++count) {
                 ASSERT_EQ(plain().sum_squares(words.data() + first, count),
                           variant().sum_squares(words.data() + first, count));
             }

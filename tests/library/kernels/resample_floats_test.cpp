@@ -17,7 +17,7 @@
 
 namespace {
 
-using namespace kz::dsp;
+using namespace kz::kernels;
 using namespace kz::test;
 
 class FloatResampleVariants : public KernelVariants {};
@@ -60,9 +60,9 @@ public:
                                        {11, 10},
                                        {1, 40},
                                        {3, 400}}) {
-            const FilterLayout layout = filter_layout(up, down);
+            const kz::dsp::FilterLayout layout = kz::dsp::filter_layout(up, down);
             taps_.emplace_back(layout.length);
-            design_windowed_sinc(layout, taps_.back());
+            kz::dsp::design_windowed_sinc(layout, taps_.back());
             filters_.push_back(
                 {{taps_.back().data(), 1, up, static_cast<uint32_t>(layout.length / up), up, down},
                  std::to_string(up) + '/' + std::to_string(down)});
@@ -139,7 +139,7 @@ std::vector<Samples> signals(size_t count)
 
 // The outputs as bits, and one word beyond them that must stay. A NaN is a NaN: which of two
 // operands leaves its sign and payload is the processor's choice.
-std::vector<uint32_t> outputs_of(decltype(Kernels::polyphase_floats) kernel,
+std::vector<uint32_t> outputs_of(decltype(Variant::polyphase_floats) kernel,
                                  const FloatPhases& phases, const Samples& samples, uint32_t phase,
                                  uint32_t count)
 {

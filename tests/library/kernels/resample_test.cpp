@@ -15,7 +15,7 @@
 
 namespace {
 
-using namespace kz::dsp;
+using namespace kz::kernels;
 using namespace kz::test;
 
 class ResampleVariants : public KernelVariants {};
@@ -93,7 +93,7 @@ size_t samples_for(const Rate& rate, uint32_t outputs)
 }
 
 // The outputs, and one word beyond them that must stay.
-Words outputs_of(decltype(Kernels::polyphase) kernel, const Rate& rate, const Words& samples,
+Words outputs_of(decltype(Variant::polyphase) kernel, const Rate& rate, const Words& samples,
                  uint32_t phase, uint32_t count)
 {
     Words output(count + 1, 77);

@@ -13,7 +13,7 @@
 
 namespace {
 
-using namespace kz::dsp;
+using namespace kz::kernels;
 using namespace kz::test;
 
 class MovingMeansVariants : public KernelVariants {};
@@ -88,7 +88,7 @@ struct State {
     std::vector<int32_t> deviations;
     MovingMeans means{};
 
-    uint32_t pass(const Kernels& kernels, const std::vector<int32_t>& samples, uint32_t count)
+    uint32_t pass(const Variant& kernels, const std::vector<int32_t>& samples, uint32_t count)
     {
         means.levels = levels.data();
         means.deviations = deviations.data();
@@ -100,7 +100,7 @@ struct State {
 
 // What a variant takes and leaves must be what the plain loop makes of as many samples; it may stop
 // before the plain loop does, but by less than a vector.
-void expect_alike(const Kernels& variant, const Kernels& plain, const State& start,
+void expect_alike(const Variant& variant, const Variant& plain, const State& start,
                   const std::vector<int32_t>& samples)
 {
     constexpr uint32_t kWidest = 8;
