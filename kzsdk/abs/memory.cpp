@@ -4,23 +4,76 @@
 #include <cstdlib>
 #include <cstring>
 
+#include "kzsdk/abs/memory_state.hpp"
+
 namespace {
 
-// Atomic so that a start-up beside a running user is a defined, if unwise, thing to do.
-std::atomic<uint8_t> memory_on{0};
+using kz::MemoryState;
 
-bool is_on() noexcept { return memory_on.load(std::memory_order_relaxed) != 0; }
+// Atomic so that a start-up beside a running user is a defined, if unwise, thing to do, and so that
+// holders may come and go on any thread.
+std::atomic<uint32_t> state_word{0};
+std::atomic<uint32_t> failures{0};
+
+MemoryState state() noexcept { return MemoryState(state_word.load(std::memory_order_relaxed)); }
+
+bool is_on() noexcept { return state().is_on(); }
+
+// Puts `change(state)` in the state's place.
+//
+// @return The state before.
+template <class Change>
+MemoryState exchange(Change change) noexcept
+{
+    uint32_t word = state_word.load(std::memory_order_relaxed);
+    while (!state_word.compare_exchange_weak(word, change(MemoryState(word)).word(),
+                                             std::memory_order_relaxed)) {
+    }
+    return MemoryState(word);
+}
+
+// Counts a failure. Empty blocks are none: a heap may answer 0 bytes with null.
+void* counted(void* block, uint32_t size) noexcept
+{
+    if (block == nullptr && size != 0) {
+        failures.fetch_add(1, std::memory_order_relaxed);
+    }
+    return block;
+}
 
 } // namespace
 
+namespace kz {
+
+bool acquire_memory() noexcept
+{
+    const MemoryState before = exchange([](MemoryState now) {
+        return now.holders() < MemoryState::kMaxHolders ? now.acquired() : now;
+    });
+    return before.holders() < MemoryState::kMaxHolders;
+}
+
+bool release_memory() noexcept
+{
+    const MemoryState before =
+        exchange([](MemoryState now) { return now.holders() != 0 ? now.released() : now; });
+    return before.holders() != 0;
+}
+
+uint32_t failed_allocations() noexcept { return failures.load(std::memory_order_relaxed); }
+
+} // namespace kz
+
 kz_status kzmem_initialize(uint32_t /*first*/, int32_t /*second*/) noexcept
 {
-    return memory_on.exchange(1, std::memory_order_relaxed) != 0 ? KZ_MEM_ALREADY_ON : KZ_OK;
+    const MemoryState before = exchange([](MemoryState now) { return now.started(); });
+    return before.is_on() ? KZ_MEM_ALREADY_ON : KZ_OK;
 }
 
 kz_status kzmem_shutdown() noexcept
 {
-    return memory_on.exchange(0, std::memory_order_relaxed) != 0 ? KZ_OK : KZ_MEM_NOT_ON;
+    const MemoryState before = exchange([](MemoryState now) { return now.shut_down(); });
+    return before.is_on() ? KZ_OK : KZ_MEM_NOT_ON;
 }
 
 kz_status kzmem_query_availability() noexcept
@@ -28,7 +81,10 @@ kz_status kzmem_query_availability() noexcept
     return is_on() ? KZ_MEM_ALREADY_ON : KZ_MEM_NOT_ON;
 }
 
-void* _kzmem_malloc(uint32_t size) noexcept { return is_on() ? std::malloc(size) : nullptr; }
+void* _kzmem_malloc(uint32_t size) noexcept
+{
+    return counted(is_on() ? std::malloc(size) : nullptr, size);
+}
 
 void* _kzmem_calloc(uint32_t count, uint32_t size) noexcept
 {
@@ -42,7 +98,7 @@ void* _kzmem_calloc(uint32_t count, uint32_t size) noexcept
 
 void* _kzmem_realloc(void* block, uint32_t size) noexcept
 {
-    return is_on() ? std::realloc(block, size) : nullptr;
+    return counted(is_on() ? std::realloc(block, size) : nullptr, size);
 }
 
 kz_status _kzmem_free(void* block) noexcept

@@ -1,6 +1,7 @@
 #include "kzsdk/abs/startup.h"
 
 #include "kzsdk/abs/memory.h"
+#include "kzsdk/abs/memory_state.hpp"
 #include "kzsdk/abs/text.h"
 
 namespace {
@@ -51,4 +52,14 @@ kz_status kzinit_shutdown_vesk() noexcept
     // Being off already is no failure of a shut-down.
     static_cast<void>(kzmem_shutdown());
     return KZ_OK;
+}
+
+kz_status kzinit_acquire() noexcept
+{
+    return kz::acquire_memory() ? KZ_OK : KZ_INIT_ERROR_TOO_MANY_HOLDERS;
+}
+
+kz_status kzinit_release() noexcept
+{
+    return kz::release_memory() ? KZ_OK : KZ_INIT_ERROR_NOT_HELD;
 }

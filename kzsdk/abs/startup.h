@@ -3,10 +3,21 @@
  * Start-up and shut-down of the library.
  *
  * Between start-up and shut-down the library may allocate; outside of that every call that needs
- * memory fails. There is no reference count: one shut-down ends the library for every user in the
- * process, however many start-ups went before it. Dispose of everything first.
+ * memory fails. There are two ways to start it:
  *
- * Threads: start-up and shut-down must not run beside each other or beside other calls.
+ * - Counted, for code that shares its process with other users: kzinit_acquire() and
+ *   kzinit_release(). The library is on from the first holder to the last. A kz_stream is a holder
+ *   by itself (kzsdk/stream/stream.h).
+ * - Plain: kzinit_initialize_vesk() and kzinit_shutdown_vesk(), which do not count. One shut-down
+ *   ends the library for every user in the process, counted holders included, however many
+ *   start-ups went before it. Dispose of everything first.
+ *
+ * Side by side: a plain start lasts through any number of counted releases. After a plain shut-down
+ * the holders' allocations fail until somebody starts the library again in either way; holders stay
+ * counted, and each still makes its release.
+ *
+ * Threads: acquire and release may run at any time on any thread. A plain start-up or shut-down
+ * must not run beside other calls.
  */
 #ifndef KZSDK_ABS_STARTUP_H
 #define KZSDK_ABS_STARTUP_H
@@ -58,6 +69,21 @@ KZ_API kz_status kzinit_initialize_vesk_safe(const kzconf_configuration* record,
  * @return 0, also when the library was not started.
  */
 KZ_API kz_status kzinit_shutdown_vesk(void) KZ_NOEXCEPT;
+
+/**
+ * Counts one holder more and starts the library if it is off.
+ *
+ * @return 0: a kzinit_release() is due; KZ_INIT_ERROR_TOO_MANY_HOLDERS at 2^30 - 1 holders.
+ */
+KZ_API kz_status kzinit_acquire(void) KZ_NOEXCEPT;
+
+/**
+ * Counts one holder less. After the last one the library is off, unless it was started by
+ * kzinit_initialize_vesk() too: then it stays on until kzinit_shutdown_vesk().
+ *
+ * @return 0; KZ_INIT_ERROR_NOT_HELD when there is no holder: nothing is changed then.
+ */
+KZ_API kz_status kzinit_release(void) KZ_NOEXCEPT;
 
 KZ_C_END
 

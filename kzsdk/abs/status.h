@@ -46,8 +46,12 @@ typedef uint32_t kz_status;
 
 /* ---- Library start-up (module 0x05) ---------------------------------------------------------- */
 
+/** Nobody holds the library: call kzinit_release() once for each kzinit_acquire(). */
+#define KZ_INIT_ERROR_NOT_HELD UINT32_C(0x90050006)
 /** The configuration record is null: pass one, even if it is cleared. */
 #define KZ_INIT_ERROR_NO_RECORD UINT32_C(0x90050990)
+/** The library has 2^30 - 1 holders: call kzinit_release() once for each kzinit_acquire(). */
+#define KZ_INIT_ERROR_TOO_MANY_HOLDERS UINT32_C(0x90050991)
 
 /* ---- Disc helpers, both families (module 0x06) ----------------------------------------------- */
 

@@ -2,8 +2,11 @@
 
 #include <cstddef>
 #include <cstring>
+#include <thread>
+#include <vector>
 
 #include "kzsdk/abs/memory.h"
+#include "kzsdk/abs/memory_state.hpp"
 #include "support/allocation.hpp"
 
 namespace {
@@ -120,6 +123,117 @@ TEST_F(Startup, ShutdownSwitchesMemoryOffAndMayBeRepeated)
     EXPECT_FALSE(is_on());
     EXPECT_EQ(KZ_OK, kzinit_shutdown_vesk());
     EXPECT_FALSE(is_on());
+}
+
+// ---- Counted start-up
+
+TEST_F(Startup, LastsFromTheFirstHolderToTheLast)
+{
+    EXPECT_EQ(KZ_OK, kzinit_acquire());
+    EXPECT_EQ(KZ_OK, kzinit_acquire());
+    EXPECT_TRUE(is_on());
+    EXPECT_EQ(KZ_OK, kzinit_release());
+    EXPECT_TRUE(is_on()) << "another holder is left";
+    EXPECT_EQ(KZ_OK, kzinit_release());
+    EXPECT_FALSE(is_on());
+}
+
+TEST_F(Startup, ReleaseWithoutAHolderChangesNothing)
+{
+    EXPECT_EQ(KZ_INIT_ERROR_NOT_HELD, kzinit_release());
+    EXPECT_FALSE(is_on());
+    ASSERT_EQ(KZ_OK, kzinit_initialize_vesk(&record_));
+    EXPECT_EQ(KZ_INIT_ERROR_NOT_HELD, kzinit_release());
+    EXPECT_TRUE(is_on());
+}
+
+TEST_F(Startup, PlainStartOutlastsCountedReleases)
+{
+    ASSERT_EQ(KZ_OK, kzinit_initialize_vesk(&record_));
+    ASSERT_EQ(KZ_OK, kzinit_acquire());
+    ASSERT_EQ(KZ_OK, kzinit_release());
+    EXPECT_TRUE(is_on()) << "started before";
+    ASSERT_EQ(KZ_OK, kzinit_shutdown_vesk());
+    ASSERT_EQ(KZ_OK, kzinit_acquire());
+    ASSERT_EQ(KZ_OK, kzinit_initialize_vesk(&record_));
+    ASSERT_EQ(KZ_OK, kzinit_release());
+    EXPECT_TRUE(is_on()) << "started while held";
+}
+
+// A plain shut-down does not count, whoever holds the library.
+TEST_F(Startup, PlainShutdownEndsItForHoldersToo)
+{
+    ASSERT_EQ(KZ_OK, kzinit_acquire());
+    ASSERT_EQ(KZ_OK, kzinit_shutdown_vesk());
+    EXPECT_FALSE(is_on());
+    EXPECT_EQ(nullptr, _kzmem_malloc(1));
+    ASSERT_EQ(KZ_OK, kzinit_acquire());
+    EXPECT_TRUE(is_on()) << "a new holder starts it again";
+    EXPECT_EQ(KZ_OK, kzinit_release());
+    EXPECT_TRUE(is_on()) << "the first holder is still counted";
+    EXPECT_EQ(KZ_OK, kzinit_release());
+    EXPECT_FALSE(is_on());
+}
+
+TEST_F(Startup, PlainShutdownLeavesReleasesDue)
+{
+    ASSERT_EQ(KZ_OK, kzinit_acquire());
+    ASSERT_EQ(KZ_OK, kzinit_shutdown_vesk());
+    EXPECT_EQ(KZ_OK, kzinit_release());
+    EXPECT_FALSE(is_on());
+    EXPECT_EQ(KZ_INIT_ERROR_NOT_HELD, kzinit_release());
+}
+
+// Each holder finds the library on however the others come and go.
+TEST_F(Startup, HoldersOnThreadsDoNotEndEachOther)
+{
+    std::vector<std::thread> threads;
+    std::vector<int> failed(4, 0);
+    for (int& count : failed) {
+        threads.emplace_back([&count] {
+            for (int round = 0; round < 20000; ++round) {
+                count += kzinit_acquire() != KZ_OK;
+                void* const block = _kzmem_malloc(8);
+                count += block == nullptr || _kzmem_free(block) != KZ_OK;
+                count += kzinit_release() != KZ_OK;
+            }
+        });
+    }
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+    EXPECT_EQ(std::vector<int>(4, 0), failed);
+    EXPECT_FALSE(is_on());
+}
+
+TEST(MemoryState, HolderCountNeitherWrapsNorSpills)
+{
+    using kz::MemoryState;
+    constexpr MemoryState kFull((MemoryState::kMaxHolders << 2) | 1);
+    static_assert(kFull.holders() == MemoryState::kMaxHolders);
+    static_assert(kFull.released().acquired().word() == kFull.word());
+    static_assert(kFull.shut_down().holders() == kFull.holders());
+    static_assert(!kFull.shut_down().is_on());
+    static_assert(!MemoryState().acquired().released().is_on());
+    static_assert(MemoryState().acquired().started().released().is_on());
+    EXPECT_EQ(MemoryState::kMaxHolders, kFull.started().holders());
+}
+
+TEST_F(Startup, FailedAllocationsAreCounted)
+{
+    const uint32_t before = kz::failed_allocations();
+    EXPECT_EQ(nullptr, _kzmem_malloc(1));
+    EXPECT_EQ(nullptr, _kzmem_realloc(nullptr, 1));
+    EXPECT_EQ(nullptr, _kzmem_calloc(1, 1));
+    EXPECT_EQ(before + 3, kz::failed_allocations()) << "while it is off";
+    ASSERT_EQ(KZ_OK, kzinit_acquire());
+    {
+        const kz::test::AllocationFault fault(1);
+        EXPECT_EQ(nullptr, _kzmem_malloc(1));
+    }
+    static_cast<void>(_kzmem_free(_kzmem_malloc(0)));
+    EXPECT_EQ(before + 4, kz::failed_allocations());
+    EXPECT_EQ(KZ_OK, kzinit_release());
 }
 
 } // namespace
