@@ -4,11 +4,14 @@
  *
  * Each failure is listed with its cause and its cure. Allocation also fails while the library is not
  * started up, so every ..._ERROR_MEMORY may mean that kzinit_initialize_vesk() was not called.
+ * kz_status_text() says the same at run time.
  */
 #ifndef KZSDK_ABS_STATUS_H
 #define KZSDK_ABS_STATUS_H
 
 #include "kzsdk/abs/base.h"
+
+KZ_C_BEGIN
 
 /** A status: 0 is success, everything else one of the failures below. */
 typedef uint32_t kz_status;
@@ -109,5 +112,17 @@ typedef uint32_t kz_status;
 #define KZ_QV_FRAME_LIMIT_REACHED UINT32_C(0x900f0960)
 /** The fingerprint is not complete: add sound until the flag is set. */
 #define KZ_QV_ERROR_INCOMPLETE UINT32_C(0x900f0961)
+
+/* ---- Texts ----------------------------------------------------------------------------------- */
+
+/**
+ * Describes a status in one English sentence: what went wrong, and what cures it.
+ *
+ * @return A constant of the library, never null: never free it. A number that is no status gets a
+ *         sentence too. Callable at any time, also before start-up.
+ */
+KZ_API const char* kz_status_text(kz_status status) KZ_NOEXCEPT;
+
+KZ_C_END
 
 #endif

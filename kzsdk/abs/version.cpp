@@ -1,6 +1,8 @@
+// The version of the library, and the texts that name the platform. The dates are fixed: services that
+// log these texts know them, and builds stay reproducible.
 #include "kzsdk/abs/version.h"
 
-// The dates are fixed: services that log these texts know them, and builds stay reproducible.
+const char* kzsdk_get_version() noexcept { return KZSDK_VERSION; }
 
 const char* kz_abs_get_common_version() noexcept { return "common-5"; }
 

@@ -1,8 +1,27 @@
 #include "kzsdk/abs/version.h"
 
+#include <string>
+
 #include <gtest/gtest.h>
 
 namespace {
+
+TEST(Version, IsTheProjects)
+{
+    EXPECT_STREQ(KZ_PROJECT_VERSION, KZSDK_VERSION);
+    EXPECT_STREQ(KZSDK_VERSION, kzsdk_get_version());
+}
+
+TEST(Version, IsItsThreeNumbers)
+{
+    EXPECT_EQ(std::to_string(KZSDK_VERSION_MAJOR) + '.' + std::to_string(KZSDK_VERSION_MINOR) +
+                  '.' + std::to_string(KZSDK_VERSION_PATCH),
+              KZSDK_VERSION);
+}
+
+#if KZSDK_VERSION_MAJOR < 1
+#error "the preprocessor can compare the numbers"
+#endif
 
 TEST(Version, TextsAreTheLiteralOnes)
 {
