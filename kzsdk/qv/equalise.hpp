@@ -5,7 +5,7 @@
 ///
 ///     Sample, Rank                     of the samples, and of the values that replace levels
 ///     Extremes                         take(samples), is_silent()
-///     run(pieces, extremes, output, histogram, ranks)
+///     run(pieces, extremes, output, histogram, ranks)      the histogram comes cleared
 #pragma once
 
 #include <algorithm>
@@ -18,8 +18,9 @@
 
 namespace kz::qv {
 
-/// Equalises a frame that comes in two pieces. Silent frames are copied, and all are when memory is
-/// short.
+/// Equalises a frame that comes in two pieces. Silent frames are copied; so is every frame when
+/// memory is short. The histogram is cleared for a silent frame too, and left alone only when
+/// memory is short.
 template <class Equaliser, class Sample = typename Equaliser::Sample>
 kz_status equalise_two_pieces(const Sample* first, uint32_t first_count, const Sample* second,
                               uint32_t second_count, Sample* output, uint32_t output_length,
@@ -29,11 +30,16 @@ kz_status equalise_two_pieces(const Sample* first, uint32_t first_count, const S
         return KZ_OK;
     }
     const auto pieces = cut_to_frame(first, first_count, second, second_count, output_length);
+    const auto ranks = make_array<typename Equaliser::Rank>(levels);
+    if (!ranks) {
+        copy_whole_frame(pieces, second, output, output_length);
+        return KZ_OK;
+    }
+    std::fill_n(histogram, levels, 0U);
     typename Equaliser::Extremes extremes;
     extremes.take(pieces.older);
     extremes.take(pieces.newer);
-    const auto ranks = make_array<typename Equaliser::Rank>(levels);
-    if (!ranks || extremes.is_silent()) {
+    if (extremes.is_silent()) {
         copy_whole_frame(pieces, second, output, output_length);
         return KZ_OK;
     }
@@ -64,6 +70,7 @@ kz_status equalise_one_piece(const Sample* input, Sample* output, uint32_t count
         copy_unless_in_place(input, output, count);
         return KZ_OK;
     }
+    std::fill_n(histogram, levels, 0U);
     typename Equaliser::Extremes extremes;
     extremes.take(whole.older);
     Equaliser::run(whole, extremes, output, std::span(histogram, levels),

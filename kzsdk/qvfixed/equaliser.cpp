@@ -117,7 +117,6 @@ struct Equaliser {
             levels.replace(std::span<const uint32_t>(ranks));
             return;
         }
-        std::fill(histogram.begin(), histogram.end(), 0U);
         quantise(pieces.older, quantiser, output, histogram);
         quantise(pieces.newer, quantiser, output + pieces.older.size(), histogram);
         rank_values(histogram, ranks);

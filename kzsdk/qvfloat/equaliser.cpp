@@ -113,7 +113,6 @@ struct Equaliser {
             levels.replace(std::span<const float>(ranks));
             return;
         }
-        std::fill(histogram.begin(), histogram.end(), 0U);
         count_levels(pieces.older, quantiser, histogram);
         count_levels(pieces.newer, quantiser, histogram);
         rank_values(histogram, count, ranks);

@@ -147,6 +147,35 @@ TYPED_TEST(Equaliser, TheSilentCopyIgnoresTheSecondCount)
     EXPECT_EQ(Frame(8, 7), output);
 }
 
+// The counters of an earlier frame must not be taken for those of a silent one.
+TYPED_TEST(Equaliser, ASilentFrameClearsTheHistogram)
+{
+    using Frame = std::vector<typename TypeParam::Sample>;
+    for (const uint32_t levels : {1U, 256U, 300U}) {
+        const Frame silence(8, 7);
+        Frame output(8, this->kUntouched);
+        std::vector<uint32_t> histogram(levels + 1, 9);
+        TypeParam::hist_eq_dual(silence.data(), 8, nullptr, 0, output.data(), 8, histogram.data(),
+                                levels);
+        std::vector<uint32_t> expected(levels + 1, 0);
+        expected[levels] = 9; // one counter per level is cleared, no more
+        EXPECT_EQ(expected, histogram) << levels;
+    }
+}
+
+TYPED_TEST(Equaliser, ShortOfMemoryTheHistogramIsLeftAlone)
+{
+    const auto frame = this->samples(random_frame(100, 11));
+    auto output = frame;
+    const std::vector<uint32_t> before(257, 9);
+    auto histogram = before;
+    const AllocationFault fault(1, AllocationFault::FromThenOn);
+    TypeParam::hist_eq_dual(frame.data(), 100, nullptr, 0, output.data(), 100, histogram.data(),
+                            256);
+    TypeParam::hist_eq2(frame.data(), output.data(), 100, histogram.data(), 256);
+    EXPECT_EQ(before, histogram);
+}
+
 TYPED_TEST(Equaliser, ANullPieceCountsAsNone)
 {
     using Frame = std::vector<typename TypeParam::Sample>;
