@@ -124,7 +124,8 @@ KZ_API kz_status kzqvfixed_signal_detector_reset(kzqvfixed_signal_detector* dete
  *
  * @param samples  @p count samples.
  * @param shift    Samples are shifted right by this, towards zero, before they are judged; 13 is
- *                 what the fingerprinter uses. Taken modulo 256; 32 and more make every sample 0.
+ *                 what the fingerprinter uses. 32 or more makes every sample 0, and so does a
+ *                 negative shift.
  * @return Half a window before the sample at which the mean deviation exceeds the threshold, 0 when
  *         that lies before the block; @p count when there is no signal, the detector is null, or
  *         @p samples is null.

@@ -28,13 +28,13 @@ uint32_t kzqvfixed_signal_detector_get_signal_offset(kzqvfixed_signal_detector* 
     if (detector == nullptr || (samples == nullptr && count != 0)) {
         return count;
     }
-    // Counts are taken modulo 256, as in all fixed-point shifts, and 32 and more leave nothing.
-    const auto bits = static_cast<uint8_t>(shift);
+    // A shift of 32 or more leaves no bit, and a negative one counts as large.
+    const bool leaves_bits = shift >= 0 && shift < 32;
     return kz::qv::signal_offset(*detector, std::span(samples, count),
-                                 [bits](const FxpType* from, uint32_t number, int32_t* levels) {
-                                     if (bits < 32) {
+                                 [=](const FxpType* from, uint32_t number, int32_t* levels) {
+                                     if (leaves_bits) {
                                          kz::kernels::active().shift_towards_zero(from, levels,
-                                                                                  number, bits);
+                                                                                  number, shift);
                                      } else {
                                          std::fill_n(levels, number, 0);
                                      }

@@ -31,7 +31,7 @@ TEST_F(FixedSignalDetector, SamplesAreShiftedTowardsZero)
     const auto detector = make(4, 100, 1000);
     offset(*detector, {-1, -8191, -8192, 8191}, 13);
     EXPECT_EQ((Words{0, 0, -1, 0}), Words(detector->levels, detector->levels + 4));
-    for (const int32_t shift : {32, 40, 255, -1}) {
+    for (const int32_t shift : {32, 40, 255, 256, 300, INT32_MAX, -1, -256}) {
         kzqvfixed_signal_detector_reset(detector.get());
         offset(*detector, {INT32_MAX, INT32_MIN, -5, 5}, shift);
         EXPECT_EQ(Words(4, 0), Words(detector->levels, detector->levels + 4)) << shift;
