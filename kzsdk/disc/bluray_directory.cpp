@@ -1,3 +1,4 @@
+#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <memory>
@@ -51,6 +52,18 @@ bool is_of_type(const kzbdfs_dirent* entry, mode_t type) noexcept
     return (facts.st_mode & S_IFMT) == type;
 }
 
+/// The next record of a stream. Null at its end and when reading fails; only a failure sets `errno`,
+/// and it becomes the last error.
+const dirent* next_record(DIR* stream) noexcept
+{
+    errno = 0;
+    const dirent* record = ::readdir(stream);
+    if (record == nullptr && errno != 0) {
+        bluray.keep_errno();
+    }
+    return record;
+}
+
 bool is_named(const kzbdfs_dirent* entry, const char* name) noexcept
 {
     return entry != nullptr && std::strcmp(entry->record->d_name, name) == 0;
@@ -70,8 +83,12 @@ kz_status kzbdfs_open_dir(const char* path, kzbdfs_dir** handle) noexcept
         return KZ_DISC_ERROR_MEMORY;
     }
     dir->path = joined(path, "");
-    dir->stream = dir->path != nullptr ? ::opendir(path) : nullptr;
+    if (dir->path == nullptr) {
+        return KZ_DISC_ERROR_MEMORY;
+    }
+    dir->stream = ::opendir(path);
     if (dir->stream == nullptr) {
+        bluray.keep_errno(); // the reason; the result says "out of memory" whatever it was
         return KZ_DISC_ERROR_MEMORY;
     }
     *handle = dir.release();
@@ -80,7 +97,7 @@ kz_status kzbdfs_open_dir(const char* path, kzbdfs_dir** handle) noexcept
 
 kzbdfs_dirent* kzbdfs_readdir(kzbdfs_dir* handle) noexcept
 {
-    const dirent* record = handle != nullptr ? ::readdir(handle->stream) : nullptr;
+    const dirent* record = handle != nullptr ? next_record(handle->stream) : nullptr;
     if (record == nullptr) {
         return nullptr;
     }
@@ -131,8 +148,8 @@ void kzbdfs_close_dir(kzbdfs_dir* handle) noexcept
     if (handle == nullptr) {
         return;
     }
-    if (handle->stream != nullptr) {
-        ::closedir(handle->stream);
+    if (handle->stream != nullptr && ::closedir(handle->stream) != 0) {
+        bluray.keep_errno();
     }
     std::free(handle->path);
     std::free(handle);

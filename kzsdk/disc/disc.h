@@ -146,16 +146,16 @@ KZ_API char kzbdfs_dir_get_delim(void) KZ_NOEXCEPT;
  * @param[out] handle  Takes the directory, which the caller closes; not touched on failure.
  * @return The pending last error, normally 0, when @p handle was set. Else
  *         KZ_DISC_ERROR_INVALID_ARGUMENT when a pointer is null, or KZ_DISC_ERROR_MEMORY when
- *         memory is short or the directory cannot be opened, for whatever reason; these do not
- *         become the last error.
+ *         memory is short or the directory cannot be opened, for whatever reason. Why it could not
+ *         be opened becomes the last error; the other two failures do not.
  */
 KZ_API kz_status kzbdfs_open_dir(const char* path, kzbdfs_dir** handle) KZ_NOEXCEPT;
 
 /**
  * Reads the next entry, "." and ".." among them, in no order.
  *
- * @return The entry, which the caller frees; null at the end, for null, or when memory is short (an
- *         entry is passed over then).
+ * @return The entry, which the caller frees; null at the end, for null, when reading fails (the
+ *         reason becomes the last error), or when memory is short (an entry is passed over then).
  */
 KZ_API kzbdfs_dirent* kzbdfs_readdir(kzbdfs_dir* handle) KZ_NOEXCEPT;
 

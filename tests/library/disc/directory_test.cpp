@@ -120,6 +120,7 @@ TEST_F(DiscDirectory, EndsWithNullAndStaysThere)
     EXPECT_TRUE(next(dir));
     EXPECT_FALSE(next(dir));
     EXPECT_FALSE(next(dir));
+    EXPECT_EQ(KZ_OK, kzbdfs_get_error()) << "the end is no error";
 }
 
 TEST_F(DiscDirectory, TheDelimiterIsASlash) { EXPECT_EQ(47, kzbdfs_dir_get_delim()); }
@@ -146,25 +147,47 @@ TEST_F(DiscDirectory, NullArgumentsAreRefused)
     EXPECT_EQ(0u, kzbdfs_get_error());
 }
 
-TEST_F(DiscDirectory, WhateverKeepsADirectoryFromOpeningIsReportedAsShortMemory)
+TEST_F(DiscDirectory, ADirectoryThatCannotOpenIsShortMemory)
 {
-    const auto expect_refused = [](const std::string& path) {
+    const auto expect_refused = [](const std::string& path, kz_status reason) {
         auto* const untouched = reinterpret_cast<kzbdfs_dir*>(&kzbdfs_dir_get_delim);
         kzbdfs_dir* dir = untouched;
         EXPECT_EQ(KZ_DISC_ERROR_MEMORY, kzbdfs_open_dir(path.c_str(), &dir)) << path;
         EXPECT_EQ(untouched, dir);
-        EXPECT_EQ(0u, kzbdfs_get_error()) << "it does not become the last error";
+        EXPECT_EQ(reason, kzbdfs_get_error()) << path.substr(0, 80);
     };
-    expect_refused(scratch_.path("missing"));
-    expect_refused(scratch_.write("file", "x"));
-    expect_refused("");
-    expect_refused(std::string(10'000, 'x'));
+    expect_refused(scratch_.path("missing"), KZ_DISC_ERROR_NOT_FOUND);
+    expect_refused(scratch_.write("file", "x"), KZ_DISC_ERROR_SYSTEM);
+    expect_refused("", KZ_DISC_ERROR_NOT_FOUND);
+    expect_refused(std::string(10'000, 'x'), KZ_DISC_ERROR_SYSTEM);
     fs::create_directory(scratch_.path("closed"));
     ASSERT_EQ(0, ::chmod(scratch_.path().c_str(), 0755));
     ASSERT_EQ(0, ::chmod(scratch_.path("closed").c_str(), 0));
-    as_nobody([&] { expect_refused(scratch_.path("closed")); });
+    as_nobody([&] { expect_refused(scratch_.path("closed"), KZ_DISC_ERROR_ACCESS_DENIED); });
     ASSERT_EQ(0, ::chmod(scratch_.path("closed").c_str(), 0700)); // or it could not be removed
-    without_descriptors([&] { expect_refused("/"); });
+    without_descriptors([&] { expect_refused("/", KZ_DISC_ERROR_TOO_MANY_FILES); });
+}
+
+// The reason stays pending until it is fetched, so the next success returns it.
+TEST_F(DiscDirectory, AFailedOpenShowsInTheNextSuccess)
+{
+    kzbdfs_dir* dir = nullptr;
+    EXPECT_EQ(KZ_DISC_ERROR_MEMORY, kzbdfs_open_dir(scratch_.path("missing").c_str(), &dir));
+    EXPECT_EQ(KZ_DISC_ERROR_NOT_FOUND, kzbdfs_open_dir("/", &dir));
+    EXPECT_NE(nullptr, dir);
+    kzbdfs_close_dir(dir);
+    EXPECT_EQ(KZ_OK, kzbdfs_get_error());
+}
+
+// The descriptor is closed behind the stream's back, so every call on it fails.
+TEST_F(DiscDirectory, FailedReadingAndClosingLeaveTheirReason)
+{
+    Directory dir = open_directory(scratch_.path());
+    ASSERT_EQ(0, ::close(::dirfd(dir->stream)));
+    EXPECT_FALSE(next(dir));
+    EXPECT_EQ(KZ_DISC_ERROR_BAD_DESCRIPTOR, kzbdfs_get_error());
+    dir.reset();
+    EXPECT_EQ(KZ_DISC_ERROR_BAD_DESCRIPTOR, kzbdfs_get_error());
 }
 
 // Who looks at what is returned, and not at the handle, loses the handle.
@@ -332,6 +355,7 @@ TEST_F(DiscDirectory, ShortMemoryWhenOpeningLeavesNothing)
         EXPECT_EQ(fired() ? KZ_DISC_ERROR_MEMORY : 0u, status);
         EXPECT_EQ(fired(), dir == nullptr);
         kzbdfs_close_dir(dir);
+        kzbdfs_get_error(); // set when it was the stream that had no memory
     });
 }
 
