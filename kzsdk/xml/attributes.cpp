@@ -1,5 +1,7 @@
 #include "kzsdk/xml/attributes.hpp"
 
+#include <utility>
+
 #include "kzsdk/xml/text.hpp"
 
 namespace {
@@ -18,24 +20,6 @@ const XMLAttr* attribute_at(const XMLTag* tag, uint32_t index) noexcept
         --index;
     }
     return attribute;
-}
-
-/// The link that leads to the first attribute of a name: the end of the list when there is none.
-XMLAttr** link_to(XMLTag& tag, Text name) noexcept
-{
-    XMLAttr** link = &tag.attributes;
-    while (*link != nullptr && !kz::xml::matches((*link)->name, name)) {
-        link = &(*link)->next;
-    }
-    return link;
-}
-
-XMLAttr** end_of(XMLAttr** link) noexcept
-{
-    while (*link != nullptr) {
-        link = &(*link)->next;
-    }
-    return link;
 }
 
 /// Frees one record that is in no list, or in no list any more.
@@ -59,14 +43,23 @@ XMLAttr* make_attribute(Text name, Text value) noexcept
     return attribute.release();
 }
 
-/// Takes the attribute out of the list when there is one. Returns the link at its place.
-XMLAttr** remove_attribute(XMLTag& tag, Text name) noexcept
+/// Removes every attribute of a name. There can be several: names that were set with a NUL inside
+/// match up to that NUL, but are no match for one another when they are set.
+///
+/// @return The link at the end of the list.
+XMLAttr** remove_attributes(XMLTag& tag, Text name) noexcept
 {
-    XMLAttr** link = link_to(tag, name);
-    if (XMLAttr* attribute = *link; attribute != nullptr) {
-        *link = attribute->next;
-        dispose_attribute(attribute);
+    XMLAttr* removed = nullptr; // freed last: the name may be the text of one of them
+    XMLAttr** link = &tag.attributes;
+    while (XMLAttr* attribute = *link) {
+        if (kz::xml::matches(attribute->name, name)) {
+            *link = attribute->next;
+            attribute->next = std::exchange(removed, attribute);
+        } else {
+            link = &attribute->next;
+        }
     }
+    kz::xml::dispose_attributes(removed);
     return link;
 }
 
@@ -76,7 +69,7 @@ kz_status set_attribute(XMLTag& tag, Text name, Text value) noexcept
     if (attribute == nullptr) {
         return KZ_XML_ERROR_MEMORY;
     }
-    *end_of(remove_attribute(tag, name)) = attribute;
+    *remove_attributes(tag, name) = attribute;
     return KZ_OK;
 }
 
@@ -151,7 +144,7 @@ kz_status SetXMLTagAttrFromBuf(XMLTag* tag, const char* name, uint32_t name_coun
     if (value != nullptr && value_count != 0) { // a first byte of NUL is a value here
         return set_attribute(*tag, wanted, {value, value_count});
     }
-    remove_attribute(*tag, wanted);
+    remove_attributes(*tag, wanted);
     return KZ_OK;
 }
 

@@ -145,12 +145,13 @@ KZ_API const char* GetXMLTagAttrFromStr(const XMLTag* tag, const char* name) KZ_
 
 /**
  * Sets an attribute: it becomes the last of the list, also when the tag had it before. An empty
- * value takes the attribute out instead.
+ * value removes the attribute instead. Either way every attribute of this name goes, should there
+ * be several (names with a NUL inside, which are read up to it, can make doubles).
  *
  * A value whose count is not 0 but whose first byte is NUL is stored and reads as an empty text;
  * CloneXMLTag() and CopyXMLTag() drop such an attribute.
  *
- * @return 0, also when there was nothing to take out; KZ_XML_ERROR_INVALID_ARGUMENT when the tag is
+ * @return 0, also when there was nothing to remove; KZ_XML_ERROR_INVALID_ARGUMENT when the tag is
  *         null or the name empty; KZ_XML_ERROR_MEMORY when memory is short. A failure changes
  *         nothing.
  */
