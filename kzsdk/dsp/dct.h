@@ -14,7 +14,7 @@ typedef struct KZDSP_DCT_fixed {
     int32_t order;               /**< base-2 logarithm of the length */
     uint32_t length;             /**< L: 16384 or 32768 points */
     const int32_t* coefficients; /**< L butterfly factors; entry 0 is not used */
-    uint32_t owns_coefficients;  /**< always 0: the factors are constants */
+    uint32_t owns_coefficients;  /**< 0: the factors are constants; else destroying frees them */
 } KZDSP_DCT_fixed;
 
 /**

@@ -34,7 +34,11 @@ KZDSP_DCT_fixed* KZDSP_DCT_fixed_create(int32_t order) noexcept
 
 void KZDSP_DCT_fixed_destroy(KZDSP_DCT_fixed* dct) noexcept
 {
-    const kz::owned<KZDSP_DCT_fixed> owned(dct);
+    if (dct != nullptr) {
+        const kz::owned<int32_t[]> coefficients(
+            dct->owns_coefficients != 0 ? const_cast<int32_t*>(dct->coefficients) : nullptr);
+        const kz::owned<KZDSP_DCT_fixed> record(dct);
+    }
 }
 
 void KZDSP_DCT_fixed_compute(const KZDSP_DCT_fixed* dct, int32_t* data, int32_t /*mode*/) noexcept

@@ -119,6 +119,31 @@ TEST_F(DctFixed, NullsDoNothing)
     EXPECT_EQ(Words(16384, 3), data);
 }
 
+// The table goes with the transform only when it is there and the transform owns it.
+TEST_F(DctFixed, DestroyFreesATableThatItOwns)
+{
+    const int64_t before = live_blocks();
+    auto* dct = KZDSP_DCT_fixed_create(14);
+    dct->coefficients = static_cast<const int32_t*>(_kzmem_malloc(16));
+    dct->owns_coefficients = 1;
+    KZDSP_DCT_fixed_destroy(dct);
+    EXPECT_EQ(before, live_blocks());
+
+    dct = KZDSP_DCT_fixed_create(14);
+    dct->coefficients = nullptr;
+    dct->owns_coefficients = 1;
+    KZDSP_DCT_fixed_destroy(dct);
+    EXPECT_EQ(before, live_blocks());
+
+    dct = KZDSP_DCT_fixed_create(14);
+    void* const table = _kzmem_malloc(16);
+    dct->coefficients = static_cast<const int32_t*>(table);
+    dct->owns_coefficients = 0;
+    KZDSP_DCT_fixed_destroy(dct);
+    EXPECT_EQ(before + 1, live_blocks());
+    _kzmem_free(table);
+}
+
 TEST_F(DctFixed, FailedAllocationsMakeNoTransform)
 {
     for_every_failed_allocation([](auto fired) {

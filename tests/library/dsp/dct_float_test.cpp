@@ -261,6 +261,31 @@ TEST_F(DctFloat, NullsDoNothing)
     EXPECT_EQ(Floats(16, 3), data);
 }
 
+// The table goes with the transform only when it is there and the transform owns it.
+TEST_F(DctFloat, DestroyFreesATableThatItOwns)
+{
+    const int64_t before = live_blocks();
+    auto* dct = KZDSP_CreateDCT(14);
+    dct->coefficients = static_cast<const float*>(_kzmem_malloc(16));
+    dct->owns_coefficients = 1;
+    KZDSP_DestroyDCT(dct);
+    EXPECT_EQ(before, live_blocks());
+
+    dct = KZDSP_CreateDCT(14);
+    dct->coefficients = nullptr;
+    dct->owns_coefficients = 1;
+    KZDSP_DestroyDCT(dct);
+    EXPECT_EQ(before, live_blocks());
+
+    dct = KZDSP_CreateDCT(14);
+    void* const table = _kzmem_malloc(16);
+    dct->coefficients = static_cast<const float*>(table);
+    dct->owns_coefficients = 0;
+    KZDSP_DestroyDCT(dct);
+    EXPECT_EQ(before + 1, live_blocks());
+    _kzmem_free(table);
+}
+
 TEST_F(DctFloat, FailedAllocationsMakeNoTransform)
 {
     for_every_failed_allocation([](auto fired) {
