@@ -63,17 +63,18 @@ void append_record(Manager& manager, owned<Record> record) noexcept
     manager.fingerprint_ready = 0;
 }
 
-/// Moves all records of `more` to the end of the manager's list.
+/// Moves all records of `more` to the end of the manager's list. The fingerprint is made anew
+/// afterwards, also when there were none to move.
 template <class Manager, class List>
 void append_records(Manager& manager, List& more) noexcept
 {
+    manager.fingerprint_ready = 0;
     if (more.records == nullptr) {
         return;
     }
     *manager.records_tail = more.records;
     manager.records_tail = more.records_tail;
     manager.frame_count += more.frame_count;
-    manager.fingerprint_ready = 0;
     more.records = nullptr;
 }
 

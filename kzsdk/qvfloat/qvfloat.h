@@ -227,7 +227,7 @@ KZ_API kz_status QVFM_Reset(QVFM* manager) KZ_NOEXCEPT;
  * not, whatever @p second_count says (see hist_eq_dual()).
  *
  * @param first, second  Pieces, oldest first. A null piece counts as none; two null pieces are no
- *                       frame.
+ *                       frame, but still use up a frame to skip.
  * @return 0 in every case.
  */
 KZ_API kz_status QVFM_AppendDualPCMData(QVFM* manager, const float* first, uint32_t first_count,
@@ -298,9 +298,10 @@ KZ_API uint32_t QVFM_GetFrameData(const QVFM* manager, void* destination,
  * Note the sense of the result, against that of the other functions.
  *
  * @param data  @p size bytes, at any address.
- * @return 1 when the data was accepted, even if every frame was then dropped. 0, and nothing
- *         appended, when a pointer is null, the data is not exactly one such block for this number
- *         of bands, it has frames without bands, or memory is short.
+ * @return 1 when the data was accepted, even if every frame was then dropped: the next
+ *         QVFM_GetFingerprint() computes the fingerprint again. 0, and nothing appended, when a
+ *         pointer is null, the data is not exactly one such block for this number of bands, it has
+ *         frames without bands, or memory is short.
  */
 KZ_API uint32_t QVFM_AppendFrameData(QVFM* manager, const void* data, uint32_t size) KZ_NOEXCEPT;
 
