@@ -254,8 +254,9 @@ kz_status QVFM_Reset(QVFM* manager) noexcept
 kz_status QVFM_AppendDualPCMData(QVFM* manager, const float* first, uint32_t first_count,
                                  const float* second, uint32_t second_count) noexcept
 {
-    if (manager == nullptr || (first == nullptr && second == nullptr) ||
-        !kz::qv::admits_frame(*manager)) {
+    // Skipping comes first: two null pieces use up a frame to skip, and otherwise do nothing.
+    if (manager == nullptr || !kz::qv::admits_frame(*manager) ||
+        (first == nullptr && second == nullptr)) {
         return KZ_OK;
     }
     fill_frame(*manager, first, first_count, second, second_count);

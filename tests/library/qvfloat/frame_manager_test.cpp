@@ -179,6 +179,18 @@ TEST_F(FloatFrameManager, ANullFirstPieceIsAFrameOfTheSecond)
 }
 
 // A frame's buffer holds its transform: that is what short pieces leave behind their end.
+// Skipping comes before the pieces are looked at: no samples at all still use up a frame to skip.
+TEST_F(FloatFrameManager, TwoNullPiecesUseUpAFrameToSkip)
+{
+    const auto manager = make_manager<Float>([](QVConfig& config) { config.skip_frames = 1; });
+    EXPECT_EQ(KZ_OK, QVFM_AppendDualPCMData(manager.get(), nullptr, 0, nullptr, 0));
+    EXPECT_EQ(0U, manager->skip_remaining);
+    EXPECT_EQ(0U, manager->frame_count);
+    EXPECT_EQ(KZ_OK, QVFM_AppendDualPCMData(manager.get(), nullptr, 0, nullptr, 0));
+    EXPECT_EQ(0U, manager->frame_count) << "and are no frame themselves";
+    EXPECT_EQ(KZ_OK, QVFM_AppendDualPCMData(nullptr, nullptr, 0, nullptr, 0));
+}
+
 TEST_F(FloatFrameManager, ShortPiecesLeaveTheTransformOfThePreviousFrame)
 {
     const auto manager = unequalised();
