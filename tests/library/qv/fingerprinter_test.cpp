@@ -125,6 +125,18 @@ TYPED_TEST(Fingerprinter, SilenceOnlyGrowsTheOffset)
     EXPECT_EQ(2 * silence.size(), object->signal_offset);
 }
 
+// 8000 Hz is resampled upwards, so an output may need no new input. With this much silence the
+// signal starts one sample into the ring; its last place is then filled without consuming a byte,
+// and the rest of the buffer must still be used.
+TYPED_TEST(Fingerprinter, AStepThatOnlyProducesIsNotTheEnd)
+{
+    const auto object = make_fingerprinter<TypeParam>(8000, kPcm16, 1);
+    std::vector<int16_t> music(95139, 0);
+    const auto sound = noise(8000 * 15, 0.5, 1);
+    music.insert(music.end(), sound.begin(), sound.end());
+    EXPECT_TRUE(feed<TypeParam>(object, music));
+}
+
 TYPED_TEST(Fingerprinter, FramesAreCutEveryHopFromTheSignalsStart)
 {
     const auto object = make_fingerprinter<TypeParam>(11025, kPcm16, 1);
