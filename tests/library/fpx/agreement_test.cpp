@@ -1,4 +1,4 @@
-/// How far the two algorithms' fingerprints of the same sound lie apart. docs/numbers.md holds the
+/// How far the two algorithms' fingerprints of the same sound lie apart. docs/closeness.md holds the
 /// table that this program prints.
 
 #include <algorithm>
