@@ -32,8 +32,12 @@ constexpr Entry kTexts[] = {
     {KZ_MEM_NOT_ON,
      "The memory manager is off: start the library up first, and free before it is shut down."},
 
+    {KZ_INIT_ERROR_NOT_HELD,
+     "Nobody holds the library: call kzinit_release() only once for each kzinit_acquire()."},
     {KZ_INIT_ERROR_NO_RECORD,
      "The start-up record is null: pass one that kzconf_initialize_configuration() has cleared."},
+    {KZ_INIT_ERROR_TOO_MANY_HOLDERS,
+     "Too many users hold the library: call kzinit_release() once for each kzinit_acquire()."},
 
     {KZ_DISC_ERROR_MEMORY,
      "Memory is short, the directory cannot be opened, or the name does not fit: check the path, "

@@ -45,7 +45,9 @@ TEST(Status, OfTheCoreIsMadeOfModuleAndReason)
     EXPECT_EQ(code(0x03, 0x004), KZ_DYN_BUF_ERROR_INVALID_ARGUMENT);
     EXPECT_EQ(code(0x04, 0x005), KZ_MEM_ALREADY_ON);
     EXPECT_EQ(code(0x04, 0x006), KZ_MEM_NOT_ON);
+    EXPECT_EQ(code(0x05, 0x006), KZ_INIT_ERROR_NOT_HELD);
     EXPECT_EQ(code(0x05, 0x990), KZ_INIT_ERROR_NO_RECORD);
+    EXPECT_EQ(code(0x05, 0x991), KZ_INIT_ERROR_TOO_MANY_HOLDERS);
 }
 
 TEST(Status, OfDiscsIsMadeOfModuleAndReason)
