@@ -1,12 +1,16 @@
-# The Java front: whether it is built, over which platform, and which names leave the library.
+# The Java front: whether it is built, over which platform, and which names leave the library. None of it
+# depends on what the machine that builds happens to have: what is missing stops the configuration.
 #
 #   KZ_JNI       build the front into the library: it costs a few kilobytes, and makes the library one
-#                that Java can load. Default: AUTO, when a jni.h is at hand
-#   KZ_JAVA      build kzsdk.jar. Default: AUTO, when the front is built and a JDK is at hand
+#                that Java can load. Needs a jni.h. Default: ON, and OFF where kzsdk is a part of another build
+#   KZ_JAVA      build kzsdk.jar, the front's Java side. Needs a JDK. Default: OFF; the presets have it ON
 #   KZ_PLATFORM  what the front logs to and starts threads with: see
 #                kzsdk/jni/platform/platform.hpp. Default: portable, which needs nothing and so loads
 #                anywhere; ndk when building for Android
-#   KZ_SMALL_MAP export only the extraction interface, start-up and what Java needs
+#   KZ_SMALL_MAP export only the extraction interface, start-up and what Java needs. Default: OFF
+option(KZ_JNI "Build the front that a Java VM loads" ${PROJECT_IS_TOP_LEVEL})
+option(KZ_JAVA "Build kzsdk.jar, the front's Java side" OFF)
+option(KZ_SMALL_MAP "Export only the extraction interface, start-up and JNI_OnLoad" OFF)
 
 find_package(Java 1.8 COMPONENTS Development Runtime QUIET)
 if(Java_JAVAC_EXECUTABLE)
@@ -18,25 +22,13 @@ if(ANDROID)
   find_path(KZ_JNI_INCLUDE_DIR jni.h)
 else()
   find_path(KZ_JNI_INCLUDE_DIR jni.h HINTS "${KZ_JAVA_HOME}/include" "$ENV{JAVA_HOME}/include"
-            DOC "Where jni.h is")
+            PATH_SUFFIXES android/nativehelper DOC "Where jni.h is")
 endif()
 find_path(
   KZ_JNI_MD_INCLUDE_DIR jni_md.h
   HINTS "${KZ_JNI_INCLUDE_DIR}/linux" "${KZ_JNI_INCLUDE_DIR}/darwin"
   DOC "Where the jni_md.h that jni.h includes is")
 mark_as_advanced(KZ_JNI_INCLUDE_DIR KZ_JNI_MD_INCLUDE_DIR)
-
-# What a machine has is looked at each time: a JDK that is installed after the first build is used by the
-# next.
-set(KZ_JNI AUTO CACHE STRING "Build the front that a Java VM loads: ON, OFF, or AUTO, where there is a jni.h")
-set_property(CACHE KZ_JNI PROPERTY STRINGS AUTO ON OFF)
-if(KZ_JNI STREQUAL "AUTO")
-  set(KZ_JNI OFF)
-  if(KZ_JNI_INCLUDE_DIR)
-    set(KZ_JNI ON)
-  endif()
-endif()
-option(KZ_SMALL_MAP "Export only the extraction interface, start-up and JNI_OnLoad" ${ANDROID})
 
 set(platform_default portable)
 if(ANDROID)
@@ -49,7 +41,9 @@ if(NOT KZ_PLATFORM MATCHES "^(portable|ndk|aosp)$")
 endif()
 
 if(KZ_JNI AND NOT KZ_JNI_INCLUDE_DIR)
-  message(FATAL_ERROR "KZ_JNI needs jni.h: install a JDK, set JAVA_HOME, or take -DKZ_JNI=OFF")
+  message(FATAL_ERROR "KZ_JNI, the front that a Java VM loads, needs a jni.h, and there is none.\n"
+                      "Install a JDK (Debian: default-jdk-headless; elsewhere set JAVA_HOME), or the header alone "
+                      "(Debian: android-libnativehelper-dev), or build without the front: -DKZ_JNI=OFF")
 endif()
 
 add_library(kz_jni_headers INTERFACE)
@@ -92,13 +86,13 @@ function(kz_symbol_map variable)
   set(${variable} "${map}" PARENT_SCOPE)
 endfunction()
 
-set(KZ_JAVA AUTO CACHE STRING "Build kzsdk.jar, the front's Java side: ON, OFF, or AUTO, where there is a JDK")
-set_property(CACHE KZ_JAVA PROPERTY STRINGS AUTO ON OFF)
-if(KZ_JAVA STREQUAL "AUTO")
-  set(KZ_JAVA OFF)
-  if(KZ_JNI AND Java_JAVAC_EXECUTABLE AND Java_JAR_EXECUTABLE AND NOT CMAKE_CROSSCOMPILING)
-    set(KZ_JAVA ON)
-  endif()
+if(KZ_JAVA AND NOT KZ_JNI)
+  message(FATAL_ERROR "KZ_JAVA builds the Java side of what -DKZ_JNI=OFF leaves out: take -DKZ_JAVA=OFF too")
+endif()
+if(KZ_JAVA AND NOT (Java_JAVAC_EXECUTABLE AND Java_JAR_EXECUTABLE))
+  message(FATAL_ERROR "KZ_JAVA, which builds kzsdk.jar, needs javac and jar of a JDK, and there are none.\n"
+                      "Install a JDK (Debian: default-jdk-headless; elsewhere set JAVA_HOME), or build without the "
+                      "jar: -DKZ_JAVA=OFF")
 endif()
 
 # A jar tells when each class was written, unless the tool (of JDK 17 and later) is told what to say.

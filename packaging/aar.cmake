@@ -2,12 +2,10 @@
 #
 #   cmake -D JAR=kzsdk.jar -D "LIBRARIES=arm64-v8a=path/libkzsdk.so;x86_64=path/libkzsdk.so"
 #         -D VERSION=1.0.0 -D NDK=27 -D WORK_DIR=scratch -D OUT=kzsdk.aar -P aar.cmake
-cmake_minimum_required(VERSION 3.25)
+cmake_minimum_required(VERSION 3.22)
 
 set(MIN_SDK 24)
 set(abis arm64-v8a armeabi-v7a x86_64 x86)
-# What a native user of the small list of names needs.
-set(headers abs/base.h abs/startup.h abs/status.h abs/version.h fpx/fpx.h)
 
 foreach(variable JAR LIBRARIES VERSION NDK WORK_DIR OUT)
   if(NOT DEFINED ${variable})
@@ -29,6 +27,8 @@ set(module "${prefab}/modules/kzsdk")
 file(WRITE "${prefab}/prefab.json"
      "{\"schema_version\": 2, \"name\": \"kzsdk\", \"version\": \"${VERSION}\", \"dependencies\": []}\n")
 file(WRITE "${module}/module.json" "{\"export_libraries\": [], \"library_name\": \"libkzsdk\"}\n")
+# Every .h of the library is public.
+file(GLOB_RECURSE headers RELATIVE "${root}/kzsdk" "${root}/kzsdk/*.h")
 foreach(header IN LISTS headers)
   configure_file("${root}/kzsdk/${header}" "${module}/include/kzsdk/${header}" COPYONLY)
 endforeach()

@@ -25,7 +25,8 @@ build_in() {
     mkdir -p "$1"
     tar -c --exclude=./build --exclude=./.git . | tar -x -C "$1"
     # shellcheck disable=SC2086 # the names are meant to be split
-    if ! { cmake -S "$1" -B "$1/build" -G Ninja -DCMAKE_BUILD_TYPE=Release -DKZ_BUILD_TESTS=OFF &&
+    if ! { cmake -S "$1" -B "$1/build" -G Ninja -DCMAKE_BUILD_TYPE=Release -DKZ_JAVA=ON \
+        -DKZ_BUILD_TESTS=OFF &&
         cmake --build "$1/build" --parallel "$2" --target $targets; } >"$folder/log" 2>&1; then
         tail -n 20 "$folder/log"
         echo "check_reproducible: not built in $1" >&2

@@ -57,7 +57,8 @@ configure() {
     esac
     # shellcheck disable=SC2086 # the options are meant to be split
     cmake -S . -B "$2" -G Ninja $compiler -DCMAKE_BUILD_TYPE=None -DCMAKE_C_FLAGS="$flags" \
-        -DCMAKE_CXX_FLAGS="$flags" -DKZ_BUILD_TOOLS=OFF $what -DKZ_BUILD_GOLDEN=ON -DKZ_WERROR=ON
+        -DCMAKE_CXX_FLAGS="$flags" -DKZ_JNI=OFF -DKZ_BUILD_TOOLS=OFF $what -DKZ_BUILD_GOLDEN=ON \
+        -DKZ_WERROR=ON
 }
 
 # What starts a program of this way.

@@ -9,11 +9,12 @@ set -eu
 
 packages_of() {
     case $1 in
-    build) echo "g++ cmake ninja-build make" ;;
+    # Also a jni.h, for the library's Java front.
+    build) echo "g++ cmake ninja-build make android-libnativehelper-dev" ;;
     tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev" ;;
     test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso python3" ;;
-    # The Java front and its tests; Android's log, threads and jni.h as a desktop has them.
-    java) echo "default-jdk-headless junit4 android-liblog-dev android-libutils-dev android-libnativehelper-dev" ;;
+    # The Java front and its tests; Android's log and threads as a desktop has them.
+    java) echo "default-jdk-headless junit4 android-liblog-dev android-libutils-dev" ;;
     clips) echo "sox libsox-fmt-all espeak-ng" ;; # the demo's music, and the tests' clips
     # What counts instructions and prints tables, and the peers, each of which may be missing.
     bench) echo "valgrind python3 pkg-config libcli11-dev nlohmann-json3-dev libchromaprint-dev libfftw3-dev libswresample-dev libavutil-dev libsoxr-dev libspeexdsp-dev libpugixml-dev libtinyxml2-dev libxml2-dev" ;;

@@ -1,5 +1,5 @@
 # Packs an AAR and looks into it.
-cmake_minimum_required(VERSION 3.25)
+cmake_minimum_required(VERSION 3.22)
 
 function(expect text pattern what)
   if(NOT text MATCHES "${pattern}")
@@ -30,16 +30,15 @@ set(expected
     R.txt
     classes.jar
     jni/x86_64/libkzsdk.so
-    ${module}/include/kzsdk/abs/base.h
-    ${module}/include/kzsdk/abs/startup.h
-    ${module}/include/kzsdk/abs/status.h
-    ${module}/include/kzsdk/abs/version.h
-    ${module}/include/kzsdk/fpx/fpx.h
     ${module}/libs/android.x86_64/abi.json
     ${module}/libs/android.x86_64/libkzsdk.so
     ${module}/module.json
     prefab/prefab.json
     proguard.txt)
+foreach(header IN LISTS HEADERS ITEMS "${ROOT}/kzsdk/kzsdk.h")
+  file(RELATIVE_PATH place "${ROOT}" "${header}")
+  list(APPEND expected "${module}/include/${place}")
+endforeach()
 list(SORT expected)
 if(NOT files STREQUAL expected)
   message(SEND_ERROR "The package holds\n${files}\nand not\n${expected}")
@@ -76,7 +75,7 @@ foreach(member IN LISTS bound)
   endif()
 endforeach()
 
-# The library exports the small list, and nothing else.
+# The library exports the names of its list under the version of the interface, and nothing else.
 file(READ "${MAP}" map)
 string(REGEX REPLACE "#[^\n]*" "" map "${map}")
 string(REGEX REPLACE "local:.*" "" map "${map}")
@@ -85,7 +84,8 @@ string(REGEX MATCHALL "[A-Za-z_0-9]+" names "${map}")
 list(SORT names)
 output_of(exported "${NM}" -D --defined-only --format=posix "${tree}/jni/x86_64/libkzsdk.so")
 string(REGEX MATCHALL "[^\n]+" exported "${exported}")
-list(TRANSFORM exported REPLACE " .*" "")
+list(FILTER exported EXCLUDE REGEX "^KZSDK_1.0 A ")
+list(TRANSFORM exported REPLACE "@@KZSDK_1\\.0 T .*" "")
 list(SORT exported)
 if(NOT exported STREQUAL names)
   message(SEND_ERROR "The library exports\n${exported}\nand not\n${names}")

@@ -1,7 +1,7 @@
 # The desktop example must print what kzfp prints, file by file.
 #
 #   cmake -D JAVA= -D CLASSPATH= -D LIBRARY= -D KZFP= -D CLIPS= -P same_document.cmake
-cmake_minimum_required(VERSION 3.25)
+cmake_minimum_required(VERSION 3.22)
 
 file(GLOB files "${CLIPS}/music-*-s16.wav" "${CLIPS}/music-*-alaw.wav" "${CLIPS}/music-*-ulaw.wav")
 list(LENGTH files count)

@@ -3,115 +3,31 @@
 // not link for users.
 
 #include <algorithm>
-#include <cstring>
 #include <fstream>
 #include <iterator>
 #include <regex>
 #include <set>
-#include <stdexcept>
 #include <string>
 #include <string_view>
 #include <vector>
 
 #include <elf.h>
-#include <link.h>
 
 #include <gtest/gtest.h>
 
+#include "whole/abi/shared_library.hpp"
+
 namespace {
 
-using Names = std::set<std::string>;
-
-std::string text_of(const std::string& path)
-{
-    std::ifstream in(path, std::ios::binary);
-    if (!in) {
-        throw std::runtime_error("cannot read " + path);
-    }
-    return {std::istreambuf_iterator<char>(in), {}};
-}
-
-/// The little of an ELF file that is asked for here.
-class SharedLibrary {
-public:
-    explicit SharedLibrary(const std::string& path) : bytes_(text_of(path))
-    {
-        const auto header = at<ElfW(Ehdr)>(0);
-        for (unsigned i = 0; i < header.e_shnum; ++i) {
-            sections_.push_back(at<ElfW(Shdr)>(header.e_shoff + i * header.e_shentsize));
-        }
-    }
-
-    /// Every symbol that others can bind to.
-    std::vector<std::pair<std::string, unsigned>> exports() const
-    {
-        std::vector<std::pair<std::string, unsigned>> found;
-        for_each<ElfW(Sym)>(SHT_DYNSYM, [&](const ElfW(Sym) & symbol, const ElfW(Shdr) & strings) {
-            if (symbol.st_name != 0 && symbol.st_shndx != SHN_UNDEF) {
-                found.emplace_back(text(strings, symbol.st_name), ELF64_ST_TYPE(symbol.st_info));
-            }
-        });
-        return found;
-    }
-
-    std::vector<ElfW(Phdr)> loaded_segments() const
-    {
-        const auto header = at<ElfW(Ehdr)>(0);
-        std::vector<ElfW(Phdr)> found;
-        for (unsigned i = 0; i < header.e_phnum; ++i) {
-            const auto segment = at<ElfW(Phdr)>(header.e_phoff + i * header.e_phentsize);
-            if (segment.p_type == PT_LOAD) {
-                found.push_back(segment);
-            }
-        }
-        return found;
-    }
-
-    Names dynamic_texts(ElfW(Sxword) tag) const
-    {
-        Names found;
-        for_each<ElfW(Dyn)>(SHT_DYNAMIC, [&](const ElfW(Dyn) & entry, const ElfW(Shdr) & strings) {
-            if (entry.d_tag == tag) {
-                found.insert(text(strings, entry.d_un.d_val));
-            }
-        });
-        return found;
-    }
-
-private:
-    template <class T>
-    T at(size_t offset) const
-    {
-        T value{};
-        std::memcpy(&value, bytes_.substr(offset, sizeof value).data(), sizeof value);
-        return value;
-    }
-
-    template <class Entry, class Visit>
-    void for_each(unsigned type, Visit visit) const
-    {
-        for (const auto& section : sections_) {
-            for (size_t at_byte = 0; section.sh_type == type && at_byte < section.sh_size;
-                 at_byte += sizeof(Entry)) {
-                visit(at<Entry>(section.sh_offset + at_byte), sections_.at(section.sh_link));
-            }
-        }
-    }
-
-    std::string text(const ElfW(Shdr) & strings, size_t offset) const
-    {
-        return bytes_.c_str() + strings.sh_offset + offset;
-    }
-
-    std::string bytes_;
-    std::vector<ElfW(Shdr)> sections_;
-};
+using kz::test::Names;
+using kz::test::SharedLibrary;
+using kz::test::text_of;
 
 Names names_of_library()
 {
     Names names;
-    for (const auto& [name, type] : SharedLibrary(KZ_LIBRARY).exports()) {
-        names.insert(name);
+    for (const auto& exported : SharedLibrary(KZ_LIBRARY).exports()) {
+        names.insert(exported.name);
     }
     return names;
 }
@@ -191,9 +107,27 @@ TEST(ExportedNames, OfTheMapAreThoseOfTheHeaders)
 
 TEST(ExportedNames, AreAllFunctions)
 {
-    for (const auto& [name, type] : SharedLibrary(KZ_LIBRARY).exports()) {
-        EXPECT_EQ(unsigned{STT_FUNC}, type) << name;
+    for (const auto& exported : SharedLibrary(KZ_LIBRARY).exports()) {
+        EXPECT_EQ(unsigned{STT_FUNC}, exported.type) << exported.name;
     }
+}
+
+// A program that was linked with this library asks for the version, so a later one may change what a name
+// does under a new version and still serve it.
+TEST(ExportedNames, BearTheVersionOfTheInterface)
+{
+    Names versions;
+    for (const auto& exported : SharedLibrary(KZ_LIBRARY).exports()) {
+        versions.insert(exported.version);
+    }
+    EXPECT_EQ(Names{"KZSDK_1.0"}, versions);
+}
+
+// Else any program or library that happens to export the same name, as sq_root may be one, would be
+// called in its place.
+TEST(ExportedNames, AreNotLookedUpFromWithin)
+{
+    EXPECT_EQ(Names{}, SharedLibrary(KZ_LIBRARY).own_names_looked_up());
 }
 
 // A map that lists a name twice hides a slip of the one who edited it.

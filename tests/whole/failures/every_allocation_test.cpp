@@ -702,7 +702,8 @@ Names exported_names()
 {
     Names names;
     for (const std::string& line : lines_of("nm -D --defined-only " KZ_LIBRARY)) {
-        names.insert(line.substr(line.rfind(' ') + 1));
+        const auto name = line.substr(line.rfind(' ') + 1);
+        names.insert(name.substr(0, name.find('@')));
     }
     return names;
 }

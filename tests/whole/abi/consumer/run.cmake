@@ -2,7 +2,7 @@
 # offered, and compares what the programs print.
 #
 #   cmake -D BUILD_DIR= -D WORK_DIR= -D EXAMPLE= -D C_COMPILER= -D GENERATOR= -D LIBDIR= -P run.cmake
-cmake_minimum_required(VERSION 3.25)
+cmake_minimum_required(VERSION 3.22)
 
 function(run)
   execute_process(COMMAND ${ARGV} COMMAND_ERROR_IS_FATAL ANY)
