@@ -312,7 +312,7 @@ TEST_F(DiscDirectory, APathOfAnyLengthIsListed)
 }
 
 // The name can still be read; the system looks at no path of 4096 bytes or more.
-TEST_F(DiscDirectory, AnEntryWhosePathIsTooLongForTheSystemIsListedButNothing)
+TEST_F(DiscDirectory, AnEntryWhosePathIsTooLongIsOnlyListed)
 {
     const std::string path = make_deep(scratch_, 4090);
     const std::string name = "longer-than-6";

@@ -142,7 +142,7 @@ TEST_F(DiscNames, AreTheLiteralOnes)
     expect("/mnt/disc/VIDEO_TS/VTS_123_0.IFO", "title set 123");
 }
 
-TEST_F(DiscNames, ASlashAtTheEndOfABlurayRootCountsUnlessItIsTheRoot)
+TEST_F(DiscNames, ASlashEndingABlurayRootCountsUnlessAlone)
 {
     char name[64];
     for (const auto& [root, expected] : std::vector<std::pair<const char*, const char*>>{
@@ -307,7 +307,7 @@ TEST_F(DiscNames, NullIsRefusedByDvd)
     EXPECT_STREQ("before", name);
 }
 
-TEST_F(DiscNames, ABlurayNameForgetsTheLastErrorAndADvdNameDoesNot)
+TEST_F(DiscNames, OnlyABlurayNameForgetsTheLastError)
 {
     char name[64];
     kzbdfs_shutdown();

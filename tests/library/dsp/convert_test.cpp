@@ -47,7 +47,7 @@ TEST(Companding, MuLawExpandsToTheMiddlesOfItsIntervals)
     }
 }
 
-TEST(Companding, ALawExpandsToTheMiddlesOfItsIntervalsWithTheSignInverted)
+TEST(Companding, ALawExpandsToInvertedMiddlesOfItsIntervals)
 {
     const std::vector<int32_t> middles = interval_middles(0, 32);
     for (uint32_t n = 0; n < 128; ++n) {

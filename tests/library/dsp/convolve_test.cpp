@@ -41,7 +41,7 @@ uint32_t bits(float x) { return std::bit_cast<uint32_t>(x); }
 
 } // namespace
 
-TEST(Convolve, AddsProductsNewestSampleFirstInSinglePrecision)
+TEST(Convolve, AddsFloatProductsNewestSampleFirst)
 {
     Random random(1);
     for (int round = 0; round < 3000; ++round) {

@@ -98,7 +98,7 @@ TEST_F(DctFloat, ExistsForEveryOrderFromOneOn)
     }
 }
 
-TEST_F(DctFloat, OrdersBelowOneAndTablesBeyondASizeAreRefusedUntried)
+TEST_F(DctFloat, BadOrdersAndHugeTablesAreRefusedUntried)
 {
     const uint64_t before = allocation_count();
     for (const int32_t order : {INT32_MIN, -32, -1, 0, 30, 31, 32, 33, 64, INT32_MAX}) {
@@ -200,7 +200,7 @@ TEST_F(DctFloat, ConstantInputLeavesOnlyTheDcTerm)
 }
 
 // 2 / L is a power of two: nothing is rounded.
-TEST_F(DctFloat, NormalisingMultipliesEveryBinByTwoOverTheLength)
+TEST_F(DctFloat, NormalisingScalesEveryBinByTwoOverTheLength)
 {
     for (const int32_t order : {1, 5, 15}) {
         const Floats input = random_input(order, 3);

@@ -227,7 +227,7 @@ TEST(Rationalize, AgreesWithConvergentsInExactArithmetic)
 
 // Whatever the rates, the tolerance of a millionth keeps both factors below a million or so:
 // filters stay within some 90 MB.
-TEST(Rationalize, WholeRatesUpToAGigahertzHaveFactorsWithinTheBound)
+TEST(Rationalize, WholeRatesToAGigahertzKeepWithinTheBound)
 {
     const auto check = [](uint32_t rate) {
         const Fraction f = ratio_of(rate, 11025);

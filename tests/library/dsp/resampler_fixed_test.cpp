@@ -188,7 +188,7 @@ TEST_F(ResamplerFixed, LoudStereoWrapsTheCrossProducts)
     EXPECT_GT(wrapped, 0);
 }
 
-TEST_F(ResamplerFixed, IntegerRatiosLeaveAtHalfLevelAnd8000HertzAtItsOwn)
+TEST_F(ResamplerFixed, IntegerRatiosHalveTheLevelAnd8000HzDoesNot)
 {
     for (const uint32_t rate : kRates) {
         const Words outputs = resample_whole(rate, sine_stream<FixedTwin>(rate, 500, rate));

@@ -131,7 +131,7 @@ TEST_F(ResamplerFloat, QuotientsBeyondAllFiltersAreRefused)
     }
 }
 
-TEST_F(ResamplerFloat, AFilterOfMoreThanTheLargestFactorCountsAsShortOfMemory)
+TEST_F(ResamplerFloat, AnOversizedFilterCountsAsShortOfMemory)
 {
     const auto largest = static_cast<float>(KZDSP_LARGEST_FACTOR);
     // The record is made, the filter is not tried.
@@ -253,7 +253,7 @@ uint64_t expected_leading(uint64_t up, uint64_t down)
 
 } // namespace
 
-TEST_F(ResamplerFloat, TheLayoutWrapsAtThirtyTwoBitsWhenUpIsMoreThanTwiceDown)
+TEST_F(ResamplerFloat, TheLayoutWrapsWhenUpIsMoreThanTwiceDown)
 {
     // 2 * 40 - 441 is 4294966935, 15 modulo 40; the lag is 40 - 4410 % 40 = 30.
     EXPECT_EQ(5U, dsp::filter_layout(441, 40).leading);
@@ -322,7 +322,7 @@ TEST_F(ResamplerFloat, EveryTapIsTheWindowedSinc)
 }
 
 // Amplitude at a share of the cutoff, relative to that at 0 Hz.
-TEST_F(ResamplerFloat, FiltersPassBelowTheLowerNyquistFrequencyAndStopAboveIt)
+TEST_F(ResamplerFloat, FiltersPassBelowTheLowerNyquistFrequencyOnly)
 {
     for (const auto& [in, out] : kManyRates) {
         const auto r = make(in, out);

@@ -114,7 +114,7 @@ TEST(Tables, FilterTapsAreTheKnownWords)
 }
 
 // The tables stand for what would else be computed when a resampler or a transform is made.
-TEST(Tables, DesignedFiltersAreWhatTheDesignGivesHereToTheBit)
+TEST(Tables, DesignedFiltersMatchTheDesignToTheBit)
 {
     for (const kernels::DesignedFilter& filter : kernels::designed_filters) {
         const auto layout = dsp::filter_layout(filter.up, filter.down);
@@ -129,7 +129,7 @@ TEST(Tables, DesignedFiltersAreWhatTheDesignGivesHereToTheBit)
     }
 }
 
-TEST(Tables, FloatTransformFactorsAreWhatTheFormulaGivesHereToTheBit)
+TEST(Tables, FloatTransformFactorsMatchTheFormulaToTheBit)
 {
     std::vector<float> factors(std::size(kernels::kDctFactors));
     kernels::fill_butterfly_factors(factors);

@@ -74,7 +74,7 @@ TEST_F(Extraction, FormatComesBeforeTheRate)
     EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
 }
 
-TEST_F(Extraction, AFailedCreateReturnsTheFingerprintersStatusAndKeepsTheHandle)
+TEST_F(Extraction, AFailedCreateReportsWhyAndKeepsTheHandle)
 {
     int marker = 0;
     auto* const untouched = reinterpret_cast<kz_fpx_handle*>(&marker);
@@ -96,7 +96,7 @@ TEST(ExtractionDeath, FollowsANullPlaceForTheHandleOnSuccessOnly)
     EXPECT_EQ(KZ_OK, kzmem_shutdown());
 }
 
-TEST_F(Extraction, AddAudioRefusesNullsWithoutCallingTheFingerprinter)
+TEST_F(Extraction, AddAudioRefusesNullsBeforeItCallsAnything)
 {
     kz_fpx_handle* handle = counting_handle(&frees);
     uint8_t complete = 0;
@@ -114,7 +114,7 @@ TEST_F(Extraction, AddAudioRefusesNullsWithoutCallingTheFingerprinter)
     EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
 }
 
-TEST_F(Extraction, FreeAlwaysLeavesNullAndReturnsTheFingerprintersStatus)
+TEST_F(Extraction, FreeAlwaysLeavesNullAndReturnsTheStatus)
 {
     EXPECT_EQ(KZ_FPX_ERROR_INVALID_ARGUMENT, kz_fpx_fingerprint_free(nullptr));
     kz_fpx_handle* handle = nullptr;
@@ -176,7 +176,7 @@ TEST_F(Extraction, OnlyTheFloatingPointAlgorithmTakesOtherRates)
 
 // What is freed while the memory manager is off is not: nothing tells so, and the caller's pointer
 // is gone. It is freed here by a copy of that pointer.
-TEST_F(Extraction, FreeingWithMemoryOffReportsSuccessAndFreesNothing)
+TEST_F(Extraction, FreeingWithMemoryOffSucceedsAndFreesNothing)
 {
     kz_fpx_handle* handle = create();
     kz_fpx_handle* kept_handle = handle;

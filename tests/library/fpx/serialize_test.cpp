@@ -40,7 +40,7 @@ protected:
 
 } // namespace
 
-TEST_F(Serialize, ADocumentHasADeclarationIndentationAndThirtyValues)
+TEST_F(Serialize, ADocumentIsDeclaredIndentedAndOf30Values)
 {
     complete();
     char* text = nullptr;
@@ -106,7 +106,7 @@ TEST_F(Serialize, TheSameFingerprintGivesTheSameText)
 // texts that then differ from the whole document are those of two deliberate maskings: a query that
 // succeeds after name or version failed, and an indentation that succeeds after a failure while
 // rendering.
-TEST_F(Serialize, EveryFailedAllocationIsReportedOrMaskedAsDocumented)
+TEST_F(Serialize, FailedAllocationsAreReportedOrMaskedAsStated)
 {
     complete();
     char* whole = nullptr;

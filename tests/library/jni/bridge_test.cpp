@@ -225,7 +225,7 @@ protected:
 const LogLine kRefused = {6, program_invocation_short_name,
                           "ERROR: failed - register_com_orvanta_android_kzsdk_Fingerprint()."};
 
-TEST_F(Registration, AsksForClassReferenceMethodFieldAndNativesInThisOrder)
+TEST_F(Registration, AsksForClassMethodFieldAndNativesInOrder)
 {
     const CapturedLog captured;
     EXPECT_EQ(0x10004, JNI_OnLoad(&vm, nullptr));
@@ -314,7 +314,7 @@ TEST(Environment, IsNullWhereTheThreadCannotBeAttached)
     EXPECT_EQ(Calls{"attach"}, vm_state.calls);
 }
 
-TEST(Environment, IsNullWhereTheThreadCouldNotBeDetachedAtItsEnd)
+TEST(Environment, IsNullWhereTheThreadCouldNotBeDetachedLater)
 {
     vm_state = {};
     android::AndroidRuntime::setJavaVM(&detached_vm);
@@ -404,7 +404,7 @@ TEST(SetUp, ReportsThatNoReferenceCanBeMade)
     EXPECT_EQ(0, context);
 }
 
-TEST(Request, WithoutMemoryForACopyIsRefusedAndLeavesTheWorkerReady)
+TEST(Request, WithoutMemoryIsRefusedAndTheWorkerStaysReady)
 {
     script() = {};
     vm_state = {};
@@ -420,7 +420,7 @@ TEST(Request, WithoutMemoryForACopyIsRefusedAndLeavesTheWorkerReady)
 }
 
 // A worker goes on without its VM, and says so.
-TEST(Environment, ThatIsMissingIsLoggedWithTheEventThatCannotBePosted)
+TEST(Environment, ThatIsMissingIsLoggedWithTheEvent)
 {
     script() = {};
     vm_state = {};

@@ -188,7 +188,7 @@ TEST_F(Job, NamesAnEmptyBufferInTheLog)
 }
 
 // The encoding is judged before the buffer.
-TEST_F(Job, SaysNothingOfAnEmptyBufferInAnEncodingThatItRefuses)
+TEST_F(Job, RefusesAnEncodingBeforeItLooksAtTheBuffer)
 {
     job_.setGenerateConfig(44100, 2, 3, 16, nullptr, 0);
     expect_failure(nullptr);
@@ -217,7 +217,7 @@ TEST_F(Job, LogsAudioThatIsRefusedAndFreesTheHandle)
     EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, job_.fpx_generate_fingerprint(&serialized));
 }
 
-TEST_F(Job, SaysNothingOfTooLittleAudioAndDoesNotSerialize)
+TEST_F(Job, DoesNotLogOrSerializeTooLittleAudio)
 {
     script().complete = 0;
     expect_failure(nullptr);
@@ -276,7 +276,7 @@ TEST_F(Job, WritesNothingBehindAText)
     }
 }
 
-TEST_F(Job, FillsTheBufferWithSixHundredCharactersAndNoTerminator)
+TEST_F(Job, FillsTheBufferWith600BytesAndNoTerminator)
 {
     script().text = std::string(600, 'x');
     std::array<char, 601> bytes;
@@ -309,7 +309,7 @@ TEST_F(Job, StartsTheCoreOnceForAllJobsOfTheProcess)
     EXPECT_EQ((Calls{"create", "add audio", "serialize", "free"}), script().calls);
 }
 
-TEST_F(Job, ShutsTheCoreDownAndStartsItOnceMoreWhenTheStartFails)
+TEST_F(Job, RestartsTheCoreOnceWhenTheStartFails)
 {
     script().starts = {KZ_INIT_ERROR_NO_RECORD};
     const CapturedLog captured;

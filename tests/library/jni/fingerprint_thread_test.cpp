@@ -150,7 +150,7 @@ TEST_F(Worker, ClearsTheWholeBufferBeforeAShorterText)
     EXPECT_EQ("short" + std::string(595, '\0'), std::string(worker->getFingerprint(), 600));
 }
 
-TEST_F(Worker, RefusesASecondRequestWhileTheFirstWaitsToBeBegun)
+TEST_F(Worker, RefusesARequestWhileTheFirstWaitsToBegin)
 {
     const uint64_t before = waits_begun();
     const auto worker = started();
@@ -291,7 +291,7 @@ TEST_F(Worker, RepeatsItsLastJobWhenWokenWithoutReason)
 }
 
 // The configuration that it then finds is clear.
-TEST_F(Worker, FailsAJobWhenWokenWithoutReasonBeforeTheFirstRequest)
+TEST_F(Worker, FailsAJobWhenWokenBeforeTheFirstRequest)
 {
     const uint64_t before = waits_begun();
     const auto worker = started();

@@ -123,7 +123,7 @@ TEST_F(Music, ThatIsTooShortGivesNothing)
 }
 
 // One run takes milliseconds, and the resampler and the tree make many allocations: in steps.
-TEST_F(Music, GivesAFailureOrTheDocumentWhicheverAllocationFails)
+TEST_F(Music, FailsOrGivesTheDocumentWhenAllocationFails)
 {
     const std::string document = document_of(2, 11025, 1, music());
     const CapturedLog captured;

@@ -77,7 +77,7 @@ TEST(Registry, GivesNoNumberTwice)
     EXPECT_FALSE(given.contains(0));
 }
 
-TEST(Registry, StepsOverZeroAndNumbersInUseWhenAllHaveBeenGiven)
+TEST(Registry, StepsOverZeroAndNumbersInUseWhenItWraps)
 {
     Registry registry(-2);
     Registered one;

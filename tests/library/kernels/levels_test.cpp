@@ -88,7 +88,7 @@ TEST_P(FrameVariants, FindTheSameExtremesOfWords)
     }
 }
 
-TEST_P(FrameVariants, FindTheSameExtremesOfFloatsAndPassOverWhatIsNoNumber)
+TEST_P(FrameVariants, FindTheSameFloatExtremesAndPassOverNaN)
 {
     const auto values = odd_floats(2);
     for (uint32_t first = 0; first < 12; ++first) {

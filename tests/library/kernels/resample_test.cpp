@@ -101,7 +101,7 @@ Words outputs_of(decltype(Variant::polyphase) kernel, const Rate& rate, const Wo
     return output;
 }
 
-TEST_P(ResampleVariants, PolyphaseFiltersGiveThePlainWordsForAnySamples)
+TEST_P(ResampleVariants, PolyphaseFiltersMatchThePlainOnesOnAnySamples)
 {
     for (const Rate& rate : polyphase_rates()) {
         constexpr uint32_t kOutputs = 1500; // several periods of the phases, and split in blocks
@@ -126,7 +126,7 @@ TEST_P(ResampleVariants, PolyphaseFiltersGiveThePlainWordsForAnyCount)
     }
 }
 
-TEST_P(ResampleVariants, PolyphaseFiltersGiveThePlainWordsFromEveryPhase)
+TEST_P(ResampleVariants, PolyphaseFiltersMatchThePlainOnesInEveryPhase)
 {
     for (const Rate& rate : polyphase_rates()) {
         for (const int shift : {0, 3}) {
@@ -140,7 +140,7 @@ TEST_P(ResampleVariants, PolyphaseFiltersGiveThePlainWordsFromEveryPhase)
     }
 }
 
-TEST_P(ResampleVariants, SymmetricFiltersGiveThePlainWordsForAnySamples)
+TEST_P(ResampleVariants, SymmetricFiltersMatchThePlainOnesOnAnySamples)
 {
     for (const Rate& rate : symmetric_rates()) {
         constexpr uint32_t kOutputs = 1300;

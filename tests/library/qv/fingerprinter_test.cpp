@@ -49,7 +49,7 @@ class Fingerprinter : public TwinTest<T> {
 };
 TYPED_TEST_SUITE(Fingerprinter, Twins, TwinNames);
 
-TYPED_TEST(Fingerprinter, AcceptsEightRatesFourFormatsAndOneOrTwoChannels)
+TYPED_TEST(Fingerprinter, AcceptsEightRatesFourFormatsOneOrTwoChannels)
 {
     for (const uint32_t rate : {8000U, 11025U, 16000U, 22050U, 24000U, 32000U, 44100U, 48000U}) {
         for (const uint32_t format : {kPcm8, kPcm16, kALaw, kULaw}) {
@@ -275,7 +275,7 @@ TYPED_TEST(Fingerprinter, ExtractionRefusesNullsAndSmallBuffers)
     EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, Extract::extract(object.get(), nullptr, 60, times));
 }
 
-TYPED_TEST(Fingerprinter, NothingButTheEqualiserAndTheRecordsAllocatesWhileFeeding)
+TYPED_TEST(Fingerprinter, OnlyEqualiserAndRecordsAllocateWhileFeeding)
 {
     const auto object = make_fingerprinter<TypeParam>(48000, kPcm16, 2);
     const auto music = tune(48000, 2, 15);

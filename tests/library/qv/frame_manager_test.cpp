@@ -183,7 +183,7 @@ TYPED_TEST(FrameManager, LongPiecesAreCutToTheFrame)
 }
 
 // What no piece provides is silence in the first frame, never what the heap held.
-TYPED_TEST(FrameManager, WithoutEqualisationANullSecondCopiesOnlyTheFirst)
+TYPED_TEST(FrameManager, UnequalisedANullSecondCopiesOnlyTheFirst)
 {
     const auto change = [](auto& config) {
         config.histogram_levels = 0;

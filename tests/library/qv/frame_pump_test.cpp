@@ -6,7 +6,7 @@
 
 namespace kz::test {
 
-TEST(RingPosition, FramesAreFullWhenTheWriterCatchesUpWithTheirStart)
+TEST(RingPosition, AFrameIsFullWhenTheWriterReachesItsStart)
 {
     constexpr uint32_t kLength = 32;
     constexpr uint32_t kHop = 11;

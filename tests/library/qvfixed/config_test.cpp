@@ -17,7 +17,7 @@ constexpr int32_t kTable[] = {0,    593,  593,  1188,  1188,  1782,  1782,  2377
 
 } // namespace
 
-TEST_F(FixedConfig, HoldsTheRateWithTwelveFractionBitsAndTheBandsAsBins)
+TEST_F(FixedConfig, HoldsTheRateInQ12AndTheBandsAsBins)
 {
     const auto config = make_config<Fixed>();
     ASSERT_TRUE(config);

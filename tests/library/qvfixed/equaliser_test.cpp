@@ -46,7 +46,7 @@ class FixedEqualiser : public MemoryOn {};
 
 } // namespace
 
-TEST_F(FixedEqualiser, AHalvedRangeOf8192IsCopiedAndOneMoreIsEqualised)
+TEST_F(FixedEqualiser, AHalvedRangeOf8192IsCopiedOneMoreEqualised)
 {
     Words frame(1000, 0);
     frame[10] = 2 * 8192;

@@ -127,7 +127,7 @@ TEST_F(FixedFrameManager, TwelveFramesAreAveragedExactly)
 
 // The dropped shift of the reciprocal: averages are exact for 8 to 15 frames. Beyond, deviations
 // are taken from a wrong centre, so the spreads are not the standard deviations.
-TEST_F(FixedFrameManager, SpreadsAreStandardDeviationsForEightToFifteenFrames)
+TEST_F(FixedFrameManager, SpreadsAreStandardDeviationsOf8To15Frames)
 {
     const auto amplitude = [](size_t frame, size_t band) {
         const auto b = static_cast<uint32_t>(band);
@@ -229,7 +229,7 @@ TEST_F(FixedFrameManager, BandsBeyondTheFifteenthHaveNoAmplitude)
     EXPECT_GT(manager->records->energy[15], 0);
 }
 
-TEST_F(FixedFrameManager, FramesOf65536SamplesWorkAndOtherLengthsAreRefused)
+TEST_F(FixedFrameManager, FramesOf65536SamplesWorkAndOthersAreRefused)
 {
     for (uint32_t log2 : {0U, 1U, 13U, 14U, 17U, 31U, 32U, 47U, 271U, 0xFFFFFFFFU}) {
         EXPECT_FALSE(make_manager<Fixed>([log2](kzqvfixed_config& c) {

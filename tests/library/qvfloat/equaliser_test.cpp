@@ -77,7 +77,7 @@ TEST_F(FloatEqualiser, OnePieceHasNoTestForSilence)
     EXPECT_EQ((Samples{-0.4375F, 0.0625F, 0.3125F, 0.0625F}), made.output);
 }
 
-TEST_F(FloatEqualiser, AnInfiniteScaleMakesEverySampleOfAConstantFrameLevelZero)
+TEST_F(FloatEqualiser, AnInfiniteScaleMakesAConstantFrameLevelZero)
 {
     for (const float value : {0.0F, -0.0F, 7.5F, -32768.0F, 999999.0F}) {
         const auto made = one_piece(Samples(64, value));
@@ -198,7 +198,7 @@ TEST_F(FloatEqualiser, TheFormWithItsOwnCountersGivesTheSame)
     EXPECT_EQ(kUntouched, output[0]);
 }
 
-TEST_F(FloatEqualiser, TheFormWithItsOwnCountersCopiesWhenMemoryIsShort)
+TEST_F(FloatEqualiser, TheFormWithItsOwnCountersCopiesOutOfMemory)
 {
     const Samples frame = random_frame(100, 3);
     const Samples equalised = one_piece(frame).output;

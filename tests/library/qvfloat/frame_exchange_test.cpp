@@ -127,7 +127,7 @@ TEST_F(FrameExchange, TheFormatIsLittleEndianWordsBandByBand)
     EXPECT_EQ(bytes, exported(manager));
 }
 
-TEST_F(FrameExchange, FramesOfOneManagerGiveTheSameFingerprintInAnother)
+TEST_F(FrameExchange, FramesGiveTheSameFingerprintInAnotherManager)
 {
     const auto music = tune(11025, 1, 16.0);
     const auto source = make_manager<Float>();

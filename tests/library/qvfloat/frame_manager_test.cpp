@@ -191,7 +191,7 @@ TEST_F(FloatFrameManager, TwoNullPiecesUseUpAFrameToSkip)
     EXPECT_EQ(KZ_OK, QVFM_AppendDualPCMData(nullptr, nullptr, 0, nullptr, 0));
 }
 
-TEST_F(FloatFrameManager, ShortPiecesLeaveTheTransformOfThePreviousFrame)
+TEST_F(FloatFrameManager, ShortPiecesLeaveThePreviousTransform)
 {
     const auto manager = unequalised();
     append_one(manager, tune_frame(0));
@@ -377,7 +377,7 @@ TEST_F(FloatFrameManager, FramesThatAreNoNumbersDoNotSpread)
     EXPECT_TRUE(std::equal(first->energy, first->energy + 15, last->energy));
 }
 
-TEST_F(FloatFrameManager, AnyPowerOfTwoIsAFrameAndOtherLengthsAreRefused)
+TEST_F(FloatFrameManager, AFramesLengthIsAnyPowerOfTwoAndNothingElse)
 {
     for (const uint32_t log2 : {0U, 30U, 31U, 32U, 47U, 271U, 0x80000000U, 0xFFFFFFFFU}) {
         EXPECT_FALSE(make_manager<Float>([log2](QVConfig& c) { c.frame_length_log2 = log2; }))

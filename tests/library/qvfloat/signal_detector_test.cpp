@@ -46,7 +46,7 @@ TEST_F(FloatSignalDetector, FractionsOfAStepAreSilence)
     EXPECT_EQ(2000U, offset(*detector, block));
 }
 
-TEST_F(FloatSignalDetector, WhatIsNoNumberCountsAsZeroAndWhatDoesNotFitAsTheNearestThatDoes)
+TEST_F(FloatSignalDetector, NaNCountsAsZeroAndTheRestIsClamped)
 {
     const OwnedDetector<Float> detector(QVSD_Create(6, 100, 1000));
     offset(*detector, {kNaN, -kNaN, kInfinity, -kInfinity, 2147483648.0F, -3e38F});

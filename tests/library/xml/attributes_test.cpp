@@ -125,7 +125,7 @@ TEST_F(Attributes, NumbersAreDecimal)
     EXPECT_STREQ("0", GetXMLTagAttrFromStr(tag(), "n"));
 }
 
-TEST_F(Attributes, AValueThatBeginsWithNulIsStoredEmptyAndACloneDropsIt)
+TEST_F(Attributes, AValueBeginningWithNulIsDroppedByAClone)
 {
     set("a", "1");
     EXPECT_EQ(KZ_OK, SetXMLTagAttrFromBuf(tag(), "b", 1, "\0x", 2));

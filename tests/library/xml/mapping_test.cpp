@@ -152,7 +152,7 @@ TEST_F(Mutation, RenamesTagsAllTheWayDown)
     EXPECT_EQ(nullptr, GetXMLSubTagFromPath(copy.get(), "A"));
 }
 
-TEST_F(Mutation, LeavesARefusedTagOutWithAllBelowItAndCopiesTheRest)
+TEST_F(Mutation, LeavesOutARefusedTagWithAllBelowIt)
 {
     maps.tag_name = [](const char* name) { return is(name, "B") ? nullptr : name; };
     const Tree copy = mutated(example());
@@ -193,7 +193,7 @@ TEST_F(Mutation, DropsARefusedAttributeFromEveryTag)
     EXPECT_EQ(0u, GetXMLTagAttrCount(GetXMLSubTagFromPath(copy.get(), "B")));
 }
 
-TEST_F(Mutation, KeepsTheLaterOfTwoAttributesThatGetOneNameAtTheEnd)
+TEST_F(Mutation, KeepsTheLaterOfTwoAttributesThatGetOneName)
 {
     const Tree source = make_tag("R");
     for (const char* name : {"x", "y", "z"}) {
@@ -220,7 +220,7 @@ TEST_F(Mutation, SetsNothingForAMissingOrEmptyValue)
 }
 
 // An empty value takes out what was set before under the name.
-TEST_F(Mutation, LosesBothOfTwoAttributesOfOneNameWhenTheLaterHasNoValue)
+TEST_F(Mutation, LosesBothAttributesWhenTheLaterHasNoValue)
 {
     maps.attribute_name = [](const char*, const char*) { return "same"; };
     maps.attribute_value = [](const char*, const char*, const char* value) {

@@ -344,7 +344,7 @@ TEST_F(Render, RandomTreesAgainstAnIndependentRenderer)
     }
 }
 
-TEST_F(Render, TreesWithNamelessTagsAgainstAnIndependentRenderer)
+TEST_F(Render, NamelessTagsAgainstAnIndependentRenderer)
 {
     Random random(11);
     int texts = 0;
@@ -362,7 +362,7 @@ TEST_F(Render, TreesWithNamelessTagsAgainstAnIndependentRenderer)
 
 // With indentation on, most of these come back as a malformed text and not as null: the caller has
 // to look. Which text, is exact.
-TEST_F(Render, EveryFailedAllocationGivesExactlyTheStatedText)
+TEST_F(Render, FailedAllocationsGiveExactlyTheStatedText)
 {
     Random random(12);
     int nulls = 0;

@@ -113,7 +113,7 @@ constexpr Bound kBounds[] = {{"8000", 160, 850}, {"11025", 10, 65},  {"16000", 1
                              {"22050", 10, 65},  {"24000", 40, 190}, {"32000", 22, 100},
                              {"44100", 10, 65},  {"48000", 24, 140}};
 
-TEST(Closeness, SameMusicStaysCloseAtEveryRateAndInEveryEncoding)
+TEST(Closeness, SameMusicStaysCloseAtEveryRateAndEncoding)
 {
     for (const Bound& bound : kBounds) {
         for (const std::string& channels : kChannels) {

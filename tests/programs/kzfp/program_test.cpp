@@ -149,7 +149,7 @@ TEST(KzfpInput, CompandedFilesGoToTheLibraryAsTheyAre)
 }
 
 // The library's own 8-bit input folds the lower half of the waveform up.
-TEST(KzfpInput, EightBitFilesAreWidenedUnlessAskedForAsTheyAre)
+TEST(KzfpInput, EightBitFilesAreWidenedUnlessAskedOtherwise)
 {
     const std::vector<int> reference = values_of({clip("music-22050-mono-s16.wav")});
     const auto distance = [&reference](const std::vector<int>& values) {

@@ -127,7 +127,7 @@ TEST(KzfpStreaming, LeadingSilenceGivesTheDocumentOfOneCall)
     }
 }
 
-TEST(KzfpStreaming, TheFloatingPointAlgorithmGivesTheDocumentOfOneCallAtAnyRate)
+TEST(KzfpStreaming, TheFloatAlgorithmGivesTheDocumentOfOneCall)
 {
     for (const char* name : {"music-8000-mono-s16", "late-48000-stereo", "music-44100-stereo-ulaw",
                              "music-96000", "music-37800"}) {
@@ -186,7 +186,7 @@ TEST(KzfpStreaming, NeedsNotOneFrameMoreThanOneCall)
     }
 }
 
-TEST(KzfpStreaming, TwoHoursOfHeaderlessAudioAreReadForTheirFirstSeconds)
+TEST(KzfpStreaming, OfTwoRawHoursOnlyTheFirstSecondsAreRead)
 {
     const std::string minute = bytes_of(tune(44100, 2, 20));
     const ProcessResult result =

@@ -90,7 +90,7 @@ size_t occurrences(const std::string& text, const std::string& word)
 
 // A linked file carries the mark only where the system's own start files do, which is not so
 // everywhere. What is compiled here must not be the reason.
-TEST(HardenedArchive, IndirectBranchesHaveMarkedTargetsInEveryObject)
+TEST(HardenedArchive, IndirectBranchTargetsAreMarkedInEveryObject)
 {
 #if defined(__x86_64__)
     const auto notes = output_of("readelf --wide --notes '" KZ_ARCHIVE "'");

@@ -127,7 +127,7 @@ void expect_same_or_complaint(const ProcessResult& whole, const ProcessResult& r
     }
 }
 
-TEST_F(FailingSystem, AnyAllocationMayFailOnTheRoadOfHeaderlessSamples)
+TEST_F(FailingSystem, AnyAllocationMayFailForHeaderlessSamples)
 {
     const std::string file = scratch_.write("music.raw", bytes_of(tune(kRate, 1, 15)));
     for_every_failure("ALLOCATION", {"--raw", "8000,1,s16", "--format", "values", file},

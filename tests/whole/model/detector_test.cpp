@@ -62,7 +62,7 @@ TEST_F(ModelDetector, LibraryFindsTheSameStartInOneBlock)
     }
 }
 
-TEST_F(ModelDetector, LibraryAgreesOnEveryKindOfMaterialInRandomBlocks)
+TEST_F(ModelDetector, LibraryAgreesOnAllMaterialInRandomBlocks)
 {
     kz::test::Random random(1);
     for (const Material& material : materials(11025, 12000)) {

@@ -94,7 +94,7 @@ TEST(FilterLaw, EveryTapIsTheDesignsInQ31)
     }
 }
 
-TEST(FilterLaw, FiltersAreSymmetricAboutTheCentreTapAndZeroBeyond)
+TEST(FilterLaw, FiltersAreSymmetricAndZeroBeyondTheirEnds)
 {
     for (const Ratio& ratio : filtered_ratios()) {
         const std::vector<int32_t> taps = library_taps(ratio);
@@ -123,7 +123,7 @@ TEST(FilterLaw, CentreTapsAreUpOverDown)
     EXPECT_EQ(1 << 29, library_taps(kRatios[6])[43]);
 }
 
-TEST(FilterLaw, PolyphaseFiltersBeginWithTheZerosThatPlaceTheirCentre)
+TEST(FilterLaw, PolyphaseFiltersBeginWithTheirLeadingZeros)
 {
     constexpr std::pair<uint32_t, size_t> kZeros[] = {
         {8000, 269}, {16000, 199}, {24000, 173}, {32000, 839}, {48000, 493}};

@@ -157,7 +157,7 @@ TEST_F(ModelResampler, LibraryComputesTheSameLengths)
 // Inside one block every product is rounded down and lacks the product of the low halves: up to 3
 // units in the last place, 1.2 on average. At half level, where two samples share a product, it is
 // less.
-TEST_F(ModelResampler, LibraryStaysWithinItsRoundingOfThePlainFormula)
+TEST_F(ModelResampler, LibraryStaysWithinRoundingOfThePlainFormula)
 {
     for (const Ratio& ratio : all_ratios()) {
         const uint32_t rate = std::max(ratio.hertz, 8000u);
@@ -187,7 +187,7 @@ TEST_F(ModelResampler, LibraryStaysWithinItsRoundingOfThePlainFormula)
 
 // The one place where a cut may show: products across it keep the bits that products inside a block
 // leave out.
-TEST_F(ModelResampler, ACutMovesNoOutputOfTheLibraryByMoreThanTwoUnitsPerTap)
+TEST_F(ModelResampler, ACutMovesNoOutputByMoreThanTwoUnitsPerTap)
 {
     for (const Ratio& ratio : all_ratios()) {
         const std::vector<int32_t> words = random_words(20000, ratio.hertz, 3);

@@ -1,0 +1,123 @@
+#include "whole/conventions/conventions.hpp"
+
+#include <algorithm>
+#include <fstream>
+#include <iterator>
+#include <regex>
+
+namespace conventions {
+
+namespace {
+
+namespace fs = std::filesystem;
+
+const Names kExtensions = {".h",   ".hpp", ".c",  ".cpp", ".java", ".cmake",
+                           ".txt", ".py",  ".sh", ".md",  ".1",    ".map"};
+
+bool is_left_out(const fs::path& folder)
+{
+    const std::string name = folder.filename().string();
+    return name.starts_with('.') || name.starts_with("build") || name.starts_with("obj-");
+}
+
+std::string text_of(const fs::path& path)
+{
+    std::ifstream in(path, std::ios::binary);
+    return {std::istreambuf_iterator<char>(in), {}};
+}
+
+std::string place(const File& file, size_t offset)
+{
+    const auto end = file.text.begin() + static_cast<std::ptrdiff_t>(offset);
+    return file.name + ':' + std::to_string(1 + std::count(file.text.begin(), end, '\n'));
+}
+
+/// Calls @p visit with each match of @p pattern in the file.
+template <typename Visit>
+void for_each_match(const File& file, const std::regex& pattern, Visit visit)
+{
+    for (std::sregex_iterator it(file.text.begin(), file.text.end(), pattern), end; it != end;
+         ++it) {
+        visit(*it);
+    }
+}
+
+const std::regex kTest(R"(\b(?:TEST|TEST_F|TEST_P|TYPED_TEST|TYPED_TEST_P)\(\s*(\w+),\s*(\w+)\))");
+const std::regex kMention(R"(`([A-Z]\w+)\.([A-Z]\w+|\*)`)");
+const std::regex kStatusNumber(R"(\b0[xX]90[0-9a-fA-F]{6}(?![0-9a-fA-F]))");
+
+bool is_documentation(const File& file) { return file.name.ends_with(".md"); }
+
+} // namespace
+
+Files read_tree(const fs::path& root)
+{
+    Files files;
+    for (fs::recursive_directory_iterator it(root), end; it != end; ++it) {
+        if (it->is_directory() && is_left_out(it->path())) {
+            it.disable_recursion_pending();
+        } else if (it->is_regular_file() && kExtensions.contains(it->path().extension().string())) {
+            files.push_back({fs::relative(it->path(), root).string(), text_of(it->path())});
+        }
+    }
+    return files;
+}
+
+Complaints numbers_of_statuses(const Files& files)
+{
+    Complaints complaints;
+    for (const File& file : files) {
+        if (file.name != "kzsdk/abs/status.h") {
+            for_each_match(file, kStatusNumber, [&](const std::smatch& match) {
+                complaints.push_back(place(file, static_cast<size_t>(match.position())) + ": " +
+                                     match.str());
+            });
+        }
+    }
+    return complaints;
+}
+
+Complaints long_test_names(const Files& files)
+{
+    Complaints complaints;
+    for (const File& file : files) {
+        for_each_match(file, kTest, [&](const std::smatch& match) {
+            if (match[2].length() > static_cast<std::ptrdiff_t>(kMaxTestName)) {
+                complaints.push_back(place(file, static_cast<size_t>(match.position())) + ": " +
+                                     match[2].str() + " has " + std::to_string(match[2].length()) +
+                                     " characters");
+            }
+        });
+    }
+    return complaints;
+}
+
+Names tests_defined(const Files& files)
+{
+    Names names;
+    for (const File& file : files) {
+        for_each_match(file, kTest, [&](const std::smatch& match) {
+            names.insert(match[1].str() + '.' + match[2].str());
+            names.insert(match[1].str() + ".*");
+        });
+    }
+    return names;
+}
+
+Complaints unknown_tests(const Files& files, const Names& defined)
+{
+    Complaints complaints;
+    for (const File& file : files) {
+        if (is_documentation(file)) {
+            for_each_match(file, kMention, [&](const std::smatch& match) {
+                if (!defined.contains(match[1].str() + '.' + match[2].str())) {
+                    complaints.push_back(place(file, static_cast<size_t>(match.position())) + ": " +
+                                         match.str());
+                }
+            });
+        }
+    }
+    return complaints;
+}
+
+} // namespace conventions
