@@ -1,25 +1,19 @@
-// kzfp: prints the fingerprints of sound files.
+// kzfp: the process around a command. Whatever goes wrong, memory for a message included, ends in one
+// line on standard error and a status, never in a signal.
 
-#include <cerrno>
 #include <csignal>
 #include <cstdio>
 #include <exception>
-#include <iostream>
 #include <new>
 #include <string_view>
 #include <typeinfo>
-#include <utility>
 
 #include <cxxabi.h>
 #include <fcntl.h>
 #include <unistd.h>
 
-#include "audio_source.hpp"
-#include "disc_command.hpp"
-#include "fingerprint.hpp"
-#include "input.hpp"
-#include "options.hpp"
-#include "output.hpp"
+#include "commands/table.hpp"
+#include "output/write.hpp"
 
 namespace {
 
@@ -50,71 +44,6 @@ void end_uncaught()
     usual_end = std::set_terminate(end_uncaught);
 }
 
-struct Result {
-    InputFacts facts;
-    Fingerprint fingerprint;
-};
-
-/// Tries with more and more of a pipe; a regular file is read once. A decoder that met the end of
-/// what has arrived may have made up the last samples, so its complaint counts as "not enough" too.
-Result process(const std::string& name, const Options& options)
-{
-    Input input(name, options);
-    for (;;) {
-        try {
-            const OpenedInput opened = input.open();
-            Fingerprint fingerprint = take_fingerprint(*opened.source, options.algorithm);
-            if (opened.source->trouble().empty() || !input.extend()) {
-                return {opened.facts, std::move(fingerprint)};
-            }
-        } catch (const FileError&) {
-            if (!input.extend()) {
-                throw;
-            }
-        }
-    }
-}
-
-std::string shown_name(const std::string& name) { return name == "-" ? "standard input" : name; }
-
-/// True when the file's fingerprint was written.
-bool process_and_write(const std::string& name, const Options& options, Progress& progress)
-{
-    const auto report = [&](const std::string& what) {
-        progress.clear();
-        write_message(shown_name(name) + ": " + what);
-        return false;
-    };
-    try {
-        const Result result = process(name, options);
-        if (!takes_rate(options.algorithm, result.facts.rate)) {
-            report("the library does not take " + std::to_string(result.facts.rate) +
-                   " Hz, converted to " + std::to_string(kConvertedRate) + " Hz");
-        }
-        progress.clear();
-        write_output(to_text(options, name, result.facts, result.fingerprint));
-        return true;
-    } catch (const FileError& error) {
-        return report(error.what());
-    } catch (const std::bad_alloc&) {
-        return report("not enough memory");
-    }
-}
-
-ExitStatus process_all(const Options& options)
-{
-    const Library library;
-    Progress progress(options.files.size());
-    ExitStatus status = all_done;
-    for (size_t i = 0; i < options.files.size(); ++i) {
-        progress.show(i + 1, options.files[i]);
-        if (!process_and_write(options.files[i], options, progress)) {
-            status = some_file_failed;
-        }
-    }
-    return status;
-}
-
 /// A standard descriptor that is closed would be given to the first file that is opened.
 bool prepare_standard_descriptors()
 {
@@ -137,14 +66,7 @@ int main(int argc, char** argv)
     }
     std::signal(SIGPIPE, SIG_IGN); // a closed pipe is met as an error of write()
     try {
-        if (is_disc_command(argc, argv)) {
-            return run_disc_command(argc, argv);
-        }
-        const auto parsed = parse_command_line(argc, argv);
-        if (const auto* status = std::get_if<ExitStatus>(&parsed)) {
-            return *status == all_done && !std::cout.flush() ? some_file_failed : *status;
-        }
-        return process_all(std::get<Options>(parsed));
+        return run_command(argc, argv);
     } catch (const OutputError& error) {
         if (!error.reader_left) { // who closes a pipe has seen enough, and wants no message
             write_message(std::string("kzfp: ") + error.what());

@@ -176,12 +176,6 @@ TEST(KzfpDisc, RefusesWhatIsNoDisc)
 
 // ---- The command line
 
-TEST(KzfpDisc, HasAHelpOfItsOwnThatTheOtherNames)
-{
-    EXPECT_NE(std::string::npos, output_of({"disc", "--help"}).find("kzfp disc [OPTIONS] PATH"));
-    EXPECT_NE(std::string::npos, output_of({"--help"}).find("kzfp disc --help"));
-}
-
 TEST(KzfpDisc, NeedsOnePathAndAKnownFormat)
 {
     for (const std::vector<std::string>& arguments :
@@ -194,20 +188,6 @@ TEST(KzfpDisc, NeedsOnePathAndAKnownFormat)
         EXPECT_EQ("", result.out);
         EXPECT_NE("", result.err);
     }
-}
-
-TEST(KzfpDisc, IsACommandOnlyInTheFirstPlace)
-{
-    const ScratchDirectory directory;
-    directory.write("disc", contents(clip("tone.wav")));
-    const fs::path before = fs::current_path();
-    fs::current_path(directory.path());
-    const std::string expected = output_of({clip("tone.wav")});
-    EXPECT_EQ(expected, output_of({"./disc"}));
-    EXPECT_EQ(expected, output_of({"--", "disc"}));
-    EXPECT_EQ(expected, output_of({"--format", "document", "disc"}));
-    EXPECT_EQ(expected + expected, output_of({clip("tone.wav"), "disc"}));
-    fs::current_path(before);
 }
 
 } // namespace

@@ -8,18 +8,18 @@
 
 #include <sndfile.h>
 
-#include "audio_source.hpp"
+#include "audio/source.hpp"
 
-namespace kzfp {
+namespace audio {
 
 /// Gives the samples of a sound file in one of these forms:
-/// - A-law and mu-law with one or two channels, at a supported rate: as they are in the file;
+/// - A-law and mu-law with one or two channels, at a rate that is accepted: as they are in the file;
 /// - everything else: 16-bit PCM, in which more than two channels are mixed down to one.
-class SoundFile : public AudioSource {
+class SoundFile : public Source {
 public:
-    /// `file` is a regular file that outlives the object; `algorithm` decides in which encoding its
-    /// samples are given. Throws FileError.
-    SoundFile(int file, Algorithm algorithm);
+    /// `file` is a regular file that outlives the object; `accepts_rate` decides whether companded
+    /// samples are given as they are. Throws FileError.
+    SoundFile(int file, const AcceptsRate& accepts_rate);
 
     /// Goes to the start of a section, beyond whose end read() gives nothing. Before the first
     /// read(). Throws FileError.
@@ -54,4 +54,4 @@ private:
     std::vector<float> floats_;
 };
 
-} // namespace kzfp
+} // namespace audio

@@ -1,5 +1,5 @@
 /// @file
-/// Rates that the library does not take, through the resampler library libsoxr.
+/// Another sampling rate, through the resampler library libsoxr.
 #pragma once
 
 #include <memory>
@@ -7,15 +7,15 @@
 
 #include <soxr.h>
 
-#include "audio_source.hpp"
+#include "audio/source.hpp"
 
-namespace kzfp {
+namespace audio {
 
-/// Gives 16-bit PCM of another rate, without dither: the same words every time.
-class RateConverter : public AudioSource {
+/// Gives 16-bit PCM of another rate, without dither: the same samples every time.
+class RateConverter : public Source {
 public:
     /// `source` gives 16-bit PCM. Throws FileError.
-    RateConverter(std::unique_ptr<AudioSource> source, uint32_t rate);
+    RateConverter(std::unique_ptr<Source> source, uint32_t rate);
 
     StreamFormat format() const override;
     size_t read(std::span<std::byte> bytes) override;
@@ -28,10 +28,10 @@ private:
 
     static size_t fetch(void* self, soxr_in_t* data, size_t frames);
 
-    std::unique_ptr<AudioSource> source_;
+    std::unique_ptr<Source> source_;
     uint32_t rate_;
     std::unique_ptr<soxr, Delete> converter_;
     std::vector<std::byte> fetched_;
 };
 
-} // namespace kzfp
+} // namespace audio

@@ -1,16 +1,16 @@
 /// @file
-/// Headerless audio: bytes go to the library as they come.
+/// Headerless audio, given as it comes.
 #pragma once
 
-#include "audio_source.hpp"
+#include "audio/source.hpp"
 
-namespace kzfp {
+namespace audio {
 
 /// What is wrong with a stream whose last frame has only `odd_bytes` bytes.
 std::string odd_bytes_text(uint64_t odd_bytes, const StreamFormat& format);
 
 /// Reads a descriptor to its end, or to the end of the section, without looking ahead.
-class RawSamples : public AudioSource {
+class RawSamples : public Source {
 public:
     /// Starts where the descriptor stands; it must outlive the object.
     RawSamples(int file, bool seekable, const StreamFormat& format, const Section& section);
@@ -27,4 +27,4 @@ private:
     uint64_t frames_left_;
 };
 
-} // namespace kzfp
+} // namespace audio

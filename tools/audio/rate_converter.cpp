@@ -1,8 +1,11 @@
-#include "rate_converter.hpp"
+// libsoxr pulls what it needs from the source, at its "high quality" setting and without dither.
 
-#include <exception>
+#include "audio/rate_converter.hpp"
 
-namespace kzfp {
+#include <algorithm>
+#include <utility>
+
+namespace audio {
 
 namespace {
 
@@ -10,7 +13,7 @@ constexpr size_t kFetch = 4096; ///< frames asked from the source at a time
 
 } // namespace
 
-RateConverter::RateConverter(std::unique_ptr<AudioSource> source, uint32_t rate)
+RateConverter::RateConverter(std::unique_ptr<Source> source, uint32_t rate)
     : source_(std::move(source)), rate_(rate)
 {
     const StreamFormat from = source_->format();
@@ -60,4 +63,4 @@ size_t RateConverter::fetch(void* self, soxr_in_t* data, size_t frames)
     return converter.source_->read(std::span(converter.fetched_).first(size));
 }
 
-} // namespace kzfp
+} // namespace audio

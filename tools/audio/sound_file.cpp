@@ -1,5 +1,9 @@
-#include "sound_file.hpp"
+// Formats that libsndfile decodes to floats are rounded here: its own conversion to 16 bits neither
+// scales floats nor clips.
 
+#include "audio/sound_file.hpp"
+
+#include <algorithm>
 #include <bit>
 #include <cerrno>
 #include <cmath>
@@ -8,7 +12,7 @@
 
 #include <unistd.h>
 
-namespace kzfp {
+namespace audio {
 
 namespace {
 
@@ -27,13 +31,13 @@ int16_t to_16_bits(float sample)
 
 } // namespace
 
-SoundFile::SoundFile(int file, Algorithm algorithm)
+SoundFile::SoundFile(int file, const AcceptsRate& accepts_rate)
 {
     // The object gets a descriptor of its own, which libsndfile closes, also when it cannot open
     // it.
     const int own = ::dup(file);
     if (own < 0 || ::lseek(own, 0, SEEK_SET) != 0) {
-        throw FileError(std::string("cannot be read (") + std::strerror(errno) + ")");
+        throw system_error("cannot be read", errno);
     }
     file_.reset(sf_open_fd(own, SFM_READ, &info_, SF_TRUE));
     if (!file_) {
@@ -45,7 +49,7 @@ SoundFile::SoundFile(int file, Algorithm algorithm)
         throw FileError("cannot be read (" + SoundFile::trouble() + ")");
     }
     check();
-    if (is_companded() && info_.channels <= 2 && takes_rate(algorithm, file_rate())) {
+    if (is_companded() && info_.channels <= 2 && accepts_rate(file_rate())) {
         const bool alaw = (info_.format & SF_FORMAT_SUBMASK) == SF_FORMAT_ALAW;
         encoding_ = alaw ? Encoding::alaw : Encoding::ulaw;
     }
@@ -226,4 +230,4 @@ void SoundFile::mix_down(size_t frames)
     }
 }
 
-} // namespace kzfp
+} // namespace audio

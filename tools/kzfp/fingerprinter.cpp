@@ -1,10 +1,11 @@
-#include "fingerprint.hpp"
+// Feeds the library what a source gives, in pieces that leave no trace in the result.
+
+#include "fingerprinter.hpp"
 
 #include <cmath>
 #include <cstdio>
 #include <memory>
 
-#include "kzsdk/abs/startup.h"
 #include "kzsdk/fpx/fpx.h"
 
 namespace kzfp {
@@ -31,30 +32,22 @@ std::string printed(const char* format, double number)
 std::string had(double seconds) { return printed("%.1f s", std::floor(seconds * 10) / 10); }
 std::string needed() { return printed("%.1f s", std::ceil(kSecondsNeeded * 10) / 10); }
 
-[[noreturn]] void fail(const char* step, kz_status status)
-{
-    char text[64];
-    std::snprintf(text, sizeof text, "%s failed with status 0x%08X", step,
-                  static_cast<unsigned>(status));
-    throw FileError(text);
-}
-
-uint32_t to_library_format(Encoding encoding)
+uint32_t to_library_format(audio::Encoding encoding)
 {
     switch (encoding) {
-    case Encoding::u8:
+    case audio::Encoding::u8:
         return KZ_FPX_FORMAT_PCM8;
-    case Encoding::alaw:
+    case audio::Encoding::alaw:
         return KZ_FPX_FORMAT_ALAW;
-    case Encoding::ulaw:
+    case audio::Encoding::ulaw:
         return KZ_FPX_FORMAT_ULAW;
-    case Encoding::s16:
+    case audio::Encoding::s16:
         break;
     }
     return KZ_FPX_FORMAT_PCM16;
 }
 
-Handle create(const StreamFormat& format, Algorithm algorithm)
+Handle create(const audio::StreamFormat& format, Algorithm algorithm)
 {
     kz_fpx_handle* handle = nullptr;
     const kz_status status = kz_fpx_fingerprint_create(static_cast<uint32_t>(algorithm),
@@ -89,7 +82,7 @@ uint32_t next_frames(const kz_fpx_handle& handle)
 }
 
 /// Why `frames` of a stream that has ended made no fingerprint.
-std::string too_little(const kz_fpx_handle& handle, const AudioSource& source, uint64_t frames)
+std::string too_little(const kz_fpx_handle& handle, const audio::Source& source, uint64_t frames)
 {
     const double seconds = static_cast<double>(frames) / source.format().rate;
     const Silence silence = silence_of(handle);
@@ -113,7 +106,7 @@ std::string too_little(const kz_fpx_handle& handle, const AudioSource& source, u
 /// Feeds a stream until the fingerprint is complete, in the pieces that the library would cut for
 /// itself out of one large buffer: leading silence is judged piece by piece, and at most rates a
 /// cut shows in the last bits of the resampled signal.
-void feed(kz_fpx_handle& handle, AudioSource& source)
+void feed(kz_fpx_handle& handle, audio::Source& source)
 {
     const size_t frame_bytes = source.format().frame_bytes();
     std::vector<std::byte> block;
@@ -132,7 +125,7 @@ void feed(kz_fpx_handle& handle, AudioSource& source)
             fed += got;
         }
         if (complete == 0 && got < wanted) {
-            throw FileError(too_little(handle, source, fed));
+            throw audio::FileError(too_little(handle, source, fed));
         }
     }
 }
@@ -166,18 +159,7 @@ std::vector<int16_t> values_of(kz_fpx_handle& handle)
 
 } // namespace
 
-Library::Library()
-{
-    kzconf_configuration configuration;
-    kzconf_initialize_configuration(&configuration);
-    if (const kz_status status = kzinit_initialize_vesk(&configuration); status != KZ_OK) {
-        fail("starting the library", status);
-    }
-}
-
-Library::~Library() { kzinit_shutdown_vesk(); }
-
-Fingerprint take_fingerprint(AudioSource& source, Algorithm algorithm)
+Fingerprint take_fingerprint(audio::Source& source, Algorithm algorithm)
 {
     const Handle handle = create(source.format(), algorithm);
     feed(*handle, source);

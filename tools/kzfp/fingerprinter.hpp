@@ -6,20 +6,10 @@
 #include <string>
 #include <vector>
 
-#include "audio_source.hpp"
+#include "audio/source.hpp"
+#include "library.hpp"
 
 namespace kzfp {
-
-constexpr uint32_t kWorkingRate = 11025; ///< hertz; what the library analyses at
-
-/// Starts the library for as long as it lives.
-class Library {
-public:
-    Library();
-    ~Library();
-    Library(const Library&) = delete;
-    Library& operator=(const Library&) = delete;
-};
 
 struct Fingerprint {
     std::string document;        ///< the query document, without a line break at its end
@@ -28,7 +18,7 @@ struct Fingerprint {
 };
 
 /// Reads no more of `source` than the fingerprint needs. The document is the one that a single call
-/// with the whole stream would give. Throws FileError, also when there is too little sound.
-Fingerprint take_fingerprint(AudioSource& source, Algorithm algorithm);
+/// with the whole stream would give. Throws audio::FileError, also when there is too little sound.
+Fingerprint take_fingerprint(audio::Source& source, Algorithm algorithm);
 
 } // namespace kzfp

@@ -1,16 +1,18 @@
-#include "raw_samples.hpp"
+// The bytes go on as they are; on a big-endian machine 16-bit samples are turned round.
 
+#include "audio/raw_samples.hpp"
+
+#include <algorithm>
 #include <array>
 #include <bit>
 #include <cerrno>
 #include <cmath>
-#include <cstring>
 #include <limits>
 #include <utility>
 
 #include <unistd.h>
 
-namespace kzfp {
+namespace audio {
 
 namespace {
 
@@ -44,7 +46,7 @@ RawSamples::RawSamples(int file, bool seekable, const StreamFormat& format, cons
     if (!seekable) {
         skip(start);
     } else if (::lseek(file, static_cast<off_t>(start), SEEK_CUR) < 0) {
-        throw FileError(std::string("cannot be read (") + std::strerror(errno) + ")");
+        throw system_error("cannot be read", errno);
     }
 }
 
@@ -73,7 +75,7 @@ size_t RawSamples::read_bytes(std::span<std::byte> bytes)
             continue;
         }
         if (count < 0) {
-            throw FileError(std::string("cannot be read (") + std::strerror(errno) + ")");
+            throw system_error("cannot be read", errno);
         }
         if (count == 0) {
             break;
@@ -96,4 +98,4 @@ void RawSamples::skip(uint64_t count)
     }
 }
 
-} // namespace kzfp
+} // namespace audio

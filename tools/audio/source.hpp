@@ -1,0 +1,41 @@
+/// @file
+/// A stream of samples, wherever it comes from.
+#pragma once
+
+#include <cstddef>
+#include <span>
+#include <stdexcept>
+#include <string>
+
+#include "audio/stream_format.hpp"
+
+namespace audio {
+
+/// What is wrong with one file, and what would be right; without the name of the file.
+struct FileError : std::runtime_error {
+    using std::runtime_error::runtime_error;
+};
+
+/// A failed system call, with the text of its `errno`.
+FileError system_error(const std::string& what, int error);
+
+/// The file ends before the section that was asked for begins; both in seconds.
+FileError start_beyond_end(double end, double start);
+
+/// A stream of samples in one of the encodings, with one or two channels.
+class Source {
+public:
+    virtual ~Source() = default;
+
+    /// The form of the samples that read() gives.
+    virtual StreamFormat format() const = 0;
+
+    /// Fills `bytes`, a whole number of frames. Returns the frames read: fewer only at the end.
+    /// Throws FileError.
+    virtual size_t read(std::span<std::byte> bytes) = 0;
+
+    /// Why the stream ended before its time; empty when nothing is known against it.
+    virtual std::string trouble() const { return {}; }
+};
+
+} // namespace audio

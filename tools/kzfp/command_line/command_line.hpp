@@ -1,0 +1,30 @@
+/// @file
+/// What the command lines of all commands have in common.
+#pragma once
+
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include <CLI/CLI.hpp>
+
+namespace kzfp {
+
+enum ExitStatus : int { all_done = 0, some_file_failed = 1, wrong_usage = 2 };
+
+/// The words that a command is run with.
+struct Arguments {
+    std::string_view command; ///< the word that named it; empty in the form without one
+    int count;
+    char** words; ///< as main() has them; the first is the program or the command's name
+};
+
+/// What the help calls the program: "kzfp", or "kzfp disc".
+std::string program_name(const Arguments& arguments);
+
+/// Reads the words, with --help and --version besides the parser's own options. Prints what was
+/// asked for or what is wrong, and returns the status to end with; nothing when the command is to be
+/// carried out.
+std::optional<ExitStatus> parse(CLI::App& parser, const Arguments& arguments);
+
+} // namespace kzfp

@@ -1,0 +1,77 @@
+// Objects keep the order of their members, so that lines of one command can be compared as text.
+
+#include "output/json.hpp"
+
+#include <cmath>
+
+#include <nlohmann/json.hpp>
+
+namespace kzfp {
+
+namespace {
+
+using Object = nlohmann::ordered_json;
+
+double to_microseconds(double seconds) { return std::round(seconds * 1e6) / 1e6; }
+
+/// Not made into an object by its first member: without memory for that, it could not be destroyed.
+Object make_object() { return Object::object_t(); }
+
+std::string to_line(const Object& object)
+{
+    // A name or label that is not UTF-8 is shown with replacement characters.
+    return object.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace) + '\n';
+}
+
+} // namespace
+
+std::string to_json(const FingerprintRecord& record)
+{
+    const uint32_t offset = record.fingerprint.signal_offset;
+    Object object = make_object();
+    object["file"] = record.file;
+    object["algorithm"] = record.algorithm;
+    object["duration"] = nullptr;
+    if (record.facts.duration) {
+        object["duration"] = to_microseconds(*record.facts.duration);
+    }
+    object["sample_rate"] = record.facts.rate;
+    object["channels"] = record.facts.channels;
+    object["signal_offset_seconds"] = to_microseconds(static_cast<double>(offset) / kWorkingRate);
+    object["signal_offset_samples"] = offset;
+    object["signal_offset_rate"] = kWorkingRate;
+    object["values"] = record.fingerprint.values;
+    return to_line(object);
+}
+
+std::string to_json(const std::string& path, const DiscContent& content)
+{
+    Object object = make_object();
+    object["path"] = path;
+    object["bluray"] = content.is_bluray;
+    object["dvd"] = content.is_dvd;
+    object["control_files"] = Object::object();
+    for (const ControlFile& file : content.control_files) {
+        object["control_files"][file.name] = file.found;
+    }
+    object["playlists"] = content.playlists;
+    object["title_sets"] = content.title_sets;
+    return to_line(object);
+}
+
+std::string to_json(const std::string& path, const DiscLabels& labels)
+{
+    Object object = make_object();
+    object["path"] = path;
+    object["iso9660_label"] = nullptr;
+    object["udf_label"] = nullptr;
+    if (labels.iso9660) {
+        object["iso9660_label"] = *labels.iso9660;
+    }
+    if (labels.udf) {
+        object["udf_label"] = *labels.udf;
+    }
+    return to_line(object);
+}
+
+} // namespace kzfp

@@ -1,0 +1,27 @@
+/// @file
+/// Results as JSON Lines: one object on one line, with its line break.
+#pragma once
+
+#include <string>
+#include <string_view>
+
+#include "audio/input.hpp"
+#include "disc/content.hpp"
+#include "disc/labels.hpp"
+#include "fingerprinter.hpp"
+
+namespace kzfp {
+
+/// What is said of one file.
+struct FingerprintRecord {
+    const std::string& file;
+    std::string_view algorithm;
+    const audio::InputFacts& facts;
+    const Fingerprint& fingerprint;
+};
+
+std::string to_json(const FingerprintRecord& record);
+std::string to_json(const std::string& path, const DiscContent& content);
+std::string to_json(const std::string& path, const DiscLabels& labels);
+
+} // namespace kzfp
