@@ -1,6 +1,6 @@
 // Feeds the library what a source gives, in pieces that leave no trace in the result.
 
-#include "fingerprinter.hpp"
+#include "kzfp/fingerprinter.hpp"
 
 #include <cmath>
 #include <cstdio>

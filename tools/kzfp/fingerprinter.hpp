@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "audio/source.hpp"
-#include "library.hpp"
+#include "kzfp/library.hpp"
 
 namespace kzfp {
 

@@ -1,6 +1,6 @@
 // The start-up of the library and the wording of its statuses.
 
-#include "library.hpp"
+#include "kzfp/library.hpp"
 
 #include <cstdio>
 

@@ -12,8 +12,8 @@
 #include <fcntl.h>
 #include <unistd.h>
 
-#include "commands/table.hpp"
-#include "output/write.hpp"
+#include "kzfp/commands/table.hpp"
+#include "kzfp/output/write.hpp"
 
 namespace {
 

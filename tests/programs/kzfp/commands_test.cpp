@@ -7,7 +7,7 @@
 
 #include <gtest/gtest.h>
 
-#include "commands/table.hpp"
+#include "kzfp/commands/table.hpp"
 
 namespace {
 

@@ -54,8 +54,7 @@ std::string target_of(const Include& include, const Tree& tree)
 {
     const fs::path beside = fs::path(include.file).parent_path() / include.what;
     for (const auto& path : {beside, fs::path(include.what), "tests" / fs::path(include.what),
-                             "bench" / fs::path(include.what), "tools" / fs::path(include.what),
-                             "tools/kzfp" / fs::path(include.what)}) {
+                             "bench" / fs::path(include.what), "tools" / fs::path(include.what)}) {
         const auto name = path.lexically_normal().generic_string();
         if (tree.files.contains(name)) {
             return name;

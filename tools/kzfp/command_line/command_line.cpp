@@ -1,6 +1,6 @@
 // Every command is parsed in the same way: help and version are its own, wrong usage has one status.
 
-#include "command_line/command_line.hpp"
+#include "kzfp/command_line/command_line.hpp"
 
 #include <iostream>
 

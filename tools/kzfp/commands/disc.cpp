@@ -5,12 +5,12 @@
 #include <string>
 #include <system_error>
 
-#include "command_line/choice.hpp"
-#include "command_line/command_line.hpp"
-#include "disc/families.hpp"
-#include "output/json.hpp"
-#include "output/text.hpp"
-#include "output/write.hpp"
+#include "kzfp/command_line/choice.hpp"
+#include "kzfp/command_line/command_line.hpp"
+#include "kzfp/disc/families.hpp"
+#include "kzfp/output/json.hpp"
+#include "kzfp/output/text.hpp"
+#include "kzfp/output/write.hpp"
 
 namespace kzfp {
 

@@ -6,12 +6,12 @@
 #include <utility>
 
 #include "audio/input.hpp"
-#include "commands/fingerprint_options.hpp"
-#include "fingerprinter.hpp"
-#include "output/json.hpp"
-#include "output/progress.hpp"
-#include "output/text.hpp"
-#include "output/write.hpp"
+#include "kzfp/commands/fingerprint_options.hpp"
+#include "kzfp/fingerprinter.hpp"
+#include "kzfp/output/json.hpp"
+#include "kzfp/output/progress.hpp"
+#include "kzfp/output/text.hpp"
+#include "kzfp/output/write.hpp"
 
 namespace kzfp {
 

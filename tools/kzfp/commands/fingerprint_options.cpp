@@ -1,6 +1,6 @@
 // The options of `kzfp fingerprint`, which are also those of the program without a command.
 
-#include "commands/fingerprint_options.hpp"
+#include "kzfp/commands/fingerprint_options.hpp"
 
 #include <charconv>
 #include <cmath>
@@ -8,7 +8,7 @@
 #include <string_view>
 #include <utility>
 
-#include "commands/table.hpp"
+#include "kzfp/commands/table.hpp"
 
 namespace kzfp {
 

@@ -7,9 +7,9 @@
 #include <vector>
 
 #include "audio/input.hpp"
-#include "command_line/choice.hpp"
-#include "command_line/command_line.hpp"
-#include "library.hpp"
+#include "kzfp/command_line/choice.hpp"
+#include "kzfp/command_line/command_line.hpp"
+#include "kzfp/library.hpp"
 
 namespace kzfp {
 

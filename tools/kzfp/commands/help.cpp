@@ -3,8 +3,8 @@
 #include <array>
 #include <string>
 
-#include "commands/table.hpp"
-#include "output/write.hpp"
+#include "kzfp/commands/table.hpp"
+#include "kzfp/output/write.hpp"
 
 namespace kzfp {
 

@@ -1,6 +1,6 @@
 // A command is one file of this folder, which defines its function, and one row here.
 
-#include "commands/table.hpp"
+#include "kzfp/commands/table.hpp"
 
 #include <algorithm>
 

@@ -6,7 +6,7 @@
 #include <string>
 #include <string_view>
 
-#include "command_line/command_line.hpp"
+#include "kzfp/command_line/command_line.hpp"
 
 namespace kzfp {
 

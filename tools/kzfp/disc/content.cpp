@@ -1,12 +1,12 @@
 // Every path is built, and every file looked for, through the library's disc helpers.
 
-#include "disc/content.hpp"
+#include "kzfp/disc/content.hpp"
 
 #include <algorithm>
 #include <memory>
 #include <string_view>
 
-#include "disc/families.hpp"
+#include "kzfp/disc/families.hpp"
 
 namespace kzfp {
 

@@ -5,8 +5,8 @@
 #include <string>
 
 #include "audio/source.hpp"
+#include "kzfp/library.hpp"
 #include "kzsdk/disc/disc.h"
-#include "library.hpp"
 
 namespace kzfp {
 

@@ -1,12 +1,12 @@
 // A label is read where its volume descriptor stands, and only when the descriptor is there.
 
-#include "disc/labels.hpp"
+#include "kzfp/disc/labels.hpp"
 
 #include <array>
 #include <cerrno>
 #include <string_view>
 
-#include "disc/families.hpp"
+#include "kzfp/disc/families.hpp"
 #include "kzsdk/disc/volume_label.hpp"
 
 namespace kzfp {

@@ -1,6 +1,6 @@
 // Objects keep the order of their members, so that lines of one command can be compared as text.
 
-#include "output/json.hpp"
+#include "kzfp/output/json.hpp"
 
 #include <cmath>
 

@@ -6,9 +6,9 @@
 #include <string_view>
 
 #include "audio/input.hpp"
-#include "disc/content.hpp"
-#include "disc/labels.hpp"
-#include "fingerprinter.hpp"
+#include "kzfp/disc/content.hpp"
+#include "kzfp/disc/labels.hpp"
+#include "kzfp/fingerprinter.hpp"
 
 namespace kzfp {
 

@@ -1,12 +1,12 @@
 // The line is replaced in place, and cleared before anything else is written.
 
-#include "output/progress.hpp"
+#include "kzfp/output/progress.hpp"
 
 #include <cstdio>
 
 #include <unistd.h>
 
-#include "output/write.hpp"
+#include "kzfp/output/write.hpp"
 
 namespace kzfp {
 

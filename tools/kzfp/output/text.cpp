@@ -1,8 +1,8 @@
 // The plain forms: "name: value" lines, and numbers with spaces between them.
 
-#include "output/text.hpp"
+#include "kzfp/output/text.hpp"
 
-#include "output/write.hpp"
+#include "kzfp/output/write.hpp"
 
 namespace kzfp {
 

@@ -6,8 +6,8 @@
 #include <string>
 #include <vector>
 
-#include "disc/content.hpp"
-#include "disc/labels.hpp"
+#include "kzfp/disc/content.hpp"
+#include "kzfp/disc/labels.hpp"
 
 namespace kzfp {
 

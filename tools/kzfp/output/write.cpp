@@ -1,6 +1,6 @@
 // Results are not buffered: each is written before the next file is begun, or its failure is known.
 
-#include "output/write.hpp"
+#include "kzfp/output/write.hpp"
 
 #include <algorithm>
 #include <cerrno>
