@@ -1,6 +1,5 @@
 # The same doors as ./run, for those whose fingers type make.
-COMMANDS := demo test build bench bench-growth bench-counts format lint install check-arch \
-            check-reproducible check-threads check-all coverage fuzz mutate sbom soak clean help
+COMMANDS := $(shell ./run commands)
 
 .DEFAULT_GOAL := help
 .PHONY: $(COMMANDS)

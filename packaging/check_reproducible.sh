@@ -13,9 +13,6 @@ cd "$(dirname "$0")/.."
 jobs=${JOBS:-$(getconf _NPROCESSORS_ONLN)}
 files="kzsdk/libkzsdk.so.1.0.0 kzsdk/libkzsdk.a tools/kzfp/kzfp bindings/java/kzsdk.jar"
 targets="kzsdk_shared kzsdk_static kzfp kzsdk_jar"
-if [ "${SETUP:-yes}" != no ]; then
-    scripts/setup.sh build tools java
-fi
 
 folder=$(mktemp -d)
 trap 'rm -rf "$folder"' EXIT

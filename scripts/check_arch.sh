@@ -6,6 +6,7 @@
 #   scripts/check_arch.sh all      also the other levels, -march=native, 32-bit ARM with and without
 #                                  floating-point hardware, and unit tests on other processors
 #   scripts/check_arch.sh <way>... just these: see `scripts/check_arch.sh list`
+#   scripts/check_arch.sh groups [quick | all | <way>...]   the groups of scripts/setup.sh that this needs
 #
 # Each way is run with all variants of the inner loops that its processor has. A way that ends in -tests
 # runs the unit tests of the rooms that compute.
@@ -23,6 +24,11 @@ rest="g++-O1 g++-O2 g++-O3 g++-O3-native clang++-O0 clang++-O1 clang++-O2 clang+
 aarch64-O0 aarch64-O3 armhf-O0 armhf-O2 armhf-O3 armel-O2 s390x-O0 s390x-O3 i686-O0 i686-O3 \
 aarch64-O2-tests s390x-O2-tests armel-O2-tests i686-O2-tests"
 
+groups_only=no
+if [ "${1:-}" = groups ]; then
+    groups_only=yes
+    shift
+fi
 case ${1:-quick} in
 quick) ways=$quick ;;
 all) ways="$quick $rest" ;;
@@ -33,6 +39,14 @@ list)
     ;;
 *) ways=$* ;;
 esac
+
+if [ "$groups_only" = yes ]; then
+    echo build
+    case $ways in *clang*) echo clang ;; esac
+    case $ways in *aarch64* | *arm* | *s390x* | *i686*) echo arch ;; esac
+    case $ways in *-tests*) echo test wide ;; esac
+    exit 0
+fi
 
 # How a way is configured: its flags are everything behind the first hyphen.
 configure() {
@@ -128,15 +142,6 @@ check() {
     fi
     $run "$1" "$build"
 }
-
-groups="build"
-case $ways in *clang*) groups="$groups clang" ;; esac
-case $ways in *aarch64* | *arm* | *s390x* | *i686*) groups="$groups arch" ;; esac
-case $ways in *-tests*) groups="$groups test wide" ;; esac
-if [ "${SETUP:-yes}" != no ]; then
-    # shellcheck disable=SC2086 # likewise
-    scripts/setup.sh $groups
-fi
 
 failed=
 for way in $ways; do

@@ -6,9 +6,6 @@ set -eu
 cd "$(dirname "$0")/.."
 
 jobs=${JOBS:-$(getconf _NPROCESSORS_ONLN)}
-if [ "${SETUP:-yes}" != no ]; then
-    scripts/setup.sh build java test
-fi
 cmake --preset tsan -DKZ_WERROR=ON -DKZ_BUILD_TOOLS=OFF
 cmake --build --preset tsan --parallel "$jobs" --target abi_threads_test soak jni_tests
 ctest --preset tsan --parallel "$jobs" --tests-regex '^(abi_threads_test|soak|jni_.*)\.'
