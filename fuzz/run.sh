@@ -15,8 +15,9 @@ seconds=${1:-60}
 jobs=${JOBS:-$(getconf _NPROCESSORS_ONLN)}
 [ $# -eq 0 ] || shift
 if [ $# -eq 0 ]; then
+    # The targets that were built.
     # shellcheck disable=SC2046 # the names are meant to be split
-    set -- $(sed -n 's/^ *kz_fuzz(\([a-z_]*\) .*/\1/p' fuzz/CMakeLists.txt) kzfp_options kzfp_files
+    set -- $(sed -n 's/^fuzz //p' "$programs/../layers.txt")
 fi
 
 run_target() {
