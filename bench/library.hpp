@@ -54,7 +54,7 @@ struct Job {
     uint32_t channels;
 };
 
-/// A fingerprint in the making.
+/// A fingerprint context.
 class Fingerprint {
 public:
     explicit Fingerprint(const Job& job)

@@ -2,9 +2,9 @@
  * @file
  * Status codes: 0 for success, else 0x90000000 | (module << 16) | reason.
  *
- * Each failure is listed with its cause and its cure. Allocation also fails while the library is not
- * started up, so every ..._ERROR_MEMORY may mean that kzinit_initialize_vesk() was not called.
- * kz_status_text() says the same at run time.
+ * Each failure is listed with its cause and its cure; kz_status_text() says the same at run time.
+ * Allocation also fails while the library is not started up, so every ..._ERROR_MEMORY may mean
+ * that neither kzinit_initialize_vesk() nor kzinit_acquire() was called.
  */
 #ifndef KZSDK_ABS_STATUS_H
 #define KZSDK_ABS_STATUS_H

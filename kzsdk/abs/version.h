@@ -37,10 +37,10 @@ KZ_API const char* kz_abs_get_common_version(void) KZ_NOEXCEPT;
 /** Version of the platform layer's own half: "zonqa-abs-linux-5". */
 KZ_API const char* kz_abs_get_platspec_version(void) KZ_NOEXCEPT;
 
-/** "Device Software Version May 12 2011 00:44:31". The date is part of the text, not of the build. */
+/** "Device Software Version May 12 2011 00:44:31". The date is part of the text. */
 KZ_API const char* kz_get_software_version(void) KZ_NOEXCEPT;
 
-/** "Device Hardware Version May 12 2011 00:44:31". The date is part of the text, not of the build. */
+/** "Device Hardware Version May 12 2011 00:44:31". The date is part of the text. */
 KZ_API const char* kz_get_hardware_version(void) KZ_NOEXCEPT;
 
 KZ_C_END

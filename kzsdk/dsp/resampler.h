@@ -13,6 +13,7 @@
 #define KZSDK_DSP_RESAMPLER_H
 
 #include "kzsdk/abs/base.h"
+#include "kzsdk/dsp/convolve.h"
 #include "kzsdk/dsp/fxp.h"
 
 KZ_C_BEGIN
@@ -106,24 +107,6 @@ KZ_API void KZDSP_resampler_fixed_resample(KZDSP_resampler_fixed* resampler, con
                                            uint32_t output_capacity, uint32_t* consumed,
                                            uint32_t* produced) KZ_NOEXCEPT;
 
-/**
- * Dot product of two runs of samples, both walked backwards, with one run of taps, walked forwards.
- *
- * Each product of a sample and a Q31 tap is exact; its bits from 32 - @p shift up are added, modulo
- * 2^32. The result has the samples' scale for shift 1, half of it for shift 0.
- *
- * @param first         Newest sample of the first run, `first[0]`, `first[-1]`, ...
- * @param second        Newest sample of the second run; read only when @p second_count is not 0.
- * @param msb, lsb      Halves of the first tap.
- * @param stride        Distance from one tap to the next.
- * @param shift         0 .. 31, taken modulo 256. (32 adds the low words; more adds nothing.)
- * @return The sum; 0 when there are samples but a table or an array is null.
- */
-KZ_API FxpType KZDSP_DualConvolveFixed(const FxpType* first, uint32_t first_count,
-                                       const FxpType* second, uint32_t second_count,
-                                       const int16_t* msb, const uint16_t* lsb, uint32_t stride,
-                                       int32_t shift) KZ_NOEXCEPT;
-
 /** A floating-point resampler. Read it, do not change it. */
 typedef struct KZDSP_resampler {
     uint32_t up;             /**< L */
@@ -195,9 +178,9 @@ KZ_API uint32_t KZDSP_ComputeRawLength(const KZDSP_resampler* resampler,
  * Timing: as in KZDSP_resampler_fixed_resample(), of which every call consumes and produces the
  * same counts at the rates that it knows.
  *
- * Scaling:  full level at every rate, 22050 and 44100 Hz included; upsampling gains L / M, so 8000
- * Hz comes out at 1.376 times full level. Cost:     one product per tap of a phase for each output.
- * Never allocates.
+ * Scaling:  full level at every rate, 22050 and 44100 Hz included; upsampling gains L / M, so
+ *           8000 Hz comes out at 1.376 times full level.
+ * Cost:     one product per tap of a phase for each output. Never allocates.
  *
  * @param input           `input_count` mono samples. NaN and infinities reach the outputs whose
  *                        windows hold them, no other.

@@ -5,6 +5,14 @@
  * Order of calls: create; add audio, once or in pieces, until the complete flag is set; serialize;
  * serialize_free; free. The library must have been started (kzinit_initialize_vesk()).
  *
+ * What may be combined:
+ *
+ *     algorithm  KZ_FPX_ALGORITHM_FIXED                KZ_FPX_ALGORITHM_FLOAT
+ *     format     PCM8, PCM16, ALAW, ULAW               the same
+ *     rate       8000, 11025, 16000, 22050,            any whole number of hertz
+ *                24000, 32000, 44100 or 48000 Hz       from 1 to 1000000000
+ *     channels   1 or 2                                the same
+ *
  * Threads: handles are independent of each other; one handle belongs to one thread at a time. A
  * call needs up to 100 KB of stack.
  */
@@ -16,14 +24,13 @@
 
 KZ_C_BEGIN
 
-/** A fingerprint in the making. Opaque. */
+/** A fingerprint context. Opaque. */
 typedef struct kz_fpx_handle kz_fpx_handle;
 
 /** Algorithm numbers. */
 enum {
-    KZ_FPX_ALGORITHM_FIXED = 1, /**< fixed point: eight rates, exact to the bit everywhere */
-    KZ_FPX_ALGORITHM_FLOAT =
-        2 /**< floating point: any rate; values a little apart from the other's */
+    KZ_FPX_ALGORITHM_FIXED = 1, /**< fixed point; the same bits on every processor */
+    KZ_FPX_ALGORITHM_FLOAT = 2  /**< floating point; values a little apart from the other's */
 };
 
 /** Input formats. Channels are interleaved. */
@@ -35,13 +42,20 @@ enum {
 };
 
 /**
- * Makes a fingerprint in the making. Note the order: the format comes before the rate here, and
+ * Milliseconds of sound, after leading silence, that complete a default fingerprint at any rate
+ * from 2000 Hz up and however the stream is cut: twelve frames, each 11264 samples at 11025 Hz after
+ * the one before and the last 32768 long, and what the resampler and the search for the signal hold
+ * back. There is no document of less sound.
+ */
+#define KZ_FPX_MILLISECONDS_NEEDED UINT32_C(14220)
+
+/**
+ * Creates a fingerprint context. Note the order: the format comes before the rate here, and
  * after it in the fingerprinters' own constructors.
  *
  * @param algorithm    One of the algorithm numbers.
  * @param format       One of the input formats.
- * @param sample_rate  Hertz: 8000, 11025, 16000, 22050, 24000, 32000, 44100 or 48000; with
- *                     KZ_FPX_ALGORITHM_FLOAT any rate that KZDSP_CreateResampler() takes.
+ * @param sample_rate  Hertz, as the table above allows.
  * @param channels     1 or 2.
  * @param[out] out_handle  The handle, which the caller frees with kz_fpx_fingerprint_free(). Left
  *                     untouched on failure: set it to null first. Must not be null.
@@ -57,8 +71,8 @@ KZ_API kz_status kz_fpx_fingerprint_create(uint32_t algorithm, uint32_t format,
 /**
  * Feeds audio. May be called again with what follows, in pieces of any whole number of frames.
  *
- * Leading silence is skipped. A default fingerprint is complete after 14.2 s of what follows it;
- * audio fed after that is ignored. Where the stream is cut does not show at 11025 Hz once the
+ * Leading silence is skipped. A default fingerprint is complete after 14.22 s of what follows it
+ * (KZ_FPX_MILLISECONDS_NEEDED); audio fed after that is ignored. Where the stream is cut does not show at 11025 Hz once the
  * signal has begun; at other rates it may show in the last bits of the resampled signal
  * (resampler.h says how far), and leading silence is judged piece by piece.
  *

@@ -9,6 +9,9 @@
  * dropped -> frames of 32768 samples, one every 11264 -> equalised, decimated by two, transformed
  * -> 15 bands. Twelve frames make a fingerprint of 30 values.
  *
+ * Order of two pieces. A frame comes in the order of time: `first` is the older piece, `second`
+ * follows it. (The two runs of a dot product, in convolve.h, come newest first.)
+ *
  * Threads: none of these objects may be used by two threads at once; different objects are
  * independent. Arithmetic: integer, modulo 2^32; the same input gives the same words everywhere.
  */
@@ -150,7 +153,7 @@ KZ_API uint32_t kzqvfixed_signal_detector_get_signal_offset(kzqvfixed_signal_det
  * @p second_count says: unless @p second is null it must then hold @p output_length less those used
  * of @p first.
  *
- * @param first, second  Pieces, oldest first. A null piece counts as no samples.
+ * @param first, second  Pieces, the older one first. A null piece counts as no samples.
  * @param output         Room for @p output_length samples, apart from the pieces. Samples that
  *                       neither piece provides are not written.
  * @param histogram      @p levels + 1 counters, scratch.
@@ -228,8 +231,11 @@ kzqvfixed_frame_manager_create(const kzqvfixed_config* config) KZ_NOEXCEPT;
 /** Frees a manager with all it owns; null is ignored. Returns 0. */
 KZ_API kz_status kzqvfixed_frame_manager_destroy(kzqvfixed_frame_manager* manager) KZ_NOEXCEPT;
 
-/** Drops all records and starts anew, with the configured frames to skip. Null is ignored. Returns
- * 0. */
+/**
+ * Drops all records and starts anew, with the configured frames to skip. Null is ignored.
+ *
+ * @return 0.
+ */
 KZ_API kz_status kzqvfixed_frame_manager_reset(kzqvfixed_frame_manager* manager) KZ_NOEXCEPT;
 
 /**
@@ -291,7 +297,7 @@ KZ_API uint32_t kzqvfixed_frame_manager_get_fingerprint(kzqvfixed_frame_manager*
 /** Samples that are converted at a time. */
 #define KZQVFIXED_CONVERSION_SAMPLES 4096
 
-/** A fingerprint in the making: row 1 of the extraction interface. Read it, do not change it. */
+/** A fingerprint context: row 1 of the extraction interface. Read it, do not change it. */
 typedef struct kzqvfixed_fingerprinter {
     uint32_t channel_count;                 /**< 1 or 2 */
     uint32_t input_rate;                    /**< hertz */

@@ -4,8 +4,8 @@
 using kz::fxp::shift_left;
 
 // The bit-pair method on 32-bit registers, all of which wrap: two bits of the value enter the
-// remainder in each round, and zeros once the value is used up, which makes it the root of value *
-// 2^30.
+// remainder in each round, and zeros once the value is used up, which makes it the root of
+// value * 2^30.
 uint32_t sq_root(uint32_t value) noexcept
 {
     uint32_t remainder = 0;

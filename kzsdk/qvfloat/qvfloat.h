@@ -11,6 +11,9 @@
  * leading silence dropped -> frames of 32768 samples, one every 11264 -> equalised, transformed ->
  * 15 bands.
  *
+ * Order of two pieces. A frame comes in the order of time: `first` is the older piece, `second`
+ * follows it. (The two runs of a dot product, in convolve.h, come newest first.)
+ *
  * Threads: none of these objects may be used by two threads at once; different objects are
  * independent. Arithmetic: sums accumulate in single precision in the stated order, without
  * contraction. Results are the same on every processor whose C library has the same sine and
@@ -159,7 +162,7 @@ KZ_API kz_status hist_eq2(const float* input, float* output, uint32_t count, uin
  * says: unless
  * @p second is null it must then hold @p output_length less those used of @p first.
  *
- * @param first, second  Pieces, oldest first. A null piece counts as no samples.
+ * @param first, second  Pieces, the older one first. A null piece counts as no samples.
  * @param output         Room for @p output_length samples, apart from the pieces. Samples that
  *                       neither piece provides are not written.
  * @param histogram      @p levels counters, scratch.
@@ -212,8 +215,11 @@ KZ_API QVFM* QVFM_Create(const QVConfig* config) KZ_NOEXCEPT;
 /** Frees a manager with all it owns; null is ignored. Returns 0. */
 KZ_API kz_status QVFM_Destroy(QVFM* manager) KZ_NOEXCEPT;
 
-/** Drops all records and starts anew, with the configured frames to skip. Null is ignored. Returns
- * 0. */
+/**
+ * Drops all records and starts anew, with the configured frames to skip. Null is ignored.
+ *
+ * @return 0.
+ */
 KZ_API kz_status QVFM_Reset(QVFM* manager) KZ_NOEXCEPT;
 
 /**
@@ -226,8 +232,8 @@ KZ_API kz_status QVFM_Reset(QVFM* manager) KZ_NOEXCEPT;
  * Precondition: with equalisation on, @p second holds all samples of a frame that @p first does
  * not, whatever @p second_count says (see hist_eq_dual()).
  *
- * @param first, second  Pieces, oldest first. A null piece counts as none; two null pieces are no
- *                       frame, but still use up a frame to skip.
+ * @param first, second  Pieces, the older one first. A null piece counts as none; two null pieces
+ *                       are no frame, but still use up a frame to skip.
  * @return 0 in every case.
  */
 KZ_API kz_status QVFM_AppendDualPCMData(QVFM* manager, const float* first, uint32_t first_count,
@@ -310,7 +316,7 @@ KZ_API uint32_t QVFM_AppendFrameData(QVFM* manager, const void* data, uint32_t s
 /** Samples that are converted at a time. */
 #define QVFP_CONVERSION_SAMPLES 4096
 
-/** A fingerprint in the making: row 2 of the extraction interface. Read it, do not change it. */
+/** A fingerprint context: row 2 of the extraction interface. Read it, do not change it. */
 typedef struct QVFP {
     uint32_t channel_count;         /**< 1 or 2 */
     uint32_t input_rate;            /**< hertz */

@@ -13,7 +13,7 @@
 
 namespace kz::soak {
 
-/// A fingerprint in the making.
+/// A fingerprint context.
 class Job {
 public:
     Job(const Recording& recording, uint32_t way);
