@@ -115,6 +115,29 @@ TEST_F(FixedEqualiser, ASpreadOf256LevelsTouchesBothEnds)
     EXPECT_EQ(0U, histogram[256]);
 }
 
+// The scale is right where 33 - the leading zeros of K - 1 is 9, and off by powers of two elsewhere.
+TEST_F(FixedEqualiser, Only129To256LevelsAreSpreadEvenly)
+{
+    const Words frame = random_frame(32768, 29, 6);
+    const auto highest = [&](uint32_t levels, uint32_t& count) {
+        std::vector<uint32_t> histogram(levels + 1);
+        Words output(frame.size());
+        kzqvfixed_hist_eq2(frame.data(), output.data(), 32768, histogram.data(), levels);
+        while (histogram[--levels] == 0) {
+        }
+        count = histogram[levels];
+        return levels;
+    };
+    uint32_t count = 0;
+    for (const uint32_t levels : {129U, 200U, 256U}) {
+        EXPECT_GE(highest(levels, count), levels - 2);
+        EXPECT_LE(count, 2 * 32768 / levels);
+    }
+    EXPECT_EQ(127U, highest(128, count));
+    EXPECT_NEAR(16384, count, 500) << "half of all samples on the last of 128 levels";
+    EXPECT_EQ(127U, highest(257, count)) << "half of the levels are not used";
+}
+
 TEST_F(FixedEqualiser, AConstantFrameInOnePieceIsAllLevelZero)
 {
     for (const int32_t value : {0, 5, -5, INT32_MAX, INT32_MIN}) {
