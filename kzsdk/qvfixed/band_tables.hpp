@@ -1,5 +1,6 @@
 /// @file
-/// The constants of the band features.
+/// The constants of the band features. Bins are those of a 16384-point transform, 11025 / 65536 Hz
+/// apart; the default bands reach from 0 to 2700 Hz.
 #pragma once
 
 #include <array>
@@ -14,18 +15,19 @@ inline constexpr std::array<int32_t, 30> kFrequencyTable = {
     5468, 5468, 6419, 6419, 7548, 7548, 8797, 8797, 10223, 10223, 11888, 11888, 13790, 13790, 16049,
 };
 
-/// Factors of a band's energy before the square root, in units of 2^-32: about 256 / bins, which
-/// makes the root 8 times the band's root-mean-square coefficient.
-inline constexpr std::array<int32_t, 15> kBandWeights = {
+/// Factors of a band's energy before the square root, Q32: 256 / bins, less a few units. They make
+/// the root 8 times the band's root-mean-square coefficient.
+inline constexpr std::array<int32_t, 15> kBandWeightsQ32 = {
     1851029675, 1844818166, 1847918701, 1844818166, 1678643705, 1539932251, 1319941929, 1231256021,
     1154949188, 973019139,  879609301,  770505695,  659970964,  577778049,  486509569,
 };
 
+/// A run of bins over which the gain changes by the same step from bin to bin.
 struct GainSegment {
     uint32_t first_bin;
     uint32_t end_bin; ///< exclusive
-    int32_t gain;     ///< at the first bin, Q30
-    int32_t step;     ///< per bin
+    int32_t gain_q30; ///< at the first bin
+    int32_t step_q30; ///< per bin
 };
 
 /// Gains that make up for the decimator's roll-off in the top band. The last bins of that band,

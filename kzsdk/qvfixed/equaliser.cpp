@@ -1,3 +1,9 @@
+/// @file
+/// The fixed-point histogram equaliser: replaces each sample of a frame by its rank among them.
+///
+/// Samples are Q29 or Q30 words, though any words will do: only their order and spacing count.
+/// Ranks are Q30 fractions of a frame of 32768 samples, less their mean, so about -2^29 .. 2^29.
+/// The factor 2^15 that makes them Q30 does not follow the frame's length.
 #include <algorithm>
 #include <limits>
 #include <span>
@@ -16,9 +22,11 @@ using namespace kz::fxp;
 using Samples = std::span<const FxpType>;
 using Pieces = kz::qv::FramePieces<FxpType>;
 
-// A frame whose halved range is no more than this is silent.
+// A frame whose halved range is no more than this is silent. That is a range of one step of 16-bit
+// audio, 2^14 in Q29, and of two steps at the rates that the resampler leaves at half level.
 constexpr int32_t kSilentRange = 8192;
 
+// The smallest and the largest sample of a frame.
 struct SampleExtremes {
     kz::kernels::Extremes<int32_t> ends{std::numeric_limits<int32_t>::max(),
                                         std::numeric_limits<int32_t>::min()};
@@ -29,49 +37,55 @@ struct SampleExtremes {
                                                   static_cast<uint32_t>(samples.size()));
     }
 
-    // Halved before they are subtracted, so that the difference fits.
+    // Halved before they are subtracted, so that the difference fits 32 bits.
     int32_t bottom() const noexcept { return ends.low >> 1; }
     int32_t range() const noexcept { return wrap_sub(ends.high >> 1, ends.low >> 1); }
     bool is_silent() const noexcept { return range() <= kSilentRange; }
 };
 
 // Maps halved samples to levels 0 .. K - 1 by a multiplication with (K - 1) / range.
+//
+// With R = range * 2^zeros / 2^32 in [0.5, 1), the scale is (K - 1) / R in Q22, and the product of
+// a halved sample and the scale has 22 - zeros bits too many. That holds for 129 to 256 levels,
+// where `bits` is 9. With fewer levels the scale is too large and the upper levels take most of the
+// samples; with more it is too small and only the lower levels are used. Both are clamped into the
+// table.
 class Quantiser {
 public:
     Quantiser(int32_t bottom, int32_t range, uint32_t levels) noexcept
         : bottom_(bottom), top_level_(static_cast<int32_t>(levels - 1))
     {
         const int32_t zeros = leading_zeros(static_cast<uint32_t>(range));
-        const uint32_t normalised = shift_left(static_cast<uint32_t>(range), zeros);
-        const uint32_t inverse = KZDSP_Reciprocal(normalised);
+        const uint32_t normalised_q32 = shift_left(static_cast<uint32_t>(range), zeros);
+        const uint32_t inverse_q31 = KZDSP_Reciprocal(normalised_q32);
         const int32_t bits = 33 - leading_zeros(levels - 1);
-        scale_ = static_cast<int32_t>((levels - 1) * shift_right(inverse, bits));
+        scale_q22_ = static_cast<int32_t>((levels - 1) * shift_right(inverse_q31, bits));
         shift_ = zeros > 22 ? 31 : 22 - zeros;
     }
 
-    // The reciprocal can come out a little large, and a range of 0 has none: levels beyond the
-    // table are brought back into it.
+    // The level of one sample. The clamp matters outside of 129 to 256 levels, and for a range of 0
+    // in the one-piece form, which has no reciprocal.
     int32_t level(FxpType sample) const noexcept
     {
-        const int32_t level = smul_high(wrap_sub(sample >> 1, bottom_), scale_) >> shift_;
+        const int32_t level = smul_high(wrap_sub(sample >> 1, bottom_), scale_q22_) >> shift_;
         return std::clamp(level, 0, top_level_);
     }
 
-    // The same as bytes: there are at most 256 levels.
+    // Writes the levels of all samples, one byte each: there are at most 256 levels.
     void write_levels(Samples samples, uint8_t* levels) const noexcept
     {
-        kz::kernels::active().word_levels({bottom_, scale_, shift_, top_level_}, samples.data(),
+        kz::kernels::active().word_levels({bottom_, scale_q22_, shift_, top_level_}, samples.data(),
                                           levels, static_cast<uint32_t>(samples.size()));
     }
 
 private:
     int32_t bottom_;
     int32_t top_level_;
-    int32_t scale_ = 0;
+    int32_t scale_q22_ = 0;
     int32_t shift_ = 0;
 };
 
-// Writes each sample's level to its place and counts the levels.
+// Writes each sample's level to its place in the output and counts the levels.
 void quantise(Samples samples, const Quantiser& quantiser, FxpType* output,
               std::span<uint32_t> histogram) noexcept
 {
@@ -82,26 +96,31 @@ void quantise(Samples samples, const Quantiser& quantiser, FxpType* output,
     }
 }
 
-// Cumulative counts, in units of 1/32768 and less their mean over a frame of 32768 samples.
-void rank_values(std::span<const uint32_t> histogram, std::span<uint32_t> ranks) noexcept
+// Turns the counts of the levels into their ranks: cumulative counts less their mean, as Q30
+// fractions of 32768 samples. `total` is the mean times 32768 for that many samples: each sample
+// adds the cumulative count of its level. It wraps for frames of more than 65536 samples.
+void rank_values(std::span<const uint32_t> histogram, std::span<uint32_t> ranks_q30) noexcept
 {
     uint32_t cumulative = 0;
     uint32_t total = 0;
     for (size_t i = 0; i < histogram.size(); ++i) {
         cumulative += histogram[i];
         total = wrap_add(total, wrap_mul(histogram[i], cumulative));
-        ranks[i] = cumulative;
+        ranks_q30[i] = cumulative;
     }
-    for (uint32_t& rank : ranks) {
-        rank = wrap_sub(shift_left(rank, 15), total);
+    for (uint32_t& rank_q30 : ranks_q30) {
+        rank_q30 = wrap_sub(shift_left(rank_q30, 15), total);
     }
 }
 
+// What the plumbing of both twins needs of this one.
 struct Equaliser {
     using Sample = FxpType;
     using Rank = uint32_t;
     using Extremes = SampleExtremes;
 
+    // Equalises a frame. Up to 256 levels are kept as bytes in the first quarter of the output;
+    // more are written as words, where the ranks that replace them will be.
     static void run(const Pieces& pieces, const SampleExtremes& extremes, FxpType* output,
                     std::span<uint32_t> histogram, std::span<uint32_t> ranks) noexcept
     {

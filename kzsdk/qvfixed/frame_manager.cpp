@@ -1,3 +1,13 @@
+/// @file
+/// The fixed-point frame manager: frames of samples -> band features -> the fingerprint.
+///
+///     samples or Q30 ranks  --halve-->  --transform-->  --gain ramp-->  coefficients c
+///     energy = sum of c^2 / 2^32            amplitude = 8 * root-mean-square c
+///     fingerprint = shares of the bands in the root mean energies, then in the spreads of the
+///                   amplitudes; 32768 is the whole
+///
+/// The scale of the coefficients cancels in the shares, so only ratios count. Sums wrap at 32 bits;
+/// with equalised frames they do not come near that.
 #include <algorithm>
 #include <span>
 #include <utility>
@@ -27,6 +37,7 @@ constexpr FxpType kFlush[60] = {};
 
 // ---- creation
 
+// The transform's order is one below the frame's, so it must come out half as long as the frame.
 bool has_all_parts(const Manager& m) noexcept
 {
     return m.frame_buffer != nullptr && m.decimator != nullptr && m.spectrum != nullptr &&
@@ -34,6 +45,7 @@ bool has_all_parts(const Manager& m) noexcept
            (m.histogram_levels == 0 || m.histogram != nullptr) && m.dct->length == m.half_length;
 }
 
+// Makes the parts as far as memory and the configuration allow; what is missing stays null.
 void make_parts(Manager& m, const kzqvfixed_config& config) noexcept
 {
     m.frame_length = shift_left(1U, static_cast<int32_t>(config.frame_length_log2));
@@ -58,6 +70,8 @@ void make_parts(Manager& m, const kzqvfixed_config& config) noexcept
 
 // ---- analysis of one frame
 
+// Writes the frame into its buffer: as Q30 ranks, or unchanged when there are no levels. The two
+// differ when the second piece is short: the equaliser's copy of a silent frame ignores its count.
 void fill_frame(Manager& m, const FxpType* first, uint32_t first_count, const FxpType* second,
                 uint32_t second_count) noexcept
 {
@@ -72,6 +86,8 @@ void fill_frame(Manager& m, const FxpType* first, uint32_t first_count, const Fx
         m.frame_buffer);
 }
 
+// Halves the rate, and with it the level: the filter's products are taken from bit 32. The delay of
+// the filter is made up for by zeros before the frame, so its last outputs need zeros behind it.
 void decimate_frame(Manager& m) noexcept
 {
     uint32_t consumed = 0;
@@ -86,6 +102,8 @@ void decimate_frame(Manager& m) noexcept
     KZDSP_resampler_fixed_reset(m.decimator); // every frame is decimated from a cold filter
 }
 
+// Applies the gain ramp of the top band. A segment that does not fit a shorter spectrum is left out
+// as a whole.
 void correct_tilt(std::span<FxpType> spectrum) noexcept
 {
     for (const auto& segment : kz::qvfixed::kGainRamp) {
@@ -93,8 +111,8 @@ void correct_tilt(std::span<FxpType> spectrum) noexcept
             continue;
         }
         kz::kernels::active().apply_ramp(spectrum.data() + segment.first_bin,
-                                         segment.end_bin - segment.first_bin, segment.gain,
-                                         segment.step);
+                                         segment.end_bin - segment.first_bin, segment.gain_q30,
+                                         segment.step_q30);
     }
 }
 
@@ -110,6 +128,8 @@ std::span<const FxpType> band_bins(const Manager& m, uint32_t band) noexcept
     return {m.spectrum + low, static_cast<size_t>(high - low + 1)};
 }
 
+// The sum of the squares, shifted right by 16 before and by 16 after the addition. The low 32 bits
+// are kept, so an energy of 2^31 or more comes out negative.
 int32_t band_energy(std::span<const FxpType> bins) noexcept
 {
     const uint64_t sum =
@@ -117,14 +137,16 @@ int32_t band_energy(std::span<const FxpType> bins) noexcept
     return static_cast<int32_t>(static_cast<uint32_t>(sum >> 16));
 }
 
-// Bands beyond those that have a weight count with none.
+// 8 times the root-mean-square coefficient of a band. A band is weighed by its number, not by its
+// width; those beyond the table have weight 0.
 uint32_t band_amplitude(int32_t energy, uint32_t band) noexcept
 {
-    const auto& weights = kz::qvfixed::kBandWeights;
-    const int32_t weight = band < weights.size() ? weights[band] : 0;
-    return sq_root(static_cast<uint32_t>(smul_high(energy, weight)));
+    const auto& weights_q32 = kz::qvfixed::kBandWeightsQ32;
+    const int32_t weight_q32 = band < weights_q32.size() ? weights_q32[band] : 0;
+    return sq_root(static_cast<uint32_t>(smul_high(energy, weight_q32)));
 }
 
+// Appends the features of the frame whose spectrum is there.
 void append_features(Manager& m) noexcept
 {
     auto record = kz::qv::make_frame_record<Record>(m.band_count);
@@ -140,17 +162,16 @@ void append_features(Manager& m) noexcept
 
 // ---- the fingerprint
 
-// 1 / count as a 32-bit fraction, normalised to [0.5, 1). With the quarters and eighths that are
-// summed this is the average of 8 to 15 frames exactly, twelve among them. Other counts are off by
-// a power of two: that cancels among the means, but moves the centre from which deviations are
-// taken.
-int32_t normalised_reciprocal(uint32_t count) noexcept
+// 1 / count, normalised to [0.25, 0.5) and read as Q32. For 8 to 15 frames that is 4 / count, which
+// with sums of quarters gives exact averages, so for the usual twelve. Other counts are off by a
+// power of two: that cancels among the means, but moves the centre from which deviations are taken.
+int32_t normalised_reciprocal_q32(uint32_t count) noexcept
 {
     int32_t shift = 0;
     return static_cast<int32_t>(KZDSP_ReciprocalWithScaling(count, &shift) >> 1);
 }
 
-// Half of a frame's amplitude, less the band's average.
+// Half of a frame's amplitude, less the average of the band's halved amplitudes.
 int32_t deviation(const Record& record, uint32_t band, int32_t average) noexcept
 {
     return wrap_sub(static_cast<int32_t>(record.amplitude[band] >> 1), average);
@@ -165,15 +186,17 @@ struct Statistics {
     int32_t largest_deviation = 0;
 };
 
-int32_t root_of_product(int32_t sum, int32_t reciprocal) noexcept
+// The square root of an average: with a Q32 reciprocal the product keeps the format of the sum.
+int32_t root_of_product(int32_t sum, int32_t reciprocal_q32) noexcept
 {
-    return static_cast<int32_t>(sq_root(static_cast<uint32_t>(smul_high(sum, reciprocal))));
+    return static_cast<int32_t>(sq_root(static_cast<uint32_t>(smul_high(sum, reciprocal_q32))));
 }
 
-// Writes each band's root mean energy to `means` and its average amplitude, for now, to `spreads`.
+// Writes each band's root mean energy to `means` and the average of its halved amplitudes, for now,
+// to `spreads`: eighths times 4 / count. Notes the largest deviation from such an average.
 void take_means(const Manager& m, Statistics& s) noexcept
 {
-    const int32_t reciprocal = normalised_reciprocal(m.frame_count);
+    const int32_t reciprocal_q32 = normalised_reciprocal_q32(m.frame_count);
     for (uint32_t band = 0; band < m.band_count; ++band) {
         int32_t energy = 0;
         int32_t amplitude = 0;
@@ -181,9 +204,9 @@ void take_means(const Manager& m, Statistics& s) noexcept
             energy = wrap_add(energy, r->energy[band] >> 2);
             amplitude = wrap_add(amplitude, static_cast<int32_t>(r->amplitude[band]) >> 3);
         }
-        s.means[band] = root_of_product(energy, reciprocal);
+        s.means[band] = root_of_product(energy, reciprocal_q32);
         s.mean_total = wrap_add(s.mean_total, s.means[band] >> 2);
-        s.spreads[band] = smul_high(amplitude, reciprocal);
+        s.spreads[band] = smul_high(amplitude, reciprocal_q32);
         for (const Record* r = m.records; r != nullptr; r = r->next) {
             const int32_t d = deviation(*r, band, s.spreads[band]);
             if (magnitude(d) > magnitude(s.largest_deviation)) {
@@ -193,19 +216,22 @@ void take_means(const Manager& m, Statistics& s) noexcept
     }
 }
 
-// Bits by which deviations are raised before they are squared. The count is -1 or -2 for the
-// largest of deviations, and a shift by that gives 0.
+// Bits by which deviations are shifted left before they are squared, so that the largest keeps two
+// spare bits: 11 at most. The count is -1 or -2 for deviations from 2^30 on, and a shift by that
+// gives 0.
 int32_t deviation_shift(int32_t largest) noexcept
 {
     const int32_t zeros = leading_zeros(magnitude(largest));
     return zeros < 14 ? zeros - 2 : 11;
 }
 
-// Replaces each band's average amplitude by the spread around it.
+// Replaces each band's average by the spread around it: a standard deviation over count - 1. The
+// shift and the factor 4 are the same for all bands and cancel in the shares. With one frame the
+// reciprocal of 0 is 0, and so is every spread.
 void take_spreads(const Manager& m, Statistics& s) noexcept
 {
     const int32_t shift = deviation_shift(s.largest_deviation);
-    const int32_t reciprocal = normalised_reciprocal(wrap_sub(m.frame_count, 1U));
+    const int32_t reciprocal_q32 = normalised_reciprocal_q32(wrap_sub(m.frame_count, 1U));
     for (uint32_t band = 0; band < m.band_count; ++band) {
         int32_t squares = 0;
         for (const Record* r = m.records; r != nullptr; r = r->next) {
@@ -213,13 +239,14 @@ void take_spreads(const Manager& m, Statistics& s) noexcept
             const int32_t e = KZDSP_SaturateAbsFxpType(raised);
             squares = wrap_add(squares, smul_high(e, e));
         }
-        s.spreads[band] = root_of_product(squares, reciprocal);
+        s.spreads[band] = root_of_product(squares, reciprocal_q32);
         s.spread_total = wrap_add(s.spread_total, s.spreads[band] >> 2);
     }
 }
 
-// Each value as its share of the total, which was summed from quarters: 32768 is the whole, and
-// wraps in 16 bits to -32768. A total too small to divide by leaves nothing to share.
+// Each value as its share of the total, which was summed from quarters: 4 / 2^16 in the divisor and
+// 2^3 behind it make 32768 the whole, which wraps in 16 bits to -32768. A total below 65536 has no
+// divisor: near silence every share is 0.
 void store_shares(std::span<const int32_t> values, int32_t total, int16_t* destination) noexcept
 {
     const int32_t divisor = total >> 16;
@@ -229,6 +256,7 @@ void store_shares(std::span<const int32_t> values, int32_t total, int16_t* desti
     }
 }
 
+// Leaves `fingerprint_ready` clear when memory is short.
 void compute_fingerprint(Manager& m) noexcept
 {
     const auto means = kz::make_array<int32_t>(m.band_count);

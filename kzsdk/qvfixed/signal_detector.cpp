@@ -1,3 +1,8 @@
+/// @file
+/// The fixed-point signal detector: finds where leading silence ends.
+///
+/// Samples are Q29 or Q30 words. Shifted right by 13 they become Q16 or Q17, and the threshold, the
+/// greatest deviation and the rings are in those units: 100 is 50 steps of 16-bit audio in mono.
 #include <algorithm>
 #include <span>
 

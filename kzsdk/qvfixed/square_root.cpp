@@ -1,11 +1,16 @@
+/// @file
+/// The integer square root of the fixed-point frame manager: floor(sqrt(value * 2^30)).
+///
+/// Where the value has 2n fraction bits, the root has n + 15. Above 2^30 the remainder may wrap,
+/// and the root can then be one too small.
 #include "kzsdk/kernels/fxp_ops.hpp"
 #include "kzsdk/qvfixed/qvfixed.h"
 
 using kz::fxp::shift_left;
 
-// The bit-pair method on 32-bit registers, all of which wrap: two bits of the value enter the
-// remainder in each round, and zeros once the value is used up, which makes it the root of
-// value * 2^30.
+// The bit-pair method, one bit of the root in each round. Two bits of the value enter the remainder
+// from above; after 16 rounds the value is used up and zeros follow, which multiplies it by 2^30.
+// All three registers wrap.
 uint32_t sq_root(uint32_t value) noexcept
 {
     uint32_t remainder = 0;

@@ -12,6 +12,8 @@
 
 namespace kz::qvfixed {
 
+/// The fixed-point twin. Its samples are Q29 words when the input is mono and Q30 words when it is
+/// mixed down; a resampler leaves 22050 and 44100 Hz at half that level.
 struct Twin {
     using Object = kzqvfixed_fingerprinter;
     using Sample = FxpType;
@@ -20,6 +22,7 @@ struct Twin {
     /// Samples are Q29 or Q30; the detector judges them in units of 2^-16 or 2^-17 of full scale.
     static constexpr int32_t kDetectorShift = 13;
 
+    /// In the order of the formats' numbers. Mono becomes Q29, mixed channels become Q30.
     static constexpr qv::Converters<Sample> kConverters[] = {
         {KZDSP_PCM8ToQ29, KZDSP_StereoPCM8ToMonoQ30, KZDSP_NChannelPCM8ToMonoQ30},
         {KZDSP_PCM16ToQ29, KZDSP_StereoPCM16ToMonoQ30, KZDSP_NChannelPCM16ToMonoQ30},
@@ -42,6 +45,8 @@ struct Twin {
     static constexpr auto destroy_detector = kzqvfixed_signal_detector_destroy;
     static constexpr auto reset_detector = kzqvfixed_signal_detector_reset;
 
+    /// Null for a rate that is not in the resampler's table. Rates become Q15; the configured one
+    /// has 12 fraction bits.
     static KZDSP_resampler_fixed* make_resampler(uint32_t input_rate, const Config& config) noexcept
     {
         constexpr uint32_t kFirstRateTooHigh = 1U << 17; // hertz in Q15 no longer fit 32 bits
