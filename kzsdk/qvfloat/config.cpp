@@ -1,3 +1,8 @@
+/// @file
+/// The floating-point twin's configuration: its defaults, and the exported calls.
+///
+/// The working rate and the band edges are in hertz; the other values are those of the fixed-point
+/// twin.
 #include "kzsdk/qv/config.hpp"
 
 #include <array>
@@ -6,6 +11,7 @@
 
 namespace {
 
+// 12 frames of 32768 samples, one every 11264: 14.2 s at 11025 Hz. The table is copied in later.
 constexpr QVConfig kDefaults = {.detect_signal = 1,
                                 .detector_window = 128,
                                 .detector_threshold = 100,

@@ -1,3 +1,9 @@
+/// @file
+/// The floating-point histogram equaliser: replaces each sample of a frame by its rank among them.
+///
+/// Samples are single precision with full scale at 32768; ranks are fractions of the frame less
+/// their mean, so about -1/2 .. 1/2. All sums run in one fixed order without fused products: the
+/// order is part of the result.
 #include <algorithm>
 #include <span>
 
@@ -13,10 +19,11 @@ namespace {
 using Samples = std::span<const float>;
 using Pieces = kz::qv::FramePieces<float>;
 
-// A frame whose range is no more than this is silent.
+// A frame whose range is no more than this, one step of 16-bit audio, is silent.
 constexpr float kSilentRange = 1.0F;
 
-// The search starts beyond any sample of 16 bits, not at the ends of the type.
+// The smallest and the largest sample of a frame. The search starts beyond any sample of 16 bits,
+// not at the ends of the type: a frame that lies wholly beyond a million is measured from there.
 struct SampleExtremes {
     kz::kernels::Extremes<float> ends{1e6F, -1e6F};
 
@@ -30,7 +37,7 @@ struct SampleExtremes {
     bool is_silent() const noexcept { return range() <= kSilentRange; }
 };
 
-// Maps samples to levels 0 .. K - 1.
+// Maps samples to levels 0 .. K - 1: (sample - bottom) * (K - 1) / range, truncated.
 class Quantiser {
 public:
     Quantiser(const SampleExtremes& extremes, uint32_t levels) noexcept
@@ -46,7 +53,7 @@ public:
         return std::min(kz::to_uint32((sample - bottom_) * scale_), top_level_);
     }
 
-    // The same as bytes, of which there are at most 256.
+    // Writes the levels of all samples, one byte each: there are at most 256 levels.
     void write_levels(Samples samples, uint8_t* levels) const noexcept
     {
         kz::kernels::active().float_levels({bottom_, scale_, static_cast<int32_t>(top_level_)},
@@ -60,6 +67,7 @@ private:
     uint32_t top_level_;
 };
 
+// Counts the levels of samples. They are not stored: map_levels() works them out again.
 void count_levels(Samples samples, const Quantiser& quantiser,
                   std::span<uint32_t> histogram) noexcept
 {
@@ -68,7 +76,8 @@ void count_levels(Samples samples, const Quantiser& quantiser,
     }
 }
 
-// Cumulative shares of `count` samples, less their mean.
+// Turns the counts of the levels into their ranks: cumulative shares of `count` samples less their
+// mean over the samples. Products are rounded before they are added.
 void rank_values(std::span<const uint32_t> histogram, float count, std::span<float> ranks) noexcept
 {
     float cumulative = 0;
@@ -85,6 +94,7 @@ void rank_values(std::span<const uint32_t> histogram, float count, std::span<flo
     }
 }
 
+// Writes the rank of each sample.
 void map_levels(Samples samples, const Quantiser& quantiser, std::span<const float> ranks,
                 float* output) noexcept
 {
@@ -93,11 +103,14 @@ void map_levels(Samples samples, const Quantiser& quantiser, std::span<const flo
     }
 }
 
+// What the plumbing of both twins needs of this one.
 struct Equaliser {
     using Sample = float;
     using Rank = float;
     using Extremes = SampleExtremes;
 
+    // Equalises a frame. Up to 256 levels are kept as bytes in the first quarter of the output;
+    // more are worked out twice.
     static void run(const Pieces& pieces, const SampleExtremes& extremes, float* output,
                     std::span<uint32_t> histogram, std::span<float> ranks) noexcept
     {

@@ -1,3 +1,15 @@
+/// @file
+/// Frame data: the features of a manager's frames as bytes that another manager can append.
+///
+///     word 0   format version, 1
+///     word 1   B, the number of bands
+///     word 2   F, the number of frames
+///     then for each band, and within it for each frame from the oldest on, two words:
+///              its energy and its amplitude, as the bits of a float
+///
+/// Words have 32 bits, lowest byte first, at any address. The data may come from anywhere: sizes
+/// are compared in 64 bits, and nothing is read until they are exactly right. Features are taken
+/// as they are, whether they are numbers or not.
 #include <algorithm>
 #include <bit>
 #include <cstddef>
@@ -26,6 +38,7 @@ uint32_t read_word(const std::byte* at) noexcept
     return word;
 }
 
+// Returns the place behind the word.
 std::byte* write_word(std::byte* at, uint32_t word) noexcept
 {
     for (uint32_t i = 0; i < 4; ++i) {
@@ -47,6 +60,7 @@ uint64_t data_size(uint32_t bands, uint32_t frames) noexcept
     return uint64_t{bands} * frames * kPairBytes + kHeaderBytes;
 }
 
+// The three words before the features.
 struct Header {
     uint32_t version;
     uint32_t bands;
@@ -66,6 +80,7 @@ bool is_acceptable(const QVFM& m, const Header& header, uint32_t size) noexcept
            (header.bands != 0 || header.frames == 0);
 }
 
+// One frame's features, which lie a whole band's frames apart. Null when memory is short.
 kz::owned<QVFrameRecord> read_record(const std::byte* pairs, const Header& header,
                                      uint32_t frame) noexcept
 {
@@ -84,6 +99,7 @@ struct Range {
     uint32_t end;
 };
 
+// Frames to skip are taken from the front first, then the limit cuts the end.
 Range admitted_frames(const QVFM& m, uint32_t frames) noexcept
 {
     const uint32_t first = std::min(m.skip_remaining, frames);
@@ -108,6 +124,7 @@ struct NewRecords {
     ~NewRecords() { kz::qv::drop_records(*this); }
 };
 
+// Makes the records of a range of frames. False when memory is short.
 bool read_records(const std::byte* data, const Header& header, Range range,
                   NewRecords& made) noexcept
 {
@@ -128,6 +145,7 @@ uint32_t QVFM_GetFrameDataSize(const QVFM* manager) noexcept
     if (manager == nullptr) {
         return 0;
     }
+    // A size that does not fit is 0, which no caller can take for one: the header has 12 bytes.
     const uint64_t size = data_size(manager->band_count, manager->frame_count);
     return size <= std::numeric_limits<uint32_t>::max() ? static_cast<uint32_t>(size) : 0;
 }
@@ -161,6 +179,7 @@ uint32_t QVFM_AppendFrameData(QVFM* manager, const void* data, uint32_t size) no
     if (!is_acceptable(*manager, header, size)) {
         return 0;
     }
+    // Records are made before anything changes, and only those that are kept.
     const Range range = admitted_frames(*manager, header.frames);
     NewRecords made;
     if (!read_records(bytes, header, range, made)) {

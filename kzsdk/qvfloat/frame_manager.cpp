@@ -1,3 +1,14 @@
+/// @file
+/// The floating-point frame manager: frames of samples -> band features -> the fingerprint.
+///
+///     samples or ranks  --transform-->  coefficients c
+///     energy = sum of c^2               amplitude = root-mean-square c
+///     fingerprint = shares of the bands in the root mean energies, then in the spreads of the
+///                   amplitudes, times `fingerprint_scale` (32768)
+///
+/// The whole frame is transformed at the full working rate: twice the points of the fixed-point twin
+/// at twice its rate, so bins are as wide. Single precision throughout, roots apart; every sum has
+/// one order, which is part of the result.
 #include <algorithm>
 #include <span>
 #include <utility>
@@ -14,12 +25,14 @@ namespace {
 
 // ---- creation
 
+// The histogram may be missing only when no frame is equalised.
 bool has_all_parts(const QVFM& m) noexcept
 {
     return m.frame_buffer != nullptr && m.dct != nullptr && m.band_table != nullptr &&
            m.fingerprint != nullptr && (m.histogram_levels == 0 || m.histogram != nullptr);
 }
 
+// Makes the parts as far as memory and the configuration allow; what is missing stays null.
 void make_parts(QVFM& m, const QVConfig& config) noexcept
 {
     m.frame_length = kz::fxp::shift_left(1U, static_cast<int32_t>(config.frame_length_log2));
@@ -41,6 +54,7 @@ void make_parts(QVFM& m, const QVConfig& config) noexcept
 
 // ---- analysis of one frame
 
+// Writes a frame in two pieces into the buffer: as ranks, or unchanged when there are no levels.
 void fill_frame(QVFM& m, const float* first, uint32_t first_count, const float* second,
                 uint32_t second_count) noexcept
 {
@@ -54,6 +68,7 @@ void fill_frame(QVFM& m, const float* first, uint32_t first_count, const float* 
         m.frame_buffer);
 }
 
+// The same of a whole frame in one piece. Here the equaliser does not test for silence.
 void fill_frame(QVFM& m, const float* samples) noexcept
 {
     if (m.histogram_levels != 0) {
@@ -64,7 +79,8 @@ void fill_frame(QVFM& m, const float* samples) noexcept
     std::copy_n(samples, m.frame_length, m.frame_buffer);
 }
 
-// The bins of a band, both edges included and cut to the spectrum.
+// The bins of a band, both edges included and cut to the spectrum. Edges in hertz are divided by the
+// width of a bin and truncated, so neighbouring bands share a bin.
 std::span<const float> band_bins(const QVFM& m, uint32_t band) noexcept
 {
     const uint32_t first = kz::to_uint32(m.band_table[2 * band] / m.bin_width);
@@ -76,14 +92,15 @@ std::span<const float> band_bins(const QVFM& m, uint32_t band) noexcept
     return {m.frame_buffer + first, last - first + 1};
 }
 
+// The energy of one band while it is being summed.
 struct Energy {
-    std::span<const float> bins; // that are left
+    std::span<const float> bins; // those still to be added
     float sum = 0;
 };
 
-// Each sum is made in the order of its bins: the order is part of the result. So the sums of
-// several bands run side by side, and none waits for its own last addition. When the narrowest band
-// is through, the others go on.
+// Adds the squares of all bins to the sums of several bands. Each sum is made in the order of its
+// bins, so no sum can be split; instead the sums of several bands run side by side, and none waits
+// for its own last addition. When the narrowest band is done, the others go on without it.
 template <size_t Count>
 void add_squares(Energy* (&bands)[Count]) noexcept
 {
@@ -114,6 +131,7 @@ void add_squares(Energy* (&bands)[Count]) noexcept
     }
 }
 
+// Writes the energies of all bands, five bands at a time.
 void sum_energies(const QVFM& m, float* energies) noexcept
 {
     constexpr uint32_t kSideBySide = 5; // neighbours have much the same width
@@ -134,8 +152,10 @@ void sum_energies(const QVFM& m, float* energies) noexcept
     }
 }
 
+// Taken in double precision and then rounded, which gives the correctly rounded root.
 float root(float value) noexcept { return static_cast<float>(kz_sqrt(static_cast<double>(value))); }
 
+// Appends the features of the frame whose spectrum is in the buffer. A band without bins has none.
 void append_features(QVFM& m) noexcept
 {
     auto record = kz::qv::make_frame_record<QVFrameRecord>(m.band_count);
@@ -150,6 +170,7 @@ void append_features(QVFM& m) noexcept
     kz::qv::append_record(m, std::move(record));
 }
 
+// Transforms the frame in the buffer, unscaled, and appends its features.
 void analyse(QVFM& m) noexcept
 {
     KZDSP_ComputeDCT(m.dct, m.frame_buffer, 0);
@@ -158,6 +179,7 @@ void analyse(QVFM& m) noexcept
 
 // ---- the fingerprint
 
+// The root of a band's average energy over all frames, oldest first.
 float root_mean_energy(const QVFM& m, uint32_t band) noexcept
 {
     float sum = 0;
@@ -167,6 +189,7 @@ float root_mean_energy(const QVFM& m, uint32_t band) noexcept
     return root(sum / static_cast<float>(m.frame_count));
 }
 
+// The standard deviation of a band's amplitude, over count - 1 and around the plain average.
 float amplitude_spread(const QVFM& m, uint32_t band) noexcept
 {
     float sum = 0;
@@ -195,6 +218,7 @@ void store_shares(std::span<const float> values, float scale, int16_t* destinati
     }
 }
 
+// Leaves `fingerprint_ready` clear when memory is short. One frame has no spread: 0, not 0 / 0.
 void compute_fingerprint(QVFM& m) noexcept
 {
     const auto means = kz::make_array<float>(m.band_count);
@@ -214,6 +238,7 @@ void compute_fingerprint(QVFM& m) noexcept
 
 } // namespace
 
+// A manager lacking any part is freed again: the others rely on all parts being there.
 QVFM* QVFM_Create(const QVConfig* config) noexcept
 {
     auto manager = config == nullptr ? nullptr : kz::make_record<QVFM>();

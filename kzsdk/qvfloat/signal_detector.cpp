@@ -1,3 +1,8 @@
+/// @file
+/// The floating-point signal detector: finds where leading silence ends.
+///
+/// Each sample counts as the whole number that it is truncated to, so full scale has to be 32768:
+/// audio scaled to +-1 is silence. The sums are the integer sums of the fixed-point twin.
 #include <span>
 
 #include "kzsdk/kernels/kernels.hpp"
