@@ -1,3 +1,9 @@
+/// @file
+/// The attributes of a tag: a singly linked list in the order in which they were set.
+///
+/// Setting an attribute removes every one of its name and appends a new record, so the order of a
+/// rendered tag follows the calls. Stored texts end at their first NUL when they are read, whatever
+/// was stored behind it.
 #include "kzsdk/xml/attributes.hpp"
 
 #include <utility>
@@ -12,6 +18,7 @@ using kz::xml::text_of;
 
 constexpr uint32_t kNumberSize = 64;
 
+/// Null for a null tag and for an index behind the end.
 const XMLAttr* attribute_at(const XMLTag* tag, uint32_t index) noexcept
 {
     const XMLAttr* attribute = tag != nullptr ? tag->attributes : nullptr;
@@ -22,7 +29,7 @@ const XMLAttr* attribute_at(const XMLTag* tag, uint32_t index) noexcept
     return attribute;
 }
 
-/// Frees one record that is in no list, or in no list any more.
+/// Frees one record, which no list holds any more.
 void dispose_attribute(XMLAttr* attribute) noexcept
 {
     static_cast<void>(_kzmem_free(attribute->name));
@@ -30,6 +37,7 @@ void dispose_attribute(XMLAttr* attribute) noexcept
     static_cast<void>(_kzmem_free(attribute));
 }
 
+/// A record of its own with copies of both texts. Null when memory is short.
 XMLAttr* make_attribute(Text name, Text value) noexcept
 {
     auto attribute = kz::make_record<XMLAttr>();
@@ -63,6 +71,7 @@ XMLAttr** remove_attributes(XMLTag& tag, Text name) noexcept
     return link;
 }
 
+/// The new record is made first: a failure changes nothing.
 kz_status set_attribute(XMLTag& tag, Text name, Text value) noexcept
 {
     XMLAttr* attribute = make_attribute(name, value);
@@ -148,11 +157,13 @@ kz_status SetXMLTagAttrFromBuf(XMLTag* tag, const char* name, uint32_t name_coun
     return KZ_OK;
 }
 
+// The Str form cannot pass a value that begins with NUL: its count is 0, which removes.
 kz_status SetXMLTagAttrFromStr(XMLTag* tag, const char* name, const char* value) noexcept
 {
     return SetXMLTagAttrFromBuf(tag, name, text_of(name).count, value, text_of(value).count);
 }
 
+// The formats are those of C's long, so the 32-bit values are widened to it.
 kz_status SetXMLTagAttrFromInt(XMLTag* tag, const char* name, int32_t value) noexcept
 {
     char number[kNumberSize] = {};

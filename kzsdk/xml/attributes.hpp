@@ -6,6 +6,7 @@
 
 namespace kz::xml {
 
+/// Frees a whole list; null is an empty one.
 void dispose_attributes(XMLAttr* first) noexcept;
 
 /// Sets copies of the source's attributes, in order, up to the first that fails.

@@ -1,3 +1,7 @@
+/// @file
+/// Equality of two tag trees: names, data, attributes in their order, and sub-tags in theirs.
+///
+/// Both trees are walked in step and without recursion. The roots' own siblings are not looked at.
 #include <utility>
 
 #include "kzsdk/abs/text.h"
@@ -12,6 +16,7 @@ bool same_text(const char* a, const char* b) noexcept
     return a == nullptr || b == nullptr ? a == b : kz_strcmp(a, b) == 0;
 }
 
+/// Two lists of attributes: the same names and values at the same places.
 bool same_attributes(const XMLAttr* a, const XMLAttr* b) noexcept
 {
     while (a != nullptr && b != nullptr && same_text(a->name, b->name) &&
@@ -22,6 +27,7 @@ bool same_attributes(const XMLAttr* a, const XMLAttr* b) noexcept
     return a == nullptr && b == nullptr;
 }
 
+/// Everything that two tags hold themselves.
 bool same_without_sub_tags(const XMLTag& a, const XMLTag& b) noexcept
 {
     return same_text(a.name, b.name) && same_text(a.data, b.data) &&
@@ -34,7 +40,8 @@ struct Pair {
     const XMLTag* b;
 };
 
-/// False too when the way back up could not be kept: what was not seen is not called equal.
+/// Each open pair is the next one of a level; it moves on before its sub-tags are entered. False too
+/// when memory for the way back up is short: what was not seen is not called equal.
 bool same_trees(const XMLTag& a, const XMLTag& b) noexcept
 {
     kz::xml::OpenTags<Pair> next;
@@ -61,6 +68,7 @@ bool same_trees(const XMLTag& a, const XMLTag& b) noexcept
 
 } // namespace
 
+// Two null tags are equal; a null tag and any other are not.
 uint32_t EqualXMLTags(const XMLTag* a, const XMLTag* b) noexcept
 {
     if (a == nullptr || b == nullptr) {

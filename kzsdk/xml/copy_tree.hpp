@@ -1,5 +1,6 @@
 /// @file
-/// The walk of every deep copy: what one tag becomes is the caller's to say.
+/// The walk of every deep copy. The caller decides what one tag becomes: its clone, a renamed copy,
+/// or nothing.
 #pragma once
 
 #include <memory>
@@ -10,6 +11,7 @@
 
 namespace kz::xml {
 
+/// Frees a tag with all below it.
 struct DisposeTree {
     void operator()(XMLTag* tag) const noexcept { static_cast<void>(DisposeXMLTag(tag)); }
 };

@@ -1,3 +1,8 @@
+/// @file
+/// Clones with mapped names and values, and the three maps of the process.
+///
+/// Each map starts as one that returns its argument, and is read anew for every tag or attribute.
+/// The texts that a map returns stay its own; they are copied at once.
 #include <atomic>
 
 #include "kzsdk/xml/copy_tree.hpp"
@@ -20,8 +25,8 @@ const char* same_attribute_value(const char* /*tag_name*/, const char* /*attribu
     return value;
 }
 
-// Relaxed: a reader sees the old map or the new one. What a map itself reads is its owner's to
-// publish before it is installed.
+// Relaxed: a reader sees the old map or the new one. Data that a map itself reads must be published
+// by its owner before the map is installed.
 constinit std::atomic<XMLMapTagName> map_tag_name{same_tag_name};
 constinit std::atomic<XMLMapAttrName> map_attribute_name{same_attribute_name};
 constinit std::atomic<XMLMapAttrValue> map_attribute_value{same_attribute_value};
@@ -32,6 +37,7 @@ Map installed(const std::atomic<Map>& map) noexcept
     return map.load(std::memory_order_relaxed);
 }
 
+/// Null is ignored, so the library's own map cannot be restored once it was replaced.
 template <class Map>
 kz_status install(std::atomic<Map>& map, Map function) noexcept
 {
@@ -41,7 +47,8 @@ kz_status install(std::atomic<Map>& map, Map function) noexcept
     return KZ_OK;
 }
 
-/// Sets one attribute on the copy, whose name the maps are told. A refused one is no failure.
+/// Sets one attribute on the copy; the maps receive the copy's name, not the source's. A refused
+/// attribute is no failure.
 kz_status set_mapped_attribute(XMLTag& copy, const XMLAttr& attribute) noexcept
 {
     const char* name = installed(map_attribute_name)(copy.name, attribute.name);
@@ -52,6 +59,7 @@ kz_status set_mapped_attribute(XMLTag& copy, const XMLAttr& attribute) noexcept
     return SetXMLTagAttrFromStr(&copy, name, value);
 }
 
+/// One tag of the copy. Null when its name is refused or memory is short.
 owned_tree mutated_without_sub_tags(const XMLTag& tag) noexcept
 {
     const char* name = installed(map_tag_name)(tag.name);
@@ -70,6 +78,7 @@ owned_tree mutated_without_sub_tags(const XMLTag& tag) noexcept
 
 } // namespace
 
+// Sub-tags that are refused, or that memory is too short for, are left out with all below them.
 XMLTag* CloneAndMutateXMLTag(const XMLTag* tag, uint8_t deep) noexcept
 {
     if (tag == nullptr) {

@@ -14,6 +14,7 @@
 
 namespace kz::xml {
 
+/// A stack of entries. The first 32 lie in the object, more on the heap.
 template <class Entry>
 requires std::is_trivially_copyable_v<Entry>
 class OpenTags {

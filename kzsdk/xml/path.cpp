@@ -1,3 +1,9 @@
+/// @file
+/// Reading and setting data by a path of names with "/" between them.
+///
+/// The five functions differ in whether the path begins with the tag's own name, in what a leading
+/// "/" does, and in whether the last name may be an attribute; the table in xml.h has all of it. All
+/// of them walk down without recursion, so a path may be of any length.
 #include "kzsdk/xml/xml.h"
 
 #include "kzsdk/xml/text.hpp"
@@ -13,6 +19,7 @@ struct Cut {
     const char* rest; ///< behind the "/"; null when there is none
 };
 
+/// An empty segment, as before a leading "/" or between two, is one that matches no name.
 Cut cut(const char* path) noexcept
 {
     const char* slash = kz_strchr(path, '/');
@@ -24,11 +31,13 @@ Cut cut(const char* path) noexcept
 
 bool has_more(const char* path) noexcept { return path != nullptr && path[0] != '\0'; }
 
+/// The first sub-tag of this name; null when there is none or the tag is null.
 XMLTag* sub_tag(const XMLTag* tag, Text name) noexcept
 {
     return GetXMLSubTagFromBuf(tag, name.bytes, name.count);
 }
 
+/// Appends an empty sub-tag. Null when memory is short.
 XMLTag* add_new_sub_tag(XMLTag& tag, Text name) noexcept
 {
     XMLTag* child = CreateXMLTagFromBuf(name.bytes, name.count, nullptr, 0);
@@ -50,11 +59,13 @@ struct Segment {
     const char* rest = nullptr; ///< null: the path is malformed
 };
 
+/// Letters, digits and "_"; no byte beyond ASCII is one.
 bool is_name_byte(char byte) noexcept
 {
     return byte == '_' || kz_isalnum(static_cast<uint8_t>(byte)) != 0;
 }
 
+/// Parses the first segment of a path that is not empty. "/" alone is well-formed and has no name.
 Segment parse_segment(const char* path) noexcept
 {
     if (path[0] == '/') {
@@ -90,6 +101,8 @@ struct Resolved {
     uint32_t kind = 1;
 };
 
+/// The sub-tag that an element segment stands for: one that is there unless the segment adds, else a
+/// new one. Null when memory is short or the name empty.
 XMLTag* element(XMLTag& tag, const char* name, bool adds) noexcept
 {
     XMLTag* child = adds ? nullptr : GetXMLSubTagFromStr(&tag, name);
@@ -98,6 +111,7 @@ XMLTag* element(XMLTag& tag, const char* name, bool adds) noexcept
 
 } // namespace
 
+// An empty path is the tag itself, so a "/" at the end changes nothing.
 XMLTag* GetXMLSubTagFromPath(XMLTag* tag, const char* path) noexcept
 {
     while (tag != nullptr && has_more(path)) {
@@ -118,6 +132,8 @@ const char* GetXMLSubTagData(const XMLTag* tag, const char* path) noexcept
     return GetXMLTagData(tag);
 }
 
+// Tags made on the way stay when a later segment fails. A "/" at the end makes an empty last segment
+// and is refused, after the tags before it were made.
 kz_status SetXMLSubTagDataFromStr(XMLTag* tag, const char* path, const char* data,
                                   uint8_t create) noexcept
 {
@@ -153,6 +169,7 @@ kz_status SetXMLSubTagDataFromUInt(XMLTag* tag, const char* path, uint32_t value
     return SetXMLSubTagDataFromStr(tag, path, number, create);
 }
 
+// The only one whose path begins with the name of the tag itself, after any number of "/".
 const char* XMLGetDataAtPath(const XMLTag* tag, const char* path) noexcept
 {
     if (tag == nullptr || path == nullptr) {
@@ -168,6 +185,8 @@ const char* XMLGetDataAtPath(const XMLTag* tag, const char* path) noexcept
     if (!has_more(below)) {
         return GetXMLTagData(tag);
     }
+    // Names before the last are sub-tags. A "/" at the end leaves nothing behind it, so the name
+    // before it is the last.
     Cut next = cut(below);
     while (tag != nullptr && has_more(next.rest)) {
         tag = sub_tag(tag, next.segment);
@@ -176,6 +195,8 @@ const char* XMLGetDataAtPath(const XMLTag* tag, const char* path) noexcept
     return tag != nullptr ? value_or_data(*tag, next.segment) : nullptr;
 }
 
+// The resolver turns each segment into the name and the kind of what it stands for. A segment with
+// "+" always makes a new element. What was made before a failure stays.
 int32_t XMLSetValueAtPath(XMLTag* tag, const char* path, const char* value, uintptr_t context,
                           XMLPathResolver resolver) noexcept
 {
@@ -190,7 +211,7 @@ int32_t XMLSetValueAtPath(XMLTag* tag, const char* path, const char* value, uint
             return 0;
         }
         const bool is_last = !has_more(segment.rest);
-        if (resolved.kind == KZ_XML_KIND_ATTRIBUTE) {
+        if (resolved.kind == KZ_XML_KIND_ATTRIBUTE) { // nothing lies below an attribute
             return is_last && SetXMLTagAttrFromStr(tag, resolved.name, value) == KZ_OK ? 1 : 0;
         }
         if (resolved.kind != KZ_XML_KIND_ELEMENT) {

@@ -1,3 +1,9 @@
+/// @file
+/// Renders a tag tree as text, in one growing buffer that the caller receives in the end.
+///
+/// Two indentations inside an element with sub-tags run even after a failure and then replace its
+/// status: with indentation on, a tag that cannot be written leaves malformed text and no error.
+/// Names go out as they are; data and values are escaped byte by byte, without regard to encoding.
 #include "kzsdk/xml/xml.h"
 
 #include <algorithm>
@@ -25,6 +31,7 @@ struct DisposeBuffer {
 };
 using owned_buffer = std::unique_ptr<kz_dyn_buf, DisposeBuffer>;
 
+/// What stands for a byte in data and values; null for a byte that stands for itself.
 constexpr const char* entity_for(char byte) noexcept
 {
     switch (byte) {
@@ -53,6 +60,7 @@ public:
     {
     }
 
+    /// True while nothing has failed, or after a failure was replaced.
     bool is_well() const noexcept { return status_ == KZ_OK; }
 
     void declaration() noexcept
@@ -61,8 +69,10 @@ public:
         newline();
     }
 
-    /// False when the way back up could not be kept. That is a failure no indentation may hide: the
-    /// rest of the tree could not be reached.
+    /// Writes all tags: the start of each on the way down, its end on the way back up.
+    ///
+    /// @return False when memory for the way back up is short. No indentation may replace that
+    ///         failure: the rest of the tree could not be reached.
     bool tree(const XMLTag& root) noexcept
     {
         kz::xml::OpenTags<const XMLTag*> open;
@@ -92,6 +102,7 @@ public:
         }
     }
 
+    /// The NUL at the end is part of the buffer's data.
     void terminator() noexcept { append("", 1); }
 
 private:
@@ -102,6 +113,7 @@ private:
         }
     }
 
+    /// A null text, the name of a nameless tag, is refused by the buffer.
     void append(const char* text) noexcept
     {
         if (is_well()) {
@@ -116,6 +128,7 @@ private:
         }
     }
 
+    /// Two spaces a level; none for a level that has wrapped below 0.
     void indentation(Level level) noexcept
     {
         for (Level i = 0; i < level && is_well(); ++i) {
@@ -123,8 +136,8 @@ private:
         }
     }
 
-    /// The two indentations inside an element with sub-tags run whatever happened before, and what
-    /// happened is forgotten.
+    /// For the two indentations inside an element with sub-tags: they run whatever happened before,
+    /// and replace its status.
     void indentation_after_all(Level level) noexcept
     {
         status_ = KZ_OK;
@@ -147,8 +160,8 @@ private:
         }
     }
 
-    /// Appends what needs no entity, at most as much as there is room for, or one byte. So where
-    /// memory ends, as much of the text is there as fits.
+    /// Appends bytes that need no entity in one piece: no more than fit without growing, but at least
+    /// one. When memory runs out, the text so ends where appending byte by byte would have ended.
     uint32_t plain_run(const char* text) noexcept
     {
         const uint32_t room = std::max(buffer_.capacity - buffer_.length, 1U);
@@ -190,6 +203,7 @@ private:
         }
     }
 
+    /// Data beside sub-tags stands on a line of its own, one level deeper than its tag.
     void data_line(const XMLTag& tag, Level level) noexcept
     {
         if (tag.data == nullptr) {
@@ -202,6 +216,7 @@ private:
         newline();
     }
 
+    /// The end tag; that of an element with sub-tags is on a line of its own.
     void end(const XMLTag& tag, Level level) noexcept
     {
         if (indent_ && tag.sub_tags != nullptr) {
@@ -221,6 +236,7 @@ private:
 
 } // namespace
 
+// The text is in the buffer's own block, which is handed over as it is: it may be larger than needed.
 char* RenderXMLTagToStrEx(const XMLTag* tag, uint8_t header, uint8_t indent,
                           uint8_t newlines) noexcept
 {

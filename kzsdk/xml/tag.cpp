@@ -1,3 +1,12 @@
+/// @file
+/// Tags and trees of them: making, copying, freeing, and what a tag holds apart from attributes.
+///
+///     tag --sub_tags--> tag --next_sibling--> tag --next_sibling--> null
+///                        |                     |
+///                     sub_tags              sub_tags
+///
+/// A tag does not know its parent. No function recurses, so a tree may be of any depth. Every stored
+/// text is a copy of its own.
 #include "kzsdk/xml/xml.h"
 
 #include <cassert>
@@ -15,6 +24,7 @@ using kz::xml::owned_tree;
 using kz::xml::Text;
 using kz::xml::text_of;
 
+/// Frees the trees of a list of siblings.
 void dispose_list(XMLTag* first) noexcept
 {
     while (first != nullptr) {
@@ -23,6 +33,7 @@ void dispose_list(XMLTag* first) noexcept
     }
 }
 
+/// The null link at the end of a list.
 XMLTag** end_of(XMLTag** link) noexcept
 {
     while (*link != nullptr) {
@@ -50,6 +61,7 @@ kz_status copy_texts(XMLTag& copy, const XMLTag& source) noexcept
     return KZ_XML_ERROR_MEMORY;
 }
 
+/// Null when memory is short.
 owned_tree clone_without_sub_tags(const XMLTag& source) noexcept
 {
     owned_tree clone(CreateEmptyXMLTag());
@@ -60,6 +72,7 @@ owned_tree clone_without_sub_tags(const XMLTag& source) noexcept
     return clone;
 }
 
+/// A deep copy, or null: nothing of it is left when a part fails.
 owned_tree clone_tree(const XMLTag& source) noexcept
 {
     return kz::xml::copy_tree(source, kz::xml::IfRefused::fails_as_a_whole, clone_without_sub_tags);
@@ -88,6 +101,7 @@ void dispose_one(XMLTag* tag) noexcept
     static_cast<void>(_kzmem_free(tag));
 }
 
+/// The first of a tag and its later siblings with this name.
 XMLTag* first_of(XMLTag* tag, Text name) noexcept
 {
     while (tag != nullptr && !kz::xml::matches(tag->name, name)) {
@@ -96,6 +110,7 @@ XMLTag* first_of(XMLTag* tag, Text name) noexcept
     return tag;
 }
 
+/// Where a search by cursor begins. A cursor of 0 is the end.
 XMLTag* at_cursor(const XMLTag& parent, uintptr_t cursor) noexcept
 {
     // A tag never lies at an odd address, so the 32-bit start value can be told from one.
@@ -107,6 +122,7 @@ XMLTag* at_cursor(const XMLTag& parent, uintptr_t cursor) noexcept
 
 XMLTag* CreateEmptyXMLTag() noexcept { return kz::make_record<XMLTag>().release(); }
 
+// The record is made only for a name that is not empty; the setters then copy both texts.
 XMLTag* CreateXMLTagFromBuf(const char* name, uint32_t name_count, const char* data,
                             uint32_t data_count) noexcept
 {
@@ -126,6 +142,7 @@ XMLTag* CreateXMLTagFromStr(const char* name, const char* data) noexcept
     return CreateXMLTagFromBuf(name, text_of(name).count, data, text_of(data).count);
 }
 
+// Deep is 1 and nothing else, unlike the flags of other calls.
 XMLTag* CloneXMLTag(const XMLTag* tag, uint8_t deep) noexcept
 {
     if (tag == nullptr) {
@@ -142,7 +159,8 @@ kz_status CopyXMLTag(XMLTag* destination, const XMLTag* source) noexcept
     if (destination == source) {
         return KZ_OK;
     }
-    // All is copied before anything of the destination goes: the source may lie below it, or above.
+    // All is copied before anything of the destination is freed: the source may lie below it, or
+    // above. How far a failed copy came decides which of the old parts are replaced.
     XMLTag copy{};
     const kz_status texts = copy_texts(copy, *source);
     const kz_status attributes = texts == KZ_OK ? kz::xml::copy_attributes(copy, *source) : texts;
@@ -159,12 +177,14 @@ kz_status CopyXMLTag(XMLTag* destination, const XMLTag* source) noexcept
     return sub_tags;
 }
 
+// Frees a tag and all below it; its own siblings are left alone.
 kz_status DisposeXMLTag(XMLTag* tag) noexcept
 {
     if (tag == nullptr || kzmem_query_availability() != KZ_MEM_ALREADY_ON) {
         return KZ_OK; // nothing could be freed, so the tree is left whole
     }
-    // The tags still to go form one list; the sub-tags of the one that goes next are put before it.
+    // The tags still to be freed form one list. The sub-tags of the one that is freed next are put
+    // in front of the others, so nothing has to be remembered.
     tag->next_sibling = nullptr;
     while (tag != nullptr) {
         *end_of(&tag->sub_tags) = tag->next_sibling;
@@ -173,6 +193,7 @@ kz_status DisposeXMLTag(XMLTag* tag) noexcept
     return KZ_OK;
 }
 
+// The caller's pointer becomes null even when memory is off and nothing is freed.
 kz_status SmartDisposeXMLTag(XMLTag** tag) noexcept
 {
     return tag != nullptr ? DisposeXMLTag(std::exchange(*tag, nullptr)) : KZ_OK;
@@ -188,6 +209,7 @@ uint32_t GetXMLSubTagCount(const XMLTag* tag) noexcept
     return count;
 }
 
+// A null name matches nothing; nameless sub-tags are passed over.
 uint32_t GetXMLNamedSubTagCount(const XMLTag* tag, const char* name) noexcept
 {
     if (name == nullptr) {
@@ -227,6 +249,7 @@ XMLTag* GetXMLSubTagFromStr(const XMLTag* tag, const char* name) noexcept
     return GetXMLSubTagFromBuf(tag, name, text_of(name).count);
 }
 
+// The cursor holds the address of the tag behind the match, so no tag may go while it is in use.
 XMLTag* GetXMLSubTagFromStrEx(const XMLTag* tag, const char* name, uintptr_t* cursor) noexcept
 {
     const Text wanted = text_of(name);
@@ -238,6 +261,8 @@ XMLTag* GetXMLSubTagFromStrEx(const XMLTag* tag, const char* name, uintptr_t* cu
     return found;
 }
 
+// The child's own siblings come along. Debug builds stop at the two misplacements that can be seen
+// from here; both would make the list endless.
 kz_status AddXMLSubTag(XMLTag* parent, XMLTag* child) noexcept
 {
     if (parent == nullptr || child == nullptr) {
@@ -253,6 +278,7 @@ kz_status AddXMLSubTag(XMLTag* parent, XMLTag* child) noexcept
     return KZ_OK;
 }
 
+// Looks for the record itself, not for its name.
 kz_status RemoveXMLSubTag(XMLTag* parent, XMLTag* child, uint8_t dispose) noexcept
 {
     if (parent == nullptr || child == nullptr) {
@@ -279,6 +305,7 @@ const char* GetXMLTagName(const XMLTag* tag) noexcept
     return tag != nullptr ? tag->name : nullptr;
 }
 
+// When memory is short the old data is gone too: the tag is left without.
 kz_status SetXMLTagDataFromBuf(XMLTag* tag, const char* data, uint32_t count) noexcept
 {
     if (tag == nullptr) {
@@ -294,6 +321,7 @@ kz_status SetXMLTagDataFromStr(XMLTag* tag, const char* data) noexcept
     return SetXMLTagDataFromBuf(tag, data, text_of(data).count);
 }
 
+// An empty name keeps the old one; short memory loses it.
 kz_status SetXMLTagNameFromBuf(XMLTag* tag, const char* name, uint32_t count) noexcept
 {
     if (tag == nullptr || Text{name, count}.is_empty()) {

@@ -9,6 +9,8 @@
 
 namespace kz::xml {
 
+/// Bytes and their count, not necessarily terminated. A text is empty also when its first byte is
+/// NUL, since it would be read as empty.
 struct Text {
     const char* bytes = nullptr;
     uint32_t count = 0;
@@ -28,6 +30,7 @@ inline bool matches(const char* stored, Text text) noexcept
     return stored != nullptr && kz_bufcmp(stored, kz_strlen(stored), text.bytes, text.count) == 0;
 }
 
+/// A terminated copy; null when memory is short or the text is null.
 inline owned<char> copy_of(Text text) noexcept
 {
     return owned<char>(kz_makestr(text.bytes, text.count));
