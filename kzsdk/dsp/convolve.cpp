@@ -1,3 +1,8 @@
+/// @file
+/// Dot products of single-precision samples and taps, with a stride between the taps.
+///
+/// Samples are walked backwards from the newest, taps forwards. Every product is rounded and then
+/// added, one after another in that order: the order is part of the result.
 #include "kzsdk/dsp/convolve.h"
 
 #include "kzsdk/kernels/kernels.hpp"
@@ -6,6 +11,7 @@ namespace {
 
 using kz::kernels::add_products;
 
+/// A null array is fine as long as nothing is read from it.
 bool missing(const float* samples, uint32_t count) noexcept
 {
     return samples == nullptr && count != 0;

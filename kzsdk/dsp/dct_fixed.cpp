@@ -1,3 +1,9 @@
+/// @file
+/// The fixed-point cosine transform, type II, of 16384 or 32768 words in place.
+///
+/// The stages are a kernel; here are the object and the last scaling. Factors are Q30 words, divided
+/// by the powers of two that the shifts of the stages undo. The first group of each stage halves its
+/// sums, so word 0 ends up as the average of the input before it is scaled.
 #include "kzsdk/dsp/dct.h"
 
 #include "kzsdk/abs/owned.hpp"
@@ -10,8 +16,9 @@ namespace {
 constexpr int32_t kSmallestOrder = 14;
 constexpr int32_t kLargestOrder = 15;
 
-// 2^18 / sqrt(2): the factor of the DC term, a plain average until then, in units of 2^-32.
-constexpr int32_t kDcScale = 185363;
+// 2^18 / sqrt(2), truncated: the factor of the average in word 0. That is 4.3e-5, so next to nothing
+// is left of it; the lowest band of every fingerprint depends on exactly this.
+constexpr int32_t kDcScaleQ32 = 185363;
 
 } // namespace
 
@@ -47,5 +54,5 @@ void KZDSP_DCT_fixed_compute(const KZDSP_DCT_fixed* dct, int32_t* data, int32_t 
         return;
     }
     kz::kernels::active().dct_fixed(data, dct->coefficients, dct->order);
-    data[0] = kz::fxp::smul_high(data[0], kDcScale);
+    data[0] = kz::fxp::smul_high(data[0], kDcScaleQ32);
 }

@@ -1,3 +1,9 @@
+/// @file
+/// The floating-point cosine transform, type II, of any power of two of values in place.
+///
+/// The stages are a kernel; here are the object and the scalings. Factors up to 2^15 points are
+/// constants, the first ones of one table; longer transforms compute their own. Unscaled, a tone of
+/// amplitude 1 gives L / 2 in its bin.
 #include <iterator>
 #include <span>
 
@@ -11,6 +17,7 @@ namespace {
 constexpr int32_t kSmallestOrder = 1;
 constexpr int32_t kLargestOrder = 29; // 2^30 factors of four bytes would be 0 in 32 bits
 
+// 1 / sqrt(2).
 constexpr float kDcScale = 0.70710678F;
 
 void scale(std::span<float> x, float factor) noexcept

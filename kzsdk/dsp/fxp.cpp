@@ -1,11 +1,15 @@
+/// @file
+/// The exported fixed-point operations: shifts, sums, products, comparisons, reciprocals, ratios.
+///
+/// Values are 32-bit words, double words of two of them, or pairs of a mantissa and an exponent: a
+/// signed mantissa m stands for m * 2^(e - 31), an unsigned one for m * 2^(e - 32). Everything is
+/// made of 32-bit words and 16 by 16 bit products, as for a processor with nothing wider. Inner
+/// loops use the inline forms of fxp_ops.hpp, which take wider products and are bit-identical.
 #include "kzsdk/dsp/fxp.h"
 
 #include <array>
 
 #include "kzsdk/kernels/fxp_ops.hpp"
-
-// The exported operations stay within 32-bit words and 16 by 16 bit products. Inner loops use the
-// inline forms of fxp_ops.hpp, which may take wider products and give the same words.
 
 namespace {
 
@@ -23,15 +27,17 @@ constexpr uint32_t high_half(uint32_t word) noexcept { return word >> 16; }
 constexpr uint32_t low_half(uint32_t word) noexcept { return word & 0xffff; }
 constexpr int32_t signed_half(uint32_t half) noexcept { return static_cast<int16_t>(half); }
 
-/// floor(a * half / 2^16) for a half in the range of 16 bits.
+/// floor(a * half / 2^16), exactly, for a half in the range of 16 bits: the low half of `a` counts as
+/// unsigned, and the arithmetic shift takes its product down to the floor.
 constexpr int32_t word_times_half(int32_t a, int32_t half) noexcept
 {
     const auto low = static_cast<int32_t>(low_half(static_cast<uint32_t>(a)));
     return (a >> 16) * half + ((low * half) >> 16);
 }
 
-// A double word is shifted as two words, and the part that crosses the middle is shifted by
-// 32 - n. From n = 33 on that count is negative, so nothing crosses.
+// A double word is shifted as two words, and the part that crosses the middle is shifted by 32 - n.
+// From n = 33 on that count is negative, which shifts everything out: nothing crosses, and the low
+// word of a right shift is 0.
 
 template <class Long>
 constexpr Long shifted_right(Long x, int32_t n) noexcept
@@ -48,6 +54,7 @@ constexpr Long shifted_left(Long x, int32_t n) noexcept
     return {.hi = static_cast<decltype(x.hi)>(hi), .lo = shift_left(x.lo, n)};
 }
 
+/// Left by a count of 0 or more, right by the magnitude of a negative one.
 template <class Long>
 constexpr Long shifted(Long x, int32_t n) noexcept
 {
@@ -62,6 +69,7 @@ constexpr FxpUTypeLong sum(FxpUTypeLong a, FxpUTypeLong b) noexcept
     return {.hi = wrap_add(wrap_add(a.hi, b.hi), carry), .lo = wrap_add(a.lo, b.lo)};
 }
 
+/// Modulo 2^64: all bits turned, plus 1, which carries only out of a low word of 0.
 constexpr FxpUTypeLong negated(FxpUTypeLong x) noexcept
 {
     return {.hi = wrap_add(~x.hi, x.lo == 0 ? 1u : 0u), .lo = wrap_sub(0u, x.lo)};
@@ -74,6 +82,9 @@ constexpr FxpTypeLong as_signed(FxpUTypeLong x) noexcept
     return {.hi = static_cast<int32_t>(x.hi), .lo = x.lo};
 }
 
+/// All 64 bits of a product, from four products of halves:
+///
+///     a * b = (ah * bh * 2^16 + ah * bl + al * bh) * 2^16 + al * bl
 constexpr FxpUTypeLong product(uint32_t a, uint32_t b) noexcept
 {
     const uint32_t ah = high_half(a);
@@ -85,7 +96,8 @@ constexpr FxpUTypeLong product(uint32_t a, uint32_t b) noexcept
     return sum(shifted_left(upper, 16), widened(al * bl));
 }
 
-/// The high word of product(), with only the carry of the low parts kept.
+/// The high word of product(). Of the low parts only the carry counts: their upper halves are summed
+/// before the last shift, so the result is exact.
 constexpr uint32_t product_high(uint32_t a, uint32_t b) noexcept
 {
     const uint32_t ah = high_half(a);
@@ -96,14 +108,15 @@ constexpr uint32_t product_high(uint32_t a, uint32_t b) noexcept
     return ah * bh + high_half(ah * bl) + high_half(bh * al) + high_half(middle);
 }
 
+/// Two mantissas that share an exponent.
 struct Aligned {
     int32_t first;
     int32_t second;
     int32_t exponent;
 };
 
-/// A value that lies 31 octaves or more below the other is taken as 0, also when it is negative:
-/// the sign fill would make -1 of it.
+/// A mantissa shifted down by some octaves. From 31 on it counts as 0, also when it is negative, where
+/// the sign fill would make it -1.
 constexpr int32_t lowered(int32_t mantissa, uint32_t octaves) noexcept
 {
     return octaves < 31 ? mantissa >> octaves : 0;
@@ -134,6 +147,9 @@ consteval std::array<uint32_t, 64> reciprocal_seeds() noexcept
 constexpr auto kReciprocalSeeds = reciprocal_seeds();
 static_assert(kReciprocalSeeds.front() == 0xfe03f80f && kReciprocalSeeds.back() == 0x80808080);
 
+/// 1/X by Newton's iteration, Y <- Y (2 - X Y), three times: from 7 good bits to all of them. X is
+/// x / 2^32 in [0.5, 1), the result is Q31. Every step rounds down, so 2^32 is never reached; an x
+/// with bit 31 clear gives 0 or a number without meaning.
 constexpr uint32_t reciprocal(uint32_t x) noexcept
 {
     uint32_t y = kReciprocalSeeds[(x & 0x7fffffff) >> 25];
@@ -145,6 +161,8 @@ constexpr uint32_t reciprocal(uint32_t x) noexcept
 }
 
 } // namespace
+
+// ---- a word times a signed half
 
 FxpType KZDSP_SmulWLo_SW_SL(FxpType a, FxpType b) noexcept
 {
@@ -162,6 +180,8 @@ FxpType KZDSP_SmulAddWHi_SW_SL(FxpType a, FxpType b, FxpType acc) noexcept
 {
     return wrap_add(KZDSP_SmulWHi_SW_SL(a, b), acc);
 }
+
+// ---- shifts of double words
 
 FxpTypeLong KZDSP_RSHFT_FxpTypeLong(int32_t hi, uint32_t lo, int32_t count) noexcept
 {
@@ -193,6 +213,8 @@ FxpUTypeLong KZDSP_SHFT_FxpUTypeLong(uint32_t hi, uint32_t lo, int32_t count) no
     return shifted(FxpUTypeLong{hi, lo}, count);
 }
 
+// ---- sums and differences, all of which wrap
+
 FxpType KZDSP_ADD_FxpType(FxpType a, FxpType b) noexcept { return wrap_add(a, b); }
 
 FxpType KZDSP_SUB_FxpType(FxpType a, FxpType b) noexcept { return wrap_sub(a, b); }
@@ -217,6 +239,9 @@ FxpType KZDSP_ALIGNED_SUB_FxpType(FxpType m1, int32_t e1, FxpType m2, int32_t e2
 
 FxpType KZDSP_MUL_POW2_FxpType(FxpType m, int32_t k) noexcept { return shift_left(m, k); }
 
+// ---- products
+
+// From the magnitudes, negated when the signs differ. Exact for every pair, -2^31 included.
 FxpTypeLong KZDSP_SMUL_FxpTypeLong(FxpType a, FxpType b) noexcept
 {
     const FxpUTypeLong size = product(magnitude(a), magnitude(b));
@@ -225,11 +250,13 @@ FxpTypeLong KZDSP_SMUL_FxpTypeLong(FxpType a, FxpType b) noexcept
 
 FxpUTypeLong KZDSP_UMUL_FxpUTypeLong(FxpUType a, FxpUType b) noexcept { return product(a, b); }
 
+// The upper 64 of 96 bits: the lowest word only carries.
 FxpUTypeLong KZDSP_UMUL_FxpUTypeLong2(uint32_t hi, uint32_t lo, FxpUType b) noexcept
 {
     return sum(product(hi, b), widened(product_high(lo, b)));
 }
 
+// Truncates towards zero, where a shift of the product would round down.
 FxpType KZDSP_SMUL_HIGH_FxpType(FxpType a, FxpType b) noexcept
 {
     const uint32_t high = product_high(magnitude(a), magnitude(b));
@@ -237,6 +264,8 @@ FxpType KZDSP_SMUL_HIGH_FxpType(FxpType a, FxpType b) noexcept
 }
 
 FxpUType KZDSP_UMUL_HIGH_FxpUType(FxpUType a, FxpUType b) noexcept { return product_high(a, b); }
+
+// ---- magnitudes and bits
 
 FxpType KZDSP_SaturateAbsFxpType(FxpType x) noexcept { return kz::fxp::saturate_abs(x); }
 
@@ -246,6 +275,9 @@ int32_t KZDSP_CountLeadingZeros(uint32_t x) noexcept { return leading_zeros(x); 
 
 uint32_t KZDSP_clp2(uint32_t x) noexcept { return kz::fxp::next_power_of_two(x); }
 
+// ---- comparisons of pairs
+
+// Different signs decide at once, whatever the exponents; 0 counts as positive.
 int32_t KZDSP_LESS_FxpType(FxpType m1, int32_t e1, FxpType m2, int32_t e2) noexcept
 {
     if ((m1 ^ m2) < 0) {
@@ -264,6 +296,7 @@ int32_t KZDSP_LESSEQ_FxpType(FxpType m1, int32_t e1, FxpType m2, int32_t e2) noe
     return pairs.first <= pairs.second;
 }
 
+// Unsigned mantissas are normalised to bit 31 and may lie 31 octaves apart before one counts as 0.
 int32_t KZDSP_LESS_FxpUType(FxpUType m1, int32_t e1, FxpUType m2, int32_t e2) noexcept
 {
     const int32_t spare1 = m1 != 0 ? leading_zeros(m1) : 0;
@@ -276,14 +309,19 @@ int32_t KZDSP_LESS_FxpUType(FxpUType m1, int32_t e1, FxpUType m2, int32_t e2) no
     return apart < 0 ? lower(first) < second : first < lower(second);
 }
 
+// ---- reciprocals and ratios
+
 FxpUType KZDSP_Reciprocal(FxpUType x) noexcept { return reciprocal(x); }
 
+// The shift normalises x; that of 0 is 32, and its reciprocal 0.
 FxpUType KZDSP_ReciprocalWithScaling(FxpUType x, int32_t* shift) noexcept
 {
     *shift = leading_zeros(x);
     return reciprocal(shift_left(x, *shift));
 }
 
+// Both numbers are normalised; the exponent makes up for the two shifts. The mantissa is a little too
+// small at most, as the reciprocal is.
 FxpUType KZDSP_UIntRatio_FxpUType(FxpUType a, FxpUType b, int32_t* exponent) noexcept
 {
     int32_t b_shift = 0;

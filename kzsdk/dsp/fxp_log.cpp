@@ -1,3 +1,9 @@
+/// @file
+/// The natural logarithm of a fixed-point pair: log2 from a table of quadratics, times ln 2.
+///
+/// All of it is done with pairs of a signed mantissa and an exponent, m * 2^(e - 31), normalised after
+/// each step. The error is 1e-8 to 2e-8; 0 has no logarithm and gives
+/// a number without meaning.
 #include "kzsdk/dsp/fxp.h"
 #include "kzsdk/dsp/log_segments.hpp"
 #include "kzsdk/kernels/fxp_ops.hpp"
@@ -12,16 +18,16 @@ using kz::fxp::shift_right;
 using kz::fxp::wrap_add;
 using kz::fxp::wrap_sub;
 
-constexpr int32_t kLn2 = 0x58b90bfb; ///< ln 2 in Q31, truncated
+constexpr int32_t kLn2Q31 = 0x58b90bfb; ///< ln 2, truncated
 
-/// Two Q31 fractions multiplied to a third.
+/// Two Q31 fractions multiplied to a third: the high word of their product is Q30.
 int32_t times(int32_t a, int32_t b) noexcept
 {
     return shift_left(KZDSP_SMUL_HIGH_FxpType(a, b), 1);
 }
 
-/// Both terms are halved before they are added, so the sum cannot overflow; the lost bit is
-/// accepted.
+/// The sum of two pairs, normalised. Both are brought to the larger exponent and halved before they
+/// are added, so the sum cannot overflow; the lost bit is accepted.
 Pair halved_sum(Pair a, Pair b) noexcept
 {
     const int32_t apart = wrap_sub(a.exponent, b.exponent);
@@ -37,6 +43,7 @@ Pair halved_sum(Pair a, Pair b) noexcept
 /// log2(M) of M = x / 2^31 in [1, 2), from the quadratic of its segment.
 Pair log2_of_fraction(uint32_t x) noexcept
 {
+    // The top seven bits behind the leading one select the segment.
     const LogSegment& fit = kz::fxp::kLogSegments[(x >> 24) & 0x7f];
     const auto m = static_cast<int32_t>(x >> 1); // M as a pair has exponent 1
     const auto m_squared = static_cast<int32_t>(KZDSP_UMUL_HIGH_FxpUType(x, x) >> 1);
@@ -65,7 +72,7 @@ FxpType kzlog_fixed(FxpUType mantissa, int32_t exponent, int32_t* out_exponent) 
     if (whole != 0) {
         log2 = halved_sum(from_integer(whole), log2);
     }
-    const Pair natural = normalised({times(log2.mantissa, kLn2), log2.exponent});
+    const Pair natural = normalised({times(log2.mantissa, kLn2Q31), log2.exponent});
     *out_exponent = natural.exponent;
     return natural.mantissa;
 }

@@ -1,9 +1,15 @@
+/// @file
+/// The fraction with small terms near a number, from its continued fraction.
+///
+/// All of it is done in double precision; only the result becomes two words, which saturate. The
+/// resampler takes its factors L / M from here, so the steps decide which ratios there are.
 #include "kzsdk/abs/mathfn.h"
 #include "kzsdk/abs/saturate.hpp"
 #include "kzsdk/dsp/resampler.h"
 
 namespace {
 
+/// Whole numbers, as long as they fit 53 bits.
 struct Fraction {
     double numerator;
     double denominator;
@@ -15,7 +21,8 @@ constexpr Fraction kNone{0, 0};
 // of int32_t.
 constexpr int kMaxTerms = 64;
 
-// The convergents h / k of the continued fraction of x, whose terms are the nearest integers.
+// The first convergent h / k of the continued fraction of x that lies within the tolerance. Its terms
+// are the nearest integers, not the floors, so there are few of them. 0 / 0 when none is near enough.
 Fraction nearest_convergent(double x, double tolerance) noexcept
 {
     Fraction previous{0, 1};
@@ -35,6 +42,8 @@ Fraction nearest_convergent(double x, double tolerance) noexcept
     return kNone;
 }
 
+// The special cases come first: what is within the tolerance of 1 is 1 / 1, however near 0 it may
+// be; else what is below the tolerance has no fraction.
 Fraction fraction_near(double x, double tolerance) noexcept
 {
     if (kz_fabs(x - 1) < tolerance) {
