@@ -52,8 +52,8 @@ bool is_of_type(const kzbdfs_dirent* entry, mode_t type) noexcept
     return (facts.st_mode & S_IFMT) == type;
 }
 
-/// The next record of a stream. Null at its end and when reading fails; only a failure sets `errno`,
-/// and it becomes the last error.
+/// The next record of a stream. Null at its end and when reading fails; only a failure sets
+/// `errno`, and it becomes the last error.
 const dirent* next_record(DIR* stream) noexcept
 {
     errno = 0;

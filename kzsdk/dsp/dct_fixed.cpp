@@ -1,9 +1,9 @@
 /// @file
 /// The fixed-point cosine transform, type II, of 16384 or 32768 words in place.
 ///
-/// The stages are a kernel; here are the object and the last scaling. Factors are Q30 words, divided
-/// by the powers of two that the shifts of the stages undo. The first group of each stage halves its
-/// sums, so word 0 ends up as the average of the input before it is scaled.
+/// The stages are a kernel; here are the object and the last scaling. Factors are Q30 words,
+/// divided by the powers of two that the shifts of the stages undo. The first group of each stage
+/// halves its sums, so word 0 ends up as the average of the input before it is scaled.
 #include "kzsdk/dsp/dct.h"
 
 #include "kzsdk/abs/owned.hpp"
@@ -16,8 +16,8 @@ namespace {
 constexpr int32_t kSmallestOrder = 14;
 constexpr int32_t kLargestOrder = 15;
 
-// 2^18 / sqrt(2), truncated: the factor of the average in word 0. That is 4.3e-5, so next to nothing
-// is left of it; the lowest band of every fingerprint depends on exactly this.
+// 2^18 / sqrt(2), truncated: the factor of the average in word 0. That is 4.3e-5, so next to
+// nothing is left of it; the lowest band of every fingerprint depends on exactly this.
 constexpr int32_t kDcScaleQ32 = 185363;
 
 } // namespace

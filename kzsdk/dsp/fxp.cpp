@@ -27,8 +27,8 @@ constexpr uint32_t high_half(uint32_t word) noexcept { return word >> 16; }
 constexpr uint32_t low_half(uint32_t word) noexcept { return word & 0xffff; }
 constexpr int32_t signed_half(uint32_t half) noexcept { return static_cast<int16_t>(half); }
 
-/// floor(a * half / 2^16), exactly, for a half in the range of 16 bits: the low half of `a` counts as
-/// unsigned, and the arithmetic shift takes its product down to the floor.
+/// floor(a * half / 2^16), exactly, for a half in the range of 16 bits: the low half of `a` counts
+/// as unsigned, and the arithmetic shift takes its product down to the floor.
 constexpr int32_t word_times_half(int32_t a, int32_t half) noexcept
 {
     const auto low = static_cast<int32_t>(low_half(static_cast<uint32_t>(a)));
@@ -96,8 +96,8 @@ constexpr FxpUTypeLong product(uint32_t a, uint32_t b) noexcept
     return sum(shifted_left(upper, 16), widened(al * bl));
 }
 
-/// The high word of product(). Of the low parts only the carry counts: their upper halves are summed
-/// before the last shift, so the result is exact.
+/// The high word of product(). Of the low parts only the carry counts: their upper halves are
+/// summed before the last shift, so the result is exact.
 constexpr uint32_t product_high(uint32_t a, uint32_t b) noexcept
 {
     const uint32_t ah = high_half(a);
@@ -115,8 +115,8 @@ struct Aligned {
     int32_t exponent;
 };
 
-/// A mantissa shifted down by some octaves. From 31 on it counts as 0, also when it is negative, where
-/// the sign fill would make it -1.
+/// A mantissa shifted down by some octaves. From 31 on it counts as 0, also when it is negative,
+/// where the sign fill would make it -1.
 constexpr int32_t lowered(int32_t mantissa, uint32_t octaves) noexcept
 {
     return octaves < 31 ? mantissa >> octaves : 0;
@@ -320,8 +320,8 @@ FxpUType KZDSP_ReciprocalWithScaling(FxpUType x, int32_t* shift) noexcept
     return reciprocal(shift_left(x, *shift));
 }
 
-// Both numbers are normalised; the exponent makes up for the two shifts. The mantissa is a little too
-// small at most, as the reciprocal is.
+// Both numbers are normalised; the exponent makes up for the two shifts. The mantissa is a little
+// too small at most, as the reciprocal is.
 FxpUType KZDSP_UIntRatio_FxpUType(FxpUType a, FxpUType b, int32_t* exponent) noexcept
 {
     int32_t b_shift = 0;

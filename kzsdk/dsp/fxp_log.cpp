@@ -1,9 +1,9 @@
 /// @file
 /// The natural logarithm of a fixed-point pair: log2 from a table of quadratics, times ln 2.
 ///
-/// All of it is done with pairs of a signed mantissa and an exponent, m * 2^(e - 31), normalised after
-/// each step. The error is 1e-8 to 2e-8; 0 has no logarithm and gives
-/// a number without meaning.
+/// All of it is done with pairs of a signed mantissa and an exponent, m * 2^(e - 31), normalised
+/// after each step. The error is 1e-8 to 2e-8. 0 has no logarithm and gives a number without
+/// meaning.
 #include "kzsdk/dsp/fxp.h"
 #include "kzsdk/dsp/log_segments.hpp"
 #include "kzsdk/kernels/fxp_ops.hpp"

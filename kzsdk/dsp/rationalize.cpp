@@ -21,8 +21,9 @@ constexpr Fraction kNone{0, 0};
 // of int32_t.
 constexpr int kMaxTerms = 64;
 
-// The first convergent h / k of the continued fraction of x that lies within the tolerance. Its terms
-// are the nearest integers, not the floors, so there are few of them. 0 / 0 when none is near enough.
+// The first convergent h / k of the continued fraction of x that lies within the tolerance. Its
+// terms are the nearest integers, not the floors, so there are few of them. 0 / 0 when none is near
+// enough.
 Fraction nearest_convergent(double x, double tolerance) noexcept
 {
     Fraction previous{0, 1};

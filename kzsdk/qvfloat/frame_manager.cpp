@@ -6,9 +6,9 @@
 ///     fingerprint = shares of the bands in the root mean energies, then in the spreads of the
 ///                   amplitudes, times `fingerprint_scale` (32768)
 ///
-/// The whole frame is transformed at the full working rate: twice the points of the fixed-point twin
-/// at twice its rate, so bins are as wide. Single precision throughout, roots apart; every sum has
-/// one order, which is part of the result.
+/// The whole frame is transformed at the full working rate: twice the points of the fixed-point
+/// twin at twice its rate, so bins are as wide. Single precision throughout, roots apart; every sum
+/// has one order, which is part of the result.
 #include <algorithm>
 #include <span>
 #include <utility>
@@ -79,8 +79,8 @@ void fill_frame(QVFM& m, const float* samples) noexcept
     std::copy_n(samples, m.frame_length, m.frame_buffer);
 }
 
-// The bins of a band, both edges included and cut to the spectrum. Edges in hertz are divided by the
-// width of a bin and truncated, so neighbouring bands share a bin.
+// The bins of a band, both edges included and cut to the spectrum. Edges in hertz are divided by
+// the width of a bin and truncated, so neighbouring bands share a bin.
 std::span<const float> band_bins(const QVFM& m, uint32_t band) noexcept
 {
     const uint32_t first = kz::to_uint32(m.band_table[2 * band] / m.bin_width);

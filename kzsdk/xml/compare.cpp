@@ -40,8 +40,8 @@ struct Pair {
     const XMLTag* b;
 };
 
-/// Each open pair is the next one of a level; it moves on before its sub-tags are entered. False too
-/// when memory for the way back up is short: what was not seen is not called equal.
+/// Each open pair is the next one of a level; it moves on before its sub-tags are entered. False
+/// too when memory for the way back up is short: what was not seen is not called equal.
 bool same_trees(const XMLTag& a, const XMLTag& b) noexcept
 {
     kz::xml::OpenTags<Pair> next;

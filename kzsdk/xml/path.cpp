@@ -2,8 +2,8 @@
 /// Reading and setting data by a path of names with "/" between them.
 ///
 /// The five functions differ in whether the path begins with the tag's own name, in what a leading
-/// "/" does, and in whether the last name may be an attribute; the table in xml.h has all of it. All
-/// of them walk down without recursion, so a path may be of any length.
+/// "/" does, and in whether the last name may be an attribute; the table in xml.h has all of it.
+/// All of them walk down without recursion, so a path may be of any length.
 #include "kzsdk/xml/xml.h"
 
 #include "kzsdk/xml/text.hpp"
@@ -101,8 +101,8 @@ struct Resolved {
     uint32_t kind = 1;
 };
 
-/// The sub-tag that an element segment stands for: one that is there unless the segment adds, else a
-/// new one. Null when memory is short or the name empty.
+/// The sub-tag that an element segment stands for: one that is there unless the segment adds, else
+/// a new one. Null when memory is short or the name empty.
 XMLTag* element(XMLTag& tag, const char* name, bool adds) noexcept
 {
     XMLTag* child = adds ? nullptr : GetXMLSubTagFromStr(&tag, name);
@@ -132,8 +132,8 @@ const char* GetXMLSubTagData(const XMLTag* tag, const char* path) noexcept
     return GetXMLTagData(tag);
 }
 
-// Tags made on the way stay when a later segment fails. A "/" at the end makes an empty last segment
-// and is refused, after the tags before it were made.
+// Tags made on the way stay when a later segment fails. A "/" at the end makes an empty last
+// segment and is refused, after the tags before it were made.
 kz_status SetXMLSubTagDataFromStr(XMLTag* tag, const char* path, const char* data,
                                   uint8_t create) noexcept
 {

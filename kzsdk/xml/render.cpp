@@ -160,8 +160,9 @@ private:
         }
     }
 
-    /// Appends bytes that need no entity in one piece: no more than fit without growing, but at least
-    /// one. When memory runs out, the text so ends where appending byte by byte would have ended.
+    /// Appends bytes that need no entity in one piece: no more than fit without growing, but at
+    /// least one. When memory runs out, the text so ends where appending byte by byte would have
+    /// ended.
     uint32_t plain_run(const char* text) noexcept
     {
         const uint32_t room = std::max(buffer_.capacity - buffer_.length, 1U);
@@ -236,7 +237,8 @@ private:
 
 } // namespace
 
-// The text is in the buffer's own block, which is handed over as it is: it may be larger than needed.
+// The text is in the buffer's own block, which is handed over as it is: it may be larger than
+// needed.
 char* RenderXMLTagToStrEx(const XMLTag* tag, uint8_t header, uint8_t indent,
                           uint8_t newlines) noexcept
 {
