@@ -33,8 +33,8 @@ void copy_pieces(const FramePieces<Sample>& pieces, Sample* frame) noexcept
     std::copy(pieces.newer.begin(), pieces.newer.end(), frame + pieces.older.size());
 }
 
-/// The equalisers' copy of a silent frame: it fills the frame from the second piece, whatever that
-/// piece's count said.
+/// The equalisers' copy of a silent frame: it fills the frame from the second piece, regardless of
+/// the count of that piece.
 template <class Sample>
 void copy_whole_frame(const FramePieces<Sample>& pieces, const Sample* second, Sample* frame,
                       uint32_t length) noexcept
