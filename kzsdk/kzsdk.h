@@ -1,6 +1,6 @@
 /**
  * @file
- * libkzsdk condenses about 14 seconds of audio into 30 numbers, written as a short XML document
+ * libkzsdk condenses 14.22 seconds of audio into 30 numbers, written as a short XML document
  * that a recognition service can be asked with. Eight calls do it:
  *
  *     kzconf_configuration configuration;

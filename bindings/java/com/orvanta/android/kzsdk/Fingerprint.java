@@ -274,7 +274,7 @@ public final class Fingerprint implements AutoCloseable {
         eventThread = Thread.currentThread();
         try {
             if (text == null) {
-                tell(request, null, "No fingerprint can be made of this audio; about 14.3 seconds are "
+                tell(request, null, "No fingerprint can be made of this audio; 14.22 seconds are "
                         + "needed after leading silence");
             } else {
                 tellDocument(request, text);
