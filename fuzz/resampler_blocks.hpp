@@ -10,9 +10,8 @@
 
 namespace kz::fuzz {
 
-/// Follows the choices; `resample` is the library's function, `choose_sample` makes input. The
-/// counts taken and produced and every word must match the model; the rest of the room stays
-/// untouched.
+/// Does what the choices say; `resample` is the library's function, `choose_sample` makes input.
+/// What was taken, what was given and every word must be the model's; the rest of the room stays.
 template <class Sample, class Record, class Model, class Resample, class ChooseSample>
 void compare_blocks(Choices& choices, Record* library, Model& model, Resample resample,
                     ChooseSample choose_sample)

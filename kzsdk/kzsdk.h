@@ -1,34 +1,37 @@
 /**
  * @file
- * libkzsdk condenses 14.22 seconds of audio into 30 numbers, written as a short XML document
- * that a recognition service can be asked with. Eight calls do it:
+ * libkzsdk condenses about 14 seconds of audio into 30 numbers, which can be written as a short XML
+ * document that a recognition service can be asked with. A stream takes sound in any format, cut
+ * anywhere (kzsdk/stream/stream.h):
  *
- *     kzconf_configuration configuration;
- *     kzconf_initialize_configuration(&configuration);      clears the start-up record
- *     kzinit_initialize_vesk(&configuration);               starts the library: memory is on
- *
- *     kz_fpx_handle* handle = NULL;
+ *     kz_stream_settings settings;
+ *     kz_stream* stream = NULL;
  *     uint8_t complete = 0;
- *     char* document = NULL;
- *     kz_fpx_fingerprint_create(KZ_FPX_ALGORITHM_FIXED, KZ_FPX_FORMAT_PCM16, 44100, 2, &handle);
+ *     int16_t values[30];
+ *     uint32_t count = 0;
+ *     const char* document = NULL;
+ *
+ *     kz_stream_initialize_settings(&settings);             16 bits, 44100 Hz, stereo
+ *     kz_stream_create(&settings, &stream);
  *     while (!complete && more audio is at hand) {
- *         kz_fpx_fingerprint_add_audio(handle, audio, byte_count, &complete);
+ *         kz_stream_feed(stream, audio, byte_count, NULL, &complete);
  *     }
+ *     kz_stream_finish(stream, &complete);
  *     if (complete) {
- *         kz_fpx_fingerprint_serialize(handle, &document);  the document, NUL-terminated
- *         ...
- *         kz_fpx_fingerprint_serialize_free(&document);
- *     }
- *     kz_fpx_fingerprint_free(&handle);
+ *         kz_stream_get_values(stream, values, 30, &count);
+ *         kz_stream_get_document(stream, &document);        the stream's, NUL-terminated
+ *     }                                                     else kz_stream_get_state() says why
+ *     kz_stream_free(&stream);
  *
- *     kzinit_shutdown_vesk();                               once, when everything is given back
+ * Every call returns a kz_status: 0 for success, else one of the codes in kzsdk/abs/status.h, for
+ * each of which kz_status_text() has a sentence. `examples/fingerprint_tune.c` is this page as a
+ * program.
  *
- * Every call returns a kz_status: 0 for success, else one of the codes in kzsdk/abs/status.h.
- * `examples/fingerprint_tune.c` is this page as a program.
- *
- * Start the library once, before any thread uses it, and shut it down once: there is no reference
- * count, and what is still out at shut-down can no longer be freed. In between, handles are
- * independent of each other; one handle belongs to one thread at a time.
+ * Below a stream lies the extraction interface (kzsdk/fpx/fpx.h), and below that every part of the
+ * fingerprinters can be called alone. Their callers start the library first: with kzinit_acquire()
+ * and kzinit_release(), which count, or with kzinit_initialize_vesk() and kzinit_shutdown_vesk(),
+ * of which one shut-down ends the library for all (kzsdk/abs/startup.h). Streams, handles and
+ * objects are independent of each other; each belongs to one thread at a time.
  *
  * The headers below are the library's families, lowest first. Each can be included alone.
  */
@@ -59,8 +62,11 @@
 #include "kzsdk/qvfixed/qvfixed.h"
 #include "kzsdk/qvfloat/qvfloat.h"
 
-/* The extraction interface: the door for most users. */
+/* The extraction interface: one algorithm or the other, in the formats that they take. */
 #include "kzsdk/fpx/fpx.h"
+
+/* Streams: sound in any format, cut anywhere. The door for most users. */
+#include "kzsdk/stream/stream.h"
 
 /* The files and labels of optical discs; works without start-up. */
 #include "kzsdk/disc/disc.h"

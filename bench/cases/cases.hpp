@@ -1,5 +1,5 @@
 /// @file
-/// The cases, by what they measure.
+/// The cases, by what they look at.
 #pragma once
 
 #include <vector>

@@ -1,4 +1,4 @@
-// How the cost grows as a sound is cut into smaller pieces.
+// Into how small pieces a sound is cut.
 
 #include "growth/growth.hpp"
 

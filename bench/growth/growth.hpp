@@ -1,5 +1,6 @@
 /// @file
-/// How the cost grows: a table for each quantity that can grow, with the law that it must obey.
+/// How the cost grows with what is asked: a table for each question, with the law that it must
+/// obey.
 #pragma once
 
 #include <array>
@@ -25,7 +26,7 @@ struct GrowthTable {
 
 struct Growth {
     std::string name;
-    /// `thorough` selects sizes that take minutes.
+    /// `thorough` asks for sizes that take minutes.
     GrowthTable (*measure)(bool thorough);
 };
 

@@ -1,4 +1,4 @@
-// How much heap a handle takes, and when.
+// What a handle takes of the heap, and when.
 
 #include "growth/growth.hpp"
 #include "measure/heap_meter.hpp"

@@ -1,4 +1,4 @@
-// How the cost grows with the silence before the sound.
+// How long the sound is silent before anything is heard.
 
 #include "cases/sound.hpp"
 #include "growth/growth.hpp"

@@ -1,5 +1,5 @@
 /// @file
-/// Summary of a number that was measured many times: median and quartiles.
+/// What is said of a number that was measured many times.
 #pragma once
 
 #include <algorithm>

@@ -1,5 +1,6 @@
 /// @file
-/// The query document as the peers write it: the texts of its parts, and the check of the result.
+/// The query document as the peers write it: the texts of its parts, and the check of what they
+/// make of them.
 #pragma once
 
 #include <string>

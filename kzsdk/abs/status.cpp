@@ -1,6 +1,4 @@
-/// @file
-/// The sentence for each status: what went wrong, and what cures it. status.h says the same at each
-/// name.
+// The sentence for each status: what went wrong, and what cures it. status.h says the same at each name.
 #include "kzsdk/abs/status.h"
 
 namespace {
@@ -76,6 +74,25 @@ constexpr Entry kTexts[] = {
     {KZ_FPX_ERROR_NO_ALGORITHM,
      "There is no algorithm with this number: use KZ_FPX_ALGORITHM_FIXED or "
      "KZ_FPX_ALGORITHM_FLOAT."},
+
+    {KZ_STREAM_ERROR_MEMORY,
+     "Memory for the stream was short, and sound may be lost: free some memory and begin anew."},
+    {KZ_STREAM_ERROR_INVALID_ARGUMENT,
+     "A pointer is null or a reserved field is not 0: pass what stream.h states, in settings that "
+     "kz_stream_initialize_settings() has filled."},
+    {KZ_STREAM_ERROR_NOT_STARTED,
+     "The library was shut down under the stream: start it again, or free the stream."},
+    {KZ_STREAM_ERROR_ALGORITHM,
+     "The stream's algorithm is unknown: use KZ_FPX_ALGORITHM_FIXED or KZ_FPX_ALGORITHM_FLOAT."},
+    {KZ_STREAM_ERROR_FORMAT,
+     "The stream's sample format is unknown: use one of KZ_STREAM_FORMAT_PCM8 and the others."},
+    {KZ_STREAM_ERROR_RATE,
+     "The algorithm does not take the stream's rate: compare with stream.h, use the "
+     "floating-point algorithm, or resample the sound."},
+    {KZ_STREAM_ERROR_CHANNELS,
+     "A stream has 1 to 65535 channels, in KZ_STREAM_FORMAT_PCM8 1 or 2: pass the number of the "
+     "sound, or use KZ_STREAM_FORMAT_LINEAR8."},
+    {KZ_STREAM_ERROR_FINISHED, "The stream was finished: create another one for more sound."},
 
     {KZ_QV_ERROR_MEMORY,
      "Memory is short or the algorithm does not take the sample rate: compare the rate with the "

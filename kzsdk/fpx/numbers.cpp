@@ -1,9 +1,9 @@
-/// @file
-/// What a fingerprint context reports as numbers: the values, where the signal starts, the times
-/// and the progress. Each call reads the algorithm's own object and converts nothing but units.
+// What a fingerprint context reports as numbers: the values, where the signal starts, the times and
+// the progress. Each call reads the algorithm's own object and converts nothing but units.
 
 #include "kzsdk/fpx/algorithm.hpp"
 #include "kzsdk/fpx/fpx.h"
+#include "kzsdk/fpx/pieces.hpp"
 #include "kzsdk/qv/frame_list.hpp"
 #include "kzsdk/qv/frame_pump.hpp"
 #include "kzsdk/qvfixed/twin.hpp"
@@ -22,7 +22,7 @@ auto visit(const kz_fpx_handle& handle, Use use) noexcept
                *static_cast<const kzqvfixed_fingerprinter*>(handle.instance));
 }
 
-// Stores a result unless the caller passed null for it.
+// Stores a result that the caller may not have asked for.
 template <class Number>
 void store(Number* out, Number number) noexcept
 {
@@ -105,4 +105,10 @@ kz_status kz_fpx_fingerprint_get_next_frames(const kz_fpx_handle* handle,
     *out_frames =
         visit(*handle, [](auto, const auto& object) { return kz::qv::next_step_frames(object); });
     return KZ_OK;
+}
+
+uint32_t kz::fpx::largest_piece_frames(const kz_fpx_handle& handle) noexcept
+{
+    return visit(handle,
+                 [](auto, const auto& object) { return kz::qv::largest_step_frames(object); });
 }

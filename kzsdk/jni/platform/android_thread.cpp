@@ -1,5 +1,3 @@
-/// @file
-/// The thread of the adapter for Android's own sources: its starter sets name and priority.
 #include <utils/AndroidThreads.h>
 
 #include "kzsdk/jni/platform/platform.hpp"

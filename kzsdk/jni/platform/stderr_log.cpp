@@ -1,5 +1,3 @@
-/// @file
-/// The log of the portable adapter: one line on standard error for each message.
 #include <cerrno>
 #include <cstdio>
 #include <ctime>
@@ -10,7 +8,6 @@
 
 namespace {
 
-/// Stands in for a null tag.
 const char* program_name() noexcept
 {
 #ifdef __GLIBC__
@@ -20,7 +17,6 @@ const char* program_name() noexcept
 #endif
 }
 
-/// The process's number where threads have none of their own.
 int thread_number() noexcept
 {
 #ifdef __linux__

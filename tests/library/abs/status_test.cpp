@@ -80,6 +80,18 @@ TEST(Status, OfFingerprintsIsMadeOfModuleAndReason)
     EXPECT_EQ(code(0x0f, 0x961), KZ_QV_ERROR_INCOMPLETE);
 }
 
+TEST(Status, OfStreamsIsMadeOfModuleAndReason)
+{
+    EXPECT_EQ(code(0x09, 0x001), KZ_STREAM_ERROR_MEMORY);
+    EXPECT_EQ(code(0x09, 0x004), KZ_STREAM_ERROR_INVALID_ARGUMENT);
+    EXPECT_EQ(code(0x09, 0x006), KZ_STREAM_ERROR_NOT_STARTED);
+    EXPECT_EQ(code(0x09, 0x010), KZ_STREAM_ERROR_ALGORITHM);
+    EXPECT_EQ(code(0x09, 0x011), KZ_STREAM_ERROR_FORMAT);
+    EXPECT_EQ(code(0x09, 0x012), KZ_STREAM_ERROR_RATE);
+    EXPECT_EQ(code(0x09, 0x013), KZ_STREAM_ERROR_CHANNELS);
+    EXPECT_EQ(code(0x09, 0x014), KZ_STREAM_ERROR_FINISHED);
+}
+
 TEST(Status, HasItsOwnText)
 {
     const std::vector<kz_status> failures = defined_failures();

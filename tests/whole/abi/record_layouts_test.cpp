@@ -266,4 +266,33 @@ TEST(RecordLayout, OfTheFingerprinter)
     EXPECT_EQ(4096 * sizeof(FxpType), sizeof(Record::conversion_buffer));
 }
 
+TEST(RecordLayout, OfTheSettingsOfAStream)
+{
+    using Record = kz_stream_settings;
+    expect_layout<Record>({
+        FIELD(Record, algorithm),
+        FIELD(Record, format),
+        FIELD(Record, sample_rate),
+        FIELD(Record, channels),
+        FIELD(Record, reserved),
+    });
+    static_assert(sizeof(Record) == 64);
+}
+
+TEST(RecordLayout, OfTheStateOfAStream)
+{
+    using Record = kz_stream_state;
+    expect_layout<Record>({
+        FIELD(Record, frames),
+        FIELD(Record, silence_milliseconds),
+        FIELD(Record, sound_milliseconds),
+        FIELD(Record, standing),
+        FIELD(Record, percent),
+        FIELD(Record, missing_milliseconds),
+        FIELD(Record, odd_bytes),
+        FIELD(Record, reserved),
+    });
+    static_assert(sizeof(Record) == 64);
+}
+
 } // namespace

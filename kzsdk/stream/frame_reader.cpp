@@ -1,0 +1,154 @@
+// Samples of every format as 16-bit words, and many channels as one. Integers keep their upper 16
+// bits; floats are scaled to 32768 and rounded to the nearest word without help of the processor's
+// rounding mode, so that the words are the same whatever a caller has set.
+
+#include "kzsdk/stream/frame_reader.hpp"
+
+#include <algorithm>
+#include <bit>
+#include <cstddef>
+#include <cstring>
+
+#include "kzsdk/dsp/convert.h"
+#include "kzsdk/fpx/fpx.h"
+
+namespace kz::stream {
+
+namespace {
+
+constexpr bool kIsLittleEndian = std::endian::native == std::endian::little;
+
+template <class Word>
+Word load(const uint8_t* bytes) noexcept
+{
+    Word word{};
+    std::memcpy(&word, bytes, sizeof word);
+    return word;
+}
+
+// To the nearest integer, halves to the even one; clipped at full scale.
+int16_t from_float(float sample) noexcept
+{
+    const float scaled = sample * 32768.0F; // exact, or infinite
+    if (!(scaled > -32768.0F)) {
+        return scaled <= -32768.0F ? int16_t{-32768} : int16_t{0}; // not a number: silence
+    }
+    if (scaled >= 32767.0F) {
+        return 32767;
+    }
+    const auto whole = static_cast<int32_t>(scaled);       // towards zero
+    const float rest = scaled - static_cast<float>(whole); // exact, within (-1, 1)
+    const float beyond = rest < 0 ? -rest : rest;
+    const bool is_odd = (whole & 1) != 0;
+    const bool rounds_away = beyond > 0.5F || (beyond == 0.5F && is_odd);
+    const int32_t away = rest < 0 ? -1 : 1;
+    return static_cast<int16_t>(rounds_away ? whole + away : whole);
+}
+
+// Beyond full scale a double may not fit single precision, and all of it is clipped alike.
+int16_t from_double(double sample) noexcept
+{
+    return from_float(sample != sample ? 0.0F : static_cast<float>(std::clamp(sample, -2.0, 2.0)));
+}
+
+int16_t from_24_bits(const uint8_t* bytes) noexcept
+{
+    return load<int16_t>(kIsLittleEndian ? bytes + 1 : bytes);
+}
+
+// Calls `to_word(bytes of a sample)` for each sample.
+template <uint32_t size, class ToWord>
+void for_each(const uint8_t* bytes, size_t count, int16_t* words, ToWord to_word) noexcept
+{
+    for (size_t i = 0; i < count; ++i, bytes += size) {
+        words[i] = to_word(bytes);
+    }
+}
+
+void to_words(uint32_t format, const uint8_t* bytes, size_t count, int16_t* words) noexcept
+{
+    switch (format) {
+    case KZ_STREAM_FORMAT_PCM16:
+        std::memcpy(words, bytes, count * sizeof *words);
+        break;
+    case KZ_STREAM_FORMAT_ALAW: // the library's table has the sign inverted
+        for_each<1>(bytes, count, words, [table = KZDSP_GetALawTable()](const uint8_t* code) {
+            return static_cast<int16_t>(-table[*code]);
+        });
+        break;
+    case KZ_STREAM_FORMAT_ULAW:
+        for_each<1>(bytes, count, words,
+                    [table = KZDSP_GetuLawTable()](const uint8_t* code) { return table[*code]; });
+        break;
+    case KZ_STREAM_FORMAT_PCM24:
+        for_each<3>(bytes, count, words, from_24_bits);
+        break;
+    case KZ_STREAM_FORMAT_PCM32:
+        for_each<4>(bytes, count, words, [](const uint8_t* at) {
+            return static_cast<int16_t>(load<int32_t>(at) >> 16);
+        });
+        break;
+    case KZ_STREAM_FORMAT_FLOAT32:
+        for_each<4>(bytes, count, words,
+                    [](const uint8_t* at) { return from_float(load<float>(at)); });
+        break;
+    case KZ_STREAM_FORMAT_FLOAT64:
+        for_each<8>(bytes, count, words,
+                    [](const uint8_t* at) { return from_double(load<double>(at)); });
+        break;
+    default: // KZ_STREAM_FORMAT_LINEAR8
+        for_each<1>(bytes, count, words, [](const uint8_t* at) {
+            return static_cast<int16_t>((int32_t{*at} - 128) * 256);
+        });
+    }
+}
+
+// In place: the sum divided by the smallest power of two that is not below the number of channels,
+// rounded to the nearest, halves up. 65535 samples and the half fit 32 bits.
+void mix_down(int16_t* samples, uint32_t frames, uint32_t channels) noexcept
+{
+    const auto shift = static_cast<uint32_t>(std::bit_width(channels - 1));
+    const int32_t half = int32_t{1} << (shift - 1);
+    const int16_t* next = samples;
+    for (uint32_t i = 0; i < frames; ++i) {
+        int32_t sum = half;
+        for (uint32_t c = 0; c < channels; ++c) {
+            sum += *next++;
+        }
+        samples[i] = static_cast<int16_t>(sum >> shift);
+    }
+}
+
+// What the extraction interface takes has the same number there.
+bool is_taken_by_fpx(uint32_t format) noexcept { return format <= KZ_STREAM_FORMAT_ULAW; }
+
+} // namespace
+
+uint32_t bytes_per_sample(uint32_t format) noexcept
+{
+    constexpr uint8_t kBytes[] = {0, 1, 2, 1, 1, 3, 4, 4, 8, 1};
+    return format < std::size(kBytes) ? kBytes[format] : 0;
+}
+
+FrameLayout layout_of(uint32_t format, uint32_t channels, bool decimated) noexcept
+{
+    FrameLayout layout{};
+    layout.format = format;
+    layout.channels = channels;
+    layout.frame_bytes = bytes_per_sample(format) * channels;
+    layout.goes_as_it_is = !decimated && channels <= 2 && is_taken_by_fpx(format) ? 1 : 0;
+    layout.piece_format = layout.goes_as_it_is != 0 ? format : uint32_t{KZ_FPX_FORMAT_PCM16};
+    layout.piece_channels = channels <= 2 ? channels : 1;
+    return layout;
+}
+
+void read_frames(const FrameLayout& layout, const uint8_t* bytes, uint32_t frames,
+                 int16_t* samples) noexcept
+{
+    to_words(layout.format, bytes, size_t{frames} * layout.channels, samples);
+    if (layout.channels > layout.piece_channels) {
+        mix_down(samples, frames, layout.channels);
+    }
+}
+
+} // namespace kz::stream
