@@ -5,7 +5,7 @@
 
 namespace {
 
-// As wide as every processor can change at once, without a library to help.
+// As wide as every processor can change atomically without a helper library.
 std::atomic<ptrdiff_t> blocks{0};
 std::atomic<size_t> allocations{0};
 std::atomic<size_t> fail_at{0}; // 0: never

@@ -35,8 +35,8 @@ public:
 };
 
 /// Runs `attempt` with the first allocation failing, then only the second, and so on until a run
-/// meets no failure, then the same with all later ones failing too. `attempt(fired)` gets a
-/// function that tells whether the failure has struck. After each run no block may be left over.
+/// meets no failure, then the same with all later ones failing too. `attempt(fired)` receives a
+/// function that reports whether the failure has occurred. After each run no block may be left.
 template <class Attempt>
 void for_every_failed_allocation(Attempt attempt)
 {

@@ -1,5 +1,5 @@
 /// @file
-/// Runs a program and catches what it writes.
+/// Runs a program and captures what it writes.
 #pragma once
 
 #include <cstdint>
@@ -19,8 +19,8 @@ struct ProcessResult {
 };
 
 struct ProcessSetup {
-    /// Gives the next piece of standard input, or nothing at its end. Without it, standard input is
-    /// empty. Called only as long as the program reads.
+    /// Provides the next piece of standard input, or nothing at its end. Without it, standard input
+    /// is empty. Called only as long as the program reads.
     std::function<std::string_view()> input;
     /// Standard input is this file instead.
     std::string input_file;

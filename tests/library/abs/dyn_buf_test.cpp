@@ -208,7 +208,8 @@ TEST_F(DynBuf, ACapacityThatWouldWrapIsOutOfMemory)
     EXPECT_EQ("x", contents(small.get()));
 }
 
-// Growth moves the block, and the bytes to append lie in it. The sanitizer sees a read of the old.
+// Growth moves the block, and the bytes to append lie in it. The sanitizer detects a read of the
+// old block.
 TEST_F(DynBuf, ItsOwnBytesCanBeAppended)
 {
     for (uint32_t offset = 0; offset < 10; ++offset) {

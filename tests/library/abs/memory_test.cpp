@@ -41,7 +41,7 @@ TEST_F(MemoryOff, TheSwitchReportsWhatItFound)
     EXPECT_EQ(KZ_MEM_NOT_ON, kzmem_query_availability());
 }
 
-// One user's shut-down is every user's: his blocks wait until memory is on again.
+// One user's shut-down affects every user: the blocks wait until memory is on again.
 TEST_F(MemoryOff, OneShutdownEndsAnyNumberOfStarts)
 {
     ASSERT_EQ(KZ_OK, kzmem_initialize(0, 0));
@@ -106,7 +106,7 @@ TEST_F(Memory, CallocClearsTheBlock)
 }
 
 // 65536 times 65537 is 65536 modulo 2^32. The block is that large and no larger; the sanitizer's
-// view of the heap would tell if more were cleared.
+// view of the heap would show if more were cleared.
 TEST_F(Memory, CallocTakesItsProductModulo32Bits)
 {
     auto* block = static_cast<uint8_t*>(_kzmem_calloc(65536, 65537));

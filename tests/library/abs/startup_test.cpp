@@ -75,7 +75,7 @@ TEST_F(Startup, WithoutARecordLeavesMemoryAsItWas)
     EXPECT_TRUE(is_on());
 }
 
-// The check comes after the memory manager: a caller who is refused has a shut-down to make.
+// The check comes after the memory manager: a caller that is refused still has to shut down.
 TEST_F(Startup, AZeroCheckIsRefusedWithMemoryOn)
 {
     EXPECT_EQ(KZ_ERROR_INVALID_ARGUMENT, kzinit_initialize_vesk_safe(&record_, 0));
@@ -160,7 +160,7 @@ TEST_F(Startup, PlainStartOutlastsCountedReleases)
     EXPECT_TRUE(is_on()) << "started while held";
 }
 
-// A plain shut-down does not count, whoever holds the library.
+// A plain shut-down does not count holders: it switches the library off for all of them.
 TEST_F(Startup, PlainShutdownEndsItForHoldersToo)
 {
     ASSERT_EQ(KZ_OK, kzinit_acquire());

@@ -91,7 +91,7 @@ TEST(Text, SearchingIsTheCLibrarys)
     EXPECT_EQ(0u, kz_strlen(""));
 }
 
-// The place reached is hidden in the C library: a second text begun in between takes it over.
+// The position is hidden in the C library: a second text begun in between overwrites it.
 TEST(Text, CuttingKeepsOneHiddenPlaceForTheProcess)
 {
     char first[] = "a,b";

@@ -1,5 +1,5 @@
 /// @file
-/// A place for the fixed device path that is this process's own.
+/// A /dev of this process's own, for the fixed device path.
 #pragma once
 
 #include <cerrno>
@@ -13,11 +13,11 @@
 
 namespace kz::test {
 
-/// Covers /dev, for this process alone, with an empty directory in which tests may put what they
-/// like. The machine's own /dev is not touched. Needs root or unprivileged user namespaces.
+/// Covers /dev, for this process alone, with an empty directory that tests may fill as they like.
+/// The machine's own /dev is not touched. Needs root or unprivileged user namespaces.
 class PrivateDevices {
 public:
-    /// Why /dev could not be covered; empty when it was. The first call does it, for good.
+    /// Why /dev could not be covered; empty when it was. The first call covers it permanently.
     static const std::string& obstacle()
     {
         static const std::string obstacle = cover();

@@ -47,7 +47,7 @@ Entry entry_named(const Directory& dir, const std::string& name)
     return nullptr;
 }
 
-/// Name of every entry with what the library takes it for.
+/// The name of every entry and the kind that the library reports.
 std::map<std::string, std::string> kinds_in(const std::string& path)
 {
     std::map<std::string, std::string> kinds;
@@ -63,7 +63,7 @@ std::map<std::string, std::string> kinds_in(const std::string& path)
     return kinds;
 }
 
-/// The switch plays no part in listing: every test runs with the family off.
+/// Listing does not depend on the switch: every test runs with the family off.
 class DiscDirectory : public ::testing::Test {
 protected:
     void SetUp() override
@@ -190,7 +190,7 @@ TEST_F(DiscDirectory, FailedReadingAndClosingLeaveTheirReason)
     EXPECT_EQ(KZ_DISC_ERROR_BAD_DESCRIPTOR, kzbdfs_get_error());
 }
 
-// Who looks at what is returned, and not at the handle, loses the handle.
+// A caller that goes by the returned status, and not by the handle, leaks the handle.
 TEST_F(DiscDirectory, SuccessReturnsThePendingLastErrorAndTakesIt)
 {
     EXPECT_EQ(KZ_DISC_NOT_ON, kzbdfs_shutdown());
@@ -216,7 +216,7 @@ TEST_F(DiscDirectory, NullIsNeitherReadNorNamedNorFreed)
     kzbdfs_close_dir(nullptr);
 }
 
-// The record is the stream's: its name is not the entry's to keep.
+// The record belongs to the stream, and so does the name.
 TEST_F(DiscDirectory, AnEntrysNameLiesInTheStream)
 {
     const Directory dir = open_directory(scratch_.path());
@@ -251,7 +251,7 @@ TEST_F(DiscDirectory, AnEntryThatIsGoneIsNothing)
     EXPECT_EQ(KZ_DISC_ERROR_NOT_FOUND, kzbdfs_get_error());
 }
 
-// A look and an opening are two things: what was a file may be a link by then.
+// The check and the opening are separate: what was a file may be a link by then.
 TEST_F(DiscDirectory, ALinkSwappedInAfterTheLookIsOpened)
 {
     scratch_.write("elsewhere", "secret");
@@ -274,7 +274,7 @@ TEST_F(DiscDirectory, ALinkSwappedInAfterTheLookIsOpened)
 TEST_F(DiscDirectory, AnEntryThatMayNotBeLookedAtIsNothing)
 {
     scratch_.write("file", "x");
-    ASSERT_EQ(0, ::chmod(scratch_.path().c_str(), 0444)); // may be listed and not looked into
+    ASSERT_EQ(0, ::chmod(scratch_.path().c_str(), 0444)); // may be listed but not searched
     as_nobody([&] {
         const Directory dir = open_directory(scratch_.path());
         const Entry file = entry_named(dir, "file");
@@ -286,7 +286,7 @@ TEST_F(DiscDirectory, AnEntryThatMayNotBeLookedAtIsNothing)
 
 // ---- Lengths
 
-/// Directories in each other, their path as long as the system can take.
+/// Nested directories, whose path is as long as the system allows.
 std::string make_deep(const ScratchDirectory& scratch, size_t length)
 {
     std::string path = scratch.path();
@@ -311,7 +311,7 @@ TEST_F(DiscDirectory, APathOfAnyLengthIsListed)
     }
 }
 
-// The name can still be read; the system looks at no path of 4096 bytes or more.
+// The name can still be read; the system accepts no path of 4096 bytes or more.
 TEST_F(DiscDirectory, AnEntryWhosePathIsTooLongIsOnlyListed)
 {
     const std::string path = make_deep(scratch_, 4090);

@@ -13,7 +13,7 @@
 
 namespace kz::test {
 
-/// Restores what it was given at its end.
+/// Restores at its end what it was given.
 template <class Restore>
 class AtEnd {
 public:

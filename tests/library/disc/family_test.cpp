@@ -1,4 +1,4 @@
-// What both families do alike: switch, last error and files.
+// What both families have in common: switch, last error and files.
 
 #include <cerrno>
 #include <cstddef>
@@ -25,7 +25,8 @@ namespace {
 
 constexpr const char* kNoFilter = "system calls cannot be filtered here: no seccomp";
 
-/// From here on the calling thread's `lseek` fails as told. There is no way back for the thread.
+/// From here on the calling thread's `lseek` fails in the given way; this cannot be undone for the
+/// thread.
 bool make_seeking_fail(int error)
 {
     const auto answer = SECCOMP_RET_ERRNO | static_cast<uint32_t>(error);
@@ -187,7 +188,7 @@ TEST_P(DiscFamily, SuccessLeavesTheLastErrorOfAnEarlierFailure)
     expect_error(KZ_DISC_ERROR_NOT_FOUND);
 }
 
-// A descriptor may be handed over on purpose.
+// A descriptor may be passed on deliberately.
 TEST_P(DiscFamily, OpensFilesThatStartedProgramsInherit)
 {
     const int32_t file = family().open("/");
@@ -267,7 +268,7 @@ TEST_P(DiscFamily, APlaceBeforeTheBeginningIsInvalid)
     EXPECT_EQ(0u, family().close(file));
 }
 
-// -1 is what a failed move returns: it must not be taken for an arrival at -1.
+// -1 is what a failed seek returns: it must not be taken for the position -1.
 TEST_P(DiscFamily, ReadingAtMinusOneReadsNothing)
 {
     const ScratchDirectory directory;
@@ -394,7 +395,7 @@ TEST(DiscErrors, EveryErrnoHasItsCode)
     }
 }
 
-// One word for the process: it tells of the last failure, whoever's it was.
+// One word for the process: it holds the last failure of any thread.
 TEST_P(DiscFamily, TheLastErrorMayBeAnotherThreads)
 {
     EXPECT_EQ(-1, family().seek(0, 0, 3));
@@ -436,7 +437,7 @@ TEST_P(DvdExists, TellsFilesOfEveryKind)
     expect_error(0);
 }
 
-// The system asks here by the real user, so that is the one to give up; for one thread only.
+// The system checks the real user here, so that is the one to give up; for one thread only.
 TEST_P(DvdExists, IsNotSeenInAClosedDirectory)
 {
     const ScratchDirectory directory;

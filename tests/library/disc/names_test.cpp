@@ -55,7 +55,7 @@ Builder playlist(uint32_t number)
             }};
 }
 
-/// The root does not come into it.
+/// The root is not part of it.
 Builder certificate(uint32_t number)
 {
     return {"certificate " + std::to_string(number),

@@ -234,7 +234,7 @@ TEST_P(DiscDevice, CutsALabelToTheCapacityAndDoesNotTell)
     EXPECT_EQ("HOLIDAY_2026", label(UINT32_MAX));
 }
 
-// The root is looked at for null only; whoever can place a link decides what is read.
+// The root is only checked for null; whoever can place a link decides what is read.
 TEST_P(DiscDevice, IsTheOnePathWhateverTheRootAndWhereverItLeads)
 {
     PrivateDevices::insert(scratch_.write("disc", disc_bytes(family().label_offset, "LINKED")));
@@ -251,7 +251,7 @@ TEST_P(DiscDevice, SuccessForgetsTheLastError)
     expect_error(0);
 }
 
-// It is nobody's: callers do not learn its number.
+// It has no owner: callers do not receive its number.
 TEST_P(DiscDevice, StaysOpenAfterEveryGoodLabelAndClosesOnExec)
 {
     PrivateDevices::insert(kImages + "dvd.iso");
@@ -328,7 +328,7 @@ TEST_P(DiscDevice, ThatCannotBeReadIsClosedAgain)
 {
     PrivateDevices::insert(scratch_.path()); // a directory
     expect_failure(KZ_DISC_ERROR_SYSTEM);
-    PrivateDevices::insert("/proc/self/mem"); // nothing is mapped so low
+    PrivateDevices::insert("/proc/self/mem"); // nothing is mapped at so low an address
     expect_failure(KZ_DISC_ERROR_SYSTEM);
 }
 

@@ -19,7 +19,7 @@ using Bytes = std::vector<uint8_t>;
 
 // ---- Companding -----------------------------------------------------------------------------
 
-/// The recommendation's way of putting it: decision values cut the range into intervals, each is
+/// As the recommendation defines it: decision values divide the range into intervals, each is
 /// expanded to its middle. `first` intervals of the narrowest width come before every group of 16,
 /// which doubles the width.
 std::vector<int32_t> interval_middles(int32_t start, size_t first)
@@ -169,7 +169,7 @@ bool keeps_its_sum(int32_t converter_channels, Encoding encoding)
 
 int32_t wrapped(int64_t value) { return std::bit_cast<int32_t>(static_cast<uint32_t>(value)); }
 
-/// Sum << bits for one channel, halved in weight as often as the number of channels asks.
+/// Sum << bits for one channel, halved in weight as often as the number of channels requires.
 int32_t averaged(int64_t sum, int32_t channels, int32_t bits)
 {
     for (int64_t divisor = 1; divisor < channels; divisor *= 2) {
@@ -236,8 +236,8 @@ Bytes random_audio(size_t bytes, uint64_t seed)
     return audio;
 }
 
-/// Converts from an address `offset` bytes beside an aligned one, and sees to it that no word but
-/// those of the output is written.
+/// Converts from an address `offset` bytes beside an aligned one, and checks that no word outside
+/// the output is written.
 template <class Word>
 std::vector<Word> convert(const Converter<Word>& converter, int32_t channels, const Bytes& audio,
                           size_t offset)

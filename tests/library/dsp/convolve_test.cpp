@@ -61,7 +61,7 @@ TEST(Convolve, AddsFloatProductsNewestSampleFirst)
     }
 }
 
-// 2^24 + 1 rounds back to 2^24: the order decides which ones survive.
+// 2^24 + 1 rounds back to 2^24: the order decides which of the ones count.
 TEST(Convolve, TheOrderOfAdditionsShows)
 {
     const Floats ones(4, 1.0F);

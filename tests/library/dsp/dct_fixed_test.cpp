@@ -119,7 +119,7 @@ TEST_F(DctFixed, NullsDoNothing)
     EXPECT_EQ(Words(16384, 3), data);
 }
 
-// The table goes with the transform only when it is there and the transform owns it.
+// The table is freed with the transform only when it exists and the transform owns it.
 TEST_F(DctFixed, DestroyFreesATableThatItOwns)
 {
     const int64_t before = live_blocks();
@@ -191,8 +191,8 @@ TEST(Butterfly, InputOrderIsEvenForwardsOddBackwards)
     }
 }
 
-// The shared frame of both transforms, run in long double, is a DCT-II: what the twins add to it is
-// only their arithmetic.
+// The structure that both transforms share, run in long double, is a DCT-II: the twins add only
+// their arithmetic.
 TEST(Butterfly, TheFrameOfTheTransformIsExactInRealNumbers)
 {
     constexpr size_t kLength = 64;
@@ -225,7 +225,8 @@ TEST(Butterfly, TheFrameOfTheTransformIsExactInRealNumbers)
                 input[n] * std::cos(std::numbers::pi_v<long double> *
                                     static_cast<long double>((2 * n + 1) * k) / (2.0L * kLength));
         }
-        // The frame delivers sums in which bin 0 is whole and the others are as defined.
+        // The shared structure yields sums in which bin 0 is unscaled and the others are as
+        // defined.
         EXPECT_NEAR(static_cast<double>(sum), static_cast<double>(x[k]), 1e-12) << k;
     }
 }

@@ -107,7 +107,7 @@ TEST_F(DctFloat, BadOrdersAndHugeTablesAreRefusedUntried)
     EXPECT_EQ(before, allocation_count());
 }
 
-// The largest tables are tried; whether they are had is the machine's business.
+// The largest tables are tried; whether they can be had depends on the machine.
 TEST_F(DctFloat, TheLargestOrderAsksForItsTable)
 {
     const uint64_t before = allocation_count();
@@ -143,7 +143,7 @@ TEST_F(DctFloat, AgreesWithTheDefinitionInEveryBin)
         const auto root = static_cast<double>(std::sqrt(energy(input)));
         for (size_t k = 0; k < x.size(); ++k) {
             // The butterflies with the largest factors, up to about L, feed the lowest bins; later
-            // additions mend the value and keep the rounding.
+            // additions restore the value and keep the rounding.
             const double bound = 1e-6 * root * std::sqrt(static_cast<double>(x.size()));
             ASSERT_NEAR(static_cast<double>(naive.bin(input, k)), x[k], bound)
                 << "bin " << k << " of order " << order;
@@ -261,7 +261,7 @@ TEST_F(DctFloat, NullsDoNothing)
     EXPECT_EQ(Floats(16, 3), data);
 }
 
-// The table goes with the transform only when it is there and the transform owns it.
+// The table is freed with the transform only when it exists and the transform owns it.
 TEST_F(DctFloat, DestroyFreesATableThatItOwns)
 {
     const int64_t before = live_blocks();

@@ -25,7 +25,7 @@ std::array<int32_t, 3> words(const LogSegment& row) { return {row.a, row.b, row.
 // ---- The table ------------------------------------------------------------------------------
 
 /// Coefficients of the parabola through the segment's 1024 points with the smallest sum of squares.
-/// Worked out around the mean of the points, where the normal equations fall apart into small ones.
+/// Solved around the mean of the points, where the normal equations separate into small ones.
 std::array<long double, 3> fit(uint32_t row)
 {
     constexpr int kPoints = 1024;

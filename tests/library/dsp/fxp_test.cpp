@@ -307,7 +307,7 @@ struct ModelPair {
     int32_t exponent;
 };
 
-/// One shift at a time, as the rule is told.
+/// One shift at a time, as the rule states it.
 ModelPair model_normalised(uint32_t m, int32_t e)
 {
     while (m != 0 && (m >> 31) == (m >> 30 & 1)) {

@@ -27,7 +27,7 @@ Fraction rationalize(double x, double tolerance)
     return f;
 }
 
-// As a resampler asks.
+// As a resampler calls it.
 Fraction ratio_of(double input_rate, double output_rate)
 {
     const double ratio = static_cast<float>(output_rate) / static_cast<float>(input_rate);
@@ -142,7 +142,7 @@ TEST(Rationalize, NullResultsAreNotWritten)
 }
 
 // A fraction with a denominator below 1000 differs from every other one by more than 10^-6: it must
-// come back as it went in, although x is not exactly it.
+// come back unchanged, although x is not exactly p/q.
 TEST(Rationalize, SmallFractionsComeBackInLowestTerms)
 {
     for (uint32_t q = 1; q < 300; ++q) {

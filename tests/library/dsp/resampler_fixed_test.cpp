@@ -120,7 +120,7 @@ TEST_F(ResamplerFixed, FractionsOfAHertzAreDropped)
     EXPECT_EQ(nullptr, KZDSP_resampler_fixed_create(32767, 32767)); // 0.99997 Hz counts as none
 }
 
-// Every output of a stream must be the one dot product that its place in the stream asks for,
+// Every output of a stream must be the one dot product that its position in the stream requires,
 // however the stream is cut and however little room the caller has: nothing lost, nothing twice.
 TEST_F(ResamplerFixed, CutsShowInTheLastBitsOnly)
 {
@@ -165,7 +165,7 @@ TEST_F(ResamplerFixed, AcrossCutsProductsAreExact)
     }
 }
 
-// Loud down-mixed stereo leaves 32 bits in the sum of cross products. The wrap is part of the
+// Loud down-mixed stereo exceeds 32 bits in the sum of cross products. The wrap is part of the
 // output.
 TEST_F(ResamplerFixed, LoudStereoWrapsTheCrossProducts)
 {

@@ -160,7 +160,7 @@ TEST_F(ResamplerFloat, RatesAMillionthApartArePassedThrough)
 
 namespace {
 
-// The stored filters' promises.
+// What the stored filters must satisfy.
 void expect_short_filter(std::span<const float> taps, size_t down, size_t zeros, double sum)
 {
     const size_t centre = 11 * down - 1;
@@ -238,7 +238,7 @@ constexpr float kManyRates[][2] = {
     {11025.5F, 11025},
 };
 
-// Counted anew from the words of the header: zeros so that the centre of the filter falls on a
+// Counted afresh from the header's description: zeros so that the centre of the filter falls on a
 // sample of the output, or as many as there are steps too many.
 uint64_t expected_leading(uint64_t up, uint64_t down)
 {
@@ -395,7 +395,7 @@ TEST_F(ResamplerFloat, CutsDoNotShowAtAll)
     }
 }
 
-// What is not a number reaches the outputs whose windows hold it and is gone after that.
+// NaN reaches the outputs whose windows contain it, and no others.
 TEST_F(ResamplerFloat, NansPassThroughWithTheirWindow)
 {
     for (const float rate : {48000.0F, 44100.0F, 8000.0F}) {

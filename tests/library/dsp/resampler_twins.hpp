@@ -88,8 +88,8 @@ size_t expected_outputs(const typename Twin::Record& r, size_t inputs)
 }
 
 /// Resamples a stream in blocks and capacities that `next_block` and `next_capacity` choose. Every
-/// block is handed over in arrays of its own, just as long as they are said to be, so that an
-/// access beyond them is seen.
+/// block is passed in arrays of its own of exactly the stated length, so that an access beyond them
+/// is detected.
 template <class Twin, class NextBlock, class NextCapacity>
 Stream<Twin> resample_in_pieces(typename Twin::Record& r, const Stream<Twin>& input,
                                 NextBlock next_block, NextCapacity next_capacity)
@@ -124,7 +124,7 @@ Stream<Twin> resample_in_pieces(typename Twin::Record& r, const Stream<Twin>& in
     return output;
 }
 
-/// Chooses a size without end, for whole blocks and boundless outputs.
+/// Chooses an unlimited size, for whole blocks and unbounded outputs.
 inline size_t unbounded() { return size_t{1} << 30; }
 
 template <class Twin>

@@ -1,4 +1,4 @@
-/// What a resampler promises whatever its numbers are: each test runs over both.
+/// What a resampler promises in either arithmetic: each test runs over both.
 
 #include "library/dsp/resampler_twins.hpp"
 

@@ -113,7 +113,7 @@ TEST(Tables, FilterTapsAreTheKnownWords)
     }
 }
 
-// The tables stand for what would else be computed when a resampler or a transform is made.
+// The tables replace what would otherwise be computed when a resampler or a transform is created.
 TEST(Tables, DesignedFiltersMatchTheDesignToTheBit)
 {
     for (const kernels::DesignedFilter& filter : kernels::designed_filters) {

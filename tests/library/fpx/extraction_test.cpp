@@ -25,7 +25,7 @@ int frees = 0;
 int feeds = 0;
 kz_status free_result = KZ_OK;
 
-// No code of the library: what a row returns has to come through unchanged.
+// Not a status of the library: what a row returns has to be passed on unchanged.
 constexpr kz_status kFeedStatus = 1234;
 constexpr kz_status kFreeStatus = 5678;
 
@@ -85,8 +85,8 @@ TEST_F(Extraction, AFailedCreateReportsWhyAndKeepsTheHandle)
     EXPECT_EQ(untouched, handle);
 }
 
-// The place is looked at last: what fails before it returns its status. Blocks are not counted
-// here: the test framework frees some of its own for each death.
+// The pointer is used last: earlier failures return their status. Blocks are not counted here: the
+// test framework frees some of its own for each death.
 TEST(ExtractionDeath, FollowsANullPlaceForTheHandleOnSuccessOnly)
 {
     ASSERT_EQ(KZ_OK, kzmem_initialize(0, 0));
@@ -174,7 +174,7 @@ TEST_F(Extraction, OnlyTheFloatingPointAlgorithmTakesOtherRates)
     }
 }
 
-// What is freed while the memory manager is off is not: nothing tells so, and the caller's pointer
+// While the memory manager is off nothing is freed: this is not reported, and the caller's pointer
 // is gone. It is freed here by a copy of that pointer.
 TEST_F(Extraction, FreeingWithMemoryOffSucceedsAndFreesNothing)
 {

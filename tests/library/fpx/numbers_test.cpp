@@ -1,5 +1,5 @@
-// The numbers of a fingerprint context: each is that of its object, and pieces of the size that it
-// reports do not show.
+// The numbers of a fingerprint context: each is that of its object, and cutting a stream into
+// pieces of the reported size does not show.
 
 #include <algorithm>
 #include <cstring>
@@ -95,8 +95,8 @@ void expect_same_words(const Object& a, const Object& b, uint32_t rate)
     EXPECT_EQ(ra == nullptr, rb == nullptr) << rate;
 }
 
-// Feeds what the interface asks for, block by block, up to the end of the music or of the
-// fingerprint.
+// Feeds what the interface reports as the next block, block by block, up to the end of the music or
+// of the fingerprint.
 template <class Twin>
 bool feed_blocks(Handle<Twin>& handle, const std::vector<int16_t>& music, size_t from,
                  size_t frames)

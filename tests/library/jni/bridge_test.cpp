@@ -1,5 +1,5 @@
-// What a VM does not do on demand: refuse an environment, lack a class or a member. A double of the
-// VM plays that; all else is tested on a real one, in tests/bindings/java.
+// What a VM does not do on demand: refuse an environment, lack a class or a member. A mock of the
+// VM does that; everything else is tested on a real one, in tests/bindings/java.
 
 #include "kzsdk/jni/bridge.hpp"
 
@@ -50,7 +50,7 @@ namespace {
 using namespace kz::test;
 using Calls = std::vector<std::string>;
 
-/// What the VM fails at, and what it was asked. "" for nothing.
+/// What the VM fails at, and what was requested of it. "" for nothing.
 struct Vm {
     std::string fails_at;
     Calls calls;
@@ -191,7 +191,7 @@ JNIInvokeInterface_ vm_table()
 const JNIInvokeInterface_ vm_functions = vm_table();
 JavaVM vm = {&vm_functions};
 
-/// A VM that knows no thread.
+/// A VM to which no thread is attached.
 JNIInvokeInterface_ detached_table()
 {
     JNIInvokeInterface_ table = vm_table();
@@ -276,7 +276,7 @@ TEST_F(Registration, FailsWhereTheClassIsGoneWhenItsMethodsAreTold)
     EXPECT_EQ(kClass, vm_state.calls.back());
 }
 
-// The thread that an event comes on, which no VM knows before.
+// The thread that an event comes on, which was not attached to the VM before.
 TEST(Environment, IsThatOfTheThreadWhenTheVmKnowsIt)
 {
     vm_state = {};
@@ -414,12 +414,12 @@ TEST(Request, WithoutMemoryIsRefusedAndTheWorkerStaysReady)
         const AllocationFault fault(1);
         EXPECT_EQ(-2, request());
     }
-    android::AndroidRuntime::setJavaVM(nullptr); // nobody to post the event to
+    android::AndroidRuntime::setJavaVM(nullptr); // nowhere to post the event to
     EXPECT_EQ(0, request());
     release();
 }
 
-// A worker goes on without its VM, and says so.
+// A worker goes on without its VM, and logs it.
 TEST(Environment, ThatIsMissingIsLoggedWithTheEvent)
 {
     script() = {};

@@ -56,7 +56,7 @@ protected:
         job_.setGenerateConfig(44100, 2, format_code, bits, audio_.data(), 8);
     }
 
-    /// Runs the job, which fails with this one line or, with null, without a word.
+    /// Runs the job, which fails with this one log line or, with null, without one.
     void expect_failure(const char* message)
     {
         const CapturedLog captured;
@@ -187,7 +187,7 @@ TEST_F(Job, NamesAnEmptyBufferInTheLog)
     EXPECT_EQ(KZ_OK, job_.fpx_generate_fingerprint(&serialized)) << "success without a text";
 }
 
-// The encoding is judged before the buffer.
+// The encoding is checked before the buffer.
 TEST_F(Job, RefusesAnEncodingBeforeItLooksAtTheBuffer)
 {
     job_.setGenerateConfig(44100, 2, 3, 16, nullptr, 0);

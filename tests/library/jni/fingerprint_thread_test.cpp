@@ -43,7 +43,7 @@ std::string text_of(const FingerprintThread& worker)
     return {worker.getFingerprint(), strnlen(worker.getFingerprint(), 600)};
 }
 
-/// A job that stands in the middle until it may end.
+/// A job that stops in the middle until it may end.
 class HeldJob {
 public:
     explicit HeldJob(FingerprintThread& worker)
@@ -179,7 +179,7 @@ TEST_F(Worker, RunsWithoutAnEventCallback)
     }
 }
 
-// Between its unlock and its next wait nobody listens to the worker's condition. A request that is
+// Between its unlock and its next wait the worker does not wait on its condition. A request that is
 // signalled there must be found all the same; many a request is made there by this test.
 TEST_F(Worker, LosesNoRequestMadeTheMomentTheEventHasCome)
 {
@@ -190,7 +190,7 @@ TEST_F(Worker, LosesNoRequestMadeTheMomentTheEventHasCome)
     }
 }
 
-// Right after set-up the worker may not wait yet either.
+// Right after set-up the worker may not be waiting yet either.
 TEST_F(Worker, LosesNoRequestMadeTheMomentItIsReady)
 {
     for (size_t made = 1; made <= 200; ++made) {
@@ -326,7 +326,7 @@ TEST_F(Worker, ThatNeverRanIsReleasedNever)
     expect_release_blocks_until_acknowledged(*new (place.data()) FingerprintThread(cookie(0)));
 }
 
-// Which holds off a second free of the buffer.
+// This prevents a second free of the buffer.
 TEST_F(Worker, WaitsForEverInASecondRelease)
 {
     alignas(FingerprintThread) static std::array<std::byte, sizeof(FingerprintThread)> place;

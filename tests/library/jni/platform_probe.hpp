@@ -1,5 +1,5 @@
 /// @file
-/// Sees what goes through the platform adapter that the test is linked with, and makes it fail.
+/// Observes the platform adapter that the test is linked with, and makes it fail.
 #pragma once
 
 #include <cstdint>
@@ -44,14 +44,14 @@ public:
     NoThreads& operator=(const NoThreads&) = delete;
 };
 
-/// What a platform shows of a thread: its own name, cut to what the system holds, and its nice
-/// value; or what it was asked for, where the platform does not care.
+/// What a platform shows of a thread: its name, cut to what the system stores, and its nice value;
+/// or what was requested, where the platform ignores it.
 struct ThreadLooks {
     std::string name;
     int priority;
 };
 
-/// Called on the thread that is asked about.
+/// Called on the thread in question.
 ThreadLooks looks_of_this_thread();
 
 } // namespace kz::test

@@ -1,4 +1,4 @@
-// What the front asks of the system, over the adapter that this program is linked with.
+// What the front needs from the system, through the adapter that this program is linked with.
 
 #include <condition_variable>
 #include <mutex>

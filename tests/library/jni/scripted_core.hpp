@@ -1,6 +1,6 @@
 /// @file
-/// Stands in for start-up and the extraction interface: returns what a test has written down, and
-/// notes what it was asked.
+/// Stands in for start-up and the extraction interface: returns what a test has set, and records
+/// how it was called.
 #pragma once
 
 #include <cstdint>

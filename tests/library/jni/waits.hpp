@@ -1,6 +1,6 @@
 /// @file
-/// Gets between a condition variable and those who wait for it: the library's waits and signals
-/// only, not those of the C++ run-time library.
+/// Intercepts condition variables: the library's waits and signals only, not those of the C++
+/// run-time library.
 #pragma once
 
 #include <cstdint>
@@ -10,7 +10,7 @@ namespace kz::test {
 /// Waits that have begun so far. One that has begun holds the mutex until it sleeps.
 uint64_t waits_begun();
 
-/// Comes back when so many waits have begun.
+/// Returns when so many waits have begun.
 void until_waits_have_begun(uint64_t count);
 
 /// Whether signals are lost.
@@ -25,7 +25,7 @@ public:
     LostSignals& operator=(const LostSignals&) = delete;
 };
 
-/// Wakes whoever waits at the condition that was waited for last.
+/// Wakes all that wait on the condition that was waited on last.
 void wake_without_reason();
 
 } // namespace kz::test

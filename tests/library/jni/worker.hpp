@@ -44,7 +44,7 @@ public:
         return seen_.size();
     }
 
-    /// Comes back when so many have been posted; gives the last of them.
+    /// Returns the last of them once so many have been posted.
     int32_t wait_for(size_t count)
     {
         std::unique_lock lock(mutex_);

@@ -1,4 +1,4 @@
-// A variant is compiled for processors that not everybody has. A function that the linker could
+// A variant is compiled for processors that not every user has. A function that the linker could
 // take from it for use elsewhere, such as an inline function of a header, would end a program on
 // the others: so a variant's object file defines its table and nothing else.
 
@@ -24,8 +24,8 @@ std::vector<std::string> lines_of(const std::string& command)
 
 class VariantObject : public testing::TestWithParam<const char*> {};
 
-// 32-bit x86 code asks such a function, which every compiled file may bring, where it lies: a load
-// and a return, the same for all processors.
+// 32-bit x86 code finds its own address through such a function, which every compiled file may
+// contain: a load and a return, the same for all processors.
 bool tells_where_it_lies(const std::string& symbol)
 {
     return symbol.find(" __x86.get_pc_thunk.") != std::string::npos;

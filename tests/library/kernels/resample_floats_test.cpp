@@ -91,7 +91,7 @@ size_t samples_for(const FloatPhases& phases, uint32_t phase, uint32_t outputs)
     return static_cast<size_t>(first) + phases.taps_per_phase;
 }
 
-// A level that keeps all that single precision rounds away in view.
+// A level at which everything that single precision rounds away shows.
 Samples noise_of(size_t count, uint64_t seed)
 {
     Random random(seed);
@@ -137,8 +137,8 @@ std::vector<Samples> signals(size_t count)
             sprinkled(noise, {kNaN, -kInfinity, kInfinity, -0.0F, kSmallest}, 331)};
 }
 
-// The outputs as bits, and one word beyond them that must stay. A NaN is a NaN: which of two
-// operands leaves its sign and payload is the processor's choice.
+// The outputs as bits, and one word beyond them that must stay untouched. A NaN is a NaN: which of
+// two operands leaves its sign and payload is the processor's choice.
 std::vector<uint32_t> outputs_of(decltype(Variant::polyphase_floats) kernel,
                                  const FloatPhases& phases, const Samples& samples, uint32_t phase,
                                  uint32_t count)

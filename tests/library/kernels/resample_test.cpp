@@ -1,4 +1,4 @@
-// Every variant of the fixed-point filters against the plain one, to the word.
+// Every variant of the fixed-point filters against the plain one, to the bit.
 
 #include <algorithm>
 #include <cstdint>
@@ -92,7 +92,7 @@ size_t samples_for(const Rate& rate, uint32_t outputs)
     return static_cast<size_t>(uint64_t{outputs} * rate.down / rate.rows.up + rate.taps + 1);
 }
 
-// The outputs, and one word beyond them that must stay.
+// The outputs, and one word beyond them that must stay untouched.
 Words outputs_of(decltype(Variant::polyphase) kernel, const Rate& rate, const Words& samples,
                  uint32_t phase, uint32_t count)
 {

@@ -98,8 +98,8 @@ struct State {
     auto sums() const { return std::pair(means.level_sum, means.deviation_sum); }
 };
 
-// What a variant takes and leaves must be what the plain loop makes of as many samples; it may stop
-// before the plain loop does, but by less than a vector.
+// After as many samples, a variant's state must equal the plain loop's; it may stop before the
+// plain loop does, but by less than a vector.
 void expect_alike(const Variant& variant, const Variant& plain, const State& start,
                   const std::vector<int32_t>& samples)
 {

@@ -1,5 +1,5 @@
 /// The rules of the histogram equalisers, for both twins. Samples are given as 16-bit values; ranks
-/// come back as fractions of the frame's samples.
+/// are returned as fractions of the frame's samples.
 
 #include <algorithm>
 #include <numeric>

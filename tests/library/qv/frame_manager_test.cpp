@@ -1,4 +1,4 @@
-/// The rules by which a frame manager takes frames and gives out the fingerprint, for both twins.
+/// The rules by which a frame manager accepts frames and returns the fingerprint, for both twins.
 
 #include <algorithm>
 #include <array>
@@ -182,7 +182,7 @@ TYPED_TEST(FrameManager, LongPiecesAreCutToTheFrame)
     }
 }
 
-// What no piece provides is silence in the first frame, never what the heap held.
+// What no piece provides is silence in the first frame, never old content of the heap.
 TYPED_TEST(FrameManager, UnequalisedANullSecondCopiesOnlyTheFirst)
 {
     const auto change = [](auto& config) {

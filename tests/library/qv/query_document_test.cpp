@@ -100,7 +100,7 @@ TEST_F(QueryDocument, ARefusalPassesThroughUnchanged)
 }
 
 // A failure while name or version are set is forgotten when the query succeeds: then a document
-// without one of them is handed out as good. Every other failure is reported.
+// without one of them is returned as a success. Every other failure is reported.
 TEST_F(QueryDocument, EveryFailedAllocationIsReportedButTwo)
 {
     const Fingerprint fingerprint{{1, 2, 3}};

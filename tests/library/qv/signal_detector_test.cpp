@@ -40,7 +40,8 @@ Levels square_wave(size_t from, size_t count)
     return block;
 }
 
-// A moving mean and a moving mean of the clamped deviation, with the sums taken anew each time.
+// A moving mean and a moving mean of the clamped deviation, with the sums computed afresh each
+// time.
 class Model {
 public:
     Model(uint32_t window, uint32_t threshold, int32_t max_deviation)

@@ -69,8 +69,8 @@ TEST_F(FixedFingerprinter, CutsLoseNoSampleAtAnyRate)
     }
 }
 
-// The detector judges what the conversion and the resampler leave: the same tone is signal at one
-// channel count or rate and silence at another.
+// The detector judges what conversion and resampling leave: the same tone is signal at one channel
+// count or rate and silence at another.
 TEST_F(FixedFingerprinter, TheStartOfTheSignalDependsOnChannelsAndRate)
 {
     const auto hears = [](uint32_t rate, uint32_t channels, int16_t level) {
@@ -89,7 +89,7 @@ TEST_F(FixedFingerprinter, TheStartOfTheSignalDependsOnChannelsAndRate)
     EXPECT_FALSE(hears(44100, 1, 80));
 }
 
-// Times are for callers inside the library; the document does not hold them.
+// Times are for callers; the document does not contain them.
 TEST_F(FixedFingerprinter, TimesWrapAt32Bits)
 {
     const auto object = make_fingerprinter<Fixed>(11025, kPcm16, 1);

@@ -10,7 +10,7 @@ namespace kz::test {
 
 namespace {
 
-// floor(sqrt(value * 2^30)), by correction of an estimate.
+// floor(sqrt(value * 2^30)), by correcting an estimate.
 uint64_t exact_root(uint64_t value)
 {
     const uint64_t target = value << 30;

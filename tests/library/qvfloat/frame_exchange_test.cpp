@@ -27,7 +27,7 @@ void put_word(Bytes& bytes, uint32_t word)
 
 void put_float(Bytes& bytes, float value) { put_word(bytes, std::bit_cast<uint32_t>(value)); }
 
-// Frame data in which every number tells its place.
+// Frame data in which every number encodes its position.
 float energy_of(uint32_t band, uint32_t frame)
 {
     return static_cast<float>(1000 * frame + band) + 0.25F;
@@ -333,7 +333,7 @@ TEST_F(FrameExchange, ASizeBeyondThirtyTwoBitsIsNone)
     EXPECT_EQ(7, byte);
 }
 
-// Numbers are carried as they are: each pattern of 32 bits comes back.
+// Numbers are passed through unchanged: each pattern of 32 bits comes back.
 TEST_F(FrameExchange, AnyBitsComeBackUnchanged)
 {
     Random random(1);
@@ -391,7 +391,7 @@ TEST_F(FrameExchange, FramesThatAreDroppedAreNotAllocated)
     EXPECT_EQ((Numbers{99}), numbers(manager));
 }
 
-// Blocks that were changed anywhere are refused or taken, never read beyond their end: each is
+// Blocks that were changed anywhere are refused or accepted, never read beyond their end: each is
 // copied into a block of the heap of exactly its size, which the address sanitizer watches.
 TEST_F(FrameExchange, MutatedBlocksAreReadWithinTheirBounds)
 {

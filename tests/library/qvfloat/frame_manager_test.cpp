@@ -178,7 +178,7 @@ TEST_F(FloatFrameManager, ANullFirstPieceIsAFrameOfTheSecond)
     EXPECT_TRUE(std::equal(record->energy, record->energy + 15, record->next->energy));
 }
 
-// A frame's buffer holds its transform: that is what short pieces leave behind their end.
+// A frame's buffer holds its transform: that is what remains after the end of short pieces.
 // Skipping comes before the pieces are looked at: no samples at all still use up a frame to skip.
 TEST_F(FloatFrameManager, TwoNullPiecesUseUpAFrameToSkip)
 {
@@ -250,7 +250,7 @@ TEST_F(FloatFrameManager, BandsBeyondTheSpectrumAreCutToIt)
     const auto plain = features({0, 5512.4F, 0, 100, 3000, 5512.4F});
     EXPECT_EQ(plain, features({-5, 5513, -kInfinity, 100, 3000, kInfinity}));
     EXPECT_EQ(plain, features({kNaN, 1e30F, -0.0F, 100, 3000, 1e9F}));
-    // Nothing is left of a band that ends before it starts or starts behind the spectrum.
+    // Nothing is left of a band that ends before it starts, or starts beyond the spectrum.
     EXPECT_EQ(std::vector<float>(6, 0.0F), features({100, 50, 6000, 7000, 200, kNaN}));
 }
 

@@ -34,7 +34,7 @@ TEST_F(FloatSignalDetector, SamplesAreTruncatedTowardsZero)
     EXPECT_EQ((Levels{0, 0, 1, -1, 32767, -32768}), levels(*detector));
 }
 
-// Whether a recording is silent is judged at its own level: less than one step of 16 bits is
+// Whether a recording is silent is judged at its own level: less than one step of 16 bits counts as
 // nothing.
 TEST_F(FloatSignalDetector, FractionsOfAStepAreSilence)
 {

@@ -225,7 +225,7 @@ TEST_F(Comparison, ChangesNothing)
     EXPECT_EQ(before_b, model_of(b));
 }
 
-// What could not be looked at to its end is not called equal.
+// What could not be compared to its end is not called equal.
 TEST_F(Comparison, OfTreesTooDeepForTheMemoryIsDifferent)
 {
     const auto chain = [](int levels) {

@@ -1,4 +1,4 @@
-// Trees as deep as an attacker likes, walked on a stack that would hold a thousand calls or so.
+// Trees as deep as an attacker likes, walked on a stack that holds about a thousand calls.
 
 #include "kzsdk/xml/xml.h"
 
@@ -69,7 +69,7 @@ Tree deep_tree(uint32_t depth, bool sides)
     return root;
 }
 
-/// Walks down beside each other: comparing models would recurse.
+/// Walks down both in parallel: comparing models would recurse.
 void expect_same_shape(const XMLTag* a, const XMLTag* b)
 {
     while (a != nullptr && b != nullptr) {
@@ -221,7 +221,7 @@ TEST_F(DeepTree, ALongListIsClonedInOnePass)
 
 TEST_F(DeepTree, ShortMemoryOnTheWayDownLeavesNothing)
 {
-    const Tree root = deep_tree(70, true); // the way back up outgrows its place and doubles once
+    const Tree root = deep_tree(70, true); // the way back up outgrows its array, once
     for_every_failed_allocation([&](auto fired) {
         const Tree clone(CloneXMLTag(root.get(), 1));
         EXPECT_EQ(fired(), clone == nullptr);

@@ -15,7 +15,7 @@ namespace {
 using Text = std::optional<std::string>;
 
 /// What the installed maps do, for the library's pointers and for the model alike. They cannot be
-/// taken out again: a test that changes nothing here has maps that change nothing.
+/// removed again: a test that sets nothing here has maps that change nothing.
 struct Maps {
     std::function<const char*(const char*)> tag_name = [](const char* name) { return name; };
     std::function<const char*(const char*, const char*)> attribute_name =
@@ -37,7 +37,7 @@ const char* map_attribute_value(const char* tag, const char* name, const char* v
     return maps.attribute_value(tag, name, value);
 }
 
-/// The first tests here see the library's own maps.
+/// The first tests here use the library's own maps.
 class DefaultMaps : public MemoryOn {};
 
 class Mutation : public MemoryOn {
@@ -336,7 +336,7 @@ Text text_or_none(const char* text) { return optional_text(text); }
 
 const char* pointer(const Text& text) { return text ? text->c_str() : nullptr; }
 
-/// The rules once more, on the model: recursive, and asking the same maps.
+/// The rules once more, on the model: recursive, and calling the same maps.
 std::optional<ModelTag> mutated_model(const ModelTag& source)
 {
     const Text name = text_or_none(maps.tag_name(pointer(source.name)));
@@ -364,7 +364,7 @@ std::optional<ModelTag> mutated_model(const ModelTag& source)
     return copy;
 }
 
-/// Draws an answer for each question and gives the same to the same question ever after.
+/// Draws an answer for each argument and returns the same one for it from then on.
 class RandomAnswers {
 public:
     explicit RandomAnswers(Random& random) : random_(random) {}

@@ -190,7 +190,7 @@ TEST_F(Paths, NoTagOrNoPathGivesNoData)
 
 // ---- XMLSetValueAtPath
 
-/// What a resolver was asked, and what it is to answer.
+/// What a resolver was called with, and what it is to return.
 struct Resolver {
     struct Asked {
         const XMLTag* tag;

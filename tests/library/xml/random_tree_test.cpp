@@ -86,7 +86,7 @@ void set_by_path(Random& random, Twin at)
     grandchild->set_data(data);
 }
 
-/// Grafts a clone of one place below another, while the tree is small.
+/// Adds a clone of one tag below another, while the tree is small.
 void graft_clone(Random& random, Twin root, Twin at)
 {
     const Twin from = random_place(random, root);

@@ -203,7 +203,7 @@ TEST_F(Render, AMissingValueIsAFailureLikeAMissingName)
     tag->attributes->value = value;
 }
 
-// ---- Against a renderer of its own, on an output that runs full when it is told to
+// ---- Against an independent renderer, on an output that runs full on request
 
 /// The text buffer's rule of growth, with the n-th allocation failing (1 and 2 make the buffer).
 class Output {
@@ -361,7 +361,7 @@ TEST_F(Render, NamelessTagsAgainstAnIndependentRenderer)
 }
 
 // With indentation on, most of these come back as a malformed text and not as null: the caller has
-// to look. Which text, is exact.
+// to check. The text is exactly predicted.
 TEST_F(Render, FailedAllocationsGiveExactlyTheStatedText)
 {
     Random random(12);
@@ -397,8 +397,8 @@ TEST_F(Render, FailedAllocationsGiveExactlyTheStatedText)
     EXPECT_GT(malformed, 0);
 }
 
-// The way back up lies in place for 32 levels and in memory beyond. Losing it is a failure of its
-// own, which no indentation forgets.
+// The way back up is stored in a fixed array for 32 levels and in allocated memory beyond. Losing
+// it is a failure of its own, which no indentation forgets.
 TEST_F(Render, ATreeTooDeepForTheMemoryGivesNull)
 {
     const Tree root = make_tag("R");

@@ -293,8 +293,8 @@ TEST_F(TagTree, AddingNothingDoesNothing)
 }
 
 #ifndef NDEBUG
-// In a release build these make endless walks and double frees: the caller's to avoid. Blocks are
-// not counted here: the test framework frees some of its own for each death.
+// In a release build these cause endless walks and double frees, which callers must avoid. Blocks
+// are not counted here: the test framework frees some of its own for each death.
 TEST(MisplacedTag, StopsADebugBuild)
 {
     ASSERT_EQ(KZ_OK, kzmem_initialize(0, 0));

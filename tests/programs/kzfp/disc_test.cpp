@@ -1,4 +1,4 @@
-// `kzfp disc` as a user meets it, on the content of real images and on the images themselves.
+// `kzfp disc` as a user sees it, on the content of real images and on the images themselves.
 
 #include "kzfp.hpp"
 

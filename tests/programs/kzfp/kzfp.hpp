@@ -29,7 +29,7 @@ std::vector<int> numbers_in(const std::string& text);
 /// All bytes of a file.
 std::string contents(const std::string& path);
 
-/// Standard input that gives `text` once.
+/// Standard input that provides `text` once.
 ProcessSetup fed_with(const std::string& text);
 
 /// The header of a 16-bit WAV file; the samples follow it.

@@ -1,4 +1,4 @@
-// The program as a user meets it: what it prints, what it refuses and how it says so.
+// The program as a user sees it: what it prints, what it refuses and how it reports that.
 
 #include "kzfp.hpp"
 
@@ -177,7 +177,7 @@ TEST(KzfpInput, ManyChannelsAreMixedDownToOne)
     }
 }
 
-// At full scale, where a sum that is not divided enough wraps round.
+// At full scale, where a sum that is not divided enough wraps.
 TEST(KzfpInput, ManyChannelsAreDividedByTheNextPowerOfTwo)
 {
     const std::vector<int16_t> music = tune(44100, 1, 15, 1.0);

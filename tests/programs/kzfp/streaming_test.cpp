@@ -223,7 +223,7 @@ TEST(KzfpStreaming, WavPipesOfUnknownLengthAreRead)
     }
 }
 
-// Far behind what is waited for when the beginning of a pipe is no sound file.
+// Far beyond what is waited for when the beginning of a pipe is not a sound file.
 TEST(KzfpStreaming, StartFarIntoAPipeIsReached)
 {
     const std::string piece = bytes_of(tune(44100, 2, 20));

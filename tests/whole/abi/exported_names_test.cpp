@@ -1,6 +1,6 @@
-// The built library, its map and its headers must tell of the same names. A name that is only in
-// the library was exported by accident and would have to be kept; one that is only in a header does
-// not link for users.
+// The built library, its map and its headers must have the same names. A name that is only in the
+// library was exported by accident and would have to be kept; one that is only in a header does not
+// link for users.
 
 #include <algorithm>
 #include <fstream>
@@ -112,8 +112,8 @@ TEST(ExportedNames, AreAllFunctions)
     }
 }
 
-// A program that was linked with this library asks for the version, so a later one may change what a name
-// does under a new version and still serve it.
+// A program that was linked with this library requests this version, so that a later library may
+// change what a name does under a new version and still serve the program.
 TEST(ExportedNames, BearTheVersionOfTheInterface)
 {
     Names versions;
@@ -123,14 +123,14 @@ TEST(ExportedNames, BearTheVersionOfTheInterface)
     EXPECT_EQ(Names{"KZSDK_1.0"}, versions);
 }
 
-// Else any program or library that happens to export the same name, as sq_root may be one, would be
-// called in its place.
+// Otherwise any program or library that happens to export the same name, for example sq_root, would
+// be called instead.
 TEST(ExportedNames, AreNotLookedUpFromWithin)
 {
     EXPECT_EQ(Names{}, SharedLibrary(KZ_LIBRARY).own_names_looked_up());
 }
 
-// A map that lists a name twice hides a slip of the one who edited it.
+// A name that is listed twice is an editing mistake.
 TEST(ExportedNames, StandInTheMapOnce)
 {
     const auto map = std::regex_replace(text_of(KZ_MAP), std::regex("#[^\n]*"), "");

@@ -1,4 +1,4 @@
-// What is built carries the protections that the build asks for: a compiler that drops a flag, or a
+// What is built carries the protections that the build requests: a compiler that drops a flag, or a
 // file that is compiled without it, must not go unnoticed.
 
 #include <cstdio>

@@ -58,7 +58,7 @@ protected:
     void TearDown() override { EXPECT_EQ(KZ_OK, kzmem_shutdown()); }
 };
 
-// Else the next test would prove nothing.
+// Otherwise the next test would prove nothing.
 TEST_F(Namesakes, AreWhatTheLoaderFindsFirst)
 {
     EXPECT_EQ(reinterpret_cast<void*>(&sq_root), dlsym(RTLD_DEFAULT, "sq_root"));

@@ -34,7 +34,7 @@ struct Export {
     std::string version;
 };
 
-/// The little of an ELF file that is asked for here.
+/// The parts of an ELF file that are needed here.
 class SharedLibrary {
 public:
     explicit SharedLibrary(const std::string& path) : bytes_(text_of(path))

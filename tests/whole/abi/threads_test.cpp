@@ -72,7 +72,7 @@ TEST_F(Threads, HaveTheirOwnHandlesAndTheDocumentsOfOneThread)
     }
 }
 
-// Whoever switches memory off under another thread makes its allocations fail, but breaks nothing.
+// Switching memory off under another thread makes its allocations fail, but breaks nothing.
 TEST_F(Threads, MaySeeTheMemoryManagerSwitchedOffAndOn)
 {
     run_beside_each_other(4, [](size_t i) {
@@ -103,7 +103,7 @@ TEST_F(Threads, MayMakeTheFirstCallsOfTheProcessTogether)
     }
 }
 
-/// A whole fingerprint and a tree, whose calls may fail at any place and must come back.
+/// A whole fingerprint and a tree, whose calls may fail anywhere and must return.
 void use_what_may_be_switched_off(const std::vector<int16_t>& music)
 {
     document_of(music, 11025);
@@ -185,7 +185,7 @@ TEST_F(Threads, MayInstallMapsWhileOthersCloneByThem)
     });
 }
 
-/// What a family's calls may answer when it may be off and others' failures are its last error.
+/// What a family's calls may return when it may be off and its last error may be another thread's.
 void expect_one_of(kz_status status, std::initializer_list<kz_status> possible)
 {
     EXPECT_NE(possible.end(), std::find(possible.begin(), possible.end(), status)) << status;

@@ -1,4 +1,4 @@
-// What this tree has agreed to keep that no compiler looks at. Each rule is a function that returns what
+// Conventions of this tree that no compiler checks. Each rule is a function that returns what
 // breaks it, so that a test can try it on a made-up file as well as on the real ones.
 #pragma once
 

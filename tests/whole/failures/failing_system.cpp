@@ -6,9 +6,9 @@
 //   KZ_FAIL_REPORT=path                    a file that takes a byte when the failure strikes
 //
 // Allocations by libsndfile's own code succeed: it writes through null when a header's buffer
-// cannot grow, which is nothing that the program could help.
+// cannot grow, which the program cannot prevent.
 //
-// It serves from before the program's first line on, so nothing here needs to be initialised.
+// It is called before the program's first line, so nothing here may need initialising.
 
 // Checked forms of the functions that are replaced here would be defined twice.
 #undef _FORTIFY_SOURCE

@@ -107,8 +107,8 @@ void expect_one_complaint(const ProcessResult& result)
     EXPECT_LE(lines_in(result.err), 2) << result.err; // a library under it may add its own
 }
 
-// Short of memory the library may leave out a frame or its equalisation, or of the document what
-// the renderer masks, and not tell: docs/deliberate_behaviour.md.
+// Short of memory the library may leave out a frame or its equalisation, or parts of the document
+// whose failure the renderer masks, and not report it: docs/deliberate_behaviour.md.
 void expect_result_or_complaint(const ProcessResult& whole, const ProcessResult& result)
 {
     if (result.status == 0) {

@@ -3,7 +3,7 @@
 // there are any.
 //
 // The sound is made with integers only and the digests are of text, so a difference comes from the
-// library. Two kinds of lines stand for what rests on the C library's sine and cosine: the factors
+// library. Two kinds of lines cover what depends on the C library's sine and cosine: the factors
 // of the floating-point transform and the taps of designed filters.
 
 #include <algorithm>

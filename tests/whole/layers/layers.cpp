@@ -76,7 +76,7 @@ bool is_of_a_library(const std::string& file)
     return is_below(file, "kzsdk") || is_below(file, "catalogue");
 }
 
-/// Complains of each include for which the rule says no. The rule is given the include and its target.
+/// Reports each include that the rule forbids. The rule is given the include and its target.
 template <class Rule>
 Complaints complaints_of(const Tree& tree, Rule allowed)
 {

@@ -67,8 +67,8 @@ Complaints includes_not_from_the_root(const Tree& tree);
 Complaints private_headers_in_public_ones(const Tree& tree);
 /// A .h is public, and the build installs it; nothing else is.
 Complaints public_headers_not_declared(const Plan& plan, const Tree& tree);
-/// The library stands on the C library and on headers that leave no C++ run-time library behind; a few
-/// rooms ask the system or the processor.
+/// The library uses the C library and headers that bring in no C++ run-time library; a few rooms
+/// query the system or the processor.
 Complaints foreign_headers(const Tree& tree);
 
 } // namespace layers

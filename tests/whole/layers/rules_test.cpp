@@ -1,4 +1,4 @@
-// Each rule of layers.hpp complains of the tree that breaks it, and of nothing else: shown on a made-up
+// Each rule of layers.hpp reports the tree that breaks it, and nothing else: shown on a made-up
 // tree with two libraries, a tool, a benchmark and a test.
 
 #include <sstream>

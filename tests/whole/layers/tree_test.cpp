@@ -1,5 +1,5 @@
-// This tree keeps the rules of layers.hpp. A request falls through the library from top to bottom and never
-// climbs back; what is built on the library sees its public headers alone.
+// This tree keeps the rules of layers.hpp. A request falls through the library from top to bottom
+// and never climbs back; what is built on the library sees only its public headers.
 
 #include <algorithm>
 #include <fstream>
@@ -69,7 +69,7 @@ TEST_F(Layers, DeclareEveryPublicHeader)
 
 TEST_F(Layers, StandOnTheCLibraryAlone) { EXPECT_EQ(Complaints{}, layers::foreign_headers(tree_)); }
 
-// What the loops and the fingerprinters share is nobody else's business.
+// What the loops and the fingerprinters share is private to them.
 TEST_F(Layers, ExportNothingFromSharedPlumbing)
 {
     for (const auto* room : {"kzsdk/kernels", "kzsdk/qv"}) {

@@ -60,8 +60,8 @@ void bit_reverse(std::span<T> x)
     }
 }
 
-/// The frame of both transforms. `stage(number)` runs the butterflies of a stage, `add(a, b)` adds
-/// two values.
+/// The structure of both transforms. `stage(number)` runs the butterflies of a stage, `add(a, b)`
+/// adds two values.
 template <class T, class Stage, class Add>
 void cosine_steps(std::span<T> x, Stage stage, Add add)
 {

@@ -1,5 +1,5 @@
 /// @file
-/// The low-pass filters of the resampler, designed afresh.
+/// The low-pass filters of the resampler, designed independently.
 #pragma once
 
 #include <algorithm>
@@ -105,7 +105,8 @@ inline std::vector<float> design(const Ratio& ratio)
     return windowed_sinc(ratio);
 }
 
-/// The gain that the stored taps carry beside their design: a centre tap above 1 would not fit Q31.
+/// The gain that the stored taps have on top of their design: a centre tap above 1 would not fit
+/// Q31.
 constexpr double storage_gain(const Ratio& ratio) { return ratio.up > ratio.down ? 0.5 : 1.0; }
 
 /// The design in Q31, rounded to nearest.

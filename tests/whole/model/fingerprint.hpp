@@ -1,6 +1,6 @@
 /// @file
-/// The whole road of a stream, in the same steps and to the same words as the library: conversion,
-/// resampling, search for signal, frames, features, values.
+/// The whole path of a stream, in the same steps as the library and bit-identical to it:
+/// conversion, resampling, search for signal, frames, features, values.
 #pragma once
 
 #include <cstdint>
@@ -17,7 +17,7 @@
 
 namespace kz::model {
 
-/// The taps in Q31 that a model is to use: for the ratio itself and for the 2:1 decimator.
+/// The taps in Q31 that a model uses: for the ratio itself and for the 2:1 decimator.
 struct Filters {
     std::vector<int32_t> resampler;
     std::vector<int32_t> decimator;

@@ -160,7 +160,7 @@ Features features_of(std::span<const double> spectrum, Weight weight)
     return result;
 }
 
-/// Without the decimator, whose loss the ramp makes up for. Only ratios of features count in the
+/// Without the decimator, whose loss the ramp compensates. Only ratios of features count in the
 /// end, so the scale of the integer path serves.
 Features analyse_whole(std::span<const double> frame)
 {

@@ -1,5 +1,5 @@
 /// @file
-/// The handful of 32-bit rules that the model needs, told in 64-bit arithmetic.
+/// The few 32-bit rules that the model needs, expressed in 64-bit arithmetic.
 ///
 /// The model computes in int64_t, where nothing overflows, and says with word() where the result is
 /// kept in 32 bits.

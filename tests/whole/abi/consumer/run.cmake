@@ -19,7 +19,7 @@ endfunction()
 
 file(REMOVE_RECURSE "${WORK_DIR}")
 run("${CMAKE_COMMAND}" --install "${BUILD_DIR}" --prefix "${WORK_DIR}/here")
-# An installed tree may be moved: no path of the first place may be needed any more.
+# An installed tree may be moved: no path of its first location may still be needed.
 file(RENAME "${WORK_DIR}/here" "${WORK_DIR}/moved")
 set(prefix "${WORK_DIR}/moved")
 

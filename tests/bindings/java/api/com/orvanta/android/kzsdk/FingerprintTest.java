@@ -25,7 +25,7 @@ public class FingerprintTest {
     private static final AudioDescription MONO = AudioDescription.pcm16(11025, 1);
     private static final byte[] MUSIC = Audio.music(15);
 
-    /** Queues what it is told, and by whom. */
+    /** Queues what it receives, and from whom. */
     private static class Told implements Fingerprint.Listener {
         final BlockingQueue<Object> queue = new LinkedBlockingQueue<>();
         volatile Thread thread;
@@ -203,7 +203,7 @@ public class FingerprintTest {
                 assertEquals("This object is closed", closed.getMessage());
                 return;
             } catch (ExecutionException closedMeanwhile) {
-                // the next one tells
+                // the next one shows
             }
             Thread.sleep(10);
         }

@@ -4,7 +4,7 @@ import java.util.concurrent.BlockingQueue;
 import java.util.concurrent.LinkedBlockingQueue;
 import java.util.concurrent.TimeUnit;
 
-/** No more than the native side asks for: five methods, a field and a callback. */
+/** No more than the native side needs: five methods, a field and a callback. */
 class Fingerprint {
     static {
         System.load(System.getProperty("kzsdk.library"));

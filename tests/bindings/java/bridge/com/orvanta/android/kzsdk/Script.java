@@ -1,6 +1,6 @@
 package com.orvanta.android.kzsdk;
 
-/** Directs what lies below the bridge, and tells what it saw. */
+/** Directs what lies below the bridge, and reports what it recorded. */
 final class Script {
     private Script() {}
 
@@ -22,10 +22,10 @@ final class Script {
     /** Waits until so many waits have begun since reset(). */
     static native void awaitWaits(long count);
 
-    /** Jobs stop in the middle until this is taken back. */
+    /** Jobs stop in the middle until this is switched off again. */
     static native void hold(boolean hold);
 
-    /** Waits until a job stands in the middle. */
+    /** Waits until a job has stopped in the middle. */
     static native void awaitHeldJob();
 
     /** The bytes that the last job was given. */
