@@ -19,7 +19,7 @@ struct Request {
     AcceptsRate accepts_rate; ///< of sound files; headerless ones are never converted
 };
 
-/// What is known of an input before anything is read from it.
+/// What can be said about an input before anything is read from it.
 struct InputFacts {
     uint32_t rate = 0;              ///< of the file itself, hertz
     uint32_t channels = 0;          ///< of the file itself
@@ -34,14 +34,14 @@ struct OpenedInput {
 
 /// A sound file that comes through a pipe cannot be read in place, since most formats need seeking.
 /// It is copied, and what has arrived so far is read as if it were the whole file. When that is not
-/// enough, extend() doubles it and the reading starts anew. So no more of a pipe is taken than twice
-/// what is needed, and memory stays as it is.
+/// enough, extend() doubles it and reading starts over. So at most twice what is needed is taken
+/// from a pipe, and memory does not grow.
 class Input {
 public:
     /// `name` is a path, or "-" for standard input; `request` outlives the object. Throws FileError.
     Input(const std::string& name, const Request& request);
 
-    /// Opens the input at the start of the section asked for. Throws FileError.
+    /// Opens the input at the start of the requested section. Throws FileError.
     OpenedInput open();
 
     /// After the input was not enough: fetches more of a pipe. False when there is no more.

@@ -9,7 +9,7 @@ namespace audio {
 
 namespace {
 
-constexpr size_t kFetch = 4096; ///< frames asked from the source at a time
+constexpr size_t kFetch = 4096; ///< frames requested from the source at a time
 
 } // namespace
 

@@ -44,7 +44,8 @@ SoundFile::SoundFile(int file, const AcceptsRate& accepts_rate)
         throw FileError("is not a sound file that can be read (WAV, FLAC, OGG, MP3, ...); "
                         "headerless audio needs --raw");
     }
-    // A header that could be read in part only is taken for another one; the next call forgets it.
+    // A header that could only be read in part is taken for another one; the next call clears that
+    // error.
     if (sf_error(file_.get()) == SF_ERR_SYSTEM) {
         throw FileError("cannot be read (" + SoundFile::trouble() + ")");
     }

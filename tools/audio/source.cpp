@@ -1,4 +1,4 @@
-// How what is wrong with a file is said.
+// How errors in a file are worded.
 
 #include "audio/source.hpp"
 

@@ -11,7 +11,7 @@
 
 namespace audio {
 
-/// What is wrong with one file, and what would be right; without the name of the file.
+/// What is wrong with one file, and what would be right, without the file's name.
 struct FileError : std::runtime_error {
     using std::runtime_error::runtime_error;
 };
@@ -19,7 +19,7 @@ struct FileError : std::runtime_error {
 /// A failed system call, with the text of its `errno`.
 FileError system_error(const std::string& what, int error);
 
-/// The file ends before the section that was asked for begins; both in seconds.
+/// The file ends before the requested section begins; both in seconds.
 FileError start_beyond_end(double end, double start);
 
 /// A stream of samples in one of the encodings, with one or two channels.
@@ -34,7 +34,7 @@ public:
     /// Throws FileError.
     virtual size_t read(std::span<std::byte> bytes) = 0;
 
-    /// Why the stream ended before its time; empty when nothing is known against it.
+    /// Why the stream ended early; empty when there is no reason to doubt it.
     virtual std::string trouble() const { return {}; }
 };
 

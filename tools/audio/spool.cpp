@@ -1,5 +1,5 @@
 // The copy of a pipe is read as if it were the whole file, and doubled while that is not enough: so
-// no more of a pipe is taken than twice what is needed, beyond the first fetch.
+// at most twice what is needed is taken from a pipe, beyond the first fetch.
 
 #include "audio/spool.hpp"
 

@@ -1,5 +1,5 @@
 /// @file
-/// A copy of what has come through a pipe.
+/// A copy of what has arrived through a pipe.
 #pragma once
 
 #include <cstdint>
@@ -8,8 +8,8 @@
 
 namespace audio {
 
-/// An unnamed temporary file that holds the beginning of a pipe, in the directory that TMPDIR names,
-/// else in /var/tmp. It grows as far as it is asked to and no further.
+/// An unnamed temporary file that holds the beginning of a pipe, in the directory that TMPDIR
+/// names, else in /var/tmp. It grows only on request.
 class Spool {
 public:
     /// Copies the first bytes of `pipe`, which must outlive the object. Throws FileError.

@@ -38,7 +38,7 @@ void end_uncaught()
     usual_end();
 }
 
-/// Before the first object of the program is made: what that throws is caught by nobody.
+/// Before the first object of the program is constructed, whose exceptions nothing catches.
 [[gnu::constructor(101)]] void watch_for_uncaught()
 {
     usual_end = std::set_terminate(end_uncaught);
@@ -64,11 +64,11 @@ int main(int argc, char** argv)
         write_message("kzfp: standard output is closed, a place to write to is needed");
         return some_file_failed;
     }
-    std::signal(SIGPIPE, SIG_IGN); // a closed pipe is met as an error of write()
+    std::signal(SIGPIPE, SIG_IGN); // a closed pipe shows as an error of write()
     try {
         return run_command(argc, argv);
     } catch (const OutputError& error) {
-        if (!error.reader_left) { // who closes a pipe has seen enough, and wants no message
+        if (!error.reader_left) { // a closed pipe needs no message: its reader has seen enough
             write_message(std::string("kzfp: ") + error.what());
         }
         return some_file_failed;

@@ -1,6 +1,6 @@
 /// @file
-/// Options whose value is one name out of a table. The table is the only place where the names
-/// stand: what is accepted, the help and the complaint about a wrong name come from it.
+/// Options whose value is one name out of a table. The table is the only place where the names are
+/// written: what is accepted, the help and the message about a wrong name come from it.
 #pragma once
 
 #include <cstddef>

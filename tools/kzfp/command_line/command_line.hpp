@@ -23,8 +23,8 @@ struct Arguments {
 std::string program_name(const Arguments& arguments);
 
 /// Reads the words, with --help and --version besides the parser's own options. Prints what was
-/// asked for or what is wrong, and returns the status to end with; nothing when the command is to be
-/// carried out.
+/// requested or what is wrong, and returns the status to end with; nothing when the command is to
+/// be carried out.
 std::optional<ExitStatus> parse(CLI::App& parser, const Arguments& arguments);
 
 } // namespace kzfp

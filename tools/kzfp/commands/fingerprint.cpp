@@ -42,7 +42,7 @@ Result process(const std::string& name, const FingerprintOptions& options)
     }
 }
 
-/// One result in the form asked for, with its line break.
+/// One result in the requested form, with its line break.
 std::string to_output(const FingerprintOptions& options, const std::string& name,
                       const Result& result)
 {

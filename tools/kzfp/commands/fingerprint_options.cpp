@@ -131,7 +131,7 @@ std::variant<FingerprintOptions, ExitStatus> parse_fingerprint_options(const Arg
     add_choice(parser, "-f,--format", "FORMAT", "a format", kOutputFormats, options.format);
     add_input_options(parser, options.request, raw);
     add_choice(parser, "--algorithm", "NAME", "an algorithm", kAlgorithms, options.algorithm);
-    parser.callback([&] { // once all options are known: the algorithm decides on the rates
+    parser.callback([&] { // once all options are parsed: the algorithm decides on the rates
         if (raw) {
             options.request.raw = to_raw_format(*raw, options.algorithm);
         }

@@ -23,7 +23,7 @@ std::string built(const std::string& root, Build build)
     return text.data();
 }
 
-/// False when there is no such file; what cannot be looked at is a failure.
+/// False when there is no such file; one that cannot be examined is a failure.
 bool exists(const std::string& path)
 {
     if (kzdvdfs_exists(path.c_str()) == 1) {

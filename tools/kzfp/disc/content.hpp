@@ -22,8 +22,8 @@ struct DiscContent {
     std::vector<int32_t> title_sets;    ///< numbers, rising
 };
 
-/// Looks at the disc that is mounted at `root`, or at a directory laid out like one. The disc
-/// families are on. Throws audio::FileError, also when it is no disc.
+/// Examines the disc that is mounted at `root`, or a directory laid out like one. The disc families
+/// are on. Throws audio::FileError, also when it is no disc.
 DiscContent content_of(const std::string& root);
 
 } // namespace kzfp

@@ -52,8 +52,8 @@ private:
 
 } // namespace
 
-/// The labels of the volumes that are there: the library reads what it finds, so the marks of the
-/// descriptors are looked at first.
+/// The labels of the volumes that are there: the library reads whatever is there, so the marks of
+/// the descriptors are checked first.
 DiscLabels labels_of(const std::string& path)
 {
     using kz::disc::kSector;

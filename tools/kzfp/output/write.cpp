@@ -1,4 +1,5 @@
-// Results are not buffered: each is written before the next file is begun, or its failure is known.
+// Results are not buffered: each is written, or known to have failed, before the next file is
+// begun.
 
 #include "kzfp/output/write.hpp"
 
