@@ -56,7 +56,7 @@ public:
             const auto& [name, symbol] = symbols[i];
             if (!name.empty() && symbol.st_shndx != SHN_UNDEF && symbol.st_shndx != SHN_ABS) {
                 const auto version = i < versions.size() ? versions[i] & 0x7fff : 0;
-                found.push_back({name, ELF64_ST_TYPE(symbol.st_info),
+                found.push_back({name, static_cast<unsigned>(ELF64_ST_TYPE(symbol.st_info)),
                                  names.contains(version) ? names.at(version) : ""});
             }
         }
