@@ -73,6 +73,7 @@ struct Twin {
                                                            kDetectorShift);
     }
 
+    /// A ring in two pieces. The second is empty when the frame starts at the ring's beginning.
     static void append_frame(Object& o, std::span<const Sample> older,
                              std::span<const Sample> newer) noexcept
     {

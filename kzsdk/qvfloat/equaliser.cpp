@@ -40,14 +40,15 @@ struct SampleExtremes {
 // Maps samples to levels 0 .. K - 1: (sample - bottom) * (K - 1) / range, truncated.
 class Quantiser {
 public:
+    // A constant frame in one piece has a range of 0.
     Quantiser(const SampleExtremes& extremes, uint32_t levels) noexcept
         : bottom_(extremes.ends.low), scale_(static_cast<float>(levels - 1) / extremes.range()),
           top_level_(levels - 1)
     {
     }
 
-    // A constant frame has an infinite scale, and a sample need not be a number: no level may leave
-    // the table.
+    // The level of one sample. A constant frame has an infinite scale, and a sample need not be a
+    // number: NaN becomes level 0, and no level may leave the table.
     uint32_t level(float sample) const noexcept
     {
         return std::min(kz::to_uint32((sample - bottom_) * scale_), top_level_);
@@ -136,6 +137,8 @@ struct Equaliser {
 
 } // namespace
 
+// The form that brings its own counters. It is short of memory twice: once here, once in
+// hist_eq2().
 kz_status hist_eq(const float* input, float* output, uint32_t count, uint32_t levels) noexcept
 {
     if (input == nullptr || output == nullptr || levels == 0) {

@@ -26,7 +26,7 @@ namespace {
 
 constexpr uint32_t kFormatVersion = 1;
 constexpr uint32_t kHeaderBytes = 12;
-constexpr uint32_t kPairBytes = 8;
+constexpr uint32_t kPairBytes = 8; // an energy and an amplitude
 
 // Words are little-endian at any address, on every machine.
 uint32_t read_word(const std::byte* at) noexcept
@@ -54,7 +54,7 @@ std::byte* write_float(std::byte* at, float value) noexcept
     return write_word(at, std::bit_cast<uint32_t>(value));
 }
 
-// In 64 bits: 2^32 bands times frames must not pass for fewer.
+// In 64 bits, so that no product of bands and frames is mistaken for a smaller one.
 uint64_t data_size(uint32_t bands, uint32_t frames) noexcept
 {
     return uint64_t{bands} * frames * kPairBytes + kHeaderBytes;
@@ -140,6 +140,8 @@ bool read_records(const std::byte* data, const Header& header, Range range,
 
 } // namespace
 
+// ---- writing
+
 uint32_t QVFM_GetFrameDataSize(const QVFM* manager) noexcept
 {
     if (manager == nullptr) {
@@ -169,6 +171,9 @@ uint32_t QVFM_GetFrameData(const QVFM* manager, void* destination, uint32_t capa
     return size;
 }
 
+// ---- reading
+
+// All or nothing: a record that cannot be made leaves the manager as it was.
 uint32_t QVFM_AppendFrameData(QVFM* manager, const void* data, uint32_t size) noexcept
 {
     if (manager == nullptr || data == nullptr || size < kHeaderBytes) {

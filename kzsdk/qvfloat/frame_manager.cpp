@@ -104,6 +104,7 @@ struct Energy {
 template <size_t Count>
 void add_squares(Energy* (&bands)[Count]) noexcept
 {
+    // The narrowest band is moved to the end, where the recursion drops it.
     const auto narrower = [](const Energy* a, const Energy* b) noexcept {
         return a->bins.size() < b->bins.size();
     };
@@ -289,6 +290,7 @@ kz_status QVFM_AppendDualPCMData(QVFM* manager, const float* first, uint32_t fir
     return KZ_OK;
 }
 
+// Any other count is no frame, and skips none either.
 kz_status QVFM_AppendPCMData(QVFM* manager, const float* samples, uint32_t count) noexcept
 {
     if (manager == nullptr || samples == nullptr || count != manager->frame_length ||

@@ -12,11 +12,14 @@
 
 namespace kz::qvfloat {
 
+/// The floating-point twin. Its samples have full scale at 32768; two channels are added, not
+/// averaged, and reach twice that.
 struct Twin {
     using Object = QVFP;
     using Sample = float;
     using Config = QVConfig;
 
+    /// In the order of the formats' numbers.
     static constexpr qv::Converters<Sample> kConverters[] = {
         {KZDSP_Offset128ToFloat, KZDSP_StereoOffset128ToMonoFloat,
          KZDSP_NChannelOffset128ToMonoFloat},
@@ -40,6 +43,7 @@ struct Twin {
     static constexpr auto destroy_detector = QVSD_Destroy;
     static constexpr auto reset_detector = QVSD_Reset;
 
+    /// Rates in hertz. Null for one whose ratio has no filter, or none that memory can hold.
     static KZDSP_resampler* make_resampler(uint32_t input_rate, const Config& config) noexcept
     {
         return KZDSP_CreateResampler(static_cast<float>(input_rate), config.sample_rate);
@@ -55,12 +59,14 @@ struct Twin {
         return counts;
     }
 
+    /// Samples count as the whole numbers they are truncated to: no shift is needed.
     static uint32_t signal_offset(Object& o, std::span<const Sample> samples) noexcept
     {
         return QVSD_GetSignalOffset(o.signal_detector, samples.data(),
                                     static_cast<uint32_t>(samples.size()));
     }
 
+    /// A ring in two pieces. The second is empty when the frame starts at the ring's beginning.
     static void append_frame(Object& o, std::span<const Sample> older,
                              std::span<const Sample> newer) noexcept
     {

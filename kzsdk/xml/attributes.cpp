@@ -103,6 +103,8 @@ kz_status kz::xml::copy_attributes(XMLTag& destination, const XMLTag& source) no
     return status;
 }
 
+// ---- reading
+
 uint32_t GetXMLTagAttrCount(const XMLTag* tag) noexcept
 {
     uint32_t count = 0;
@@ -125,6 +127,7 @@ const char* GetXMLTagAttrValue(const XMLTag* tag, uint32_t index) noexcept
     return attribute != nullptr ? attribute->value : nullptr;
 }
 
+// The first of the name, should there be several.
 const char* GetXMLTagAttrFromBuf(const XMLTag* tag, const char* name, uint32_t count) noexcept
 {
     const Text wanted{name, count};
@@ -143,6 +146,9 @@ const char* GetXMLTagAttrFromStr(const XMLTag* tag, const char* name) noexcept
     return GetXMLTagAttrFromBuf(tag, name, text_of(name).count);
 }
 
+// ---- setting and removing
+
+// No value, that is null or a count of 0, removes.
 kz_status SetXMLTagAttrFromBuf(XMLTag* tag, const char* name, uint32_t name_count,
                                const char* value, uint32_t value_count) noexcept
 {

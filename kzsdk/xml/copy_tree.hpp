@@ -20,7 +20,8 @@ using owned_tree = std::unique_ptr<XMLTag, DisposeTree>;
 /// What becomes of a copy when one of the sub-tags cannot be copied.
 enum class IfRefused { fails_as_a_whole, leaves_it_out };
 
-/// A copy whose sub-tags are being made: where the next goes, and what it will be a copy of.
+/// A copy whose sub-tags are being made: where the next goes, and what it will be a copy of. `end`
+/// is the last link of the copies made so far, so none of them is walked again.
 struct OpenCopy {
     XMLTag** end;
     const XMLTag* next;

@@ -91,6 +91,7 @@ XMLTag* CloneAndMutateXMLTag(const XMLTag* tag, uint8_t deep) noexcept
         .release();
 }
 
+// All three may be called while another thread clones: each map is replaced in one step.
 kz_status SetMapXMLTagName(XMLMapTagName function) noexcept
 {
     return install(map_tag_name, function);

@@ -52,7 +52,11 @@ const char* value_or_data(const XMLTag& tag, Text name) noexcept
     return value != nullptr ? value : GetXMLTagData(sub_tag(&tag, name));
 }
 
-/// A segment of XMLSetValueAtPath(): optional "/", name, optional "+", optional "/".
+/// A segment of XMLSetValueAtPath():
+///
+///     segment = ["/"] name ["+"] ["/"]        name = one or more letters, digits or "_"
+///
+/// So two "/" in a row are accepted, one from each segment, and three are not.
 struct Segment {
     Text name{}; ///< missing where the path ends behind the leading "/"
     bool adds = false;
@@ -82,7 +86,7 @@ Segment parse_segment(const char* path) noexcept
     if (segment.name.count == 0) {
         return {};
     }
-    if (path[0] == '+') {
+    if (path[0] == '+') { // only one: a second is neither a "/" nor the end
         segment.adds = true;
         ++path;
     }
@@ -111,6 +115,8 @@ XMLTag* element(XMLTag& tag, const char* name, bool adds) noexcept
 
 } // namespace
 
+// ---- reading
+
 // An empty path is the tag itself, so a "/" at the end changes nothing.
 XMLTag* GetXMLSubTagFromPath(XMLTag* tag, const char* path) noexcept
 {
@@ -122,6 +128,7 @@ XMLTag* GetXMLSubTagFromPath(XMLTag* tag, const char* path) noexcept
     return tag;
 }
 
+// As above; a tag that is found but has no data gives null as one that is missing does.
 const char* GetXMLSubTagData(const XMLTag* tag, const char* path) noexcept
 {
     while (tag != nullptr && has_more(path)) {
@@ -131,6 +138,8 @@ const char* GetXMLSubTagData(const XMLTag* tag, const char* path) noexcept
     }
     return GetXMLTagData(tag);
 }
+
+// ---- setting
 
 // Tags made on the way stay when a later segment fails. A "/" at the end makes an empty last
 // segment and is refused, after the tags before it were made.
@@ -175,7 +184,7 @@ const char* XMLGetDataAtPath(const XMLTag* tag, const char* path) noexcept
     if (tag == nullptr || path == nullptr) {
         return nullptr;
     }
-    while (path[0] == '/') {
+    while (path[0] == '/') { // any number, where the other functions accept one at most
         ++path;
     }
     const auto [root, below] = cut(path);

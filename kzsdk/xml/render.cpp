@@ -1,5 +1,11 @@
 /// @file
-/// Renders a tag tree as text, in one growing buffer that the caller receives in the end.
+/// Renders a tag tree as text, in one growing buffer that the caller receives in the end:
+///
+///     <R a="1">          a start tag with its attributes
+///       data             data beside sub-tags, one level deeper
+///       <C>x</C>         an element without sub-tags takes one line
+///       <E></E>          there is no short form of an empty element
+///     </R>
 ///
 /// Two indentations inside an element with sub-tags run even after a failure and then replace its
 /// status: with indentation on, a tag that cannot be written leaves malformed text and no error.
@@ -63,6 +69,7 @@ public:
     /// True while nothing has failed, or after a failure was replaced.
     bool is_well() const noexcept { return status_ == KZ_OK; }
 
+    /// The line that names version and encoding.
     void declaration() noexcept
     {
         append(kDeclaration);
@@ -144,6 +151,7 @@ private:
         indentation(level);
     }
 
+    /// Data or a value, with entities for the five bytes that mark-up uses.
     void escaped(const char* text) noexcept
     {
         if (text == nullptr) {
@@ -174,6 +182,7 @@ private:
         return count;
     }
 
+    /// Always in double quotes; a double quote in the value is an entity, so nothing can end it.
     void attribute(const XMLAttr& attribute) noexcept
     {
         append(" ");

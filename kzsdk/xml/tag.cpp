@@ -120,6 +120,8 @@ XMLTag* at_cursor(const XMLTag& parent, uintptr_t cursor) noexcept
 
 } // namespace
 
+// ---- making, copying and disposing
+
 XMLTag* CreateEmptyXMLTag() noexcept { return kz::make_record<XMLTag>().release(); }
 
 // The record is made only for a name that is not empty; the setters then copy both texts.
@@ -151,6 +153,7 @@ XMLTag* CloneXMLTag(const XMLTag* tag, uint8_t deep) noexcept
     return (deep == 1 ? clone_tree(*tag) : clone_without_sub_tags(*tag)).release();
 }
 
+// The destination keeps its place among its siblings. Copying a tag onto itself does nothing.
 kz_status CopyXMLTag(XMLTag* destination, const XMLTag* source) noexcept
 {
     if (destination == nullptr || source == nullptr) {
@@ -199,6 +202,8 @@ kz_status SmartDisposeXMLTag(XMLTag** tag) noexcept
     return tag != nullptr ? DisposeXMLTag(std::exchange(*tag, nullptr)) : KZ_OK;
 }
 
+// ---- sub-tags
+
 uint32_t GetXMLSubTagCount(const XMLTag* tag) noexcept
 {
     uint32_t count = 0;
@@ -223,6 +228,7 @@ uint32_t GetXMLNamedSubTagCount(const XMLTag* tag, const char* name) noexcept
     return count;
 }
 
+// The list is walked from its start each time; GetXMLSiblingTag() takes one step.
 XMLTag* GetXMLSubTag(const XMLTag* tag, uint32_t index) noexcept
 {
     XMLTag* child = tag != nullptr ? tag->sub_tags : nullptr;
@@ -238,6 +244,7 @@ XMLTag* GetXMLSiblingTag(const XMLTag* tag) noexcept
     return tag != nullptr ? tag->next_sibling : nullptr;
 }
 
+// A match is exact: the same bytes, and no more of them.
 XMLTag* GetXMLSubTagFromBuf(const XMLTag* tag, const char* name, uint32_t count) noexcept
 {
     const Text wanted{name, count};
@@ -294,6 +301,8 @@ kz_status RemoveXMLSubTag(XMLTag* parent, XMLTag* child, uint8_t dispose) noexce
     *link = std::exchange(child->next_sibling, nullptr);
     return dispose != 0 ? DisposeXMLTag(child) : KZ_OK;
 }
+
+// ---- name and data
 
 const char* GetXMLTagData(const XMLTag* tag) noexcept
 {
