@@ -97,6 +97,18 @@ Manager with_features(size_t frames, const std::function<Feature(size_t frame, s
 
 } // namespace
 
+// The floating-point twin skips before it looks at the pieces.
+TEST_F(FixedFrameManager, ANullFirstPieceUsesUpNoFrameToSkip)
+{
+    const auto manager =
+        make_manager<Fixed>([](kzqvfixed_config& config) { config.skip_frames = 1; });
+    const Words ones(kFrame, 1);
+    kzqvfixed_frame_manager_append_dual_PCM_data(manager.get(), nullptr, 0, nullptr, 0);
+    kzqvfixed_frame_manager_append_dual_PCM_data(manager.get(), nullptr, 0, ones.data(), kFrame);
+    EXPECT_EQ(1U, manager->skip_remaining);
+    EXPECT_EQ(0U, manager->frame_count);
+}
+
 TEST_F(FixedFrameManager, AShareOfTheWholeIsStoredAsMinus32768)
 {
     const auto manager = with_features(12, [](size_t frame, size_t band) {
