@@ -1,4 +1,4 @@
-# The same doors as ./run, for those whose fingers type make.
+# The commands of ./run, for those who type make.
 COMMANDS := $(shell ./run commands)
 
 .DEFAULT_GOAL := help

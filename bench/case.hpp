@@ -9,7 +9,7 @@
 
 namespace kz::bench {
 
-/// Thrown where work did not come out as it must: nothing that goes wrong is timed.
+/// Thrown when work does not yield what it must: nothing that goes wrong is timed.
 struct Failure : std::runtime_error {
     using runtime_error::runtime_error;
 };
@@ -21,10 +21,10 @@ inline void require(bool good, const std::string& what)
     }
 }
 
-/// Keeps the compiler from leaving out the work that made what lies there.
+/// Keeps the compiler from removing the work that produced what lies there.
 inline void keep(const void* made) { asm volatile("" : : "r"(made) : "memory"); }
 
-/// Another library's way to the same end, or a yardstick such as memcpy.
+/// Another library that does the same work, or a yardstick such as memcpy.
 struct Peer {
     std::string name;
     std::function<void()> run = {};    ///< empty where the library was not there at configuration
@@ -39,11 +39,11 @@ struct Prepared {
     std::function<void()> run;
     std::function<std::string()> digest; ///< of what the work yields from a fresh start
     std::function<Peers()> peers = [] { return Peers(); }; ///< makes them ready to run
-    /// What `run` does beyond the work meant; its time is taken off in every round.
+    /// What `run` does besides the work of interest; its time is subtracted in every round.
     std::vector<std::function<void()>> beside = {};
 };
 
-/// In which a case's times are told.
+/// The unit in which a case's times are given.
 struct Unit {
     std::string name;
     double seconds; ///< of one run for each unit
@@ -57,7 +57,7 @@ inline Unit nanoseconds_per(const std::string& what, double in_a_run)
 }
 
 /// The most that a case may take: a share of a peer's time, or, without a peer, an amount of its
-/// unit. 0 where nothing is asked.
+/// unit. 0 where there is no limit.
 struct Limit {
     std::string peer = {};
     double most = 0;

@@ -1,5 +1,5 @@
 /// @file
-/// Which of the cases or tables the words of a command line stand for.
+/// Which cases or tables the words of a command line select.
 #pragma once
 
 #include <algorithm>
@@ -11,7 +11,7 @@
 
 namespace kz::bench {
 
-/// Whether a word stands for a thing: it is its name, or the beginning of several things' names.
+/// Whether a word selects a thing: it is its name, or the beginning of the names of several.
 template <class Thing>
 bool stands_for(const std::string& word, const Thing& one, const std::vector<Thing>& all)
 {
@@ -20,7 +20,7 @@ bool stands_for(const std::string& word, const Thing& one, const std::vector<Thi
                                                         : one.name.rfind(word, 0) == 0;
 }
 
-/// The things that any of these words stand for; all when there are none.
+/// The things that any of these words select; all when there are no words.
 template <class Thing>
 std::vector<Thing> chosen(const std::vector<Thing>& all, const std::vector<std::string>& words)
 {

@@ -5,8 +5,8 @@
     bench/counts.py PROGRAM --record   write the counts of this build to bench/instructions.json
 
 PROGRAM is a kzbench. Each variant of the inner loops has its own figures; one that this machine or
-this build does not have is passed over, and keeps its figures when others are recorded. Counts
-depend on the compiler, so figures of another one are not compared with.
+this build does not have is skipped, and keeps its figures when others are recorded. Counts
+depend on the compiler, so figures of another one are not compared.
 """
 
 import argparse
@@ -30,12 +30,12 @@ CASES = """
     create_free_2
 """.split()
 
-# What we want to get by with.
+# The goals.
 GOALS = {"avx2": {"fp1_44100s": 25_000_000, "fp1_48000s": 35_000_000}}
 
 
 class Counts:
-    """What a run under callgrind told."""
+    """What a run under callgrind printed."""
 
     def __init__(self, build, variant, by_case):
         self.build = build

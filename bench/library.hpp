@@ -1,5 +1,5 @@
 /// @file
-/// Owners for what the benchmarks make with the library, and the sizes that its road has.
+/// Owners for what the benchmarks create with the library, and the sizes of its stages.
 #pragma once
 
 #include <cstdint>

@@ -26,7 +26,7 @@ def quartiles(spread):
 
 
 def held_against(limit, case):
-    """The spread that a limit speaks of; None when its peer was not there."""
+    """The spread that a limit applies to; None when its peer was not there."""
     if limit["peer"] is None:
         return case["time"]
     for peer in case["peers"]:
@@ -54,7 +54,7 @@ def verdict(limit, case):
 
 
 def rows_of(case):
-    """The first peer's row tells of the limits, the other peers follow below."""
+    """The first peer's row has the limits, the other peers follow below."""
     limits = [verdict(case["must"], case), verdict(case["goal"], case)]
     ours = [f"`{case['name']}`", quartiles(case["time"]) + " " + case["unit"]]
     if not case["peers"]:

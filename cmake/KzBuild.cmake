@@ -27,7 +27,7 @@ if(KZ_SANITIZE)
                                                -fno-sanitize-recover=all)
   target_link_options(kz_settings INTERFACE -fsanitize=${KZ_SANITIZE})
   if(KZ_SANITIZE MATCHES "integer")
-    # Unsigned numbers may wrap; this sanitizer asks where that is meant.
+    # Unsigned numbers may wrap; this sanitizer reports where that is not intended.
     target_compile_options(
       kz_settings INTERFACE "-fsanitize-ignorelist=${PROJECT_SOURCE_DIR}/cmake/integer_ignorelist.txt")
   endif()
@@ -37,8 +37,9 @@ if(KZ_COVERAGE)
   target_link_options(kz_settings INTERFACE -fprofile-instr-generate)
 endif()
 
-# What a compiler and a linker can do against the exploitation of a bug. tests/whole/abi/hardening_test.cpp
-# looks for it in the built files. A sanitizer sees more, and some of its checks do not go with these.
+# What a compiler and a linker can do against the exploitation of a bug.
+# tests/whole/abi/hardening_test.cpp looks for it in the built files. A sanitizer detects more, and
+# some of its checks do not work together with these.
 option(KZ_HARDEN "Compile and link with the usual protections" ON)
 if(KZ_HARDEN AND NOT KZ_SANITIZE)
   include(CheckCXXCompilerFlag)
@@ -58,12 +59,12 @@ if(KZ_HARDEN AND NOT KZ_SANITIZE)
     target_link_options(kz_settings INTERFACE -Wl,-z,relro -Wl,-z,now -Wl,-z,noexecstack)
   endif()
   # The kernels' scratch, tens of KB on the stack, is written before it is read: clearing it first
-  # would cost more than some of the loops. Their files are the only ones to go without.
+  # would cost more than some of the loops. Only their files are compiled without it.
   check_cxx_compiler_flag("-ftrivial-auto-var-init=zero -Werror" KZ_HAS_AUTO_VAR_INIT)
 endif()
 
-# What is shipped does not tell where it was built: the same sources give the same bytes in any folder.
-# Debuggers and coverage tools want the real names, and get them in the other builds.
+# What is shipped does not reveal where it was built: the same sources give the same bytes in any
+# folder. Debuggers and coverage tools want the real names, and get them in the other builds.
 target_compile_options(
   kz_settings
   INTERFACE

@@ -95,7 +95,7 @@ if(KZ_JAVA AND NOT (Java_JAVAC_EXECUTABLE AND Java_JAR_EXECUTABLE))
                       "jar: -DKZ_JAVA=OFF")
 endif()
 
-# A jar tells when each class was written, unless the tool (of JDK 17 and later) is told what to say.
+# A jar contains when each class was written, unless the tool (of JDK 17 and later) is given a date.
 set(KZ_JAR_DATE "")
 if(KZ_JAVA)
   execute_process(COMMAND "${Java_JAR_EXECUTABLE}" --help OUTPUT_VARIABLE jar_help ERROR_QUIET)

@@ -111,7 +111,7 @@ void check(Choices& choices, const Converter<Word>& converter)
     for (size_t i = 0; i < sums.size(); ++i) {
         ASSERT_EQ(expected_word(converter, channels, sums[i]), words[i]) << "word " << i;
     }
-    // In two calls, which begin the running sum anew and leave the rest of the output alone.
+    // In two calls, which restart the running sum and leave the rest of the output untouched.
     const size_t half = std::min(offset_out, words.size());
     std::vector<Word> begin(half);
     convert(converter, channels, copy.data(), begin);

@@ -79,7 +79,7 @@ void expect_listing(const std::string& directory, const Kinds& kinds)
     ASSERT_EQ(kinds.size() + 2, seen.size());
 }
 
-/// Reads here and there, and behind the end.
+/// Reads at several places, also beyond the end.
 void expect_bytes(Choices& choices, int32_t descriptor, const std::string& bytes)
 {
     int64_t place = 0;

@@ -1,5 +1,5 @@
 // Frame data from anywhere: accepted only when it is exactly one block for this number of bands,
-// and then handed out again with what was there before, skipped and limited as documented.
+// and then returned again together with what was there before, skipped and limited as documented.
 
 #include <algorithm>
 

@@ -2,7 +2,7 @@
 
 extern "C" int LLVMFuzzerInitialize(int* /*count*/, char*** /*arguments*/)
 {
-    GTEST_FLAG_SET(throw_on_failure, true); // nobody catches it: the fuzzer keeps the input
+    GTEST_FLAG_SET(throw_on_failure, true); // not caught: the fuzzer keeps the input
     EXPECT_EQ(KZ_OK, kzmem_initialize(0, 0));
     return 0;
 }

@@ -1,6 +1,6 @@
 /// @file
-/// What the fuzz targets share. A target reads its input as a list of choices, does what they say,
-/// and compares the library with a model by GoogleTest's checks; a check that fails ends the run.
+/// What the fuzz targets share. A target reads its input as a list of choices, follows them, and
+/// compares the library with a model by GoogleTest's checks; a check that fails ends the run.
 #pragma once
 
 #include <cstddef>
@@ -20,7 +20,7 @@ namespace kz::fuzz {
 
 using Choices = FuzzedDataProvider;
 
-/// The target: does what the choices say.
+/// The target: follows the choices.
 void run(Choices& choices);
 
 /// True once in `n` times.
@@ -30,7 +30,7 @@ inline bool one_in(Choices& choices, uint32_t n)
 }
 
 /// A copy that ends where its heap block ends and begins `offset` bytes into it, so that a read
-/// beside it is seen and nothing relies on its alignment.
+/// outside it is detected and nothing relies on its alignment.
 class Copy {
 public:
     Copy(const void* bytes, size_t count, size_t offset)

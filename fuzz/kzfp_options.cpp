@@ -1,5 +1,5 @@
-// The command line of kzfp: any words, on files that are not there, are empty or are no sound. It
-// ends with one of its statuses, and with "wrong usage" without having looked at a file.
+// The command line of kzfp: any words, on files that are missing, empty or not sound. It ends with
+// one of its statuses, and with "wrong usage" without having opened a file.
 
 #include "fuzz.hpp"
 #include "kzfp_program.hpp"

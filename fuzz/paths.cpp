@@ -6,7 +6,7 @@ namespace kz::fuzz {
 
 namespace {
 
-/// Mostly a path of known names, sometimes any bytes.
+/// Usually a path of names that occur, sometimes any bytes.
 std::string choose_path(Choices& choices)
 {
     if (one_in(choices, 8)) {
@@ -39,7 +39,7 @@ std::optional<std::string> data_of(const ModelTag* tag)
     return tag != nullptr ? tag->data : std::nullopt;
 }
 
-// ---- Looking
+// ---- Look-up
 
 ModelTag* find(ModelTag* tag, std::vector<std::string> parts)
 {
@@ -93,7 +93,7 @@ std::optional<std::string> value_at(ModelTag& root, const std::string& path)
     return data_of(tag->sub_tag(last));
 }
 
-// ---- Setting
+// ---- Setting values
 
 kz_status set(ModelTag* tag, const std::string& path, const std::string& data, bool create)
 {

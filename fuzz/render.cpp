@@ -1,5 +1,5 @@
-// Rendering: what is written for a tree of known names is well-formed, and reads as the same tree
-// to a parser that knows nothing of the library.
+// Rendering: what is written for a tree of well-formed names is well-formed, and an independent
+// parser reads the same tree from it.
 
 #include <algorithm>
 
@@ -11,8 +11,8 @@ namespace kz::fuzz {
 
 namespace {
 
-/// Bytes that every encoding of one byte a character knows as text, and no line break, which a
-/// parser may change.
+/// Bytes that are text in every single-byte encoding, without line breaks, which a parser may
+/// change.
 std::string printable(std::string text)
 {
     std::ranges::replace_if(
@@ -40,7 +40,7 @@ void grow(Choices& choices, Place at, int depth)
     }
 }
 
-/// The parser gives UTF-8 for what it was told is Latin-1.
+/// The parser returns UTF-8 for what was declared as Latin-1.
 std::string to_bytes(const char* text, size_t count)
 {
     std::string bytes;
@@ -122,7 +122,7 @@ void drop_layout(ModelTag& tag)
     }
 }
 
-/// Leading spaces of data cannot be told from indentation.
+/// Leading spaces of data cannot be distinguished from indentation.
 void drop_leading_spaces(ModelTag& tag)
 {
     if (tag.data) {

@@ -10,8 +10,9 @@
 
 namespace kz::fuzz {
 
-/// Does what the choices say; `resample` is the library's function, `choose_sample` makes input.
-/// What was taken, what was given and every word must be the model's; the rest of the room stays.
+/// Follows the choices; `resample` is the library's function, `choose_sample` makes input. The
+/// counts taken and produced and every word must match the model; the rest of the room stays
+/// untouched.
 template <class Sample, class Record, class Model, class Resample, class ChooseSample>
 void compare_blocks(Choices& choices, Record* library, Model& model, Resample resample,
                     ChooseSample choose_sample)

@@ -1,5 +1,5 @@
 // The floating-point resampler between any rates, in blocks and rooms of any size: no sample is
-// lost or repeated, and every output has the bits of the one plain sum.
+// lost or repeated, and every output is bit-identical to the plain sum.
 
 #include "resampler_blocks.hpp"
 #include "support/signals.hpp"

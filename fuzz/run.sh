@@ -1,5 +1,5 @@
 #!/usr/bin/env bash
-# Runs the fuzz targets: each first with what is in its corpus, then with what grows out of it.
+# Runs the fuzz targets: each first on its corpus, then on what it derives from that.
 #
 #   fuzz/run.sh [seconds] [target...]      seconds for each target, 60 if not given; all targets
 #

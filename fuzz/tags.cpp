@@ -93,7 +93,7 @@ ModelTag cloned(ModelTag model)
     return model;
 }
 
-/// Without what the maps refuse as long as nobody has installed others: tags without a name.
+/// Without what the default maps refuse: tags without a name.
 void prune_nameless(ModelTag& model)
 {
     std::erase_if(model.sub_tags, [](const ModelTag& tag) { return !tag.name; });

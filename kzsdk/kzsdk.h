@@ -1,7 +1,7 @@
 /**
  * @file
- * libkzsdk condenses about 14 seconds of audio into 30 numbers, which can be written as a short XML
- * document that a recognition service can be asked with. A stream takes sound in any format, cut
+ * libkzsdk condenses 14.22 seconds of audio into 30 numbers, which can be written as a short XML
+ * document, the query that a recognition service is sent. A stream takes sound in any format, cut
  * anywhere (kzsdk/stream/stream.h):
  *
  *     kz_stream_settings settings;

@@ -47,7 +47,7 @@ def places_of(file):
 
 @functools.cache
 def package_of(place):
-    """The Debian package that a file came in. It may know the file by its name from before /usr was
+    """The Debian package that a file came in. It may list the file by its name from before /usr was
     merged."""
     place = os.path.realpath(place)
     for name in (place, place.removeprefix("/usr")):

@@ -60,7 +60,7 @@ def check_link(document, target):
 
 
 def check_path(document, path, folders):
-    """Paths are told from the root, or from the document's own folder."""
+    """A path counts from the root, or from the document's own folder."""
     if path.split("/")[0] not in folders or any(sign in path for sign in "<>*"):
         return None
     if (ROOT / path.rstrip(".")).exists() or (document.parent / path.rstrip(".")).exists():

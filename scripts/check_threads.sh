@@ -1,5 +1,5 @@
 #!/bin/sh
-# Runs the tests that have threads under the thread sanitizer; the others have nothing to show to it.
+# Runs the tests that have threads under the thread sanitizer; it has nothing to find in the others.
 #
 #   scripts/check_threads.sh
 set -eu

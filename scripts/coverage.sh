@@ -1,5 +1,5 @@
 #!/usr/bin/env bash
-# How much of kzsdk/ runs in the unit tests, and how much on the corpus of the fuzz targets.
+# Reports how much of kzsdk/ runs in the unit tests, and how much on the corpus of the fuzz targets.
 #
 #   scripts/coverage.sh [tests | corpus]...   default: both
 #

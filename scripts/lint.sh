@@ -27,11 +27,11 @@ format() {
     scripts/sources.sh | xargs clang-format-14 --dry-run -Werror
 }
 
-# With assertions on, for the analyzer to read; one file at a time, for it takes a va_list of the
-# second file for one that was never set up.
+# With assertions on, for the analyzer to read; one file at a time, because it takes a va_list of
+# the second file for one that was never initialised.
 tidy() {
     if [ ! -f "$build/compile_commands.json" ]; then
-        # The compiler's flags for protection are not all known to the analyzer.
+        # The analyzer does not accept all of the compiler's flags for protection.
         cmake -S . -B "$build" -G Ninja -DCMAKE_BUILD_TYPE=Debug -DKZ_BUILD_BENCH=ON -DKZ_HARDEN=OFF \
             >/dev/null || return 1
     fi
@@ -45,7 +45,7 @@ tidy() {
         { ! grep -v -e 'warnings generated' -e 'warning generated' -e '^Suppressed ' -e '^Use -header-filter'; }
 }
 
-# What clang-tidy does not look at: whole classes, and what holds on other processors.
+# What clang-tidy does not check: whole classes, and what holds on other processors.
 other_analyser() {
     cppcheck --quiet --std=c++20 --enable=warning,performance,portability --inconclusive \
         --suppressions-list=scripts/cppcheck_suppressions.txt --error-exitcode=1 -j "$jobs" -I . \
@@ -56,7 +56,7 @@ man_page() {
     find tools docs -name '*.[1-8]' -print0 | xargs -0 -r mandoc -T lint -W warning
 }
 
-# Functions that are called by name look unreachable to it.
+# It takes functions that are called by name for unreachable.
 shell_scripts() {
     shellcheck --external-sources --exclude=SC2317 run .ci/run scripts/*.sh packaging/*.sh fuzz/*.sh
 }

@@ -1,12 +1,13 @@
 #!/usr/bin/env python3
-"""Puts faults into the library, one at a time, and tells which ones no unit test notices.
+"""Puts faults into the library, one at a time, and reports those that no unit test notices.
 
 scripts/mutate.py [COUNT] [SEED]
 
-COUNT faults (30) are drawn by SEED (1): a comparison, an operator, a constant or a condition changed, or a
-statement left out. Works on a copy of the tree in build/mutants. A fault that survives asks for a test, or
-changes nothing that a caller can see: a larger buffer, a bound that only a slower path needs. Of what
-sanitizers alone would see, such as a buffer too small, nothing is seen here.
+COUNT faults (30) are drawn by SEED (1): a comparison, an operator, a constant or a condition
+changed, or a statement left out. Works on a copy of the tree in build/mutants. A fault that survives
+needs a test, or changes nothing that a caller can observe: a larger buffer, a bound that only a
+slower path needs. What only sanitizers would detect, such as a buffer too small, is not detected
+here.
 """
 import pathlib
 import random
@@ -21,7 +22,7 @@ TREE = ROOT / "build/mutants/tree"
 BUILD = ROOT / "build/mutants/build"
 # Tests that read the built files, which are built otherwise here, or the sources.
 NOT_RUN = ("tests/whole/abi/",)
-# Not this machine's loops, and which of them are chosen: all give the same words.
+# Not this machine's loops, or the choice among them: all are bit-identical.
 LEFT_OUT = ("neon", "select.cpp")
 # Trees of a million levels, and what reads the built files, which are built otherwise here.
 TESTS = "-DeepTree.*:*DefinesNothingBesideItsTable*:EveryAllocatingFunction*"

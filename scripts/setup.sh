@@ -16,7 +16,7 @@ packages_of() {
     # The Java front and its tests; Android's log and threads as a desktop has them.
     java) echo "default-jdk-headless junit4 android-liblog-dev android-libutils-dev" ;;
     clips) echo "sox libsox-fmt-all espeak-ng" ;; # the demo's music, and the tests' clips
-    # What counts instructions and prints tables, and the peers, each of which may be missing.
+    # Tools that count instructions and print tables, and the peers, each of which may be missing.
     bench) echo "valgrind python3 pkg-config libcli11-dev nlohmann-json3-dev libchromaprint-dev libfftw3-dev libswresample-dev libavutil-dev libsoxr-dev libspeexdsp-dev libpugixml-dev libtinyxml2-dev libxml2-dev" ;;
     fuzz) echo "libexpat1-dev python3" ;; # a parser to read what is rendered, and the seeds
     lint) echo "clang-format-14 clang-tidy-14 cppcheck mandoc shellcheck" ;;

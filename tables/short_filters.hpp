@@ -3,7 +3,7 @@
 ///
 /// They are the ideal response over 10 * down samples to either side under a Kaiser window, with
 /// the centre tap and the structural zeros exact and the other taps scaled to an exact sum. (The
-/// Hamming design of filter_design.hpp would miss the sums in the third decimal.)
+/// Hamming design of filter_design.hpp would be off in the third decimal of the sums.)
 /// Source of the window: J. F. Kaiser, "Nonrecursive digital filter design using the I0-sinh window
 /// function", Proc. IEEE Int. Symp. Circuits and Systems (1974).
 #pragma once

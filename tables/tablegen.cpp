@@ -1,7 +1,7 @@
 /// @file
 /// Writes the library's coefficient tables as C++ source: tablegen <output file>
 ///
-/// The formulas stand where the library uses them, in kzsdk/dsp/filter_design.hpp and
+/// The formulas are where the library uses them, in kzsdk/dsp/filter_design.hpp and
 /// kzsdk/kernels/butterfly.hpp. A machine whose mathematics rounds otherwise must not make another
 /// library: the words are compared with a digest, and a difference fails the build.
 
@@ -51,7 +51,7 @@ std::vector<int32_t> to_q31(const std::vector<float>& taps, double gain)
 
 void write_value(std::ostream& out, int32_t word) { out << word; }
 
-// Hexadecimal, which tells every bit.
+// Hexadecimal, which shows every bit.
 void write_value(std::ostream& out, float value) { out << std::hexfloat << value << 'F'; }
 
 // FNV-1a over the bits of every value, low byte first.
@@ -73,8 +73,8 @@ private:
 
 constexpr uint64_t kKnownDigest = 0x6c676693ad4e4d42U;
 
-// The source files that are written, and the digest of what is in them: what the inner loops read, and
-// the fixed-point prototypes that callers can ask for.
+// The source files that are written, and the digest of what is in them: what the inner loops read,
+// and the fixed-point prototypes that callers can request.
 struct Source {
     std::ostream& text;
     std::ostream& prototypes;
@@ -133,7 +133,7 @@ void write_filter(Source& out, uint32_t hertz, const std::vector<int32_t>& words
     accessor("uint32_t", "length") << " { return " << words.size() << "; }\n\n";
 }
 
-// The same taps once more, in rows. These words follow from those that the digest knows.
+// The same taps once more, in rows. These words follow from those that the digest covers.
 void write_rows(std::ostream& out, uint32_t hertz, uint32_t up, uint32_t down,
                 const std::vector<int32_t>& words)
 {

@@ -1,5 +1,5 @@
 /// @file
-/// The cases, by what they look at.
+/// The cases, by what they measure.
 #pragma once
 
 #include <vector>

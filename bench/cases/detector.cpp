@@ -1,4 +1,4 @@
-// The search for the signal where there is none.
+// The search for the signal in sound that has none.
 
 #include "cases/cases.hpp"
 #include "cases/sound.hpp"

@@ -1,4 +1,4 @@
-// The whole road: what an application pays for a fingerprint and for the life of a handle.
+// The whole path: what an application pays for a fingerprint and for the life of a handle.
 
 #include <cstdlib>
 #include <iterator>
@@ -62,7 +62,7 @@ SharedBytes as_pcm8(const std::vector<int16_t>& sound)
     return std::make_shared<const Bytes>(std::move(bytes));
 }
 
-// The code whose sample is nearest, by steps of sixteen.
+// The code whose sample is nearest, in steps of sixteen.
 std::vector<uint8_t> alaw_codes()
 {
     const int16_t* const table = KZDSP_GetALawTable();
@@ -89,7 +89,7 @@ SharedBytes as_alaw(const std::vector<int16_t>& sound)
 
 // ---- the cases
 
-/// 16-bit samples beside libchromaprint, which gets the same.
+/// 16-bit samples beside libchromaprint, which receives the same samples.
 Case beside_chromaprint(const std::string& name, uint32_t algorithm, uint32_t rate,
                         uint32_t channels, double must, double goal)
 {

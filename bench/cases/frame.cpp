@@ -91,8 +91,8 @@ Prepared whole_frame()
     return {[appending] { appending->append(); }, [appending] { return appending->digest(); }};
 }
 
-// The bands are a small part of a frame. So they are measured as the difference between frames with
-// this many times the bands and usual frames.
+// The bands are a small part of a frame. They are therefore measured as the difference between
+// frames with this many times the bands and usual frames.
 constexpr uint32_t kTimesTheBands = 65;
 
 Prepared bands()

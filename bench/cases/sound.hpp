@@ -1,5 +1,5 @@
 /// @file
-/// The sound that the cases work on, at the stages of its road.
+/// The sound that the cases work on, at each stage of the path.
 #pragma once
 
 #include <algorithm>

@@ -1,5 +1,5 @@
 // The cosine transforms. Ours work in place, so each run copies its input first; the time of the
-// copy is taken off.
+// copy is subtracted.
 
 #include "cases/cases.hpp"
 #include "cases/sound.hpp"

@@ -1,4 +1,4 @@
-// Into how small pieces a sound is cut.
+// How the cost grows as a sound is cut into smaller pieces.
 
 #include "growth/growth.hpp"
 

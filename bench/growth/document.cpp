@@ -1,4 +1,4 @@
-// How many blocks of values a document has.
+// How the cost grows with the number of value blocks in a document.
 
 #include "growth/growth.hpp"
 #include "peers/peers.hpp"
@@ -34,7 +34,7 @@ void write_document(size_t count)
     require(text != nullptr, "no document");
 }
 
-/// Seconds of processor time; the median of several runs, of which small ones are repeated.
+/// Seconds of processor time; the median of several runs; short ones are repeated.
 double time_of(const std::function<void()>& run, size_t blocks)
 {
     const size_t repetitions = std::max<size_t>(1, 100 / blocks);

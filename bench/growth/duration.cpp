@@ -1,4 +1,4 @@
-// How long a sound is that is handed over whole.
+// How the cost grows with the length of a sound that is passed in whole.
 
 #include <algorithm>
 #include <cstring>
@@ -11,7 +11,7 @@ namespace kz::bench {
 
 namespace {
 
-/// Music for a fingerprint, then nothing for hours. What is not read takes no memory.
+/// Music for a fingerprint, then nothing for hours. Pages that are never read take no memory.
 class LongSound {
 public:
     explicit LongSound(size_t size)

@@ -1,4 +1,4 @@
-// How many frames a frame manager without a limit keeps.
+// How the cost grows with the frames that a frame manager without a limit keeps.
 
 #include "cases/sound.hpp"
 #include "growth/growth.hpp"

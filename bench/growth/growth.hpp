@@ -1,6 +1,5 @@
 /// @file
-/// How the cost grows with what is asked: a table for each question, with the law that it must
-/// obey.
+/// How the cost grows: a table for each quantity that can grow, with the law that it must obey.
 #pragma once
 
 #include <array>
@@ -26,7 +25,7 @@ struct GrowthTable {
 
 struct Growth {
     std::string name;
-    /// `thorough` asks for sizes that take minutes.
+    /// `thorough` selects sizes that take minutes.
     GrowthTable (*measure)(bool thorough);
 };
 

@@ -1,4 +1,4 @@
-// What a handle takes of the heap, and when.
+// How much heap a handle takes, and when.
 
 #include "growth/growth.hpp"
 #include "measure/heap_meter.hpp"

@@ -1,4 +1,4 @@
-// How long the sound is silent before anything is heard.
+// How the cost grows with the silence before the sound.
 
 #include "cases/sound.hpp"
 #include "growth/growth.hpp"

@@ -1,4 +1,4 @@
-// How many threads take fingerprints, each with handles of its own.
+// How throughput grows with the threads that take fingerprints, each with handles of its own.
 
 #include <algorithm>
 #include <functional>
@@ -12,7 +12,7 @@ namespace kz::bench {
 
 namespace {
 
-/// Others that keep a larger part of a processor busy are in the way of threads.
+/// If other programs keep a larger part of a processor busy than this, threads are disturbed.
 constexpr double kInTheWay = 0.1;
 
 struct Rate {

@@ -1,4 +1,4 @@
-// How many fingerprints are taken, one after the other.
+// How the cost grows with the number of fingerprints taken one after the other.
 
 #include <cmath>
 #include <numeric>
@@ -29,7 +29,7 @@ GrowthTable grow_windows(bool thorough)
         std::vector<double> shares;
         std::vector<double> totals;
         for (int round = 0; round < 7; ++round) {
-            // As many single ones, before and after, so that both see the same machine.
+            // As many single ones, before and after, so that both run under the same conditions.
             std::vector<double> singles;
             const auto time_singles = [&] {
                 for (uint32_t i = 0; i < count / 2; ++i) {

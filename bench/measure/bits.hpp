@@ -1,6 +1,6 @@
 /// @file
-/// Whether the variant of the inner loops that is to be timed makes the same words as the plain
-/// one: a fast wrong loop is worth nothing.
+/// Whether the variant of the inner loops that is to be timed is bit-identical to the plain one: a
+/// fast wrong loop is worth nothing.
 #pragma once
 
 #include <string>

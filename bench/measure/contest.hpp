@@ -1,5 +1,5 @@
 /// @file
-/// Our work and its peers, slice beside slice.
+/// Our work and its peers, timed in alternating slices.
 #pragma once
 
 #include <optional>
@@ -29,7 +29,7 @@ struct Result {
 /// A case under way.
 class Contest {
 public:
-    /// Verifies the peers, and warms all up.
+    /// Verifies the peers, and warms everything up.
     ///
     /// @param slice_seconds  Length of a slice, or of a single run where that takes longer.
     Contest(const Prepared& prepared, double slice_seconds);

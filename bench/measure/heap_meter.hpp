@@ -1,8 +1,8 @@
 /// @file
-/// Counts what the library asks of the heap.
+/// Counts what the library allocates from the heap.
 ///
 /// The program is linked with the heap functions wrapped (`ld --wrap`), so calls from the static
-/// library are seen, those of the peers are not.
+/// library are counted, those of the peers are not.
 #pragma once
 
 #include <cstdint>
@@ -18,7 +18,7 @@ struct HeapUse {
 /// Of this thread; on a program's main thread, of all that has happened since its start.
 HeapUse heap_use();
 
-/// Lets the peak begin anew with what is held now.
+/// Resets the peak to what is held now.
 void reset_heap_peak();
 
 } // namespace kz::bench

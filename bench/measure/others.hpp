@@ -15,7 +15,7 @@ namespace kz::bench {
 /// Watches, as long as it lives, how much processor time others take.
 class OthersWork {
 public:
-    /// Processors that others kept busy, on the average; 0.1 is a tenth of one.
+    /// Processors that others kept busy, on average; 0.1 is a tenth of one.
     double processors() const
     {
         const double own = read_clock(CLOCK_PROCESS_CPUTIME_ID) - own_;

@@ -1,5 +1,5 @@
 /// @file
-/// A piece of work repeated for some milliseconds: the unit of which everything is measured.
+/// A piece of work repeated for some milliseconds: the unit in which everything is measured.
 #pragma once
 
 #include <algorithm>
@@ -27,7 +27,7 @@ public:
         count_ = static_cast<uint64_t>(wanted);
     }
 
-    /// Seconds of processor time that one run took, on the average of a slice.
+    /// Seconds of processor time that one run took, averaged over a slice.
     double measure() const { return time(count_); }
 
 private:

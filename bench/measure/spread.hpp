@@ -1,5 +1,5 @@
 /// @file
-/// What is said of a number that was measured many times.
+/// Summary of a number that was measured many times: median and quartiles.
 #pragma once
 
 #include <algorithm>

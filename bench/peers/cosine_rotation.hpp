@@ -1,6 +1,6 @@
 /// @file
-/// What turns a real Fourier transform into a cosine transform. Compiled by itself for the very
-/// processor that builds, as a user of FFTW would at his best.
+/// What turns a real Fourier transform into a cosine transform. Compiled separately for the
+/// building machine's own processor, as a careful user of FFTW would.
 #pragma once
 
 #include <cstdint>

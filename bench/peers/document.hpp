@@ -1,6 +1,5 @@
 /// @file
-/// The query document as the peers write it: the texts of its parts, and the check of what they
-/// make of them.
+/// The query document as the peers write it: the texts of its parts, and the check of the result.
 #pragma once
 
 #include <string>

@@ -29,7 +29,7 @@ Floats floats(size_t count) { return Floats(fftwf_alloc_real(count)); }
 
 constexpr unsigned kPatience = FFTW_PATIENT | FFTW_DESTROY_INPUT;
 
-/// Planning with patience takes minutes the first time, nothing once it is remembered.
+/// Planning with patience takes minutes the first time, and nothing once the plans are stored.
 template <class MakePlan>
 Plan remembered(MakePlan make_plan)
 {
@@ -108,8 +108,8 @@ private:
     Plan plan_;
 };
 
-// These arrays fill much of a second-level cache, and by the pages that they happen to get a
-// transform can take half as long again. So several are made, and the luckiest is kept.
+// These arrays fill much of a second-level cache, and depending on the pages that they happen to
+// get a transform can take half as long again. Several are therefore made, and the fastest is kept.
 template <class Transform>
 std::shared_ptr<const Transform> best_placed(uint32_t length)
 {

@@ -39,7 +39,7 @@ struct ContextHeap {
 ContextHeap chromaprint_heap(const std::vector<int16_t>& samples, uint32_t rate, uint32_t channels);
 
 /// FFTW's own DCT-II, and one over its real transform. Single precision, out of place, planned with
-/// patience once and remembered in a file.
+/// patience once and stored in a file.
 Peer cosine_by_fftw(uint32_t length);
 Peer cosine_by_real_fftw(uint32_t length);
 

@@ -39,8 +39,8 @@ inline size_t resampled_room(uint32_t rate, size_t block)
     return block * kWorkingRate / rate + 512;
 }
 
-/// Throws unless a block becomes as many samples, on the average, as the rates ask for, and they
-/// are not silent.
+/// Throws unless a block becomes as many samples, on average, as the rates require, and they are
+/// not silent.
 template <class Stream>
 void verify_flow(const std::string& name, uint32_t rate, size_t block, Stream& stream)
 {
@@ -57,7 +57,7 @@ void verify_flow(const std::string& name, uint32_t rate, size_t block, Stream& s
     require(loudest > 0.05 * kFullScale<Sample>, name + ": silence");
 }
 
-/// A peer over a stream, of which step() resamples a block from `input` to `output` and tells how
+/// A peer over a stream, of which step() resamples a block from `input` to `output` and returns how
 /// many samples it made.
 template <class Stream>
 Peer resampling_peer(const std::string& name, uint32_t rate, size_t block)

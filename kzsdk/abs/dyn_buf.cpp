@@ -1,3 +1,8 @@
+/// @file
+/// A byte buffer that grows by a fixed step, for documents of a few hundred bytes.
+///
+/// The block belongs to the buffer until it is handed over. Bytes appended may lie in the buffer
+/// itself. A failure leaves the buffer as it was.
 #include "kzsdk/abs/dyn_buf.h"
 
 #include <algorithm>
@@ -9,7 +14,7 @@
 
 namespace {
 
-/// Sizes asked of the heap are never 0: what the heap then does (null, or a resize that frees)
+/// The heap is never called with a size of 0: what it then does (null, or a resize that frees)
 /// differs between systems.
 constexpr uint32_t block_size(uint32_t capacity) noexcept { return std::max(capacity, 1u); }
 
@@ -24,6 +29,7 @@ uint32_t offset_inside(const kz_dyn_buf& buffer, const void* bytes) noexcept
     return inside ? static_cast<uint32_t>(at - begin) : kOutside;
 }
 
+/// False, with nothing changed, when memory is short.
 bool resize(kz_dyn_buf& buffer, uint32_t capacity) noexcept
 {
     void* data = _kzmem_realloc(buffer.data, block_size(capacity));
@@ -35,6 +41,7 @@ bool resize(kz_dyn_buf& buffer, uint32_t capacity) noexcept
     return true;
 }
 
+/// Grows by the step, or by the shortfall where that is larger. False also beyond 32 bits.
 bool grow(kz_dyn_buf& buffer, uint32_t shortfall) noexcept
 {
     const uint64_t capacity = uint64_t{buffer.capacity} + std::max(buffer.grow_by, shortfall);

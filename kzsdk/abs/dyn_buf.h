@@ -2,9 +2,9 @@
  * @file
  * A growable byte buffer, filled piece by piece and handed over as one block.
  *
- * It keeps bytes only; whoever wants a text appends the NUL. It grows by a fixed step and not by a
- * factor: right for documents of a few hundred bytes, while a large one costs time in the square of
- * its length wherever `realloc` has to copy. A failed call leaves the buffer as it was.
+ * It keeps bytes only; callers that want a text append the NUL. It grows by a fixed step and not by
+ * a factor: right for documents of a few hundred bytes, while a large one costs time in the square
+ * of its length wherever `realloc` has to copy. A failed call leaves the buffer as it was.
  *
  * Threads: one buffer belongs to one thread at a time.
  */
@@ -16,7 +16,7 @@
 
 KZ_C_BEGIN
 
-/** The buffer, made by kz_dyn_buf_create() and its maker's until disposed of. */
+/** A buffer. It belongs to the caller of kz_dyn_buf_create() until disposed of. */
 typedef struct kz_dyn_buf {
     uint8_t* data;     /**< owned; from the library's allocator */
     uint32_t length;   /**< bytes in use, from the start of `data` */

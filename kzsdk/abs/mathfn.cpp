@@ -1,3 +1,8 @@
+/// @file
+/// Mathematical functions in double precision, as the C library has them.
+///
+/// All of the library calls them through here, so that there is one place to look at when a result
+/// differs between systems.
 #include "kzsdk/abs/mathfn.h"
 
 #include <algorithm>

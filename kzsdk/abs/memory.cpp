@@ -1,3 +1,8 @@
+/// @file
+/// The memory manager: a switch in front of the system heap, and no bookkeeping of blocks.
+///
+/// While it is off every allocation returns null and nothing is freed. A plain start and counted
+/// holders keep it on, see memory_state.hpp.
 #include "kzsdk/abs/memory.h"
 
 #include <atomic>

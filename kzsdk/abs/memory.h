@@ -2,9 +2,10 @@
  * @file
  * Memory manager: one process-wide switch in front of the system heap.
  *
- * The switch starts off. While it is off every allocation fails and nothing is freed. There is no
- * reference count: one kzmem_shutdown() switches memory off for every user in the process, and the
- * blocks that are still out can then no longer be given back. Dispose of everything first.
+ * The switch starts off. While it is off every allocation fails and nothing is freed. One
+ * kzmem_shutdown() switches memory off for every user in the process, however often it was switched
+ * on, and the blocks that are still out can then no longer be given back. Dispose of everything
+ * first; startup.h has a counted start for code that shares its process.
  *
  * Threads: the switch is read and written atomically; the allocation functions are as safe for use
  * from several threads as the system heap. Switching off while another thread works with the
@@ -35,7 +36,7 @@ KZ_API kz_status kzmem_initialize(uint32_t first, int32_t second) KZ_NOEXCEPT;
 KZ_API kz_status kzmem_shutdown(void) KZ_NOEXCEPT;
 
 /**
- * Tells whether the memory manager is on.
+ * Reports whether the memory manager is on.
  *
  * @return KZ_MEM_ALREADY_ON when it is on, KZ_MEM_NOT_ON when it is off; never 0.
  */

@@ -1,3 +1,5 @@
+/// @file
+/// Starting the library up and shutting it down: both come down to the memory manager's switch.
 #include "kzsdk/abs/startup.h"
 
 #include "kzsdk/abs/memory.h"

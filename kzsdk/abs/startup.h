@@ -13,7 +13,7 @@
  *   start-ups went before it. Dispose of everything first.
  *
  * Side by side: a plain start lasts through any number of counted releases. After a plain shut-down
- * the holders' allocations fail until somebody starts the library again in either way; holders stay
+ * the holders' allocations fail until the library is started again in either way; holders stay
  * counted, and each still makes its release.
  *
  * Threads: acquire and release may run at any time on any thread. A plain start-up or shut-down
@@ -35,7 +35,7 @@ typedef struct kzconf_configuration {
     const char* memory_arg_text; /**< decimal text, read with kz_atoi32(); null counts as 0 */
     uint32_t memory_arg;         /**< first argument of kzmem_initialize() */
     uint8_t memory_args_present; /**< 1: the two fields above are used; else 0 and 0 are */
-    uint32_t reserved[14];       /**< cleared, and read by nobody */
+    uint32_t reserved[14];       /**< cleared and never read */
 } kzconf_configuration;
 
 /**

@@ -1,4 +1,6 @@
-// The sentence for each status: what went wrong, and what cures it. status.h says the same at each name.
+/// @file
+/// The sentence for each status: what went wrong, and what cures it. status.h says the same at each
+/// name.
 #include "kzsdk/abs/status.h"
 
 namespace {

@@ -1,3 +1,8 @@
+/// @file
+/// Strings, numbers and character classes that do not differ between systems or locales.
+///
+/// Comparisons return exactly -1, 0 or 1; lengths and numbers have 32 bits and saturate; the
+/// classes are those of ASCII. Only kz_snprintf() follows the locale, for a decimal point.
 #include "kzsdk/abs/text.h"
 
 #include <algorithm>
@@ -14,6 +19,7 @@ namespace {
 
 constexpr uint32_t kLongest = std::numeric_limits<uint32_t>::max();
 
+/// -1, 0 or 1.
 constexpr int16_t sign(int order) noexcept
 {
     return static_cast<int16_t>((order > 0) - (order < 0));
@@ -38,7 +44,7 @@ constexpr bool is_space(uint8_t byte) noexcept
     return byte == ' ' || is_between(byte, '\t', '\r');
 }
 
-/// The rule by which every class takes its argument: its low 8 bits. Those of -1 (end of file) are
+/// How every class but digits reads its argument: the low 8 bits. Those of -1 (end of file) are
 /// 255, which is in no class of ASCII.
 template <class Class>
 int32_t is_in_class(int32_t character, Class belongs) noexcept
@@ -52,7 +58,8 @@ constexpr int folded(char character) noexcept
     return is_upper(byte) ? byte + ('a' - 'A') : byte;
 }
 
-/// Not `strcasecmp`: that one follows the process's locale.
+/// Compares at most `count` bytes regardless of ASCII case. `strcasecmp` would follow the locale of
+/// the process.
 int16_t compare_folded(const char* a, const char* b, uint64_t count) noexcept
 {
     for (uint64_t i = 0; i < count; ++i) {
@@ -64,6 +71,7 @@ int16_t compare_folded(const char* a, const char* b, uint64_t count) noexcept
     return 0;
 }
 
+/// Reports a number that does not fit as the C library does.
 template <class Word>
 Word out_of_range(Word nearest) noexcept
 {

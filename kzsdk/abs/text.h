@@ -2,8 +2,8 @@
  * @file
  * Texts, counted bytes, numbers in texts and character classes.
  *
- * A text is a NUL-terminated string of bytes. Most functions are the C library's function of the
- * like name; what differs is said. Three rules hold for all: a comparison returns exactly -1, 0 or
+ * A text is a NUL-terminated string of bytes. Most functions are the C library's of a similar
+ * name; differences are stated. Three rules hold for all: a comparison returns exactly -1, 0 or
  * 1; character classes and case are those of plain ASCII, whatever the process's locale; null is
  * allowed only where a function says so.
  */

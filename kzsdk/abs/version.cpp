@@ -1,5 +1,7 @@
-// The version of the library, and the texts that name the platform. The dates are fixed: services that
-// log these texts know them, and builds stay reproducible.
+/// @file
+/// The version of the library, and the texts that name the platform. Their dates are part of the
+/// texts, not the day of the build: services that log the texts expect them, and builds stay
+/// reproducible.
 #include "kzsdk/abs/version.h"
 
 const char* kzsdk_get_version() noexcept { return KZSDK_VERSION; }

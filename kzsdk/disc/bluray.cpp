@@ -1,3 +1,8 @@
+/// @file
+/// The exported calls of the Blu-ray family, directories apart, and the builders of its paths.
+///
+/// A builder puts a NUL into the last byte of its destination before it writes, and reports no text
+/// that was cut, with one exception. The root "/" gets a second slash.
 #include "kzsdk/disc/bluray.hpp"
 
 #include "kzsdk/abs/text.h"
@@ -6,6 +11,7 @@ namespace {
 
 using kz::disc::bluray;
 
+// Room for a fixed name with a number of at most 20 digits in it.
 constexpr uint32_t kNumberedSize = 64;
 
 bool ends_in_slash(const char* root) noexcept
@@ -26,6 +32,7 @@ int32_t write_below(const char* root, const char* tail, char* destination, uint3
     return kz_snprintf(destination, size, "%s%s%s", root, ends_in_slash(root) ? "" : "/", tail);
 }
 
+/// The common form of the builders: arguments checked, the last error set or cleared.
 kz_status build_below(const char* root, const char* tail, char* destination, uint32_t size) noexcept
 {
     if (root == nullptr || !can_build(destination, size)) {
@@ -86,7 +93,7 @@ kz_status kzbdfs_get_cert_dirname(const char* root, char* destination, uint32_t 
     if (root == nullptr || !can_build(destination, size)) {
         return bluray.keep(KZ_DISC_ERROR_INVALID_ARGUMENT);
     }
-    // Only 16 bits of the length are looked at.
+    // The only builder that reports a text that was cut, and only 16 bits of the length count.
     const auto length = static_cast<uint16_t>(write_below(root, "AACS/", destination, size));
     return bluray.keep(size > length ? KZ_OK : KZ_DISC_ERROR_MEMORY);
 }

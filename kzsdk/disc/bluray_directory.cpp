@@ -1,3 +1,9 @@
+/// @file
+/// Listing the directories of a Blu-ray disc.
+///
+/// The records here live on the system heap: directories can be listed before the library is
+/// started and after it was shut down, and whether the family is on or off. An entry's name belongs
+/// to the stream; its path is a copy of its own.
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
@@ -7,13 +13,11 @@
 
 #include "kzsdk/disc/bluray.hpp"
 
-// The records here live on the system heap: directories can be listed before the library is started
-// and after it was shut down.
-
 namespace {
 
 using kz::disc::bluray;
 
+/// Frees either record by its exported call.
 struct FreeRecord {
     void operator()(kzbdfs_dir* dir) const noexcept { kzbdfs_close_dir(dir); }
     void operator()(kzbdfs_dirent* entry) const noexcept { kzbdfs_free_dirent(entry); }
@@ -21,6 +25,7 @@ struct FreeRecord {
 template <class Record>
 using heap_owned = std::unique_ptr<Record, FreeRecord>;
 
+/// A cleared record; null when memory is short.
 template <class Record>
 heap_owned<Record> make_on_heap() noexcept
 {
@@ -64,6 +69,7 @@ const dirent* next_record(DIR* stream) noexcept
     return record;
 }
 
+/// False for a null entry.
 bool is_named(const kzbdfs_dirent* entry, const char* name) noexcept
 {
     return entry != nullptr && std::strcmp(entry->record->d_name, name) == 0;

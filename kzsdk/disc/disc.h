@@ -7,7 +7,7 @@
  * from its allocator.
  *
  * Each family has a switch, off at first, and a last error. Both are the process's, atomic and
- * without a lock: another thread's failure may be the one that get_error tells, so look at what a
+ * without a lock: another thread's failure may be the one that get_error returns, so look at what a
  * call returns. While a family is off, open, seek, read, read_at, close, read_vol_label and
  * kzdvdfs_exists() do nothing but fail with KZ_DISC_NOT_ON. The names are built, and directories
  * listed, whether it is on or off.
@@ -101,9 +101,9 @@ KZ_API kz_status kzbdfs_close(int32_t descriptor) KZ_NOEXCEPT;
  * Reads the volume label of the disc in /dev/dvd: the UDF volume identifier in sector 32, up to its
  * first white space.
  *
- * IMPORTANT: each success leaves a descriptor of the device open that nobody is told of and nobody
- * can close. Ask once for a disc: after about a thousand labels the process can open nothing any
- * more. (A program that is started does not inherit it.)
+ * IMPORTANT: each success leaves a descriptor of the device open that is not handed out and cannot
+ * be closed. Call it once for a disc: after about a thousand labels the process can open nothing
+ * any more. (A program that is started does not inherit the descriptor.)
  *
  * What is read is not checked: other bytes than a label come out where sector 32 does not hold the
  * volume descriptor, and none where the device ends earlier. A label of 30 characters, the most
@@ -112,7 +112,7 @@ KZ_API kz_status kzbdfs_close(int32_t descriptor) KZ_NOEXCEPT;
  *
  * @param root         Must not be null and is not used otherwise: the device is always /dev/dvd, or
  *                     whatever that links to.
- * @param capacity     Bytes of room at @p label. A longer label is cut, and nothing tells so.
+ * @param capacity     Bytes of room at @p label. A longer label is cut without notice.
  * @param[out] length  Takes the bytes written, 0 .. 32; 0 on failure.
  * @param[out] label   Takes the label, without a NUL.
  * @return 0, and no last error is left; KZ_DISC_ERROR_INVALID_ARGUMENT when a pointer is null (@p
@@ -202,7 +202,7 @@ KZ_API void kzbdfs_close_dir(kzbdfs_dir* handle) KZ_NOEXCEPT;
  *
  * They return 0, and no last error is left; KZ_DISC_ERROR_INVALID_ARGUMENT when a pointer is null
  * or `size` is 0. A text that was cut names another file, and only kzbdfs_get_cert_dirname() may
- * tell: give more room than the root's length and 64 bytes.
+ * report it: give more room than the root's length and 64 bytes.
  */
 
 /** "Content003.cer" for the number 3. At least three digits; no directory. */

@@ -19,6 +19,8 @@ namespace kz::disc {
 
 constexpr const char* kDevice = "/dev/dvd";
 
+/// The status for what a system call leaves in `errno`. 0, which read_at() leaves for a move that
+/// went elsewhere, counts as an error of the system like any other.
 constexpr kz_status status_of(int error) noexcept
 {
     switch (error) {
@@ -39,12 +41,14 @@ constexpr kz_status status_of(int error) noexcept
     }
 }
 
-/// One family. Its two words are the process's; each is read and written atomically, without order
-/// between them.
+/// One family. Its two words belong to the whole process; each is read and written atomically,
+/// without order between them. A success leaves the last error of an earlier failure in place
+/// unless the call says otherwise.
 class Family {
 public:
     explicit constexpr Family(int64_t label_offset) noexcept : label_offset_(label_offset) {}
 
+    /// Success clears the last error.
     kz_status initialize() noexcept
     {
         return keep(on_.exchange(true, kRelaxed) ? KZ_DISC_ALREADY_ON : KZ_OK);
@@ -60,6 +64,7 @@ public:
         return is_on() ? KZ_DISC_ALREADY_ON : KZ_DISC_NOT_ON;
     }
 
+    /// Returns the last error and clears it.
     kz_status take_error() noexcept { return last_error_.exchange(KZ_OK, kRelaxed); }
 
     /// Makes a status the last error and hands it on.
@@ -87,6 +92,7 @@ public:
         return is_ready() ? checked(path != nullptr ? ::open(path, O_RDONLY) : refuse_null()) : -1;
     }
 
+    /// An unknown origin is reported as a missing file.
     int64_t seek(int32_t descriptor, int64_t offset, int32_t whence) noexcept
     {
         if (!is_ready()) {
@@ -117,6 +123,8 @@ public:
         return ::close(descriptor) == 0 ? KZ_OK : keep_errno();
     }
 
+    /// Reads from the one device there is; the root is only checked. On success the device stays
+    /// open.
     kz_status read_vol_label(const char* root, uint32_t capacity, uint32_t* length,
                              char* label) noexcept
     {
@@ -127,7 +135,8 @@ public:
         if (!is_ready()) {
             return KZ_DISC_NOT_ON;
         }
-        // Nobody is told of this descriptor, so at least a program that is started does not get it.
+        // The descriptor is not handed out and never closed, so at least a program that is started
+        // does not inherit it.
         const int device = ::open(kDevice, O_RDONLY | O_CLOEXEC);
         if (device < 0) {
             return keep_errno();
@@ -156,7 +165,7 @@ private:
 
     bool is_on() const noexcept { return on_.load(kRelaxed); }
 
-    /// What the system answers to a path that is null; the C library does not promise to ask it.
+    /// What the system reports for a null path. The C library need not pass one on to it.
     static int refuse_null() noexcept
     {
         errno = EFAULT;

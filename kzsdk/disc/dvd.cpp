@@ -1,3 +1,8 @@
+/// @file
+/// The exported calls of the DVD family, and the builders of its paths.
+///
+/// Unlike those of the Blu-ray family, the builders return a length, leave the last error alone and
+/// always put a slash behind the root, also behind one that ends in a slash.
 #include "kzsdk/abs/text.h"
 #include "kzsdk/disc/disc.h"
 #include "kzsdk/disc/disc_family.hpp"
@@ -6,7 +11,8 @@ namespace {
 
 constinit kz::disc::Family dvd(kz::disc::kIso9660Label);
 
-/// Writes the root and a tail behind it. Returns the length of the whole.
+/// Writes the root and a tail behind it. Returns the length of the whole, whether it fitted or not;
+/// -1 for null arguments.
 int32_t build(const char* root, const char* tail, char* destination, uint32_t size) noexcept
 {
     if (root == nullptr || (destination == nullptr && size != 0)) {

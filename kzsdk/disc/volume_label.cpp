@@ -1,3 +1,8 @@
+/// @file
+/// Reads the volume label of a disc: up to 32 bytes at a fixed offset, cut at the first white
+/// space.
+///
+/// Nothing checks that a volume descriptor lies there; any bytes are taken for a label.
 #include "kzsdk/disc/volume_label.hpp"
 
 #include "kzsdk/abs/text.h"

@@ -36,7 +36,7 @@ typedef struct KZDSP_resampler_fixed {
  * Makes a resampler between two rates, of which fractions of a hertz are dropped.
  *
  * @param input_rate   Q15: hertz times 32768. 8000, 16000, 22050, 24000, 32000, 44100 or 48000 Hz.
- * @param output_rate  Q15: 11025 Hz. Two further pairs are known: 2 and 1 "Hz", which halves any
+ * @param output_rate  Q15: 11025 Hz. Two further pairs exist: 2 and 1 "Hz", which halves any
  *                     rate, and equal rates, which copy.
  * @return The resampler, which the caller frees with KZDSP_resampler_fixed_destroy(); null for a
  *         rate of 0, any other pair, or when memory is short.
@@ -176,7 +176,7 @@ KZ_API uint32_t KZDSP_ComputeRawLength(const KZDSP_resampler* resampler,
  * product and each addition.
  *
  * Timing: as in KZDSP_resampler_fixed_resample(), of which every call consumes and produces the
- * same counts at the rates that it knows.
+ * same counts at the rates that it supports.
  *
  * Scaling:  full level at every rate, 22050 and 44100 Hz included; upsampling gains L / M, so
  *           8000 Hz comes out at 1.376 times full level.

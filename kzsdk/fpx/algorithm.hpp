@@ -48,6 +48,7 @@ constexpr Algorithm algorithm_row(uint32_t id) noexcept
 
 } // namespace kz::fpx
 
+/// What a caller holds. The row outlives every handle; the instance belongs to it.
 struct kz_fpx_handle {
     const kz::fpx::Algorithm* algorithm;
     void* instance;

@@ -1,3 +1,8 @@
+/// @file
+/// The extraction interface: creating, feeding and freeing a fingerprint context.
+///
+/// A handle is a row of the table of algorithms and the fingerprinter that this row created.
+/// Nothing is kept here; every status of a fingerprinter is passed on unchanged.
 #include "kzsdk/fpx/fpx.h"
 
 #include <array>
@@ -11,6 +16,7 @@ namespace {
 
 using kz::fpx::Algorithm;
 
+// Searched in this order; a new algorithm is one more row.
 constexpr std::array kAlgorithms = {
     kz::fpx::algorithm_row<kzqvfixed_fingerprinter, kzqvfixed_constructor, kzqvfixed_destructor,
                            kzqvfixed_add_samples, kzqvfixed_get_result>(KZ_FPX_ALGORITHM_FIXED),

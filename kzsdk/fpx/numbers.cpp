@@ -1,5 +1,6 @@
-// What a fingerprint context reports as numbers: the values, where the signal starts, the times and
-// the progress. Each call reads the algorithm's own object and converts nothing but units.
+/// @file
+/// What a fingerprint context reports as numbers: the values, where the signal starts, the times
+/// and the progress. Each call reads the algorithm's own object and converts nothing but units.
 
 #include "kzsdk/fpx/algorithm.hpp"
 #include "kzsdk/fpx/fpx.h"
@@ -22,7 +23,7 @@ auto visit(const kz_fpx_handle& handle, Use use) noexcept
                *static_cast<const kzqvfixed_fingerprinter*>(handle.instance));
 }
 
-// Stores a result that the caller may not have asked for.
+// Stores a result unless the caller passed null for it.
 template <class Number>
 void store(Number* out, Number number) noexcept
 {

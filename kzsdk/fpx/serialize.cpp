@@ -1,3 +1,9 @@
+/// @file
+/// The query document of a fingerprint as text: the algorithm's tag tree, rendered with
+/// declaration, indentation and line breaks.
+///
+/// The tree is always freed; the text belongs to the caller. Indentation can hide that memory was
+/// short while rendering, see RenderXMLTagToStrEx().
 #include "kzsdk/abs/memory.h"
 #include "kzsdk/fpx/algorithm.hpp"
 #include "kzsdk/fpx/fpx.h"

@@ -1,3 +1,9 @@
+/// @file
+/// The native methods of the Java class, and the way back to Java for the events.
+///
+/// A Java object holds a number, not an address: the number finds a session in a registry, or
+/// nothing once the session has ended. So calls may come on any thread, in any order and twice. The
+/// audio of a request is copied out of the Java array and kept until the next request is accepted.
 #include "kzsdk/jni/bridge.hpp"
 
 #include <array>
@@ -190,7 +196,7 @@ jint com_orvanta_android_kzsdk_Fingerprint_native_generate(JNIEnv* env, jobject 
         static_cast<uint32_t>(sample_rate), channels, format_code, bits_per_sample,
         reinterpret_cast<const uint8_t*>(audio.get()), static_cast<uint32_t>(length));
     if (code == android::kOk) {
-        session->audio = std::move(audio); // the worker knows the new audio only: the old one goes
+        session->audio = std::move(audio); // only the new audio is used now: the old is freed
     }
     return code;
 }

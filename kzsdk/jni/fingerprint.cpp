@@ -1,3 +1,8 @@
+/// @file
+/// One job: from a buffer of audio to the text of its query document, by the extraction interface.
+///
+/// The core is started once per process and stays up. Every failure is logged where it happens; the
+/// result is only 0 or one code.
 #include "kzsdk/jni/fingerprint.hpp"
 
 #include <algorithm>

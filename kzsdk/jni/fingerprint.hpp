@@ -10,7 +10,8 @@
 
 namespace android {
 
-/// The encodings that a job tells apart. It can fingerprint the first four that have a name.
+/// The encodings between which a job distinguishes. It can fingerprint the first four that have a
+/// name.
 enum class KZWaveFileEncoding : int32_t {
     Unknown = 0,
     Pcm8 = 1,

@@ -1,3 +1,8 @@
+/// @file
+/// The worker: one thread that runs one job at a time and reports its end by an event.
+///
+/// One mutex guards all of the state and is held for the whole run of a job, the event included.
+/// Both a start and a release wait until the worker has answered.
 #include "kzsdk/jni/fingerprint_thread.hpp"
 
 #include <cstring>

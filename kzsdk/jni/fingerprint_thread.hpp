@@ -101,7 +101,7 @@ private:
     bool exit_requested_ = false;
     Fingerprint* job_ = nullptr;
     char* result_;
-    // A condition may wake without reason. These two tell a starter and a stopper that it did not.
+    // A wait may end without a reason. By these two a starter and a stopper see that there was one.
     bool running_ = false;
     bool exited_ = false;
 };

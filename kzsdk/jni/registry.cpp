@@ -1,3 +1,6 @@
+/// @file
+/// The sessions by number. Numbers are handed out upwards, so an old one does not find a new
+/// session.
 #include "kzsdk/jni/registry.hpp"
 
 #include "kzsdk/jni/lock.hpp"
@@ -42,6 +45,7 @@ Registered* Registry::claim(int32_t number) noexcept
     return object;
 }
 
+/// Waits until no pin is left. The object is out of the list before, so no new pin can come.
 void Registry::remove(Registered& object) noexcept
 {
     const Lock lock(mutex_);
@@ -61,6 +65,7 @@ Registered** Registry::find(int32_t number) noexcept
     return link;
 }
 
+/// After 2^32 sessions numbers begin again; 0 and those still in use are passed over.
 int32_t Registry::next_number() noexcept
 {
     do {

@@ -1,3 +1,9 @@
+/// @file
+/// What the bridge needs of the Java VM: an environment for each thread, and binding native
+/// methods.
+///
+/// A thread that was attached here is detached when it ends, by the destructor of a thread-specific
+/// value.
 #include "kzsdk/jni/runtime.hpp"
 
 #include <atomic>

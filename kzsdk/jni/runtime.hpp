@@ -17,7 +17,7 @@ public:
     static int registerNativeMethods(JNIEnv* env, const char* class_name,
                                      const JNINativeMethod* methods, int count) noexcept;
 
-    /// The calling thread's environment. A thread that the VM does not know is attached to it, as a
+    /// The calling thread's environment. A thread that is new to the VM is attached to it, as a
     /// daemon, which does not keep the VM from ending, and detached when it ends. Null when that
     /// fails.
     static JNIEnv* getJNIEnv() noexcept;

@@ -24,6 +24,7 @@ void copy_table(const Entry* source, uint32_t count, Entry** out_table,
     *out_table = copy.release();
 }
 
+/// Frees a configuration with its table; null is ignored.
 template <class Config>
 kz_status destroy_config(Config* config) noexcept
 {
@@ -55,6 +56,7 @@ kz_status create_config(const Config& defaults, std::span<const Entry> table, Co
     return KZ_OK;
 }
 
+/// Hands out a copy of the table. Reports success, and touches nothing, when there is no table.
 template <class Config, class Entry>
 kz_status copy_freq_table(const Config* config, Entry** out_table, uint32_t* out_count) noexcept
 {
@@ -64,7 +66,8 @@ kz_status copy_freq_table(const Config* config, Entry** out_table, uint32_t* out
     return KZ_OK;
 }
 
-/// Replaces the table by a copy of `table`, which may be the configuration's own.
+/// Replaces the table by a copy of `table`, which may be the configuration's own. When memory is
+/// short there is none afterwards, and success is reported: the next frame manager is then refused.
 template <class Config, class Entry>
 kz_status set_freq_table(Config* config, const Entry* table, uint32_t count) noexcept
 {

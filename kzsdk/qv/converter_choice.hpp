@@ -1,11 +1,12 @@
 /// @file
-/// Runs the sample converter that an input's format and channel count ask for.
+/// Runs the sample converter for an input's format and channel count.
 #pragma once
 
 #include <cstdint>
 
 namespace kz::qv {
 
+/// The numbers by which callers name the format of their samples.
 enum InputFormat : uint32_t { kPcm8 = 1, kPcm16 = 2, kALaw = 3, kULaw = 4 };
 
 constexpr bool is_input_format(uint32_t format) noexcept

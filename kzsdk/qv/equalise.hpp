@@ -48,6 +48,7 @@ kz_status equalise_two_pieces(const Sample* first, uint32_t first_count, const S
     return KZ_OK;
 }
 
+/// A frame that is equalised in place needs no copy of itself.
 template <class Sample>
 void copy_unless_in_place(const Sample* input, Sample* output, uint32_t count) noexcept
 {

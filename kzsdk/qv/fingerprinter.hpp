@@ -25,11 +25,17 @@ namespace kz::qv {
 inline constexpr char kAlgorithmName[] = "Quenvar";
 inline constexpr char kAlgorithmVersion[] = "1.1";
 
+/// The operations of a fingerprinter, without state of their own: an object is the twin's record.
 template <class Twin>
 class Fingerprinter {
 public:
     using Object = typename Twin::Object;
 
+    /// Makes an object that is ready to be fed. On failure nothing is left and `out_object` is not
+    /// touched. The configuration serves only here; the parts keep what they need of it.
+    ///
+    /// @return 0; KZ_QV_ERROR_INVALID_ARGUMENT; KZ_QV_ERROR_MEMORY also for an input rate that the
+    ///         resampler does not support.
     static kz_status create(uint32_t sample_rate, uint32_t format, uint32_t channels,
                             Object** out_object) noexcept
     {
@@ -60,6 +66,7 @@ public:
         return KZ_OK;
     }
 
+    /// Also for an object whose parts were not all made.
     static kz_status destroy(Object* object) noexcept
     {
         if (object == nullptr) {
@@ -73,6 +80,8 @@ public:
         return KZ_OK;
     }
 
+    /// Feeds audio. The status that stops the feed loop at the frame limit does not leave here: it
+    /// becomes the flag.
     static kz_status add_samples(Object* object, const void* bytes, uint32_t byte_count,
                                  uint8_t* out_complete) noexcept
     {
@@ -89,6 +98,7 @@ public:
         return status;
     }
 
+    /// Makes the query document, which the caller disposes.
     static kz_status get_result(const Object* object, XMLTag** out_tree) noexcept
     {
         if (object == nullptr || out_tree == nullptr) {
@@ -146,6 +156,7 @@ public:
                     frames == 0 ? 0 : Twin::milliseconds(o, (frames - 1) * o.hop + o.frame_length)};
     }
 
+    /// A count of samples at the working rate in seconds.
     static double seconds(const Object& o, uint32_t samples) noexcept
     {
         return Twin::seconds(o, samples);
@@ -171,6 +182,7 @@ private:
         }
     };
 
+    /// Makes the parts as far as memory allows; what is missing stays null.
     static void make_parts(Object& o, const Config& config) noexcept
     {
         o.working_rate = config.sample_rate;
@@ -192,6 +204,8 @@ private:
                o.signal_detector != nullptr && o.frame_bytes != 0 && o.ring != nullptr;
     }
 
+    /// Starts a stream: the search for the signal begins anew, and the ring is written from its
+    /// start.
     static void reset(Object& o) noexcept
     {
         Twin::reset_resampler(o.resampler);

@@ -14,6 +14,7 @@
 
 namespace kz::qv {
 
+/// Whether the fingerprint is complete; never without a limit.
 template <class Manager>
 bool reached_limit(const Manager& manager) noexcept
 {
@@ -52,6 +53,7 @@ owned<Record> make_frame_record(uint32_t bands) noexcept
     return owned<Record>(record);
 }
 
+/// Links a record at the end, through the last link of the list; the manager owns it from then on.
 template <class Manager, class Record>
 void append_record(Manager& manager, owned<Record> record) noexcept
 {

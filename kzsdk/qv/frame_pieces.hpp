@@ -8,6 +8,7 @@
 
 namespace kz::qv {
 
+/// A frame's samples, those of the ring's end first.
 template <class Sample>
 struct FramePieces {
     std::span<const Sample> older;
@@ -24,6 +25,7 @@ FramePieces<Sample> cut_to_frame(const Sample* first, uint32_t first_count, cons
     return {{first, older}, {second, newer}};
 }
 
+/// Writes the pieces one behind the other. What they do not fill keeps its old samples.
 template <class Sample>
 void copy_pieces(const FramePieces<Sample>& pieces, Sample* frame) noexcept
 {
@@ -31,8 +33,8 @@ void copy_pieces(const FramePieces<Sample>& pieces, Sample* frame) noexcept
     std::copy(pieces.newer.begin(), pieces.newer.end(), frame + pieces.older.size());
 }
 
-/// The equalisers' copy of a silent frame: it fills the frame from the second piece, whatever that
-/// piece's count said.
+/// The equalisers' copy of a silent frame: it fills the frame from the second piece, regardless of
+/// the count of that piece.
 template <class Sample>
 void copy_whole_frame(const FramePieces<Sample>& pieces, const Sample* second, Sample* frame,
                       uint32_t length) noexcept

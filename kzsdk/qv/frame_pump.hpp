@@ -2,6 +2,12 @@
 /// The fingerprinters' feed loop: bytes -> mono samples -> working rate -> ring -> overlapping
 /// frames.
 ///
+/// The ring holds one frame. A frame begins at `frame_start` and is full when the writer comes
+/// round to that place again; then its start moves on by the hop, which makes that much room:
+///
+///     |=== newer part ===|-------- room --------|===== older part =====|
+///     0                write              frame_start               length
+///
 /// Both twins run this loop over their own object, whose fields have the same names. A twin brings
 /// a `Twin` type with
 ///
@@ -51,18 +57,24 @@ constexpr bool advance_writer(RingPosition& at, uint32_t stored, uint32_t length
     return full;
 }
 
+/// Where the frame after this one starts.
 constexpr uint32_t next_frame_start(uint32_t frame_start, uint32_t hop, uint32_t length) noexcept
 {
     const uint32_t next = frame_start + hop;
     return next >= length ? next - length : next;
 }
 
+/// What one step of the loop has done.
 struct StepCounts {
     uint32_t bytes;   ///< consumed
     uint32_t samples; ///< produced
 };
 
 /// Converts and resamples from `bytes` until `room` samples are made or the input is used up.
+///
+/// Bytes are converted in chunks of the conversion buffer, and no more than the outputs are
+/// expected to need. What a full room leaves of a chunk is not consumed: it is converted again in
+/// the next step.
 template <class Twin>
 StepCounts convert_and_resample(typename Twin::Object& object, std::span<const uint8_t> bytes,
                                 std::span<typename Twin::Sample> room) noexcept
@@ -101,7 +113,7 @@ template <class Twin>
 uint32_t drop_silence(typename Twin::Object& object, uint32_t produced) noexcept
 {
     const std::span<typename Twin::Sample> block(object.ring + object.write_position, produced);
-    // A block without samples is searched too: it primes the detector.
+    // A block without samples is searched too: one that comes first primes the detector with zeros.
     const uint32_t offset = Twin::signal_offset(object, block);
     object.signal_offset += offset;
     const uint32_t remaining = produced - offset;
@@ -150,6 +162,8 @@ kz_status feed(typename Twin::Object& object, std::span<const uint8_t> bytes) no
             ring_room({object.frame_start, object.write_position}, object.frame_length);
         const auto counts =
             convert_and_resample<Twin>(object, bytes, {object.ring + object.write_position, room});
+        // A step may produce without consuming, when resampling upwards; only one that does neither
+        // is the end.
         if (counts.bytes == 0 && counts.samples == 0) {
             break;
         }

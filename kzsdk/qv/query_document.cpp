@@ -1,3 +1,14 @@
+/// @file
+/// Builds the query document of a fingerprint as a tag tree:
+///
+///     KZFPX_FP_QUERY VERSION="1.0"
+///         ALGORITHM
+///             NAME, VERSION, QUERY
+///         FP_BLOCKS
+///             FP_BLOCK TYPE="SIGNED_INT_16" COUNT="30" ENCODING="ASCII" SEPARATOR=" "
+///
+/// FP_BLOCK holds the values in decimal with one space between them. The blocks are made first; a
+/// tree is handed out whole or not at all.
 #include "kzsdk/qv/query_document.hpp"
 
 #include <cstring>
@@ -12,11 +23,13 @@ constexpr char kDocumentVersion[] = "1.0";
 constexpr char kSeparator[] = " ";
 constexpr uint32_t kElementSize = sizeof(uint16_t);
 
+/// Frees a tag with all below it.
 struct Dispose {
     void operator()(XMLTag* tag) const noexcept { static_cast<void>(DisposeXMLTag(tag)); }
 };
 using OwnedTag = std::unique_ptr<XMLTag, Dispose>;
 
+/// The bytes of a fingerprint, read as 16-bit values.
 struct FingerprintData {
     kz::owned<uint8_t[]> bytes;
     uint32_t size;
@@ -34,9 +47,7 @@ struct FingerprintData {
 
 constexpr size_t kMaxDigits = 5;
 
-// Writes a number in decimal.
-//
-// @return Behind its last digit.
+// Writes a number in decimal. Returns the place behind its last digit.
 char* write_decimal(char* to, uint16_t value) noexcept
 {
     char digits[kMaxDigits];
@@ -52,7 +63,7 @@ char* write_decimal(char* to, uint16_t value) noexcept
     return to;
 }
 
-// The values are declared signed and printed unsigned: -1 is written 65535.
+// The text of the values. They are declared signed and printed unsigned: -1 is written 65535.
 kz_status format_values(const FingerprintData& data, kz::owned<char[]>& out_text) noexcept
 {
     auto text = kz::make_array<char>(uint64_t{data.count()} * (kMaxDigits + 1) + 1);
@@ -74,6 +85,7 @@ kz_status format_values(const FingerprintData& data, kz::owned<char[]>& out_text
     return KZ_OK;
 }
 
+// Sets the attributes in their order, up to the first that fails.
 kz_status describe_block(XMLTag* block, uint32_t count) noexcept
 {
     kz_status status = SetXMLTagAttrFromStr(block, "TYPE", "SIGNED_INT_16");
@@ -89,6 +101,7 @@ kz_status describe_block(XMLTag* block, uint32_t count) noexcept
     return status;
 }
 
+// Appends the block of values to the blocks.
 kz_status add_block(XMLTag* blocks, const FingerprintData& data) noexcept
 {
     kz::owned<char[]> text;
@@ -107,6 +120,7 @@ kz_status add_block(XMLTag* blocks, const FingerprintData& data) noexcept
     return status;
 }
 
+// Reads the fingerprint, which the source may refuse, and makes the blocks of it.
 kz_status build_blocks(const kz::qv::FingerprintSource& source, OwnedTag& out_blocks) noexcept
 {
     OwnedTag blocks(CreateXMLTagFromStr("FP_BLOCKS", nullptr));
@@ -127,7 +141,7 @@ kz_status build_blocks(const kz::qv::FingerprintSource& source, OwnedTag& out_bl
     return status;
 }
 
-// The service's own query string: name, double quote, version.
+// The text of QUERY: name, one double quote, version. The quote is part of it.
 kz_status set_query(XMLTag* root, const kz::qv::FingerprintSource& source) noexcept
 {
     const uint64_t room = uint64_t{kz_strlen(source.name)} + kz_strlen(source.version) + 2;
@@ -140,6 +154,7 @@ kz_status set_query(XMLTag* root, const kz::qv::FingerprintSource& source) noexc
     return SetXMLSubTagDataFromStr(root, "ALGORITHM/QUERY", text.get(), 1);
 }
 
+// Makes the root with everything but the blocks.
 kz_status build_root(const kz::qv::FingerprintSource& source, OwnedTag& out_root) noexcept
 {
     OwnedTag root(CreateXMLTagFromStr("KZFPX_FP_QUERY", nullptr));

@@ -1,6 +1,10 @@
 /// @file
-/// Both twins search for the end of leading silence in the same way. A twin brings its samples and
-/// the rule that makes integers, the levels, of them: levels_of(samples, count, levels).
+/// The search for the end of leading silence, the same for both twins. A twin brings its samples
+/// and the rule that makes integers, the levels, of them: levels_of(samples, count, levels).
+///
+/// Two moving means run over a window of W levels: of the levels, and of their distances from that
+/// mean, each cut to a maximum. The signal begins half a window before the second mean exceeds the
+/// threshold. Sums are 32-bit and wrap; each mean keeps its window in a ring.
 #pragma once
 
 #include <algorithm>
@@ -35,6 +39,7 @@ Detector* make_detector(uint32_t window, uint32_t threshold, int32_t max_deviati
     return detector.release();
 }
 
+/// Frees a detector with its rings; null is ignored.
 template <class Detector>
 void free_detector(Detector* detector) noexcept
 {
@@ -45,6 +50,7 @@ void free_detector(Detector* detector) noexcept
     }
 }
 
+/// Only the flag is cleared: priming overwrites everything else.
 template <class Detector>
 kz_status reset_detector(Detector* detector) noexcept
 {
@@ -54,6 +60,7 @@ kz_status reset_detector(Detector* detector) noexcept
     return KZ_OK;
 }
 
+/// Replaces the oldest level of the window.
 template <class Detector>
 void take_level(Detector& detector, int32_t level) noexcept
 {
@@ -62,6 +69,7 @@ void take_level(Detector& detector, int32_t level) noexcept
     oldest = level;
 }
 
+/// Replaces the oldest deviation of the window.
 template <class Detector>
 void take_deviation(Detector& detector, int32_t deviation) noexcept
 {
@@ -71,6 +79,7 @@ void take_deviation(Detector& detector, int32_t deviation) noexcept
     oldest = deviation;
 }
 
+/// Moves the place of the oldest level and deviation on.
 template <class Detector>
 void advance(Detector& detector, uint32_t count) noexcept
 {
@@ -93,8 +102,8 @@ bool step(Detector& detector, int32_t level) noexcept
     return detector.threshold < static_cast<uint32_t>(detector.deviation_sum / window);
 }
 
-/// Takes levels as long as they are surely quiet, in a loop that is made for it; stops early where
-/// it cannot tell, and at the end of the rings.
+/// Takes levels for as long as they are certainly quiet, in a faster loop than step(). Stops early
+/// where a level might not be, and at the end of the rings.
 ///
 /// @return How many were taken.
 template <class Detector>
@@ -103,8 +112,8 @@ uint32_t pass_quiet(Detector& detector, std::span<const int32_t> levels) noexcep
     if ((detector.window & (detector.window - 1)) != 0) {
         return 0; // the loop divides by shifting
     }
-    // A sum below this is one whose mean does not exceed the threshold. Sums that are negative are
-    // beyond it, whatever the threshold.
+    // A sum below the limit has a mean that does not exceed the threshold. Negative sums count as
+    // beyond it, whatever the threshold: step() compares their means unsigned.
     constexpr uint64_t kNegative = uint64_t{1} << 31;
     const uint64_t limit = (uint64_t{detector.threshold} + 1) * detector.window;
     kernels::MovingMeans means{
@@ -185,13 +194,14 @@ void prime(Detector& detector, std::span<const Sample> block, LevelsOf levels_of
     detector.primed = 1;
 }
 
-/// Brings the means up to the end of a block. All that they hold then was made of its last two
-/// windows, so a longer block is entered there.
+/// Brings the means up to the end of a block. What they hold then depends on its last two windows
+/// only: the deviations of the last window, and the levels from which those were taken. A longer
+/// block is entered there.
 template <class Detector, class Sample, class LevelsOf>
 void settle(Detector& detector, std::span<const Sample> rest, LevelsOf levels_of) noexcept
 {
     const uint64_t remembered = uint64_t{detector.window} * 2;
-    uint32_t unheard = 0; // levels that only the mean level has to know
+    uint32_t unheard = 0; // levels that only fill the ring of levels
     if (rest.size() > remembered) {
         const auto skipped = static_cast<uint32_t>(rest.size() - remembered);
         advance(detector, skipped);

@@ -5,7 +5,7 @@
  * Most users reach it through the extraction interface (kzsdk/fpx/fpx.h), as algorithm 1. Its parts
  * are public too: configuration, frame manager, signal detector and equaliser.
  *
- * The road of the samples: interleaved bytes -> mono Q29 or Q30 -> 11025 Hz -> leading silence
+ * The path of the samples: interleaved bytes -> mono Q29 or Q30 -> 11025 Hz -> leading silence
  * dropped -> frames of 32768 samples, one every 11264 -> equalised, decimated by two, transformed
  * -> 15 bands. Twelve frames make a fingerprint of 30 values.
  *
@@ -13,7 +13,7 @@
  * follows it. (The two runs of a dot product, in convolve.h, come newest first.)
  *
  * Threads: none of these objects may be used by two threads at once; different objects are
- * independent. Arithmetic: integer, modulo 2^32; the same input gives the same words everywhere.
+ * independent. Arithmetic: integer, modulo 2^32; results are bit-identical on every machine.
  */
 #ifndef KZSDK_QVFIXED_QVFIXED_H
 #define KZSDK_QVFIXED_QVFIXED_H
@@ -156,8 +156,12 @@ KZ_API uint32_t kzqvfixed_signal_detector_get_signal_offset(kzqvfixed_signal_det
  * @param first, second  Pieces, the older one first. A null piece counts as no samples.
  * @param output         Room for @p output_length samples, apart from the pieces. Samples that
  *                       neither piece provides are not written.
- * @param histogram      @p levels + 1 counters, scratch.
- * @param levels         K, 1 or more; 0, or a null output or histogram, does nothing.
+ * @param histogram      @p levels + 1 counters. The first @p levels hold the number of samples on
+ *                       each level afterwards: 0 for a silent frame, what they held before when
+ *                       memory is short.
+ * @param levels         K, 1 or more; 0, or a null output or histogram, does nothing. Only 129 to
+ *                       256 levels are spread evenly: with fewer the last takes most of the
+ *                       samples, with more the upper ones stay unused.
  * @return 0.
  */
 KZ_API kz_status kzqvfixed_hist_eq_dual(const FxpType* first, uint32_t first_count,
@@ -362,7 +366,7 @@ KZ_API kz_status kzqvfixed_get_result(kzqvfixed_fingerprinter* object,
                                       XMLTag** out_tree) KZ_NOEXCEPT;
 
 /**
- * Tells how far the fingerprint is.
+ * Reports how far the fingerprint is.
  *
  * @param[out] out_percent  0 .. 100.
  * @return 0, or KZ_QV_ERROR_INVALID_ARGUMENT for a null pointer.

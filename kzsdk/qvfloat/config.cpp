@@ -11,7 +11,7 @@
 
 namespace {
 
-// 12 frames of 32768 samples, one every 11264: 14.2 s at 11025 Hz. The table is copied in later.
+// 12 frames of 32768 samples, one every 11264: 14.21 s at 11025 Hz. The table is copied in later.
 constexpr QVConfig kDefaults = {.detect_signal = 1,
                                 .detector_window = 128,
                                 .detector_threshold = 100,

@@ -2,7 +2,7 @@
 /// The exported calls of the floating-point fingerprinter, algorithm 2.
 ///
 /// The object's life and its feed loop are those of both twins, in kzsdk/qv; what is this twin's
-/// own lies in twin.hpp. The number of the algorithm is not looked at: the caller chose by it.
+/// own lies in twin.hpp. The number of the algorithm is not used: the caller chose by it.
 #include "kzsdk/qvfloat/qvfloat.h"
 #include "kzsdk/qvfloat/twin.hpp"
 

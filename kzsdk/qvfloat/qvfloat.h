@@ -7,7 +7,7 @@
  * any sample rate, and the features of its frames can be exported and appended elsewhere. Most
  * users reach it through the extraction interface (kzsdk/fpx/fpx.h), as algorithm 2.
  *
- * The road of the samples: interleaved bytes -> mono floats, full scale +-32768 -> 11025 Hz ->
+ * The path of the samples: interleaved bytes -> mono floats, full scale +-32768 -> 11025 Hz ->
  * leading silence dropped -> frames of 32768 samples, one every 11264 -> equalised, transformed ->
  * 15 bands.
  *
@@ -165,7 +165,9 @@ KZ_API kz_status hist_eq2(const float* input, float* output, uint32_t count, uin
  * @param first, second  Pieces, the older one first. A null piece counts as no samples.
  * @param output         Room for @p output_length samples, apart from the pieces. Samples that
  *                       neither piece provides are not written.
- * @param histogram      @p levels counters, scratch.
+ * @param histogram      @p levels counters. They hold the number of samples on each level
+ *                       afterwards: 0 for a silent frame, what they held before when memory is
+ *                       short.
  * @return 0.
  */
 KZ_API kz_status hist_eq_dual(const float* first, uint32_t first_count, const float* second,
@@ -301,7 +303,7 @@ KZ_API uint32_t QVFM_GetFrameData(const QVFM* manager, void* destination,
  * Appends frames given as frame data. Frames are skipped and limited as if they had been analysed
  * here; their numbers are taken as they are, whatever they are.
  *
- * Note the sense of the result, against that of the other functions.
+ * Note that 1 is success here, against the other functions.
  *
  * @param data  @p size bytes, at any address.
  * @return 1 when the data was accepted, even if every frame was then dropped: the next
@@ -380,7 +382,7 @@ KZ_API kz_status QVFP_AddSamples(QVFP* object, const void* bytes, uint32_t byte_
 KZ_API kz_status QVFP_GetResult(QVFP* object, XMLTag** out_tree) KZ_NOEXCEPT;
 
 /**
- * Tells how far the fingerprint is.
+ * Reports how far the fingerprint is.
  *
  * @param[out] out_percent  0 .. 100.
  * @return 0, or KZ_QV_ERROR_INVALID_ARGUMENT for a null pointer.

@@ -1,7 +1,7 @@
 /// @file
 /// Equality of two tag trees: names, data, attributes in their order, and sub-tags in theirs.
 ///
-/// Both trees are walked in step and without recursion. The roots' own siblings are not looked at.
+/// Both trees are walked in step and without recursion. The roots' own siblings do not count.
 #include <utility>
 
 #include "kzsdk/abs/text.h"

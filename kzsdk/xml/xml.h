@@ -16,13 +16,13 @@
  * whole, but whatever reads the stored text sees it end at the NUL.
  *
  * Names match when all their bytes do; case counts. A tag without a name (CreateEmptyXMLTag()) is
- * passed over by every look-up. Indexes are positions in a list, from 0.
+ * skipped by every look-up. Indexes are positions in a list, from 0.
  *
  * Names are not checked and not escaped when rendered: a name from outside that holds a `<` writes
  * mark-up. Data and values are escaped, but control bytes and bytes above 127 go out as they are.
  *
- * A tag is in one place of one tree. Adding a tag to two parents, twice to one, to itself or below
- * itself makes walks endless and frees memory twice; that is the caller's to avoid.
+ * A tag is in one place of one tree. Callers must not add a tag to two parents, twice to one, to
+ * itself or below itself: walks would be endless, and memory would be freed twice.
  *
  * Depth costs no stack: a tree may be as deep as memory allows. A walk takes 16 bytes or less of
  * memory for each level below the 32nd, in doubling blocks; disposing takes none.
@@ -67,7 +67,7 @@ typedef struct XMLTag {
 
 /* ---- Making, copying and disposing ---------------------------------------------------------- */
 
-/** Makes a tag with nothing in it, no name either. The caller disposes of it. */
+/** Makes an empty tag, without even a name. The caller disposes of it. */
 KZ_API XMLTag* CreateEmptyXMLTag(void) KZ_NOEXCEPT;
 
 /**
@@ -205,8 +205,8 @@ KZ_API XMLTag* GetXMLSubTagFromStrEx(const XMLTag* tag, const char* name,
                                      uintptr_t* cursor) KZ_NOEXCEPT;
 
 /**
- * Puts a tag at the end of a parent's sub-tags. The parent owns it from then on. Tags that follow
- * @p child as its siblings come along with it. Null arguments do nothing.
+ * Appends a tag to a parent's sub-tags. The parent owns it from then on. Tags that follow @p child
+ * as its siblings come along with it. Null arguments do nothing.
  *
  * The end of the list is searched for each time: the cost grows with the number of sub-tags.
  *
@@ -215,7 +215,7 @@ KZ_API XMLTag* GetXMLSubTagFromStrEx(const XMLTag* tag, const char* name,
 KZ_API kz_status AddXMLSubTag(XMLTag* parent, XMLTag* child) KZ_NOEXCEPT;
 
 /**
- * Takes a tag out of its parent's sub-tags. Null arguments, and a tag that is not among them, do
+ * Removes a tag from its parent's sub-tags. Null arguments, and a tag that is not among them, do
  * nothing.
  *
  * @param dispose  Not 0: the tag is disposed of; 0: it becomes the caller's.
@@ -262,7 +262,7 @@ KZ_API kz_status SetXMLTagNameFromStr(XMLTag* tag, const char* name) KZ_NOEXCEPT
  *   GetXMLSubTagData         a sub-tag of the tag    matches nothing      a sub-tag
  *   SetXMLSubTagDataFromStr  a sub-tag of the tag    is refused           a sub-tag
  *   XMLGetDataAtPath         the tag's own name      any number skipped   attribute or sub-tag
- *   XMLSetValueAtPath        a sub-tag of the tag    one skipped          what the resolver says
+ *   XMLSetValueAtPath        a sub-tag of the tag    one skipped          what the resolver decides
  */
 
 /**
@@ -313,7 +313,7 @@ enum {
 };
 
 /**
- * Says what a segment of a path means. Called by XMLSetValueAtPath() once for each segment.
+ * Decides what a segment of a path means. Called by XMLSetValueAtPath() once for each segment.
  *
  * @param tag        The tag that the segment is looked up in.
  * @param segment    First byte of the segment's name, inside the path and not NUL-terminated. Null
@@ -328,8 +328,7 @@ typedef int32_t (*XMLPathResolver)(XMLTag* tag, const char* segment, uint32_t le
                                    uintptr_t context, const char** name, uint32_t* kind);
 
 /**
- * Sets a value by a path, making elements on the way; what each segment means is the resolver's to
- * say.
+ * Sets a value by a path, making elements on the way. The resolver decides what each segment means.
  *
  * A segment is an optional "/", a name of ASCII letters, digits and "_", an optional "+", and an
  * optional "/". An element that is missing is made; with "+" a further one of that name is made
@@ -350,7 +349,7 @@ KZ_API int32_t XMLSetValueAtPath(XMLTag* tag, const char* path, const char* valu
 /* ---- Comparing and mapping ------------------------------------------------------------------ */
 
 /**
- * Tells whether two trees are the same: name, data, attributes in their order, and sub-tags in
+ * Compares two trees: name, data, attributes in their order, and sub-tags in
  * their order, all the way down. What is missing (a name, data) equals only what is missing too.
  * The siblings of the two tags do not count.
  *
@@ -360,9 +359,9 @@ KZ_API int32_t XMLSetValueAtPath(XMLTag* tag, const char* path, const char* valu
 KZ_API uint32_t EqualXMLTags(const XMLTag* a, const XMLTag* b) KZ_NOEXCEPT;
 
 /*
- * Three maps say what CloneAndMutateXMLTag() makes of a tree. They are settings of the process: the
- * last one installed serves everyone, and the first ones, which change nothing, cannot be had back
- * other than by installing functions of one's own that do the same. Install them before any thread
+ * Three maps decide what CloneAndMutateXMLTag() makes of a tree. They are settings of the process:
+ * the last one installed applies to every caller. The first ones, which change nothing, cannot be
+ * restored; install functions that return their argument instead. Install maps before any thread
  * clones.
  *
  * What a map returns is read, copied and never freed: one of its arguments, or a text of its own.
@@ -397,7 +396,7 @@ typedef const char* (*XMLMapAttrValue)(const char* tag_name, const char* attr_na
                                        const char* value);
 
 /**
- * Copies a tag as the three maps say.
+ * Copies a tag through the three maps.
  *
  * Attributes are set one by one, in order: of two that get the same name the later stays, at the
  * end of the list, and if that has no value, neither stays.
@@ -438,7 +437,7 @@ KZ_API kz_status SetMapXMLAttrValue(XMLMapAttrValue function) KZ_NOEXCEPT;
  * indented.
  *
  * @param header    Not 0: begins with `<?xml version="1.0" encoding="UTF-8" ?>`. The encoding is
- *                  said, not made: bytes go out as they are.
+ *                  declared, not checked: bytes go out as they are.
  * @param indent    Not 0: two spaces for each level at the beginning of a line.
  * @param newlines  Not 0: a new line behind the declaration, the start tag of an element with
  *                  sub-tags, the data of such an element, and each end tag.

@@ -12,9 +12,6 @@ namespace kzfp {
 
 namespace {
 
-/// Twelve frames of 32768 samples, each 11264 after the one before.
-constexpr double kSecondsNeeded = (11.0 * 11264 + 32768) / kWorkingRate;
-
 struct Free {
     void operator()(kz_fpx_handle* handle) const { kz_fpx_fingerprint_free(&handle); }
     void operator()(char* text) const { kz_fpx_fingerprint_serialize_free(&text); }
@@ -28,9 +25,15 @@ std::string printed(const char* format, double number)
     return text;
 }
 
-/// Rounded so that what is too short never looks long enough.
-std::string had(double seconds) { return printed("%.1f s", std::floor(seconds * 10) / 10); }
-std::string needed() { return printed("%.1f s", std::ceil(kSecondsNeeded * 10) / 10); }
+std::string tenths(double seconds) { return printed("%.1f s", std::floor(seconds * 10) / 10); }
+
+/// Rounded down, so that what is too short never looks long enough.
+std::string hundredths(double seconds)
+{
+    return printed("%.2f s", std::floor(seconds * 100 + 1e-6) / 100);
+}
+
+std::string needed() { return hundredths(KZ_FPX_MILLISECONDS_NEEDED / 1000.0); }
 
 uint32_t to_library_format(audio::Encoding encoding)
 {
@@ -90,11 +93,11 @@ std::string too_little(const kz_fpx_handle& handle, const audio::Source& source,
     if (frames == 0) {
         text = "no sound";
     } else if (silence.has_ended == 0) {
-        text = "nothing but silence in " + had(seconds);
+        text = "nothing but silence in " + tenths(seconds);
     } else {
-        text = had(std::max(0.0, seconds - silence.seconds)) + " of sound";
+        text = hundredths(std::max(0.0, seconds - silence.seconds)) + " of sound";
         if (silence.seconds >= 0.1) {
-            text += " after " + had(silence.seconds) + " of silence";
+            text += " after " + tenths(silence.seconds) + " of silence";
         }
     }
     if (const std::string trouble = source.trouble(); !trouble.empty()) {

@@ -1,3 +1,5 @@
+/// @file
+/// The log of the Android adapters: the system's own.
 #include <android/log.h>
 
 #include "kzsdk/jni/platform/platform.hpp"

@@ -1,3 +1,5 @@
+/// @file
+/// The thread of the adapter for Android's own sources: its starter sets name and priority.
 #include <utils/AndroidThreads.h>
 
 #include "kzsdk/jni/platform/platform.hpp"

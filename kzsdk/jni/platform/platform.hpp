@@ -1,5 +1,6 @@
 /// @file
-/// What the Android front asks of the system it runs on: a log and a thread. One adapter is linked:
+/// What the Android front needs of the system it runs on: a log and a thread. One adapter is
+/// linked:
 ///
 ///     portable   log on standard error, POSIX thread; needs nothing but the C library
 ///     ndk        Android's log, POSIX thread; needs nothing but what the public NDK offers

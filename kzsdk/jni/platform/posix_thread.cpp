@@ -1,3 +1,6 @@
+/// @file
+/// The thread of the portable and the NDK adapter: a detached POSIX thread, named and given a
+/// priority where the system offers that.
 #include <cstdio>
 
 #include <pthread.h>
@@ -10,6 +13,7 @@
 
 namespace {
 
+/// What a new thread runs with; freed by that thread.
 struct Start {
     int (*entry)(void*);
     void* argument;
@@ -17,8 +21,8 @@ struct Start {
     int32_t priority;
 };
 
-/// Dresses the calling thread. Refusals are of no consequence.
-void dress([[maybe_unused]] const Start& start) noexcept
+/// Gives the calling thread its name and priority. A refusal is ignored.
+void apply_name_and_priority([[maybe_unused]] const Start& start) noexcept
 {
 #ifdef __linux__
     char name[16]; // the system holds 15 characters and refuses longer names
@@ -28,11 +32,12 @@ void dress([[maybe_unused]] const Start& start) noexcept
 #endif
 }
 
+/// The body of every thread. What the entry returns is dropped.
 void* run(void* argument) noexcept
 {
     const Start start = *static_cast<Start*>(argument);
     std::free(argument);
-    dress(start);
+    apply_name_and_priority(start);
     start.entry(start.argument);
     return nullptr;
 }

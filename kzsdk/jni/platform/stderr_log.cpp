@@ -1,3 +1,5 @@
+/// @file
+/// The log of the portable adapter: one line on standard error for each message.
 #include <cerrno>
 #include <cstdio>
 #include <ctime>
@@ -8,6 +10,7 @@
 
 namespace {
 
+/// Stands in for a null tag.
 const char* program_name() noexcept
 {
 #ifdef __GLIBC__
@@ -17,6 +20,7 @@ const char* program_name() noexcept
 #endif
 }
 
+/// The process's number where threads have none of their own.
 int thread_number() noexcept
 {
 #ifdef __linux__

@@ -103,7 +103,8 @@ ProcessSetup endless(const std::string& beginning, const std::string& repeated, 
 }
 
 constexpr uint64_t kTwoHoursAt44100 = uint64_t{7200} * 44100 * 4;
-constexpr uint64_t kNeededAt44100 = uint64_t{1433} * 441 * 4; // 14.33 s
+// What a default fingerprint takes, and a tenth of a second for the blocks in which a pipe is read.
+constexpr uint64_t kNeededAt44100 = (KZ_FPX_MILLISECONDS_NEEDED + 100) * 441 / 10 * 4;
 constexpr uint64_t kPipe = 65536; ///< what fits into a pipe without being read
 
 TEST(KzfpStreaming, EveryRateAndEncodingGivesTheDocumentOfOneCall)
@@ -159,31 +160,50 @@ TEST(KzfpStreaming, SilenceOfAnyLengthGivesTheDocumentOfOneCall)
     }
 }
 
+/// The fewest frames of mono 16-bit sound that one call makes a fingerprint of.
+size_t fewest_frames(const Audio& audio)
+{
+    const auto complete = [&](size_t frames) {
+        Audio beginning = audio;
+        beginning.bytes.resize(2 * frames);
+        return !document_of_one_call(beginning).empty();
+    };
+    size_t enough = size_t{16} * audio.rate;
+    size_t too_few = size_t{14} * audio.rate;
+    EXPECT_TRUE(complete(enough));
+    EXPECT_FALSE(complete(too_few));
+    while (enough - too_few > 1) {
+        const size_t middle = (enough + too_few) / 2;
+        (complete(middle) ? enough : too_few) = middle;
+    }
+    return enough;
+}
+
 // The shortest stream that is enough for one call is enough for the program, and one frame less is
 // too little for both.
 TEST(KzfpStreaming, NeedsNotOneFrameMoreThanOneCall)
 {
     for (const uint32_t rate : {8000u, 11025u, 22050u, 44100u, 48000u}) {
         const std::string all = bytes_of(tune(rate, 1, 16));
-        const auto complete = [&](size_t frames) {
-            const Audio audio = {.rate = rate, .channels = 1, .bytes = all.substr(0, 2 * frames)};
-            return !document_of_one_call(audio).empty();
-        };
-        size_t enough = size_t{16} * rate;
-        size_t too_few = size_t{14} * rate;
-        ASSERT_TRUE(complete(enough));
-        ASSERT_FALSE(complete(too_few));
-        while (enough - too_few > 1) {
-            const size_t middle = (enough + too_few) / 2;
-            (complete(middle) ? enough : too_few) = middle;
-        }
+        const size_t enough = fewest_frames({.rate = rate, .channels = 1, .bytes = all});
         const std::string format = std::to_string(rate) + ",1,s16";
         EXPECT_EQ(0, kzfp({"--raw", format, "-"}, fed_with(all.substr(0, 2 * enough))).status);
         const ProcessResult refused =
-            kzfp({"--raw", format, "-"}, fed_with(all.substr(0, 2 * too_few)));
+            kzfp({"--raw", format, "-"}, fed_with(all.substr(0, 2 * enough - 2)));
         EXPECT_EQ(1, refused.status);
-        EXPECT_EQ("standard input: 14.2 s of sound, 14.3 s needed\n", refused.err) << rate;
+        EXPECT_EQ("standard input: 14.21 s of sound, 14.22 s needed\n", refused.err) << rate;
     }
+}
+
+// The slowest rate that the program takes, at which the resampler looks furthest ahead.
+TEST(KzfpStreaming, WhatIsTooShortNeverLooksLongEnough)
+{
+    const std::string all = bytes_of(tune(1000, 1, 16));
+    const size_t enough = fewest_frames(
+        {.rate = 1000, .channels = 1, .bytes = all, .algorithm = KZ_FPX_ALGORITHM_FLOAT});
+    const ProcessResult refused = kzfp({"--algorithm", "float", "--raw", "1000,1,s16", "-"},
+                                       fed_with(all.substr(0, 2 * enough - 2)));
+    EXPECT_EQ("standard input: 14.21 s of sound, 14.22 s needed\n", refused.err);
 }
 
 TEST(KzfpStreaming, OfTwoRawHoursOnlyTheFirstSecondsAreRead)
@@ -261,7 +281,7 @@ TEST(KzfpStreaming, MemoryDoesNotGrowWithTheLengthOfTheInput)
     const ProcessResult file = kzfp({write("long.wav", two_hours)});
     const ProcessResult raw =
         kzfp({"--raw", "8000,1,s16", "-"}, endless(second, second, two_hours));
-    EXPECT_EQ("standard input: nothing but silence in 7200.0 s, 14.3 s needed\n", raw.err);
+    EXPECT_EQ("standard input: nothing but silence in 7200.0 s, 14.22 s needed\n", raw.err);
     EXPECT_LT(file.peak_kibibytes, brief.peak_kibibytes + 8192);
     EXPECT_LT(raw.peak_kibibytes, brief.peak_kibibytes + 8192);
     // A quarter of that through a pipe, which is gone through again with each doubling.

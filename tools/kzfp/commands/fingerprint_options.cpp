@@ -17,7 +17,7 @@ namespace {
 constexpr const char* kDescription =
     "Prints the fingerprint of each FILE: the query document that a recognition service is sent.\n"
     "A FILE is any sound file that libsndfile reads (WAV, FLAC, OGG, MP3, AIFF, AU, ...);\n"
-    "- is standard input. 14.3 s of sound are needed after leading silence; reading stops there.";
+    "- is standard input. 14.22 s of sound are needed after leading silence; reading stops there.";
 
 constexpr const char* kNotes =
     "Rates:     8000, 11025, 16000, 22050, 24000, 32000, 44100 and 48000 Hz go to the library as\n"

@@ -85,8 +85,8 @@ public final class AudioDescription {
     }
 
     /**
-     * Describes audio with the words of a WAVE file's header. Only what can be fingerprinted is taken;
-     * audio of 24 or 32 bits has to be narrowed to 16 first.
+     * Describes audio by the fields of a WAVE file's header. Only what can be fingerprinted is
+     * accepted; audio of 24 or 32 bits has to be narrowed to 16 first.
      *
      * @param formatCode 1 for PCM, 6 for A-law, 7 for mu-law
      * @param bitsPerSample 8 or 16 for PCM, 8 for A-law and mu-law

@@ -21,8 +21,8 @@ import java.util.concurrent.Executors;
  * }
  * }</pre>
  *
- * <p>A fingerprint takes about 14.3 seconds of audio after leading silence; what follows is not looked
- * at. The bytes are copied when a request is made: the array may be changed or dropped at once.
+ * <p>A fingerprint takes 14.22 seconds of audio after leading silence; what follows is not read.
+ * The bytes are copied when a request is made: the array may be changed or dropped at once.
  *
  * <p>Threads: an object may be used from any thread. Different objects work at the same time.
  *
@@ -55,12 +55,12 @@ public final class Fingerprint implements AutoCloseable {
         }
     }
 
-    /** Is told of the result of every request. */
+    /** Receives the result of every request. */
     public interface Listener {
         /**
          * Called when a fingerprint was made.
          *
-         * @param source the object that was asked for it
+         * @param source the object that the request was made of
          * @param document the fingerprint
          */
         void onFingerprint(Fingerprint source, QueryDocument document);
@@ -74,7 +74,8 @@ public final class Fingerprint implements AutoCloseable {
         void onFailure(Fingerprint source, FingerprintException reason);
     }
 
-    /** Read and written by the native side, which knows this object by it. 0: by nothing. */
+    /** Read and written by the native side, which identifies this object by it; 0 when it has
+     * none. */
     @SuppressWarnings("unused")
     private volatile int mNativeContext;
 
@@ -99,7 +100,7 @@ public final class Fingerprint implements AutoCloseable {
     }
 
     /**
-     * Has results told to a listener on threads that are kept for that.
+     * Delivers results to a listener on threads that are kept for that.
      *
      * @param listener is told from the next result on; null tells nobody
      */
@@ -108,7 +109,7 @@ public final class Fingerprint implements AutoCloseable {
     }
 
     /**
-     * Has results told to a listener.
+     * Delivers results to a listener.
      *
      * @param listener is told from the next result on; null tells nobody
      * @param executor runs the listener; on Android, for example, {@code context.getMainExecutor()}.
@@ -124,7 +125,7 @@ public final class Fingerprint implements AutoCloseable {
     }
 
     /**
-     * Asks for the fingerprint of a whole array.
+     * Requests the fingerprint of a whole array.
      *
      * @param description what the bytes mean
      * @param audio the bytes
@@ -135,7 +136,7 @@ public final class Fingerprint implements AutoCloseable {
     }
 
     /**
-     * Asks for a fingerprint.
+     * Requests a fingerprint.
      *
      * @param description what the bytes mean
      * @param audio the bytes, which are copied
@@ -213,8 +214,8 @@ public final class Fingerprint implements AutoCloseable {
     }
 
     /**
-     * Stops the thread. Comes back when it has stopped: a fingerprint that is being made is finished
-     * first, and its result is still told. Closing twice does nothing.
+     * Stops the thread. Returns when it has stopped: a fingerprint that is being made is finished
+     * first, and its result is still delivered. Closing twice does nothing.
      */
     @Override
     public void close() {
@@ -238,7 +239,7 @@ public final class Fingerprint implements AutoCloseable {
         }
     }
 
-    /** Stops the thread of an object that nobody has closed. */
+    /** Stops the thread of an object that was not closed. */
     @Override
     protected void finalize() throws Throwable {
         try {
@@ -268,12 +269,12 @@ public final class Fingerprint implements AutoCloseable {
             request = underWay;
         }
         if (!end(request)) {
-            return; // nobody asked: a thread may wake up without reason, and repeats its last job
+            return; // no request: a thread may wake up without reason, and repeats its last job
         }
         eventThread = Thread.currentThread();
         try {
             if (text == null) {
-                tell(request, null, "No fingerprint can be made of this audio; about 14.3 seconds are "
+                tell(request, null, "No fingerprint can be made of this audio; 14.22 seconds are "
                         + "needed after leading silence");
             } else {
                 tellDocument(request, text);

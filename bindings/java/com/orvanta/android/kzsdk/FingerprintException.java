@@ -1,6 +1,6 @@
 package com.orvanta.android.kzsdk;
 
-/** Tells that audio gave no fingerprint. */
+/** Reports that audio gave no fingerprint. */
 public final class FingerprintException extends Exception {
     private static final long serialVersionUID = 1L;
 

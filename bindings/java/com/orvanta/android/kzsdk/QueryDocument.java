@@ -44,7 +44,7 @@ public final class QueryDocument {
      *
      * @param text what a job of the library wrote
      * @return the document
-     * @throws IllegalArgumentException when the text is no such document; the message tells what is
+     * @throws IllegalArgumentException when the text is no such document; the message says what is
      *     missing
      */
     public static QueryDocument parse(String text) {

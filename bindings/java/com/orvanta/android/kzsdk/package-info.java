@@ -1,5 +1,5 @@
 /**
- * Fingerprints of audio: about 14 seconds of sound condensed into 30 numbers, in a short document that a
+ * Fingerprints of audio: 14.22 seconds of sound condensed into 30 numbers, in a short document that a
  * recognition service can be asked with.
  *
  * <p>{@link com.orvanta.android.kzsdk.Fingerprint} is where to start.
