@@ -1,12 +1,15 @@
-# The Java front: whether it is built, over which platform, and which names leave the library. None of it
-# depends on what the machine that builds happens to have: what is missing stops the configuration.
+# The Java front: whether it is built, over which platform, and which names leave the library. None
+# of it depends on what the machine that builds happens to have: what is missing stops the
+# configuration.
 #
-#   KZ_JNI       build the front into the library: it costs a few kilobytes, and makes the library one
-#                that Java can load. Needs a jni.h. Default: ON, and OFF where kzsdk is a part of another build
-#   KZ_JAVA      build kzsdk.jar, the front's Java side. Needs a JDK. Default: OFF; the presets have it ON
+#   KZ_JNI       build the front into the library: it costs a few kilobytes, and makes the library
+#                one that Java can load. Needs a jni.h. Default: ON, and OFF where kzsdk is a
+#                part of another build
+#   KZ_JAVA      build kzsdk.jar, the front's Java side. Needs a JDK. Default: OFF; the presets have
+#                it ON
 #   KZ_PLATFORM  what the front logs to and starts threads with: see
-#                kzsdk/jni/platform/platform.hpp. Default: portable, which needs nothing and so loads
-#                anywhere; ndk when building for Android
+#                kzsdk/jni/platform/platform.hpp. Default: portable, which needs nothing and so
+#                loads anywhere; ndk when building for Android
 #   KZ_SMALL_MAP export only the extraction interface, start-up and what Java needs. Default: OFF
 option(KZ_JNI "Build the front that a Java VM loads" ${PROJECT_IS_TOP_LEVEL})
 option(KZ_JAVA "Build kzsdk.jar, the front's Java side" OFF)
@@ -104,7 +107,8 @@ if(KZ_JAVA)
   endif()
 endif()
 
-# kz_jar(<target> OUTPUT <name> SOURCES <files> [CLASSPATH <jars>] [MANIFEST <file>] [FLAGS <flags>])
+# kz_jar(<target> OUTPUT <name> SOURCES <files> [CLASSPATH <jars>] [MANIFEST <file>]
+#        [FLAGS <flags>])
 #
 # Compiles for Java 8, warnings being errors, and packs the classes. The jar's path is the target's
 # property KZ_JAR.

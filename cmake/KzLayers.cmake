@@ -1,12 +1,12 @@
-# Which folder may see which, and which room of the library lies above which. Declared once, here and in
-# each room's CMakeLists.txt; kz_write_layers() writes it to layers.txt in the build folder, from which
-# tests/whole/layers and scripts/mutate.py read it.
+# Which folder may see which, and which room of the library lies above which. Declared once, here
+# and in each room's CMakeLists.txt; kz_write_layers() writes it to layers.txt in the build folder,
+# from which tests/whole/layers and scripts/mutate.py read it.
 
 # kz_house(<folder> [PUBLIC <folder>...] [SEES <folder>...] [INSIDE <folder>...])
 #
-# A top-level folder of sources, and what it may include besides itself: of the folders after PUBLIC only the
-# public headers (.h); of those after SEES the private headers (.hpp) too, but of a room that has a DOOR only
-# what that names; of those after INSIDE everything.
+# A top-level folder of sources, and what it may include besides itself: of the folders after PUBLIC
+# only the public headers (.h); of those after SEES the private headers (.hpp) too, but of a room
+# that has a DOOR only what that names; of those after INSIDE everything.
 function(kz_house folder)
   cmake_parse_arguments(PARSE_ARGV 1 house "" "" "PUBLIC;SEES;INSIDE")
   list(JOIN house_PUBLIC "," public)
@@ -15,12 +15,13 @@ function(kz_house folder)
   set_property(GLOBAL APPEND PROPERTY KZ_LAYERS "house ${folder} public=${public} sees=${sees} inside=${inside}")
 endfunction()
 
-# kz_room(<name> [IF <condition>] [BELOW <room>...] [DOOR <header>...] [HEADERS <header>...] SOURCES <file>...)
+# kz_room(<name> [IF <condition>] [BELOW <room>...] [DOOR <header>...] [HEADERS <header>...]
+#         SOURCES <file>...)
 #
 # A room of the library becomes an object library. A room sees, and its tests link, only what is
-# named in BELOW and what lies below that: a call upwards does not link. HEADERS are public. Where DOOR
-# is given, other rooms include only the headers that it names. Where the variable after IF is false the room
-# is declared, so that its rules hold, but not built.
+# named in BELOW and what lies below that: a call upwards does not link. HEADERS are public. Where
+# DOOR is given, other rooms include only the headers that it names. Where the variable after IF is
+# false the room is declared, so that its rules hold, but not built.
 function(kz_room name)
   cmake_parse_arguments(PARSE_ARGV 1 room "" "IF" "BELOW;DOOR;HEADERS;SOURCES")
   set(closure ${name})
@@ -73,7 +74,8 @@ function(kz_room_objects variable)
   set(${variable} ${rooms} PARENT_SCOPE)
 endfunction()
 
-# kz_record_test(<target> <room>...): a test program of this folder, and the rooms whose code it runs.
+# kz_record_test(<target> <room>...): a test program of this folder, and the rooms whose code it
+# runs.
 function(kz_record_test target)
   set(rooms ${ARGN})
   list(FILTER rooms EXCLUDE REGEX "^platform_")

@@ -3,9 +3,9 @@
 #
 #   fuzz/run.sh [seconds] [target...]      seconds for each target, 60 if not given; all targets
 #
-# As many run at once as there are processors; JOBS=1 another number. RUNS=20000000 ends a target earlier,
-# after that many executions. Corpus and logs are kept in $FUZZ_HOME (build/fuzz/home); an input that ends a
-# target stays there as <target>-crash-*, and the status is 1.
+# As many run at once as there are processors; JOBS=1 another number. RUNS=20000000 ends a target
+# earlier, after that many executions. Corpus and logs are kept in $FUZZ_HOME (build/fuzz/home); an
+# input that ends a target stays there as <target>-crash-*, and the status is 1.
 set -u
 cd "$(dirname "$0")/.." || exit
 

@@ -1,6 +1,6 @@
 #!/bin/sh
-# Builds build/kzsdk.aar for all four ABIs. Needs a JDK and, in ANDROID_NDK_HOME, an NDK of version 26
-# or later.
+# Builds build/kzsdk.aar for all four ABIs. Needs a JDK and, in ANDROID_NDK_HOME, an NDK of version
+# 26 or later.
 set -eu
 cd "$(dirname "$0")/.."
 

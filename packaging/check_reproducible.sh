@@ -1,10 +1,10 @@
 #!/bin/sh
-# Builds what is shipped twice, from copies of the tree in two folders whose names differ in length, with
-# another locale, time zone, file mode mask and number of jobs, and compares byte for byte: the libraries,
-# kzfp, and kzsdk.jar.
+# Builds what is shipped twice, from copies of the tree in two folders whose names differ in length,
+# with another locale, time zone, file mode mask and number of jobs, and compares byte for byte: the
+# libraries, kzfp, and kzsdk.jar.
 #
 #   packaging/check_reproducible.sh
-#   packaging/check_reproducible.sh <build-directory>    builds once, and compares with this release build
+#   packaging/check_reproducible.sh <build-directory>    builds once, compares with this build
 #
 # CXX=clang++-14 CC=clang-14 takes another compiler than the default.
 set -eu

@@ -1,9 +1,10 @@
 #!/usr/bin/env bash
-# Everything that a change must pass, step by step. Each step runs even when an earlier one failed, so that one
-# run reports everything; the summary closes the log. `./run check` sets up what this needs.
+# Everything that a change must pass, step by step. Each step runs even when an earlier one failed,
+# so that one run reports everything; the summary closes the log. `./run check` sets up what this
+# needs.
 #
 #   scripts/check.sh                                        half an hour on two processors
-#   scripts/check.sh --long [fuzz seconds] [soak seconds]   a night's work: 1800 for each fuzz target, and 600
+#   scripts/check.sh --long [fuzz seconds] [soak seconds]   a night's work: 1800 and 600
 #
 # ARCH=quick compares documents on five builds only.
 set -uo pipefail

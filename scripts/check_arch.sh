@@ -1,19 +1,21 @@
 #!/bin/sh
-# Builds the library in several ways, for several processors, and compares what it makes of some sixty
-# pieces of sound with tests/whole/golden/documents.txt. Prints one line for each way; any difference fails.
+# Builds the library in several ways, for several processors, and compares what it makes of some
+# sixty pieces of sound with tests/whole/golden/documents.txt. Prints one line for each way; any
+# difference fails.
 #
-#   scripts/check_arch.sh          g++ at -O0 and clang++ at -O3; at -O2 64-bit ARM, S/390, 32-bit x86
+#   scripts/check_arch.sh          g++ at -O0, clang++ at -O3; at -O2 64-bit ARM, S/390, 32-bit x86
 #   scripts/check_arch.sh all      also the other levels, -march=native, 32-bit ARM with and without
 #                                  floating-point hardware, and unit tests on other processors
 #   scripts/check_arch.sh <way>... just these: see `scripts/check_arch.sh list`
-#   scripts/check_arch.sh groups [quick | all | <way>...]   the groups of scripts/setup.sh that this needs
+#   scripts/check_arch.sh groups [quick | all | <way>...]   the groups of scripts/setup.sh it needs
 #
-# Each way is run with all variants of the inner loops that its processor has. A way that ends in -tests
-# runs the unit tests of the rooms that compute.
+# Each way is run with all variants of the inner loops that its processor has. A way that ends in
+# -tests runs the unit tests of the rooms that compute.
 #
-# Programs for ARM and S/390, whose bytes run from the highest to the lowest, run under QEMU; those for
-# 32-bit x86 run natively where the machine can. Which factors and taps the floating-point path computes
-# rests on the C library's sine and cosine: the cross-built programs run against the same release of it.
+# Programs for ARM and S/390, whose bytes run from the highest to the lowest, run under QEMU; those
+# for 32-bit x86 run natively where the machine can. Which factors and taps the floating-point path
+# computes rests on the C library's sine and cosine: the cross-built programs run against the same
+# release of it.
 set -eu
 cd "$(dirname "$0")/.."
 
@@ -93,7 +95,8 @@ emulator() {
     esac
 }
 
-# The variants that programs of this way may have; one that the processor lacks is the default again.
+# The variants that programs of this way may have; one that the processor lacks is the default
+# again.
 variants() {
     case $1 in
     *-O0) echo "default" ;;

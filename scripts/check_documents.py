@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Checks the Markdown documents: paths, links and the width of lines.
+"""Checks the Markdown documents (paths, links and the width of lines) and the width of comments.
 
     scripts/check_documents.py      exits with 1 and one line for each complaint
 
@@ -7,7 +7,8 @@
 - A path in `back quotes` or in a code block that begins with a folder of the tree exists. What is
   built (build/...), what has a placeholder (<name>, *, ...) and what is installed elsewhere is not
   looked at.
-- No line is wider than 100 characters but those of tables, code blocks and long links.
+- No line is wider than 100 characters, except in tables, code blocks and long links. Nor is any
+  comment in a source, a script or a CMake file.
 """
 
 import pathlib
@@ -19,6 +20,8 @@ ROOT = pathlib.Path(__file__).resolve().parent.parent
 WIDTH = 100
 LINK = re.compile(r"\[[^\]]*\]\(([^)\s]+)\)")
 CODE = re.compile(r"`([^`]+)`")
+COMMENT = re.compile(r"\s*(//|\*|#)")
+COMMENTED = (".c", ".cpp", ".h", ".hpp", ".java", ".py", ".sh", ".cmake", "CMakeLists.txt", "run")
 PATH = re.compile(r"(?<![\w./-])(?:[\w.-]+/)+[\w.-]*")
 
 
@@ -81,10 +84,18 @@ def complaints(document, folders):
             yield f"{document.relative_to(ROOT)}:{number}: {complaint}"
 
 
+def wide_comments(source):
+    for number, line in enumerate(source.read_text(encoding="utf-8").splitlines(), 1):
+        if len(line) > WIDTH and COMMENT.match(line):
+            yield f"{source.relative_to(ROOT)}:{number}: {len(line)} characters wide"
+
+
 def main():
     folders = {path.relative_to(ROOT).parts[0] for path in tracked("*")
                if len(path.relative_to(ROOT).parts) > 1}
     found = [complaint for document in tracked("*.md") for complaint in complaints(document, folders)]
+    found += [complaint for source in tracked("*") if source.name.endswith(COMMENTED)
+              for complaint in wide_comments(source)]
     print("\n".join(found), end="\n" if found else "")
     sys.exit(1 if found else 0)
 

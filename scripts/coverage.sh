@@ -3,8 +3,9 @@
 #
 #   scripts/coverage.sh [tests | corpus]...   default: both
 #
-# The corpus is what fuzz/run.sh has gathered in $FUZZ_HOME (build/fuzz/home), with the seeds. Leaves the
-# totals of each room, and every line and branch that did not run, in build/coverage/<which>.txt.
+# The corpus is what fuzz/run.sh has gathered in $FUZZ_HOME (build/fuzz/home), with the seeds.
+# Leaves the totals of each room, and every line and branch that did not run, in
+# build/coverage/<which>.txt.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 

@@ -1,12 +1,13 @@
 #!/bin/sh
-# Shows what a fingerprint is good for: prints the query document of half a minute of music, then how
-# far other encodings of that tune lie from it, and another tune. The music is downloaded on first use.
+# Shows what a fingerprint is good for: prints the query document of half a minute of music, then
+# how far other encodings of that tune lie from it, and another tune. The music is downloaded on
+# first use.
 #
 #   scripts/demo.sh KZFP    where KZFP is the program, for example build/release/tools/kzfp/kzfp
 #
-# The distance is the mean absolute difference of the 30 values (docs/fingerprint.md). The other tune is
-# the main title of the game Holotz's Castle by Juan Carlos Seijo Pérez, GPL 2 or later, out of the Debian
-# package holotz-castle-data (2.6 MB).
+# The distance is the mean absolute difference of the 30 values (docs/fingerprint.md). The other
+# tune is the main title of the game Holotz's Castle by Juan Carlos Seijo Pérez, GPL 2 or later, out
+# of the Debian package holotz-castle-data (2.6 MB).
 set -eu
 
 root=$(cd "$(dirname "$0")/.." && pwd)

@@ -1,11 +1,11 @@
 #!/bin/sh
-# Checks the tree: format, clang-tidy, cppcheck, the man page, the scripts. Every check runs; any complaint
-# makes the whole fail.
+# Checks the tree: format, clang-tidy, cppcheck, the man page, the scripts. Every check runs; any
+# complaint makes the whole fail.
 #
-#   scripts/lint.sh [build-directory]     where compile_commands.json is; default build/lint, made here
+#   scripts/lint.sh [build-directory]     with compile_commands.json; default build/lint, made here
 #
-# clang-tidy reads the library, its tools and examples; LINT_TESTS=yes adds the tests, which take three
-# times as long.
+# clang-tidy reads the library, its tools and examples; LINT_TESTS=yes adds the tests, which take
+# three times as long.
 set -u
 cd "$(dirname "$0")/.." || exit
 

@@ -1,7 +1,8 @@
 #!/bin/sh
 # Installs what is missing to build and test the library on Debian 12.
 #
-#   scripts/setup.sh [build] [java] [tools] [test] [clips] [bench] [lint] [clang] [fuzz] [coverage] [arch] [wide]
+#   scripts/setup.sh [build] [java] [tools] [test] [clips] [bench] [lint] [clang] [fuzz]
+#                    [coverage] [arch] [wide]
 #                                 default: all of them but the last three
 #
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.

@@ -1,4 +1,5 @@
-# 32-bit ARM without floating-point hardware, with Debian's cross compiler; what is built runs under QEMU.
+# 32-bit ARM without floating-point hardware, with Debian's cross compiler; what is built runs under
+# QEMU.
 set(CMAKE_SYSTEM_NAME Linux)
 set(CMAKE_SYSTEM_PROCESSOR arm)
 set(CMAKE_C_COMPILER arm-linux-gnueabi-gcc)

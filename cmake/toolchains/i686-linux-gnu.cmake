@@ -1,5 +1,6 @@
-# 32-bit x86, with Debian's cross compiler; what is built runs natively where the machine can, else under
-# QEMU. (The other way to such programs, g++-multilib, cannot be installed beside cross compilers.)
+# 32-bit x86, with Debian's cross compiler; what is built runs natively where the machine can, else
+# under QEMU. (The other way to such programs, g++-multilib, cannot be installed beside cross
+# compilers.)
 set(CMAKE_SYSTEM_NAME Linux)
 set(CMAKE_SYSTEM_PROCESSOR i686)
 set(CMAKE_C_COMPILER i686-linux-gnu-gcc)

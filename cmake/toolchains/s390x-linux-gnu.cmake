@@ -1,4 +1,5 @@
-# S/390, whose bytes run from the highest to the lowest, with Debian's cross compiler; what is built runs under QEMU.
+# S/390, whose bytes run from the highest to the lowest, with Debian's cross compiler; what is built
+# runs under QEMU.
 set(CMAKE_SYSTEM_NAME Linux)
 set(CMAKE_SYSTEM_PROCESSOR s390x)
 set(CMAKE_C_COMPILER s390x-linux-gnu-gcc)

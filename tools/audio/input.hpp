@@ -38,7 +38,8 @@ struct OpenedInput {
 /// from a pipe, and memory does not grow.
 class Input {
 public:
-    /// `name` is a path, or "-" for standard input; `request` outlives the object. Throws FileError.
+    /// `name` is a path, or "-" for standard input; `request` outlives the object. Throws
+    /// FileError.
     Input(const std::string& name, const Request& request);
 
     /// Opens the input at the start of the requested section. Throws FileError.

@@ -13,7 +13,8 @@
 namespace audio {
 
 /// Gives the samples of a sound file in one of these forms:
-/// - A-law and mu-law with one or two channels, at a rate that is accepted: as they are in the file;
+/// - A-law and mu-law with one or two channels, at a rate that is accepted: as they are in the
+///   file;
 /// - everything else: 16-bit PCM, in which more than two channels are mixed down to one.
 class SoundFile : public Source {
 public:

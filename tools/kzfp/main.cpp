@@ -1,5 +1,5 @@
-// kzfp: the process around a command. Whatever goes wrong, memory for a message included, ends in one
-// line on standard error and a status, never in a signal.
+// kzfp: the process around a command. Whatever goes wrong, memory for a message included, ends in
+// one line on standard error and a status, never in a signal.
 
 #include <csignal>
 #include <cstdio>

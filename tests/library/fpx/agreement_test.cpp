@@ -1,5 +1,5 @@
-/// How far the two algorithms' fingerprints of the same sound lie apart. docs/closeness.md holds the
-/// table that this program prints.
+/// How far the two algorithms' fingerprints of the same sound lie apart. docs/closeness.md holds
+/// the table that this program prints.
 
 #include <algorithm>
 #include <array>

@@ -115,7 +115,8 @@ TEST_F(FixedEqualiser, ASpreadOf256LevelsTouchesBothEnds)
     EXPECT_EQ(0U, histogram[256]);
 }
 
-// The scale is right where 33 - the leading zeros of K - 1 is 9, and off by powers of two elsewhere.
+// The scale is right where 33 - the leading zeros of K - 1 is 9, and off by powers of two
+// elsewhere.
 TEST_F(FixedEqualiser, Only129To256LevelsAreSpreadEvenly)
 {
     const Words frame = random_frame(32768, 29, 6);

@@ -148,7 +148,8 @@ TEST_F(Attributes, ANameWithANulInsideIsFoundByItsBeginningOnly)
     EXPECT_EQ(0, std::memcmp("a\0b", GetXMLTagAttrName(tag(), 0), 4));
 }
 
-// Names with a NUL inside make doubles; setting or removing by the part that is read finds them all.
+// Names with a NUL inside make doubles; setting or removing by the part that is read finds them
+// all.
 TEST_F(Attributes, EveryAttributeOfTheNameGoes)
 {
     const auto add_doubles = [&] {

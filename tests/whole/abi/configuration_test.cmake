@@ -1,7 +1,8 @@
-# What the library exports depends on what was asked for, never on what the machine has: without a jni.h or a
-# JDK the configuration stops and names its cures.
+# What the library exports depends on what was asked for, never on what the machine has: without a
+# jni.h or a JDK the configuration stops and names its cures.
 #
-#   cmake -D ROOT= -D WORK_DIR= -D C_COMPILER= -D CXX_COMPILER= -D GENERATOR= -P configuration_test.cmake
+#   cmake -D ROOT= -D WORK_DIR= -D C_COMPILER= -D CXX_COMPILER= -D GENERATOR=
+#         -P configuration_test.cmake
 cmake_minimum_required(VERSION 3.22)
 
 set(common -G "${GENERATOR}" "-DCMAKE_C_COMPILER=${C_COMPILER}" "-DCMAKE_CXX_COMPILER=${CXX_COMPILER}"
@@ -10,7 +11,8 @@ set(alone -DKZ_BUILD_TESTS=OFF -DKZ_BUILD_TOOLS=OFF)
 # As on a machine on which nothing of Java is found.
 set(no_java -DCMAKE_DISABLE_FIND_PACKAGE_Java=ON -DKZ_JNI_INCLUDE_DIR=)
 
-# configure(<name> <source> <option>...): sets `status` and `said`, without line ends, in the caller.
+# configure(<name> <source> <option>...): sets `status` and `said`, without line ends, in the
+# caller.
 function(configure name source)
   file(REMOVE_RECURSE "${WORK_DIR}/${name}")
   execute_process(

@@ -1,4 +1,5 @@
-// A program may have functions whose names the library exports too: the library goes on calling its own.
+// A program may have functions whose names the library exports too: the library goes on calling its
+// own.
 
 #include <atomic>
 #include <cstdint>

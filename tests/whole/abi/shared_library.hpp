@@ -45,7 +45,8 @@ public:
         }
     }
 
-    /// Every symbol that others can bind to. The names of the versions themselves are absolute ones.
+    /// Every symbol that others can bind to. The names of the versions themselves are absolute
+    /// ones.
     std::vector<Export> exports() const
     {
         std::vector<Export> found;

@@ -1,5 +1,6 @@
-// The rules of what may include what, over the folders and rooms that the build declares. Each rule is a
-// function that returns what breaks it, so that a test can try it on a made-up tree as well as on this one.
+// The rules of what may include what, over the folders and rooms that the build declares. Each rule
+// is a function that returns what breaks it, so that a test can try it on a made-up tree as well as
+// on this one.
 #pragma once
 
 #include <filesystem>

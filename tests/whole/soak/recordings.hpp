@@ -35,8 +35,8 @@ private:
     test::Random random_;
 };
 
-/// Reads what is on record in tests/whole/golden, makes the sound of the 16-bit music among it, and takes
-/// the documents, one after the other. `problem` says what is not as it is on record.
+/// Reads what is on record in tests/whole/golden, makes the sound of the 16-bit music among it, and
+/// takes the documents, one after the other. `problem` says what is not as it is on record.
 std::vector<Recording> make_recordings(std::string& problem);
 
 } // namespace kz::soak

@@ -1,4 +1,5 @@
-// Every command is parsed in the same way: help and version are its own, wrong usage has one status.
+// Every command is parsed in the same way: help and version are its own, wrong usage has one
+// status.
 
 #include "kzfp/command_line/command_line.hpp"
 

@@ -1,5 +1,5 @@
-// `kzfp disc`: of a directory, what the disc that is mounted there holds; of a device or an image, its
-// volume labels.
+// `kzfp disc`: of a directory, what the disc that is mounted there holds; of a device or an image,
+// its volume labels.
 
 #include <filesystem>
 #include <string>

@@ -1,5 +1,5 @@
-// `kzfp fingerprint`: one result for each file, in the order given. A file that fails gets one line on
-// standard error and does not stop the others.
+// `kzfp fingerprint`: one result for each file, in the order given. A file that fails gets one line
+// on standard error and does not stop the others.
 
 #include <new>
 #include <string>

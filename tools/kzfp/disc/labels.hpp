@@ -12,8 +12,8 @@ struct DiscLabels {
     std::optional<std::string> udf;
 };
 
-/// Reads the labels of a device or an image. The disc families are on. Throws audio::FileError, also
-/// when there is no volume.
+/// Reads the labels of a device or an image. The disc families are on. Throws audio::FileError,
+/// also when there is no volume.
 DiscLabels labels_of(const std::string& path);
 
 } // namespace kzfp

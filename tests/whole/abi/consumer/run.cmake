@@ -1,8 +1,8 @@
-# Installs the library, moves it elsewhere, builds a program against it in C and in C++ and in every way that
-# is offered, and compares what the programs print.
+# Installs the library, moves it elsewhere, builds a program against it in C and in C++ and in every
+# way that is offered, and compares what the programs print.
 #
-#   cmake -D BUILD_DIR= -D WORK_DIR= -D EXAMPLE= -D C_COMPILER= -D CXX_COMPILER= -D GENERATOR= -D LIBDIR=
-#         -P run.cmake
+#   cmake -D BUILD_DIR= -D WORK_DIR= -D EXAMPLE= -D C_COMPILER= -D CXX_COMPILER= -D GENERATOR=
+#         -D LIBDIR= -P run.cmake
 cmake_minimum_required(VERSION 3.22)
 
 function(run)

@@ -47,9 +47,9 @@ public final class AudioDescription {
     }
 
     /**
-     * Describes 8-bit PCM with silence at 128. The library folds the lower half of its range upwards:
-     * the fingerprint differs from that of the same music in 16 bits. Widen the samples to 16 bits
-     * unless the other side does the same.
+     * Describes 8-bit PCM with silence at 128. The library folds the lower half of its range
+     * upwards: the fingerprint differs from that of the same music in 16 bits. Widen the samples to
+     * 16 bits unless the other side does the same.
      *
      * @param sampleRate frames in a second
      * @param channels 1 or 2

@@ -29,8 +29,8 @@ import java.util.concurrent.Executors;
  * <p>Close an object when it is not needed any more; one that is forgotten keeps its thread and the
  * last audio until it is garbage-collected. An object with a request under way is not collected.
  *
- * <p>The native library is looked for as {@code System.loadLibrary("kzsdk")} does, or loaded from the
- * file that the system property {@code kzsdk.library} names.
+ * <p>The native library is looked for as {@code System.loadLibrary("kzsdk")} does, or loaded from
+ * the file that the system property {@code kzsdk.library} names.
  */
 public final class Fingerprint implements AutoCloseable {
     private static final int SUCCEEDED = 0;
@@ -112,9 +112,9 @@ public final class Fingerprint implements AutoCloseable {
      * Delivers results to a listener.
      *
      * @param listener is told from the next result on; null tells nobody
-     * @param executor runs the listener; on Android, for example, {@code context.getMainExecutor()}.
-     *     An executor that runs it at once runs it on the fingerprint thread: there
-     *     {@link #generate} of the same object is refused
+     * @param executor runs the listener; on Android, for example, {@code
+     *     context.getMainExecutor()}. An executor that runs it at once runs it on the fingerprint
+     *     thread: there {@link #generate} of the same object is refused
      */
     public void setListener(Listener listener, Executor executor) {
         Objects.requireNonNull(executor, "executor");
@@ -141,13 +141,13 @@ public final class Fingerprint implements AutoCloseable {
      * @param description what the bytes mean
      * @param audio the bytes, which are copied
      * @param length how many of them count, from the first one: a whole number of frames
-     * @return a future that gets the fingerprint; or a {@link FingerprintException} when there was too
-     *     little audio, or when this object was closed before the work was begun. Cancelling it stops
-     *     nothing
-     * @throws IllegalArgumentException when the length is not positive, exceeds the array, or is not a
-     *     whole number of frames
-     * @throws IllegalStateException when the object is closed, or the result of an earlier request has
-     *     not come yet
+     * @return a future that gets the fingerprint; or a {@link FingerprintException} when there was
+     *     too little audio, or when this object was closed before the work was begun. Cancelling it
+     *     stops nothing
+     * @throws IllegalArgumentException when the length is not positive, exceeds the array, or is
+     *     not a whole number of frames
+     * @throws IllegalStateException when the object is closed, or the result of an earlier request
+     *     has not come yet
      * @throws OutOfMemoryError when there is no memory for the copy
      */
     public CompletableFuture<QueryDocument> generate(
