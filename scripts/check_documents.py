@@ -20,7 +20,7 @@ ROOT = pathlib.Path(__file__).resolve().parent.parent
 WIDTH = 100
 LINK = re.compile(r"\[[^\]]*\]\(([^)\s]+)\)")
 CODE = re.compile(r"`([^`]+)`")
-COMMENT = re.compile(r"\s*(//|\*|#)")
+COMMENT = re.compile(r"\s*(//|\*[ /]|#)")
 COMMENTED = (".c", ".cpp", ".h", ".hpp", ".java", ".py", ".sh", ".cmake", "CMakeLists.txt", "run")
 PATH = re.compile(r"(?<![\w./-])(?:[\w.-]+/)+[\w.-]*")
 
