@@ -94,6 +94,16 @@ public:
         return document;
     }
 
+    std::vector<int16_t> values() const
+    {
+        uint32_t count = 0;
+        kz_fpx_fingerprint_get_values(handle_, nullptr, 0, &count);
+        std::vector<int16_t> values(count);
+        require(kz_fpx_fingerprint_get_values(handle_, values.data(), count, &count) == KZ_OK,
+                "no values");
+        return values;
+    }
+
 private:
     kz_fpx_handle* handle_ = nullptr;
 };

@@ -27,67 +27,81 @@ static int16_t tune_sample(uint32_t frame)
     return (int16_t)(saw * (int32_t)(fading / 4) / (RATE / 16));
 }
 
-/* Fills `samples` and returns the number of frames, 0 at the end. */
-static uint32_t next_piece(int16_t* samples)
+/* Fills `samples` and returns the number of bytes, 0 at the end. */
+static size_t next_piece(int16_t* samples)
 {
-    uint32_t count = 0;
+    size_t count = 0;
     if (file != NULL) {
-        return (uint32_t)fread(samples, CHANNELS * sizeof(int16_t), FRAMES_AT_A_TIME, file);
+        return fread(samples, 1, FRAMES_AT_A_TIME * CHANNELS * sizeof(int16_t), file);
     }
     while (count < FRAMES_AT_A_TIME && frames_played < TUNE_SECONDS * RATE) {
         samples[2 * count] = samples[2 * count + 1] = tune_sample(frames_played++);
         ++count;
     }
-    return count;
+    return count * CHANNELS * sizeof(int16_t);
 }
 
-static kz_status print_document(kz_fpx_handle* handle)
+/* Feeds the stream until it is complete or the music ends. */
+static kz_status feed(kz_stream* stream)
 {
-    char* document = NULL;
-    const kz_status status = kz_fpx_fingerprint_serialize(handle, &document);
+    static int16_t samples[FRAMES_AT_A_TIME * CHANNELS];
+    uint8_t complete = 0;
+    size_t bytes = 0;
+    kz_status status = KZ_OK;
+    while (status == KZ_OK && !complete && (bytes = next_piece(samples)) != 0) {
+        status = kz_stream_feed(stream, samples, bytes, NULL, &complete);
+    }
+    return status == KZ_OK ? kz_stream_finish(stream, &complete) : status;
+}
+
+/* Prints the document, or what the music lacks. */
+static kz_status print_document(kz_stream* stream)
+{
+    const char* document = NULL;
+    kz_stream_state state;
+    const kz_status status = kz_stream_get_document(stream, &document);
     if (status == KZ_OK) {
         fputs(document, stdout);
-        kz_fpx_fingerprint_serialize_free(&document);
+    } else if (status == KZ_QV_ERROR_INCOMPLETE && kz_stream_get_state(stream, &state) == KZ_OK) {
+        fprintf(stderr, "%.1f s of silence, %.1f s of sound: %.1f s more are needed\n",
+                (double)state.silence_milliseconds / 1000, (double)state.sound_milliseconds / 1000,
+                (double)state.missing_milliseconds / 1000);
     }
     return status;
 }
 
 static kz_status fingerprint(void)
 {
-    static int16_t samples[FRAMES_AT_A_TIME * CHANNELS];
-    kz_fpx_handle* handle = NULL;
-    uint8_t complete = 0;
-    uint32_t count = 0;
-    kz_status status = kz_fpx_fingerprint_create(KZ_FPX_ALGORITHM_FIXED, KZ_FPX_FORMAT_PCM16, RATE,
-                                                 CHANNELS, &handle);
-    while (status == KZ_OK && !complete && (count = next_piece(samples)) != 0) {
-        const uint32_t bytes = count * CHANNELS * (uint32_t)sizeof(int16_t);
-        status = kz_fpx_fingerprint_add_audio(handle, samples, bytes, &complete);
+    kz_stream_settings settings;
+    kz_stream* stream = NULL;
+    kz_status status = kz_stream_initialize_settings(&settings);
+    settings.format = KZ_STREAM_FORMAT_PCM16;
+    settings.sample_rate = RATE;
+    settings.channels = CHANNELS;
+    if (status == KZ_OK) {
+        status = kz_stream_create(&settings, &stream);
     }
     if (status == KZ_OK) {
-        status = print_document(handle); /* refused when the music was too short */
+        status = feed(stream);
     }
-    kz_fpx_fingerprint_free(&handle);
+    if (status == KZ_OK) {
+        status = print_document(stream);
+    }
+    kz_stream_free(&stream);
     return status;
 }
 
 int main(int argc, char** argv)
 {
-    kzconf_configuration configuration;
     kz_status status = KZ_OK;
     if (argc > 1 && (file = fopen(argv[1], "rb")) == NULL) {
         perror(argv[1]);
         return EXIT_FAILURE;
     }
-    kzconf_initialize_configuration(&configuration);
-    status = kzinit_initialize_vesk(&configuration);
-    if (status == KZ_OK) {
-        status = fingerprint();
-    }
+    status = fingerprint();
     if (status != KZ_OK) {
-        fprintf(stderr, "no fingerprint: status %08lX\n", (unsigned long)status);
+        fprintf(stderr, "no fingerprint: %s\n", kz_status_text(status));
     }
-    kzinit_shutdown_vesk();
     if (file != NULL) {
         fclose(file);
     }

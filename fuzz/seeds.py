@@ -10,7 +10,7 @@ import random
 import sys
 
 TARGETS = (
-    "extraction tags paths render exchange resampler_fixed resampler_float converters dyn_buf "
+    "extraction stream tags paths render exchange resampler_fixed resampler_float converters dyn_buf "
     "disc_names disc_files kzfp_options kzfp_files"
 ).split()
 
@@ -53,6 +53,27 @@ def extraction():
             for kind, count in enumerate(stretches):
                 seed.number(count, 0, 65535).number(0, 0, 255).number(kind, 0, 65535)
                 seed.number(min(kind, 1), 0, 3)
+            seed.number(4096 + 7 * form, 1, 100000)
+            yield seed.all()
+
+
+def stream():
+    """A complete fingerprint in each format by both algorithms, at plain and at decimated rates."""
+    rates = [8000, 11025, 16000, 22050, 24000, 32000, 44100, 48000]
+    sizes = [1, 2, 1, 1, 3, 4, 4, 8, 1]
+    for fixed in (True, False):
+        for form, size in enumerate(sizes, 1):
+            index = 0 if size > 2 else form % 3
+            halvings = int(fixed and size < 3 and form != 1)
+            channels = 1 + form % 3 if form != 1 and size < 4 else 1
+            seed = Seed().flag(fixed).number(form, 1, 9).number(index, 0, 7).number(halvings, 0, 4)
+            seed.number(channels, 1, 8).number(0, 0, 15).number(0, 0, 63).number(31, 0, 31)
+            wanted = 15 * (rates[index] << halvings) * channels * size
+            stretches = [0] + [65535] * min(11, wanted // 262141 + 1)
+            seed.number(len(stretches), 0, 12)
+            for kind, count in enumerate(stretches):
+                seed.number(count, 0, 65535).number(0, 0, 255).number(kind, 0, 65535)
+                seed.number(min(kind, 1), 0, 2)
             seed.number(4096 + 7 * form, 1, 100000)
             yield seed.all()
 

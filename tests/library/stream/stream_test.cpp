@@ -4,6 +4,7 @@
 #include <thread>
 
 #include "kzsdk/abs/memory.h"
+#include "kzsdk/stream/stream_record.hpp"
 #include "library/stream/streams.hpp"
 #include "support/allocation.hpp"
 
@@ -226,6 +227,16 @@ TEST_F(Streams, MissingSoundCompletesTheFingerprint)
     }
 }
 
+// At very low rates the resampler holds back more than the usual milliseconds cover.
+TEST_F(Streams, MissSomethingUntilTheyAreComplete)
+{
+    const Stream stream = create(settings_of(kFloat, kPcm16, 100, 1));
+    EXPECT_FALSE(feed_music(stream, 0, 14.25, 100).complete);
+    EXPECT_FALSE(finish(stream.get()));
+    EXPECT_GE(state_of(stream.get()).sound_milliseconds, KZ_FPX_MILLISECONDS_NEEDED);
+    EXPECT_EQ(1U, state_of(stream.get()).missing_milliseconds);
+}
+
 TEST_F(Streams, ReportTheFingerprintOnceComplete)
 {
     const Stream stream = stream_of_44100_hz();
@@ -385,6 +396,17 @@ TEST_F(Streams, NeverConcealALostFrame)
             EXPECT_EQ(KZ_STREAM_ERROR_MEMORY, kz_stream_get_document(stream.get(), &text));
         }
     });
+}
+
+// Allocations are counted for the whole process: better a stream too many fails than one too few.
+TEST_F(Streams, CountFailuresOfOtherThreadsAsTheirs)
+{
+    const Stream stream = stream_of_44100_hz();
+    const stream::AllocationWatch watch;
+    EXPECT_FALSE(watch.saw_failure());
+    const AllocationFault fault(1);
+    std::thread([] { EXPECT_EQ(nullptr, _kzmem_malloc(1)); }).join();
+    EXPECT_TRUE(watch.saw_failure());
 }
 
 TEST_F(Streams, ResultsMayBeAskedForAgain)
