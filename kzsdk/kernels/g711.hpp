@@ -6,6 +6,7 @@
 #pragma once
 
 #include <array>
+#include <cstddef>
 #include <cstdint>
 
 namespace kz::g711 {
@@ -41,18 +42,55 @@ constexpr int16_t expand_alaw(uint8_t byte) noexcept
     return static_cast<int16_t>(code.sign_bit ? -size : size);
 }
 
-using Table = std::array<int16_t, 256>;
-
-constexpr Table expansion_table(int16_t (*expand)(uint8_t) noexcept) noexcept
+constexpr std::array<int16_t, 256> expansion_table(int16_t (*expand)(uint8_t) noexcept) noexcept
 {
-    Table table{};
+    std::array<int16_t, 256> table{};
     for (uint32_t byte = 0; byte < table.size(); ++byte) {
         table[byte] = expand(static_cast<uint8_t>(byte));
     }
     return table;
 }
 
-inline constexpr Table kULaw = expansion_table(expand_ulaw);
-inline constexpr Table kALaw = expansion_table(expand_alaw);
+/// From what a vector makes samples, byte by byte, of the halves of their codes:
+///
+///     sample = 2^unit_log2 * (scales[high] * sign * steps[low] - biases[high])
+///
+/// The sign is that of biases[high], which is never 0.
+struct LawParts {
+    int32_t unit_log2;
+    int8_t steps[16];
+    uint8_t scales[16];
+    int8_t biases[16];
+};
+
+/// Segments above the first are written with steps that are larger by one, so that they have a
+/// bias.
+constexpr LawParts alaw_parts() noexcept
+{
+    LawParts parts{.unit_log2 = 3, .steps = {}, .scales = {}, .biases = {}};
+    for (int32_t half = 0; half < 16; ++half) {
+        const Code high = split(static_cast<uint8_t>((half << 4) ^ 0x55));
+        const Code low = split(static_cast<uint8_t>(half ^ 0x55));
+        const int32_t scale = high.segment == 0 ? 1 : 1 << (high.segment - 1);
+        const int32_t bias = high.segment == 0 ? 33 : scale;
+        parts.steps[half] = static_cast<int8_t>(2 * low.step + 34);
+        parts.scales[half] = static_cast<uint8_t>(scale);
+        parts.biases[half] = static_cast<int8_t>(high.sign_bit ? -bias : bias);
+    }
+    return parts;
+}
+
+constexpr LawParts ulaw_parts() noexcept
+{
+    LawParts parts{.unit_log2 = 2, .steps = {}, .scales = {}, .biases = {}};
+    for (int32_t half = 0; half < 16; ++half) {
+        const Code high = split(static_cast<uint8_t>(~(half << 4)));
+        const Code low = split(static_cast<uint8_t>(~half));
+        parts.steps[half] = static_cast<int8_t>(2 * low.step + 33);
+        parts.scales[half] = static_cast<uint8_t>(1 << high.segment);
+        parts.biases[half] = static_cast<int8_t>(high.sign_bit ? -33 : 33);
+    }
+    return parts;
+}
 
 } // namespace kz::g711

@@ -16,18 +16,31 @@
 
 namespace kz::kernels {
 
-/// Makes one word of each frame of interleaved bytes: the sum of the channels, shifted left by
-/// 0 .. 31 bits. The number of frames counts as unsigned.
-template <class Word>
-using Converter = void(const void* input, Word* output, int32_t frames, int32_t shift) noexcept;
+/// Makes one word of each frame of interleaved samples: the sum of its `channels` samples modulo
+/// 2^32, shifted left by `shift` bits, which leaves 0 where `shift` is not 0 .. 31. Without channels,
+/// or with a negative number of them, nothing is read and sums are 0. The number of frames counts as
+/// unsigned.
+using ToWords = void(int32_t channels, const void* input, int32_t* output, int32_t frames,
+                     int32_t shift) noexcept;
 
-template <class Word>
-struct Converters {
-    Converter<Word>* pcm16_mono;
-    Converter<Word>* pcm16_stereo;
-    Converter<Word>* pcm8_mono; ///< bytes count as 0 .. 255, their top bit inverted
-    Converter<Word>* pcm8_stereo;
+/// Makes one float of each frame: the sum of its samples, rounded once where nothing else is said.
+using ToFloats = void(int32_t channels, const void* input, float* output, int32_t frames) noexcept;
+
+/// One converter for each encoding of samples.
+template <class Convert>
+struct Encodings {
+    Convert* pcm16; ///< floats are added one by one, in order
+    Convert* pcm8;  ///< bytes count as 0 .. 255, their top bit inverted; floats as 256 times that
+    Convert* alaw;
+    Convert* ulaw;
+    Convert* alaw_running; ///< the sum is never cleared: word k is made of frames 0 to k
+    Convert* ulaw_running;
 };
+
+/// What the code bytes of G.711 stand for. A-law's polarity is the opposite of the recommendation's.
+using SampleTable = std::array<int16_t, 256>;
+extern const SampleTable kALawSamples;
+extern const SampleTable kULawSamples;
 
 /// Two moving means over the last 2^window_log2 samples: of their levels, and of the deviations of
 /// the levels from their mean, none of which counts for more than max_deviation. The arrays are
@@ -96,8 +109,8 @@ struct Variant {
     /// The transform of dct_float.cpp without its scalings, 2^order values in place.
     void (*dct_float)(float* x, const float* factors, int32_t order) noexcept;
 
-    Converters<int32_t> words;
-    Converters<float> floats;
+    Encodings<ToWords> to_words;
+    Encodings<ToFloats> to_floats;
 
     /// Divides by 2^shift, 0 <= shift <= 31, towards zero.
     void (*shift_towards_zero)(const int32_t* input, int32_t* output, uint32_t count,

@@ -4,12 +4,14 @@ namespace kz::kernels {
 
 namespace {
 
-template <class Word>
-constexpr Converters<Word> kPlainConverters = {
-    .pcm16_mono = plain::pcm16_mono,
-    .pcm16_stereo = plain::pcm16_stereo,
-    .pcm8_mono = plain::pcm8_mono,
-    .pcm8_stereo = plain::pcm8_stereo,
+template <class Convert>
+constexpr Encodings<Convert> kPlainEncodings = {
+    .pcm16 = plain::pcm16,
+    .pcm8 = plain::pcm8,
+    .alaw = plain::alaw,
+    .ulaw = plain::ulaw,
+    .alaw_running = plain::alaw_running,
+    .ulaw_running = plain::ulaw_running,
 };
 
 } // namespace
@@ -18,8 +20,8 @@ const Variant kPlainVariant = {
     .name = "plain",
     .dct_fixed = plain::dct_fixed,
     .dct_float = plain::dct_float,
-    .words = kPlainConverters<int32_t>,
-    .floats = kPlainConverters<float>,
+    .to_words = kPlainEncodings<ToWords>,
+    .to_floats = kPlainEncodings<ToFloats>,
     .shift_towards_zero = plain::shift_towards_zero,
     .truncate = plain::truncate,
     .pass_quiet = plain::pass_quiet,

@@ -12,14 +12,8 @@ namespace kz::kernels::plain {
 void dct_fixed(int32_t* x, const int32_t* factors, int32_t order) noexcept;
 void dct_float(float* x, const float* factors, int32_t order) noexcept;
 
-void pcm16_mono(const void* input, int32_t* output, int32_t frames, int32_t shift) noexcept;
-void pcm16_stereo(const void* input, int32_t* output, int32_t frames, int32_t shift) noexcept;
-void pcm8_mono(const void* input, int32_t* output, int32_t frames, int32_t shift) noexcept;
-void pcm8_stereo(const void* input, int32_t* output, int32_t frames, int32_t shift) noexcept;
-void pcm16_mono(const void* input, float* output, int32_t frames, int32_t shift) noexcept;
-void pcm16_stereo(const void* input, float* output, int32_t frames, int32_t shift) noexcept;
-void pcm8_mono(const void* input, float* output, int32_t frames, int32_t shift) noexcept;
-void pcm8_stereo(const void* input, float* output, int32_t frames, int32_t shift) noexcept;
+ToWords pcm16, pcm8, alaw, ulaw, alaw_running, ulaw_running;
+ToFloats pcm16, pcm8, alaw, ulaw, alaw_running, ulaw_running;
 
 void shift_towards_zero(const int32_t* input, int32_t* output, uint32_t count,
                         int32_t shift) noexcept;

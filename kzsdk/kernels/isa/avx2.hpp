@@ -37,6 +37,14 @@ struct Avx2 {
     {
         return _mm256_loadu_si256(reinterpret_cast<const __m256i*>(from));
     }
+    static Ints load_vector(const uint8_t* from) noexcept
+    {
+        return _mm256_loadu_si256(reinterpret_cast<const __m256i*>(from));
+    }
+    static void store(int16_t* to, Ints v) noexcept
+    {
+        _mm256_storeu_si256(reinterpret_cast<__m256i*>(to), v);
+    }
     /// The low 16 bits of the lanes of both.
     static void store_narrow(int16_t* to, Ints a, Ints b) noexcept
     {
@@ -85,13 +93,19 @@ struct Avx2 {
     /// `offset` and the sum of the lanes of each of four vectors.
     static void store_sums(int32_t* to, Ints a, Ints b, Ints c, Ints d, int32_t offset) noexcept
     {
-        const Ints ab = add(_mm256_unpacklo_epi32(a, b), _mm256_unpackhi_epi32(a, b));
-        const Ints cd = add(_mm256_unpacklo_epi32(c, d), _mm256_unpackhi_epi32(c, d));
-        const Ints abcd = add(_mm256_unpacklo_epi64(ab, cd), _mm256_unpackhi_epi64(ab, cd));
+        const Ints abcd = sums_of_halves(a, b, c, d);
         const __m128i sums =
             _mm_add_epi32(_mm256_castsi256_si128(abcd), _mm256_extracti128_si256(abcd, 1));
         _mm_storeu_si128(reinterpret_cast<__m128i*>(to),
                          _mm_add_epi32(sums, _mm_set1_epi32(offset)));
+    }
+    /// Lane k becomes the sum of the lanes of vector k.
+    static Ints sums_of_lanes(const Ints (&v)[kLanes]) noexcept
+    {
+        const Ints low = sums_of_halves(v[0], v[1], v[2], v[3]);
+        const Ints high = sums_of_halves(v[4], v[5], v[6], v[7]);
+        return add(_mm256_permute2x128_si256(low, high, 0x20),
+                   _mm256_permute2x128_si256(low, high, 0x31));
     }
     static int32_t max_of_lanes(Ints v) noexcept
     {
@@ -124,7 +138,7 @@ struct Avx2 {
         return _mm256_blend_epi32(even, odd, 0b10101010);
     }
 
-    /// Shifts every lane by the same `count`, 0 .. 31.
+    /// Shifts every lane by the same `count`, 0 .. 127; 32 and more leave 0.
     static Ints shift_left(Ints v, int32_t count) noexcept
     {
         return _mm256_sll_epi32(v, _mm_cvtsi32_si128(count));
@@ -142,6 +156,7 @@ struct Avx2 {
 
     static Ints bit_xor(Ints a, Ints b) noexcept { return _mm256_xor_si256(a, b); }
     static Ints bit_and(Ints a, Ints b) noexcept { return _mm256_and_si256(a, b); }
+    static Ints bit_or(Ints a, Ints b) noexcept { return _mm256_or_si256(a, b); }
     static Ints min(Ints a, Ints b) noexcept { return _mm256_min_epi32(a, b); }
 
     /// Magnitudes; -2^31 stays.
@@ -244,6 +259,50 @@ struct Avx2 {
         const __m128i bytes = _mm_loadu_si128(reinterpret_cast<const __m128i*>(from));
         const __m128i folded = _mm_xor_si128(bytes, _mm_set1_epi8(-128));
         return _mm256_cvtepi16_epi32(_mm_maddubs_epi16(folded, _mm_set1_epi8(1)));
+    }
+
+    static Ints load_byte_fours(const uint8_t* from) noexcept
+    {
+        const Ints folded = _mm256_xor_si256(load_vector(from), _mm256_set1_epi8(-128));
+        const Ints pairs = _mm256_maddubs_epi16(folded, _mm256_set1_epi8(1));
+        return _mm256_madd_epi16(pairs, _mm256_set1_epi16(1));
+    }
+
+    /// Widens bytes to 16 bits, with zeros.
+    static Ints widen_bytes(const uint8_t* from) noexcept
+    {
+        return _mm256_cvtepu8_epi16(_mm_loadu_si128(reinterpret_cast<const __m128i*>(from)));
+    }
+    /// Widens the 16-bit numbers of the lower lanes, and of the upper lanes.
+    static Ints lower_shorts(Ints v) noexcept
+    {
+        return _mm256_cvtepi16_epi32(_mm256_castsi256_si128(v));
+    }
+    static Ints upper_shorts(Ints v) noexcept
+    {
+        return _mm256_cvtepi16_epi32(_mm256_extracti128_si256(v, 1));
+    }
+    static Ints sub_shorts(Ints a, Ints b) noexcept { return _mm256_sub_epi16(a, b); }
+
+    /// A table of 16 bytes for look_up().
+    static Ints load_table(const void* table) noexcept
+    {
+        return _mm256_broadcastsi128_si256(_mm_loadu_si128(static_cast<const __m128i*>(table)));
+    }
+    /// The byte of the table that each byte names, 0 .. 15; 0 for a byte whose top bit is set.
+    static Ints look_up(Ints table, Ints bytes) noexcept
+    {
+        return _mm256_shuffle_epi8(table, bytes);
+    }
+    /// Negates the bytes whose byte in `signs` is negative; what is 0 there becomes 0 or stays.
+    static Ints take_signs(Ints bytes, Ints signs) noexcept
+    {
+        return _mm256_sign_epi8(bytes, signs);
+    }
+    /// The 16-bit sums, which must fit, of the products of two unsigned and two signed bytes each.
+    static Ints byte_pair_products(Ints unsigned_bytes, Ints signed_bytes) noexcept
+    {
+        return _mm256_maddubs_epi16(unsigned_bytes, signed_bytes);
     }
 
     /// Adds bits `Shift` to `Shift` + 31 of each product, 1 <= Shift <= 32, to sums that
@@ -363,9 +422,12 @@ struct Avx2 {
     }
 
 private:
-    static Ints load_vector(const uint8_t* from) noexcept
+    /// The sums of the lower four lanes of each vector, and then of the upper four.
+    static Ints sums_of_halves(Ints a, Ints b, Ints c, Ints d) noexcept
     {
-        return _mm256_loadu_si256(reinterpret_cast<const __m256i*>(from));
+        const Ints ab = add(_mm256_unpacklo_epi32(a, b), _mm256_unpackhi_epi32(a, b));
+        const Ints cd = add(_mm256_unpacklo_epi32(c, d), _mm256_unpackhi_epi32(c, d));
+        return add(_mm256_unpacklo_epi64(ab, cd), _mm256_unpackhi_epi64(ab, cd));
     }
     static Ints truncated_to_shorts(Ints v) noexcept
     {

@@ -33,6 +33,11 @@ struct Neon {
     {
         return vreinterpretq_s32_s16(vld1q_s16(from));
     }
+    static Ints load_vector(const uint8_t* from) noexcept
+    {
+        return vreinterpretq_s32_u8(vld1q_u8(from));
+    }
+    static void store(int16_t* to, Ints v) noexcept { vst1q_s16(to, vreinterpretq_s16_s32(v)); }
     /// The low 16 bits of the lanes of both.
     static void store_narrow(int16_t* to, Ints a, Ints b) noexcept
     {
@@ -71,10 +76,15 @@ struct Neon {
     }
 
     static int32_t sum_of_lanes(Ints v) noexcept { return vaddvq_s32(v); }
+    /// Lane k becomes the sum of the lanes of vector k.
+    static Ints sums_of_lanes(const Ints (&v)[kLanes]) noexcept
+    {
+        return vpaddq_s32(vpaddq_s32(v[0], v[1]), vpaddq_s32(v[2], v[3]));
+    }
     /// `offset` and the sum of the lanes of each of four vectors.
     static void store_sums(int32_t* to, Ints a, Ints b, Ints c, Ints d, int32_t offset) noexcept
     {
-        store(to, add(vpaddq_s32(vpaddq_s32(a, b), vpaddq_s32(c, d)), set(offset)));
+        store(to, add(sums_of_lanes({a, b, c, d}), set(offset)));
     }
     static int32_t max_of_lanes(Ints v) noexcept { return vmaxvq_s32(v); }
 
@@ -99,7 +109,7 @@ struct Neon {
         return vshrn_high_n_s64(vshrn_n_s64(low, Shift), high, Shift);
     }
 
-    /// Shifts every lane by the same `count`, 0 .. 31.
+    /// Shifts every lane by the same `count`, 0 .. 127; 32 and more leave 0.
     static Ints shift_left(Ints v, int32_t count) noexcept
     {
         return vshlq_s32(v, vdupq_n_s32(count));
@@ -117,6 +127,7 @@ struct Neon {
 
     static Ints bit_xor(Ints a, Ints b) noexcept { return veorq_s32(a, b); }
     static Ints bit_and(Ints a, Ints b) noexcept { return vandq_s32(a, b); }
+    static Ints bit_or(Ints a, Ints b) noexcept { return vorrq_s32(a, b); }
     static Ints min(Ints a, Ints b) noexcept { return vminq_s32(a, b); }
 
     /// Magnitudes; -2^31 stays.
@@ -202,6 +213,56 @@ struct Neon {
     {
         const uint8x8_t folded = veor_u8(vld1_u8(from), vdup_n_u8(0x80));
         return vreinterpretq_s32_u32(vmovl_u16(vpaddl_u8(folded)));
+    }
+
+    static Ints load_byte_fours(const uint8_t* from) noexcept
+    {
+        const uint8x16_t folded = veorq_u8(vld1q_u8(from), vdupq_n_u8(0x80));
+        return vreinterpretq_s32_u32(vpaddlq_u16(vpaddlq_u8(folded)));
+    }
+
+    /// Widens bytes to 16 bits, with zeros.
+    static Ints widen_bytes(const uint8_t* from) noexcept
+    {
+        return vreinterpretq_s32_u16(vmovl_u8(vld1_u8(from)));
+    }
+    /// Widens the 16-bit numbers of the lower lanes, and of the upper lanes.
+    static Ints lower_shorts(Ints v) noexcept
+    {
+        return vmovl_s16(vget_low_s16(vreinterpretq_s16_s32(v)));
+    }
+    static Ints upper_shorts(Ints v) noexcept { return vmovl_high_s16(vreinterpretq_s16_s32(v)); }
+    static Ints sub_shorts(Ints a, Ints b) noexcept
+    {
+        return vreinterpretq_s32_s16(vsubq_s16(vreinterpretq_s16_s32(a), vreinterpretq_s16_s32(b)));
+    }
+
+    /// A table of 16 bytes for look_up().
+    static Ints load_table(const void* table) noexcept
+    {
+        return load_vector(static_cast<const uint8_t*>(table));
+    }
+    /// The byte of the table that each byte names, 0 .. 15; 0 for a byte whose top bit is set.
+    static Ints look_up(Ints table, Ints bytes) noexcept
+    {
+        return vreinterpretq_s32_u8(
+            vqtbl1q_u8(vreinterpretq_u8_s32(table), vreinterpretq_u8_s32(bytes)));
+    }
+    /// Negates the bytes whose byte in `signs` is negative; what is 0 there becomes 0 or stays.
+    static Ints take_signs(Ints bytes, Ints signs) noexcept
+    {
+        const int8x16_t mask = vshrq_n_s8(vreinterpretq_s8_s32(signs), 7);
+        return vreinterpretq_s32_s8(vsubq_s8(veorq_s8(vreinterpretq_s8_s32(bytes), mask), mask));
+    }
+    /// The 16-bit sums, which must fit, of the products of two unsigned and two signed bytes each.
+    static Ints byte_pair_products(Ints unsigned_bytes, Ints signed_bytes) noexcept
+    {
+        const uint8x16_t a = vreinterpretq_u8_s32(unsigned_bytes);
+        const int8x16_t b = vreinterpretq_s8_s32(signed_bytes);
+        const int16x8_t low =
+            vmulq_s16(vreinterpretq_s16_u16(vmovl_u8(vget_low_u8(a))), vmovl_s8(vget_low_s8(b)));
+        const int16x8_t high = vmulq_s16(vreinterpretq_s16_u16(vmovl_high_u8(a)), vmovl_high_s8(b));
+        return vreinterpretq_s32_s16(vpaddq_s16(low, high));
     }
 
     /// Adds bits `Shift` to `Shift` + 31 of each product, 1 <= Shift <= 32, to sums that

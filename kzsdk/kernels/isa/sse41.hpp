@@ -37,6 +37,14 @@ struct Sse41 {
     {
         return _mm_loadu_si128(reinterpret_cast<const __m128i*>(from));
     }
+    static Ints load_vector(const uint8_t* from) noexcept
+    {
+        return _mm_loadu_si128(reinterpret_cast<const __m128i*>(from));
+    }
+    static void store(int16_t* to, Ints v) noexcept
+    {
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(to), v);
+    }
     /// The low 16 bits of the lanes of both.
     static void store_narrow(int16_t* to, Ints a, Ints b) noexcept
     {
@@ -78,13 +86,17 @@ struct Sse41 {
         v = _mm_add_epi32(v, _mm_shuffle_epi32(v, 0b10110001));
         return _mm_cvtsi128_si32(v);
     }
+    /// Lane k becomes the sum of the lanes of vector k.
+    static Ints sums_of_lanes(const Ints (&v)[kLanes]) noexcept
+    {
+        const Ints ab = add(_mm_unpacklo_epi32(v[0], v[1]), _mm_unpackhi_epi32(v[0], v[1]));
+        const Ints cd = add(_mm_unpacklo_epi32(v[2], v[3]), _mm_unpackhi_epi32(v[2], v[3]));
+        return add(_mm_unpacklo_epi64(ab, cd), _mm_unpackhi_epi64(ab, cd));
+    }
     /// `offset` and the sum of the lanes of each of four vectors.
     static void store_sums(int32_t* to, Ints a, Ints b, Ints c, Ints d, int32_t offset) noexcept
     {
-        const Ints ab = add(_mm_unpacklo_epi32(a, b), _mm_unpackhi_epi32(a, b));
-        const Ints cd = add(_mm_unpacklo_epi32(c, d), _mm_unpackhi_epi32(c, d));
-        const Ints sums = add(_mm_unpacklo_epi64(ab, cd), _mm_unpackhi_epi64(ab, cd));
-        store(to, add(sums, set(offset)));
+        store(to, add(sums_of_lanes({a, b, c, d}), set(offset)));
     }
     static int32_t max_of_lanes(Ints v) noexcept
     {
@@ -115,7 +127,7 @@ struct Sse41 {
         return _mm_blend_epi16(even, odd, 0b11001100);
     }
 
-    /// Shifts every lane by the same `count`, 0 .. 31.
+    /// Shifts every lane by the same `count`, 0 .. 127; 32 and more leave 0.
     static Ints shift_left(Ints v, int32_t count) noexcept
     {
         return _mm_sll_epi32(v, _mm_cvtsi32_si128(count));
@@ -133,6 +145,7 @@ struct Sse41 {
 
     static Ints bit_xor(Ints a, Ints b) noexcept { return _mm_xor_si128(a, b); }
     static Ints bit_and(Ints a, Ints b) noexcept { return _mm_and_si128(a, b); }
+    static Ints bit_or(Ints a, Ints b) noexcept { return _mm_or_si128(a, b); }
     static Ints min(Ints a, Ints b) noexcept { return _mm_min_epi32(a, b); }
 
     /// Magnitudes; -2^31 stays.
@@ -225,6 +238,41 @@ struct Sse41 {
         const __m128i bytes = _mm_loadl_epi64(reinterpret_cast<const __m128i*>(from));
         const __m128i folded = _mm_xor_si128(bytes, _mm_set1_epi8(-128));
         return _mm_cvtepi16_epi32(_mm_maddubs_epi16(folded, _mm_set1_epi8(1)));
+    }
+
+    static Ints load_byte_fours(const uint8_t* from) noexcept
+    {
+        const Ints folded = _mm_xor_si128(load_vector(from), _mm_set1_epi8(-128));
+        const Ints pairs = _mm_maddubs_epi16(folded, _mm_set1_epi8(1));
+        return _mm_madd_epi16(pairs, _mm_set1_epi16(1));
+    }
+
+    /// Widens bytes to 16 bits, with zeros.
+    static Ints widen_bytes(const uint8_t* from) noexcept
+    {
+        return _mm_cvtepu8_epi16(_mm_loadl_epi64(reinterpret_cast<const __m128i*>(from)));
+    }
+    /// Widens the 16-bit numbers of the lower lanes, and of the upper lanes.
+    static Ints lower_shorts(Ints v) noexcept { return _mm_cvtepi16_epi32(v); }
+    static Ints upper_shorts(Ints v) noexcept
+    {
+        return _mm_cvtepi16_epi32(_mm_unpackhi_epi64(v, v));
+    }
+    static Ints sub_shorts(Ints a, Ints b) noexcept { return _mm_sub_epi16(a, b); }
+
+    /// A table of 16 bytes for look_up().
+    static Ints load_table(const void* table) noexcept
+    {
+        return _mm_loadu_si128(static_cast<const __m128i*>(table));
+    }
+    /// The byte of the table that each byte names, 0 .. 15; 0 for a byte whose top bit is set.
+    static Ints look_up(Ints table, Ints bytes) noexcept { return _mm_shuffle_epi8(table, bytes); }
+    /// Negates the bytes whose byte in `signs` is negative; what is 0 there becomes 0 or stays.
+    static Ints take_signs(Ints bytes, Ints signs) noexcept { return _mm_sign_epi8(bytes, signs); }
+    /// The 16-bit sums, which must fit, of the products of two unsigned and two signed bytes each.
+    static Ints byte_pair_products(Ints unsigned_bytes, Ints signed_bytes) noexcept
+    {
+        return _mm_maddubs_epi16(unsigned_bytes, signed_bytes);
     }
 
     /// Adds bits `Shift` to `Shift` + 31 of each product, 1 <= Shift <= 32, to sums that

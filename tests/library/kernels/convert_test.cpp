@@ -2,6 +2,8 @@
 
 #include <cstdint>
 #include <cstring>
+#include <limits>
+#include <numeric>
 #include <string>
 #include <vector>
 
@@ -18,67 +20,172 @@ using namespace kz::test;
 
 class ConvertVariants : public KernelVariants {};
 
-// Bytes that hold all the extremes of both encodings, and noise.
-std::vector<uint8_t> audio(size_t size)
+using Bytes = std::vector<uint8_t>;
+
+// Bytes that hold all the extremes of the encodings, and noise.
+Bytes audio(size_t size)
 {
     Random random(16);
-    std::vector<uint8_t> bytes(size);
+    Bytes bytes(size);
     for (uint8_t& byte : bytes) {
-        byte = static_cast<uint8_t>(random.next());
+        byte = static_cast<uint8_t>(random.next() >> 24);
     }
     const uint8_t extremes[] = {0x00, 0x80, 0x00, 0x80, 0xff, 0x7f, 0xff, 0x7f, 0xff, 0xff,
-                                0x01, 0x00, 0x00, 0x00, 0x80, 0x80, 0x7f, 0x80, 0x00, 0x80};
+                                0x01, 0x00, 0x00, 0x00, 0x80, 0x80, 0x7f, 0x80, 0x00, 0x80,
+                                0x2a, 0xaa, 0x2a, 0x2a, 0x2a, 0x2a, 0xaa, 0xaa, 0xaa, 0xaa};
     std::memcpy(bytes.data(), extremes, std::min(size, sizeof extremes));
     return bytes;
 }
 
-constexpr int32_t kMaxFrames = 70;
+struct Input {
+    const uint8_t* bytes;
+    int32_t channels;
+    int32_t frames;
+    int32_t shift; ///< of words only
+};
 
 // Bits of the words, with one beyond the last that must stay untouched.
-template <class Word>
-std::vector<uint32_t> converted(Converter<Word>* convert, const uint8_t* bytes, int32_t frames,
-                                int32_t shift)
+template <class Word, class Convert>
+std::vector<uint32_t> bits_of(int32_t frames, const Convert& convert)
 {
     std::vector<Word> output(static_cast<size_t>(frames) + 1, Word{77});
-    convert(bytes, output.data(), frames, shift);
+    convert(output.data());
     std::vector<uint32_t> bits(output.size());
     std::memcpy(bits.data(), output.data(), output.size() * sizeof(Word));
     return bits;
 }
 
-// All lengths up to several vectors and a tail, at even and odd addresses, with every shift in use.
-template <class Word>
-void expect_equal(Converter<Word>* actual, Converter<Word>* plain, const char* name)
+std::vector<uint32_t> converted(ToWords* convert, const Input& in)
 {
-    const auto bytes = audio(4 * kMaxFrames + 3);
-    for (int32_t frames = 0; frames <= kMaxFrames; ++frames) {
-        for (size_t offset = 0; offset < 4; ++offset) {
-            for (const int32_t shift : {0, 8, 14, 15, 22, 23}) {
-                ASSERT_EQ(converted(actual, bytes.data() + offset, frames, shift),
-                          converted(plain, bytes.data() + offset, frames, shift))
-                    << name << ", " << frames << " frames, shift " << shift;
+    return bits_of<int32_t>(in.frames, [&](int32_t* output) {
+        convert(in.channels, in.bytes, output, in.frames, in.shift);
+    });
+}
+
+std::vector<uint32_t> converted(ToFloats* convert, const Input& in)
+{
+    return bits_of<float>(
+        in.frames, [&](float* output) { convert(in.channels, in.bytes, output, in.frames); });
+}
+
+template <class Convert>
+struct Member {
+    const char* name;
+    Convert* Encodings<Convert>::*of;
+};
+
+template <class Convert>
+constexpr Member<Convert> kMembers[] = {
+    {"pcm16", &Encodings<Convert>::pcm16},
+    {"pcm8", &Encodings<Convert>::pcm8},
+    {"alaw", &Encodings<Convert>::alaw},
+    {"ulaw", &Encodings<Convert>::ulaw},
+    {"alaw running", &Encodings<Convert>::alaw_running},
+    {"ulaw running", &Encodings<Convert>::ulaw_running},
+};
+
+template <class Convert>
+void expect_equal(const Encodings<Convert>& actual, const Encodings<Convert>& plain,
+                  const Input& in)
+{
+    for (const Member<Convert>& member : kMembers<Convert>) {
+        ASSERT_EQ(converted(actual.*member.of, in), converted(plain.*member.of, in))
+            << member.name << ", " << in.channels << " channels, " << in.frames << " frames, shift "
+            << in.shift;
+    }
+}
+
+void expect_equal(const Variant& actual, const Variant& plain, const Input& in)
+{
+    expect_equal(actual.to_words, plain.to_words, in);
+    expect_equal(actual.to_floats, plain.to_floats, in);
+}
+
+TEST_P(ConvertVariants, AreBitIdenticalForAllLengths)
+{
+    constexpr int32_t kMaxFrames = 70;
+    const Bytes bytes = audio(2 * 9 * kMaxFrames + 3);
+    for (int32_t channels = 1; channels <= 9; ++channels) {
+        for (int32_t frames = 0; frames <= kMaxFrames; ++frames) {
+            for (const size_t offset : {0u, 1u, 2u, 3u}) {
+                expect_equal(variant(), plain(), {bytes.data() + offset, channels, frames, 14});
             }
         }
     }
 }
 
-template <class Word>
-void expect_equal(const Converters<Word>& actual, const Converters<Word>& plain)
+TEST_P(ConvertVariants, AreBitIdenticalForAllShifts)
 {
-    expect_equal(actual.pcm16_mono, plain.pcm16_mono, "pcm16 mono");
-    expect_equal(actual.pcm16_stereo, plain.pcm16_stereo, "pcm16 stereo");
-    expect_equal(actual.pcm8_mono, plain.pcm8_mono, "pcm8 mono");
-    expect_equal(actual.pcm8_stereo, plain.pcm8_stereo, "pcm8 stereo");
+    const Bytes bytes = audio(2 * 5 * 40);
+    for (int32_t shift = -32; shift <= 64; ++shift) {
+        for (int32_t channels = 1; channels <= 5; ++channels) {
+            expect_equal(variant(), plain(), {bytes.data(), channels, 40, shift});
+        }
+    }
 }
 
-TEST_P(ConvertVariants, GiveTheWordsOfThePlainConverters)
+TEST_P(ConvertVariants, AreBitIdenticalForManyChannels)
 {
-    expect_equal(variant().words, plain().words);
+    constexpr int32_t kFrames = 37;
+    const Bytes bytes = audio(2 * 4097 * kFrames);
+    for (const int32_t channels : {15, 16, 17, 31, 32, 33, 100, 255, 511, 512, 513, 1000, 4097}) {
+        expect_equal(variant(), plain(), {bytes.data() + 1, channels, kFrames, 6});
+    }
 }
 
-TEST_P(ConvertVariants, GiveTheFloatsOfThePlainConverters)
+TEST_P(ConvertVariants, AreBitIdenticalOverManyBatches)
 {
-    expect_equal(variant().floats, plain().floats);
+    const Bytes bytes = audio(2 * 100 * 301);
+    for (const int32_t channels : {3, 7, 100}) {
+        expect_equal(variant(), plain(), {bytes.data(), channels, 100 * 301 / channels, 12});
+    }
+}
+
+TEST_P(ConvertVariants, AreBitIdenticalForEveryCode)
+{
+    Bytes pairs;
+    for (uint32_t first = 0; first < 256; ++first) {
+        for (uint32_t second = 0; second < 256; ++second) {
+            pairs.push_back(static_cast<uint8_t>(first));
+            pairs.push_back(static_cast<uint8_t>(second));
+        }
+    }
+    for (const int32_t channels : {1, 2, 4, 8}) {
+        const auto frames =
+            static_cast<int32_t>(pairs.size() / (2 * static_cast<size_t>(channels)));
+        expect_equal(variant(), plain(), {pairs.data(), channels, frames, 0});
+    }
+}
+
+// Full scale of one sign: 512 samples reach 2^24, where floats begin to round, and a sum that is
+// never cleared passes 2^31.
+TEST_P(ConvertVariants, AreBitIdenticalAtFullScale)
+{
+    for (const uint8_t byte : Bytes{0x00, 0x2a, 0x7f, 0x80, 0xaa, 0xff}) {
+        const Bytes bytes(2 * 513 * 300, byte);
+        for (const int32_t channels : {1, 2, 4, 8, 511, 512, 513}) {
+            expect_equal(variant(), plain(), {bytes.data(), channels, 300, 15});
+        }
+    }
+    Bytes lows(2 * 512 * 40);
+    for (size_t i = 0; i < lows.size(); i += 2) {
+        lows[i + 1] = 0x80; // -32768, little end first
+    }
+    for (const int32_t channels : {511, 512, 513}) {
+        expect_equal(variant(), plain(), {lows.data(), channels, 39, 6});
+    }
+}
+
+TEST_P(ConvertVariants, ReadNothingWithoutChannels)
+{
+    for (const int32_t channels : {0, -1, std::numeric_limits<int32_t>::min()}) {
+        const Input nothing{nullptr, channels, 20, 3};
+        for (const auto& member : kMembers<ToWords>) {
+            const auto words = converted(variant().to_words.*member.of, nothing);
+            EXPECT_EQ(0U, std::accumulate(words.begin(), words.end() - 1, 0U)) << member.name;
+        }
+        expect_equal(variant(), plain(), nothing);
+    }
 }
 
 KZ_FOR_KERNEL_VARIANTS(ConvertVariants);
