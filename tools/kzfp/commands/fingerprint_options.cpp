@@ -28,8 +28,8 @@ constexpr const char* kNotes =
     "           divided by the smallest power of two that is not below their number.\n"
     "Encodings: A-law and mu-law files go to the library as they are, everything else as 16-bit\n"
     "           PCM. That includes 8-bit files, since the library's own 8-bit input makes\n"
-    "           fingerprints that match no other encoding; --raw RATE,CHANNELS,u8 asks for it.\n"
-    "Exit:      0 all done, 1 some file failed (one line each on standard error), 2 wrong usage.";
+    "           fingerprints that match no other encoding; --raw RATE,CHANNELS,u8 uses it.\n"
+    "Exit:      0 success, 1 a file failed (one line each on standard error), 2 wrong usage.";
 
 constexpr const char* kAboutCommands =
     "\n  Each has a help of its own: kzfp COMMAND --help. A sound file that is named like a\n"
@@ -100,10 +100,10 @@ void add_input_options(CLI::App& parser, audio::Request& request, std::optional<
             "encoding, for example 44100,2,s16\n" +
                 explanations_in(kEncodings))
         ->type_name("RATE,CHANNELS,ENCODING");
-    parser.add_option("--start", request.section.start, "Listen from here on")
+    parser.add_option("--start", request.section.start, "Start at this time")
         ->type_name("SECONDS")
         ->check(check_seconds);
-    parser.add_option("--length", request.section.length, "Listen to no more than this")
+    parser.add_option("--length", request.section.length, "Use no more than this much sound")
         ->type_name("SECONDS")
         ->check(check_seconds);
 }
