@@ -65,7 +65,7 @@
 /* The extraction interface: one algorithm or the other, in the formats that they take. */
 #include "kzsdk/fpx/fpx.h"
 
-/* Streams: sound in any format, cut anywhere. The door for most users. */
+/* Streams: sound in any format, cut anywhere. The entry point for most users. */
 #include "kzsdk/stream/stream.h"
 
 /* The files and labels of optical discs; works without start-up. */

@@ -13,29 +13,29 @@ using kz::test::digest_of;
 
 Prepared equaliser()
 {
-    const auto road = std::make_shared<FrameRoad>();
-    return {[road] {
-                road->equalise();
-                keep(road->equalised.data());
+    const auto stages = std::make_shared<FrameStages>();
+    return {[stages] {
+                stages->equalise();
+                keep(stages->equalised.data());
             },
-            [road] {
-                road->equalise();
-                return digest_of(road->equalised);
+            [stages] {
+                stages->equalise();
+                return digest_of(stages->equalised);
             },
             [] { return Peers{copying(2 * kFrame * sizeof(FxpType), 4)}; }};
 }
 
 Prepared decimator()
 {
-    const auto road = std::make_shared<FrameRoad>();
-    road->equalise();
-    return {[road] {
-                road->decimate();
-                keep(road->half.data());
+    const auto stages = std::make_shared<FrameStages>();
+    stages->equalise();
+    return {[stages] {
+                stages->decimate();
+                keep(stages->half.data());
             },
-            [road] {
-                road->decimate();
-                return digest_of(road->half);
+            [stages] {
+                stages->decimate();
+                return digest_of(stages->half);
             },
             [] { return Peers{swresample_float(22050, kFrame)}; }};
 }

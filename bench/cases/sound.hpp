@@ -40,9 +40,9 @@ inline std::vector<int16_t> quiet_noise(size_t count)
 }
 
 /// A frame's way through the fixed-point stages, one by one.
-class FrameRoad {
+class FrameStages {
 public:
-    FrameRoad()
+    FrameStages()
         : frame(fixed_sound(kWorkingHertz, kFrame)), equalised(kFrame), half(kFrame / 2),
           decimator_(KZDSP_resampler_fixed_create(2U << 15, 1U << 15)),
           transform_(KZDSP_DCT_fixed_create(14))

@@ -38,20 +38,20 @@ Prepared in_place(const Aligned<Number>& input, const std::function<void(Number*
 
 Prepared fixed_16384()
 {
-    FrameRoad road;
-    road.equalise();
-    road.decimate();
+    FrameStages stages;
+    stages.equalise();
+    stages.decimate();
     const std::shared_ptr<KZDSP_DCT_fixed> dct = FixedTransform(KZDSP_DCT_fixed_create(14));
-    return in_place<FxpType>(road.half,
+    return in_place<FxpType>(stages.half,
                              [dct](FxpType* data) { KZDSP_DCT_fixed_compute(dct.get(), data, 0); });
 }
 
 Prepared fixed_32768()
 {
-    FrameRoad road;
-    road.equalise();
+    FrameStages stages;
+    stages.equalise();
     const std::shared_ptr<KZDSP_DCT_fixed> dct = FixedTransform(KZDSP_DCT_fixed_create(15));
-    return in_place<FxpType>(road.equalised,
+    return in_place<FxpType>(stages.equalised,
                              [dct](FxpType* data) { KZDSP_DCT_fixed_compute(dct.get(), data, 0); });
 }
 
