@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <filesystem>
+#include <fstream>
 #include <map>
 #include <set>
 
@@ -113,6 +114,32 @@ void expect_label(int32_t descriptor, const std::string& bytes, int64_t offset)
     ASSERT_EQ(expected, std::string(label.text, label.length));
 }
 
+/// A volume with anything in its label's field, on a disc that may end too early.
+void expect_whole_label(Choices& choices, const std::string& path)
+{
+    const bool is_udf = choices.ConsumeBool();
+    std::string descriptor = is_udf ? std::string("\1\0", 2) : "\1CD001";
+    descriptor.resize(is_udf ? 24 : 40);
+    descriptor += choices.ConsumeBytesAsString(100);
+    std::ofstream(path, std::ios::binary)
+        << std::string((is_udf ? 32u : 16u) * 2048, '\0') << descriptor;
+    const int32_t file = kzbdfs_open(path.c_str());
+    ASSERT_GE(file, 0);
+    const auto get = is_udf ? kzbdfs_get_volume_label : kzdvdfs_get_volume_label;
+    char label[KZ_DISC_LABEL_SIZE];
+    const bool is_there = descriptor.size() >= 72;
+    ASSERT_EQ(is_there ? KZ_OK : KZ_DISC_ERROR_NOT_FOUND, get(file, label, sizeof label));
+    const std::string whole = label;
+    ASSERT_FALSE(whole.ends_with(' '));
+    if (!whole.empty()) {
+        const auto too_small = static_cast<uint32_t>(whole.size());
+        ASSERT_EQ(KZ_DISC_ERROR_MEMORY, get(file, label, too_small));
+        ASSERT_EQ(KZ_OK, get(file, label, too_small + 1));
+        ASSERT_EQ(whole, label);
+    }
+    ASSERT_EQ(KZ_OK, kzbdfs_close(file));
+}
+
 } // namespace
 
 void run(Choices& choices)
@@ -130,13 +157,16 @@ void run(Choices& choices)
 
     const std::string bytes = choices.ConsumeRandomLengthString(400);
     const std::string path = scratch.write("file", bytes);
-    static const kz_status on = kzbdfs_initialize();
-    ASSERT_EQ(KZ_OK, on);
+    static const kz_status on[] = {kzbdfs_initialize(), kzdvdfs_initialize()};
+    ASSERT_EQ(KZ_OK, on[0] | on[1]);
     const int32_t descriptor = kzbdfs_open(path.c_str());
     ASSERT_GE(descriptor, 0);
     expect_bytes(choices, descriptor, bytes);
     expect_label(descriptor, bytes, choices.ConsumeIntegralInRange<int64_t>(0, 400));
     ASSERT_EQ(KZ_OK, kzbdfs_close(descriptor));
+    if (one_in(choices, 8)) {
+        expect_whole_label(choices, path);
+    }
 }
 
 } // namespace kz::fuzz

@@ -53,8 +53,8 @@ constexpr Entry kTexts[] = {
     {KZ_DISC_ERROR_ACCESS_DENIED,
      "Access to the file or device is denied: give the user the right to read it."},
     {KZ_DISC_ERROR_NOT_FOUND,
-     "There is no such file or device, or the origin of a seek is unknown: correct the path, or "
-     "pass 0, 1 or 2 as the origin."},
+     "There is no such file, device or volume, or the origin of a seek is unknown: correct the "
+     "path, insert another disc, or pass 0, 1 or 2 as the origin."},
     {KZ_DISC_ERROR_NO_SPACE, "The device has no space left: free some."},
     {KZ_DISC_ERROR_TOO_MANY_FILES, "The process has too many files open: close some."},
     {KZ_DISC_ERROR_BAD_DESCRIPTOR,

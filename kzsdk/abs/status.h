@@ -71,7 +71,8 @@ typedef uint32_t kz_status;
 #define KZ_DISC_ERROR_SYSTEM UINT32_C(0x90060009)
 /** Access is denied: give the user the right to read the file or device. */
 #define KZ_DISC_ERROR_ACCESS_DENIED UINT32_C(0x90060047)
-/** There is no such file or device, or a seek names no known origin: correct the path or origin. */
+/** There is no such file, device or volume, or a seek names no known origin: correct the path, the
+    disc or the origin. */
 #define KZ_DISC_ERROR_NOT_FOUND UINT32_C(0x90060048)
 /** The device has no space left: free some. */
 #define KZ_DISC_ERROR_NO_SPACE UINT32_C(0x9006004a)

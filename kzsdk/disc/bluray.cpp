@@ -77,6 +77,11 @@ kz_status kzbdfs_read_vol_label(const char* root, uint32_t capacity, uint32_t* l
     return bluray.read_vol_label(root, capacity, length, label);
 }
 
+kz_status kzbdfs_get_volume_label(int32_t descriptor, char* label, uint32_t size) noexcept
+{
+    return bluray.get_volume_label(descriptor, label, size);
+}
+
 kz_status kzbdfs_get_cert_filename(char* destination, uint32_t number, uint32_t size) noexcept
 {
     if (!can_build(destination, size)) {

@@ -19,6 +19,6 @@ struct kzbdfs_dirent {
 
 namespace kz::disc {
 
-inline constinit Family bluray(kUdfLabel);
+inline constinit Family bluray(kUdfLabel, kUdfVolume);
 
 } // namespace kz::disc

@@ -8,9 +8,9 @@
  *
  * Each family has a switch, off at first, and a last error. Both are the process's, atomic and
  * without a lock: another thread's failure may be the one that get_error returns, so look at what a
- * call returns. While a family is off, open, seek, read, read_at, close, read_vol_label and
- * kzdvdfs_exists() do nothing but fail with KZ_DISC_NOT_ON. The names are built, and directories
- * listed, whether it is on or off.
+ * call returns. While a family is off, open, seek, read, read_at, close, read_vol_label,
+ * get_volume_label and kzdvdfs_exists() do nothing but fail with KZ_DISC_NOT_ON. The names are
+ * built, and directories listed, whether it is on or off.
  *
  * Status codes. A failed system call gives, by its `errno`:
  *
@@ -34,6 +34,9 @@
 #include "kzsdk/abs/status.h"
 
 KZ_C_BEGIN
+
+/** Bytes that are room enough for every volume label of get_volume_label, with its NUL. */
+#define KZ_DISC_LABEL_SIZE 64u
 
 /* ---- Blu-ray: switch and last error --------------------------------------------------------- */
 
@@ -120,6 +123,24 @@ KZ_API kz_status kzbdfs_close(int32_t descriptor) KZ_NOEXCEPT;
  */
 KZ_API kz_status kzbdfs_read_vol_label(const char* root, uint32_t capacity, uint32_t* length,
                                        char* label) KZ_NOEXCEPT;
+
+/**
+ * Reads the volume label of any disc or image that is open: the UDF volume identifier in sector 32.
+ *
+ * Unlike kzbdfs_read_vol_label() this looks whether the volume is there, returns its label as a
+ * whole, white space within included, and leaves nothing open. Spaces at the end are left out, and
+ * a label ends at its first NUL. Characters of 8 and of 16 bits become UTF-8; a label in any other
+ * form is empty.
+ *
+ * @param descriptor  From kzbdfs_open(). Its place is moved: one thread at a time for a descriptor.
+ * @param[out] label  Takes the label, NUL-terminated; empty on failure.
+ * @param size        Bytes of room at @p label, 1 or more. KZ_DISC_LABEL_SIZE is always enough.
+ * @return 0; KZ_DISC_ERROR_NOT_FOUND when there is no such volume; KZ_DISC_ERROR_MEMORY when the
+ *         label does not fit; KZ_DISC_ERROR_INVALID_ARGUMENT when @p label is null or @p size is 0;
+ *         else why the disc cannot be read.
+ */
+KZ_API kz_status kzbdfs_get_volume_label(int32_t descriptor, char* label,
+                                         uint32_t size) KZ_NOEXCEPT;
 
 /* ---- Blu-ray: directories ---------------------------------------------------------------------
  *
@@ -274,6 +295,13 @@ KZ_API kz_status kzdvdfs_close(int32_t descriptor) KZ_NOEXCEPT;
  */
 KZ_API kz_status kzdvdfs_read_vol_label(const char* root, uint32_t capacity, uint32_t* length,
                                         char* label) KZ_NOEXCEPT;
+
+/**
+ * As kzbdfs_get_volume_label(), for the ISO 9660 volume identifier in sector 16, whose bytes are
+ * returned as they are.
+ */
+KZ_API kz_status kzdvdfs_get_volume_label(int32_t descriptor, char* label,
+                                          uint32_t size) KZ_NOEXCEPT;
 
 /**
  * @return 1 when there is a file of any kind at the path, links followed; 0 when not, or when the

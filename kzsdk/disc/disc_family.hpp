@@ -13,6 +13,7 @@
 
 #include "kzsdk/abs/status.h"
 #include "kzsdk/disc/read_at.hpp"
+#include "kzsdk/disc/volume.hpp"
 #include "kzsdk/disc/volume_label.hpp"
 
 namespace kz::disc {
@@ -46,7 +47,10 @@ constexpr kz_status status_of(int error) noexcept
 /// unless the call says otherwise.
 class Family {
 public:
-    explicit constexpr Family(int64_t label_offset) noexcept : label_offset_(label_offset) {}
+    constexpr Family(int64_t label_offset, const VolumeKind& volume) noexcept
+        : label_offset_(label_offset), volume_(volume)
+    {
+    }
 
     /// Success clears the last error.
     kz_status initialize() noexcept
@@ -152,6 +156,31 @@ public:
         return keep(KZ_OK); // and the device stays open
     }
 
+    kz_status get_volume_label(int32_t descriptor, char* label, uint32_t size) noexcept
+    {
+        if (label == nullptr || size == 0) {
+            return keep(KZ_DISC_ERROR_INVALID_ARGUMENT);
+        }
+        label[0] = '\0';
+        if (!is_ready()) {
+            return KZ_DISC_NOT_ON;
+        }
+        WholeLabel found;
+        switch (read_whole_label(descriptor, volume_, found)) {
+        case VolumeSearch::failed:
+            return keep_errno();
+        case VolumeSearch::missing:
+            return keep(KZ_DISC_ERROR_NOT_FOUND);
+        case VolumeSearch::found:
+            break;
+        }
+        if (found.length >= size) {
+            return keep(KZ_DISC_ERROR_MEMORY);
+        }
+        std::memcpy(label, found.text, found.length + 1);
+        return KZ_OK;
+    }
+
     bool exists(const char* path) noexcept
     {
         if (!is_ready()) {
@@ -184,6 +213,7 @@ private:
     }
 
     const int64_t label_offset_;
+    const VolumeKind& volume_;
     std::atomic<bool> on_{false};
     std::atomic<kz_status> last_error_{KZ_OK};
 };

@@ -9,7 +9,7 @@
 
 namespace {
 
-constinit kz::disc::Family dvd(kz::disc::kIso9660Label);
+constinit kz::disc::Family dvd(kz::disc::kIso9660Label, kz::disc::kIso9660Volume);
 
 /// Writes the root and a tail behind it. Returns the length of the whole, whether it fitted or not;
 /// -1 for null arguments.
@@ -58,6 +58,11 @@ kz_status kzdvdfs_read_vol_label(const char* root, uint32_t capacity, uint32_t* 
                                  char* label) noexcept
 {
     return dvd.read_vol_label(root, capacity, length, label);
+}
+
+kz_status kzdvdfs_get_volume_label(int32_t descriptor, char* label, uint32_t size) noexcept
+{
+    return dvd.get_volume_label(descriptor, label, size);
 }
 
 int32_t kzdvdfs_get_video_ts_ifoname(const char* root, char* destination, uint32_t size) noexcept

@@ -38,15 +38,25 @@ struct DiscFamilyCalls {
     int32_t (*read_at)(int32_t, int64_t, void*, uint32_t);
     kz_status (*close)(int32_t);
     kz_status (*read_vol_label)(const char*, uint32_t, uint32_t*, char*);
+    kz_status (*get_volume_label)(int32_t, char*, uint32_t);
     int64_t label_offset;
 };
 
 inline void PrintTo(const DiscFamilyCalls& family, std::ostream* out) { *out << family.name; }
 
-inline constexpr DiscFamilyCalls kBluray = {
-    "Bluray",         kzbdfs_initialize, kzbdfs_shutdown,       kzbdfs_query_availability,
-    kzbdfs_get_error, kzbdfs_open,       kzbdfs_seek,           kzbdfs_read,
-    kzbdfs_read_at,   kzbdfs_close,      kzbdfs_read_vol_label, 65561};
+inline constexpr DiscFamilyCalls kBluray = {"Bluray",
+                                            kzbdfs_initialize,
+                                            kzbdfs_shutdown,
+                                            kzbdfs_query_availability,
+                                            kzbdfs_get_error,
+                                            kzbdfs_open,
+                                            kzbdfs_seek,
+                                            kzbdfs_read,
+                                            kzbdfs_read_at,
+                                            kzbdfs_close,
+                                            kzbdfs_read_vol_label,
+                                            kzbdfs_get_volume_label,
+                                            65561};
 
 inline constexpr DiscFamilyCalls kDvd = {"Dvd",
                                          kzdvdfs_initialize,
@@ -59,6 +69,7 @@ inline constexpr DiscFamilyCalls kDvd = {"Dvd",
                                          kzdvdfs_read_at,
                                          kzdvdfs_close,
                                          kzdvdfs_read_vol_label,
+                                         kzdvdfs_get_volume_label,
                                          32808};
 
 /// Both families are off, without a last error, before and after each test.
