@@ -11,14 +11,14 @@ namespace kzfp {
 
 std::string status_text(kz_status status)
 {
-    char text[32];
-    std::snprintf(text, sizeof text, "status 0x%08X", static_cast<unsigned>(status));
-    return text;
+    char number[32];
+    std::snprintf(number, sizeof number, " (status 0x%08X)", static_cast<unsigned>(status));
+    return kz_status_text(status) + std::string(number);
 }
 
 void fail(const std::string& step, kz_status status)
 {
-    throw audio::FileError(step + " failed with " + status_text(status));
+    throw audio::FileError(step + " failed: " + status_text(status));
 }
 
 Library::Library()

@@ -37,7 +37,7 @@ public:
     Library& operator=(const Library&) = delete;
 };
 
-/// A status as the messages show it.
+/// What a status means, as the library says it, and its number.
 std::string status_text(kz_status status);
 
 /// Throws FileError for a step of the library that failed.

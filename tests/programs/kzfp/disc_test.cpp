@@ -155,11 +155,23 @@ TEST(KzfpDisc, TellsOnlyLabelsOfVolumesThatAreThere)
     EXPECT_EQ(json(), json_of(kImages + "plain.iso")["udf_label"]);
 }
 
-TEST(KzfpDisc, ShowsNoControlCharacters)
+TEST(KzfpDisc, TellsLabelsAsAWhole)
 {
     EXPECT_EQ("ISO 9660 label: ABCDEFGHIJKLMNOPQRSTUVWXYZ012345\n"
-              "UDF label: ABCDEFGHIJKLMNOPQRSTUVWXYZ0123??\n",
+              "UDF label: ABCDEFGHIJKLMNOPQRSTUVWXYZ0123\n",
               output_of({"disc", kImages + "longest.iso"}));
+    EXPECT_EQ("ISO 9660 label: TWO WORDS\nUDF label: TWO WORDS\n",
+              output_of({"disc", kImages + "words.iso"}));
+}
+
+TEST(KzfpDisc, ShowsNoControlCharacters)
+{
+    std::string image = contents(kImages + "plain.iso");
+    image.replace(16 * 2048 + 40, 6, "A\x1b\n\x7fZ ");
+    const ScratchDirectory directory;
+    const std::string path = directory.write("image", image);
+    EXPECT_EQ("ISO 9660 label: A???Z\n", output_of({"disc", path}));
+    EXPECT_EQ("A\x1b\n\x7fZ", json_of(path)["iso9660_label"]);
 }
 
 TEST(KzfpDisc, RefusesWhatIsNoDisc)
@@ -171,7 +183,8 @@ TEST(KzfpDisc, RefusesWhatIsNoDisc)
     expect_failure(directory.write("noise", std::string(100'000, 'x')), what);
     expect_failure(kImages + "far.udf", what);
     expect_failure(directory.path("missing"),
-                   "cannot be opened (status " + hexadecimal(KZ_DISC_ERROR_NOT_FOUND) + ")");
+                   "cannot be opened: " + std::string(kz_status_text(KZ_DISC_ERROR_NOT_FOUND)) +
+                       " (status " + hexadecimal(KZ_DISC_ERROR_NOT_FOUND) + ")");
 }
 
 // ---- The command line

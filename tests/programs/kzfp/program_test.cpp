@@ -9,6 +9,7 @@
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 
+#include "kzsdk/abs/version.h"
 #include "support/signals.hpp"
 
 namespace {
@@ -442,7 +443,7 @@ TEST(KzfpStatus, HelpAndVersionAreNoFailures)
                              "mixed down", "8-bit", "JSON Lines"}) {
         EXPECT_TRUE(contains(help, word)) << word;
     }
-    EXPECT_EQ("kzfp " KZFP_VERSION " (libkzsdk " KZFP_VERSION ")\n", output_of({"--version"}));
+    EXPECT_EQ("kzfp " KZFP_VERSION " (libkzsdk " KZSDK_VERSION ")\n", output_of({"--version"}));
 }
 
 TEST(KzfpStatus, WrongUsageIsTwo)

@@ -5,6 +5,8 @@
 
 #include <iostream>
 
+#include "kzsdk/abs/version.h"
+
 namespace kzfp {
 
 std::string program_name(const Arguments& arguments)
@@ -18,7 +20,8 @@ std::string program_name(const Arguments& arguments)
 
 std::optional<ExitStatus> parse(CLI::App& parser, const Arguments& arguments)
 {
-    parser.set_version_flag("--version", "kzfp " KZFP_VERSION " (libkzsdk " KZFP_VERSION ")");
+    parser.set_version_flag("--version", std::string("kzfp " KZFP_VERSION " (libkzsdk ") +
+                                             kzsdk_get_version() + ")");
     parser.get_formatter()->column_width(32);
     try {
         parser.parse(arguments.count, arguments.words);

@@ -30,7 +30,7 @@ public:
 /// What cannot be done with a disc, with the library's reason.
 inline audio::FileError disc_error(const std::string& what, kz_status status)
 {
-    return audio::FileError(what + " (" + status_text(status) + ")");
+    return audio::FileError(what + ": " + status_text(status));
 }
 
 } // namespace kzfp
