@@ -10,10 +10,10 @@ namespace {
 
 namespace fs = std::filesystem;
 
-Names split(std::string_view list)
+Names split(const std::string& list)
 {
     Names names;
-    std::istringstream in{std::string(list)};
+    std::istringstream in(list);
     for (std::string name; std::getline(in, name, ',');) {
         names.insert(name);
     }
@@ -28,7 +28,7 @@ Names list_of(const std::string& line, const std::string& key)
         return {};
     }
     const auto value = start + key.size() + 2;
-    return split(std::string_view(line).substr(value, line.find(' ', value) - value));
+    return split(line.substr(value, line.find(' ', value) - value));
 }
 
 bool is_below(const std::string& path, const std::string& folder)
@@ -55,7 +55,7 @@ std::string target_of(const Include& include, const Tree& tree)
     const fs::path beside = fs::path(include.file).parent_path() / include.what;
     for (const auto& path : {beside, fs::path(include.what), "tests" / fs::path(include.what),
                              "bench" / fs::path(include.what), "tools" / fs::path(include.what)}) {
-        const auto name = path.lexically_normal().generic_string();
+        auto name = path.lexically_normal().generic_string();
         if (tree.files.contains(name)) {
             return name;
         }
@@ -243,7 +243,7 @@ Complaints public_headers_not_declared(const Plan& plan, const Tree& tree)
     Names declared = {"kzsdk/kzsdk.h"};
     for (const auto& [name, room] : plan.rooms) {
         for (const auto& header : room.headers) {
-            declared.insert(name + "/" + header);
+            declared.insert((fs::path(name) / header).generic_string());
         }
     }
     Complaints found;
