@@ -5,7 +5,7 @@
 #include <optional>
 
 #include "fuzz.hpp"
-#include "kzsdk/fpx/fpx.h"
+#include "support/fingerprints.hpp"
 #include "support/signals.hpp"
 
 namespace kz::fuzz {
@@ -19,31 +19,38 @@ constexpr size_t kUsual = 1U << 16;   ///< so that most runs are short
 constexpr size_t kSeconds = 60;       ///< at a rate of 1 Hz a few KB would last for hours
 
 struct Job {
-    uint32_t algorithm;
-    uint32_t format;
+    test::Algorithm algorithm;
+    test::Format format;
     uint32_t rate;
-    uint32_t channels;
+    test::Channels channels;
 
-    uint32_t frame_bytes() const { return channels * (format == KZ_FPX_FORMAT_PCM16 ? 2 : 1); }
+    uint32_t frame_bytes() const { return number(channels) * (format == test::pcm16 ? 2 : 1); }
     bool is_valid() const
     {
         const bool known = std::ranges::find(kFixedRates, rate) != std::end(kFixedRates);
-        return (algorithm == KZ_FPX_ALGORITHM_FIXED ? known
-                                                    : algorithm == KZ_FPX_ALGORITHM_FLOAT) &&
-               format >= 1 && format <= 4 && rate != 0 && (channels == 1 || channels == 2);
+        return (algorithm == test::fixed ? known : algorithm == test::floating) &&
+               format >= test::pcm8 && format <= test::ulaw && rate != 0 &&
+               (channels == test::mono || channels == test::stereo);
+    }
+    kz_status create(kz_fpx_handle** handle) const
+    {
+        return test::create(algorithm, format, rate, channels, handle);
     }
 };
 
 Job choose_job(Choices& choices)
 {
-    Job job{choices.ConsumeBool() ? 1U : 2U, choices.ConsumeIntegralInRange<uint32_t>(1, 4),
-            choices.PickValueInArray(kFixedRates), choices.ConsumeIntegralInRange<uint32_t>(1, 2)};
+    Job job{choices.ConsumeBool() ? test::fixed : test::floating,
+            test::Format{choices.ConsumeIntegralInRange<uint32_t>(1, 4)},
+            choices.PickValueInArray(kFixedRates),
+            test::Channels{choices.ConsumeIntegralInRange<uint32_t>(1, 2)}};
     if (one_in(choices, 4)) {
         job.rate = choices.PickValueInArray(kOtherRates);
     }
     if (one_in(choices, 32)) {
-        job = {choices.ConsumeIntegral<uint32_t>(), choices.ConsumeIntegral<uint32_t>(), 8000,
-               choices.ConsumeIntegral<uint32_t>()};
+        job = {test::Algorithm{choices.ConsumeIntegral<uint32_t>()},
+               test::Format{choices.ConsumeIntegral<uint32_t>()}, 8000,
+               test::Channels{choices.ConsumeIntegral<uint32_t>()}};
     }
     return job;
 }
@@ -147,8 +154,7 @@ void run(Choices& choices)
 {
     const Job job = choose_job(choices);
     kz_fpx_handle* handle = nullptr;
-    const kz_status status =
-        kz_fpx_fingerprint_create(job.algorithm, job.format, job.rate, job.channels, &handle);
+    const kz_status status = job.create(&handle);
     ASSERT_EQ(job.is_valid(), status == KZ_OK);
     ASSERT_EQ(job.is_valid(), handle != nullptr);
     if (handle == nullptr) {
@@ -164,8 +170,7 @@ void run(Choices& choices)
     EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
     if (!document.empty()) {
         EXPECT_TRUE(document.starts_with("<?xml"));
-        ASSERT_EQ(KZ_OK, kz_fpx_fingerprint_create(job.algorithm, job.format, job.rate,
-                                                   job.channels, &handle));
+        ASSERT_EQ(KZ_OK, job.create(&handle));
         EXPECT_EQ(document, document_of(handle, sound, pieces, 0));
         EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
     }

@@ -7,6 +7,8 @@
 #include <functional>
 #include <memory>
 
+#include "support/input_formats.hpp"
+
 namespace kz::test {
 
 template <class Twin>
@@ -57,10 +59,10 @@ OwnedManager<Twin> unlimited_manager()
 }
 
 template <class Twin>
-OwnedObject<Twin> make_fingerprinter(uint32_t rate, uint32_t format, uint32_t channels)
+OwnedObject<Twin> make_fingerprinter(Format format, uint32_t rate, Channels channels)
 {
     typename Twin::Object* object = nullptr;
-    Twin::construct(Twin::kAlgorithm, rate, format, channels, &object);
+    Twin::construct(Twin::kAlgorithm, rate, number(format), number(channels), &object);
     return OwnedObject<Twin>(object);
 }
 

@@ -15,7 +15,6 @@ namespace kz::test {
 
 namespace {
 
-constexpr uint32_t kPcm16 = 2;
 constexpr double kSeconds = 14.5; // 12 frames take 14.21 s
 constexpr uint64_t kSeeds[] = {1, 2, 3};
 constexpr uint32_t kRates[] = {8000, 11025, 16000, 22050, 24000, 32000, 44100, 48000};
@@ -26,7 +25,7 @@ using Sound = std::vector<int16_t>;
 template <class Twin>
 Values values_of(uint32_t rate, uint32_t channels, const Sound& sound)
 {
-    const auto object = make_fingerprinter<Twin>(rate, kPcm16, channels);
+    const auto object = make_fingerprinter<Twin>(pcm16, rate, Channels{channels});
     uint8_t complete = 0;
     EXPECT_EQ(KZ_OK, Twin::add_samples(object.get(), sound.data(),
                                        static_cast<uint32_t>(sound.size() * 2), &complete));

@@ -1,10 +1,9 @@
-#include <string>
-#include <vector>
+#include <algorithm>
 
 #include "kzsdk/abs/owned.hpp"
 #include "kzsdk/fpx/algorithm.hpp"
-#include "kzsdk/fpx/fpx.h"
 #include "support/allocation.hpp"
+#include "support/fingerprints.hpp"
 #include "support/signals.hpp"
 
 namespace kz::test {
@@ -12,13 +11,6 @@ namespace kz::test {
 namespace {
 
 class Extraction : public MemoryOn {};
-
-kz_fpx_handle* create(uint32_t rate = 44100, uint32_t channels = 1)
-{
-    kz_fpx_handle* handle = nullptr;
-    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_create(1, KZ_FPX_FORMAT_PCM16, rate, channels, &handle));
-    return handle;
-}
 
 // A row whose operations only count.
 int frees = 0;
@@ -60,7 +52,7 @@ TEST_F(Extraction, AnUnknownAlgorithmIsRefusedWithoutAllocating)
     const uint64_t before = allocation_count();
     kz_fpx_handle* handle = nullptr;
     for (const uint32_t id : {0U, 3U, 4U, 0xFFFFFFFFU}) {
-        EXPECT_EQ(KZ_FPX_ERROR_NO_ALGORITHM, kz_fpx_fingerprint_create(id, 2, 44100, 1, &handle))
+        EXPECT_EQ(KZ_FPX_ERROR_NO_ALGORITHM, create(Algorithm{id}, pcm16, 44100, mono, &handle))
             << id;
     }
     EXPECT_EQ(before, allocation_count());
@@ -70,7 +62,7 @@ TEST_F(Extraction, AnUnknownAlgorithmIsRefusedWithoutAllocating)
 TEST_F(Extraction, FormatComesBeforeTheRate)
 {
     kz_fpx_handle* handle = nullptr;
-    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_create(1, 2, 8000, 1, &handle));
+    EXPECT_EQ(KZ_OK, create(fixed, pcm16, 8000, mono, &handle));
     EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
 }
 
@@ -79,9 +71,9 @@ TEST_F(Extraction, AFailedCreateReportsWhyAndKeepsTheHandle)
     int marker = 0;
     auto* const untouched = reinterpret_cast<kz_fpx_handle*>(&marker);
     kz_fpx_handle* handle = untouched;
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, kz_fpx_fingerprint_create(1, 5, 44100, 1, &handle));
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, kz_fpx_fingerprint_create(1, 2, 44100, 3, &handle));
-    EXPECT_EQ(KZ_QV_ERROR_MEMORY, kz_fpx_fingerprint_create(1, 2, 12345, 1, &handle));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, create(fixed, Format{5}, 44100, mono, &handle));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, create(fixed, pcm16, 44100, Channels{3}, &handle));
+    EXPECT_EQ(KZ_QV_ERROR_MEMORY, create(fixed, pcm16, 12345, mono, &handle));
     EXPECT_EQ(untouched, handle);
 }
 
@@ -90,9 +82,9 @@ TEST_F(Extraction, AFailedCreateReportsWhyAndKeepsTheHandle)
 TEST(ExtractionDeath, FollowsANullPlaceForTheHandleOnSuccessOnly)
 {
     ASSERT_EQ(KZ_OK, kzmem_initialize(0, 0));
-    EXPECT_EQ(KZ_FPX_ERROR_NO_ALGORITHM, kz_fpx_fingerprint_create(3, 2, 44100, 1, nullptr));
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, kz_fpx_fingerprint_create(1, 5, 44100, 1, nullptr));
-    EXPECT_DEATH(static_cast<void>(kz_fpx_fingerprint_create(1, 2, 44100, 1, nullptr)), "");
+    EXPECT_EQ(KZ_FPX_ERROR_NO_ALGORITHM, create(Algorithm{3}, pcm16, 44100, mono, nullptr));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, create(fixed, Format{5}, 44100, mono, nullptr));
+    EXPECT_DEATH(static_cast<void>(create(fixed, pcm16, 44100, mono, nullptr)), "");
     EXPECT_EQ(KZ_OK, kzmem_shutdown());
 }
 
@@ -149,11 +141,11 @@ TEST_F(Extraction, AHandleWithoutAnInstanceIsForgotten)
 
 TEST_F(Extraction, CreateSurvivesEveryFailedAllocation)
 {
-    for (const uint32_t algorithm : {1U, 2U}) {
+    for (const Algorithm algorithm : kAlgorithms) {
         bool first = true;
         for_every_failed_allocation([&first, algorithm](auto fired) {
             kz_fpx_handle* handle = nullptr;
-            const kz_status status = kz_fpx_fingerprint_create(algorithm, 2, 44100, 2, &handle);
+            const kz_status status = create(algorithm, pcm16, 44100, stereo, &handle);
             if (fired()) {
                 EXPECT_EQ(first ? KZ_FPX_ERROR_MEMORY : KZ_QV_ERROR_MEMORY, status);
                 EXPECT_EQ(nullptr, handle);
@@ -168,8 +160,8 @@ TEST_F(Extraction, OnlyTheFloatingPointAlgorithmTakesOtherRates)
 {
     kz_fpx_handle* handle = nullptr;
     for (const uint32_t rate : {1000U, 11024U, 37800U, 96000U, 768000U}) {
-        EXPECT_EQ(KZ_QV_ERROR_MEMORY, kz_fpx_fingerprint_create(1, 2, rate, 1, &handle));
-        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_create(2, 2, rate, 1, &handle));
+        EXPECT_EQ(KZ_QV_ERROR_MEMORY, create(fixed, pcm16, rate, mono, &handle));
+        EXPECT_EQ(KZ_OK, create(floating, pcm16, rate, mono, &handle));
         EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
     }
 }
@@ -178,7 +170,7 @@ TEST_F(Extraction, OnlyTheFloatingPointAlgorithmTakesOtherRates)
 // is gone. It is freed here by a copy of that pointer.
 TEST_F(Extraction, FreeingWithMemoryOffSucceedsAndFreesNothing)
 {
-    kz_fpx_handle* handle = create();
+    kz_fpx_handle* handle = create(fixed, pcm16, 44100, mono).release();
     kz_fpx_handle* kept_handle = handle;
     char* text = static_cast<char*>(_kzmem_malloc(8));
     char* kept_text = text;
@@ -198,7 +190,7 @@ TEST_F(Extraction, NothingWorksBeforeTheLibraryIsStarted)
 {
     kzmem_shutdown();
     kz_fpx_handle* handle = nullptr;
-    EXPECT_EQ(KZ_FPX_ERROR_MEMORY, kz_fpx_fingerprint_create(1, 2, 44100, 1, &handle));
+    EXPECT_EQ(KZ_FPX_ERROR_MEMORY, create(fixed, pcm16, 44100, mono, &handle));
     kzmem_initialize(0, 0);
 }
 
@@ -206,34 +198,17 @@ TEST_F(Extraction, HandlesAreIndependent)
 {
     const auto music = tune(11025, 1, 16);
     const auto other = tune(11025, 1, 16, 0.5, 7);
-    const auto document = [](kz_fpx_handle* handle) {
-        char* text = nullptr;
-        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_serialize(handle, &text));
-        std::string copy = text;
-        kz_fpx_fingerprint_serialize_free(&text);
-        return copy;
-    };
-    const auto feed = [](kz_fpx_handle* handle, const std::vector<int16_t>& samples, size_t from,
-                         size_t count) {
-        uint8_t complete = 0;
-        kz_fpx_fingerprint_add_audio(handle, samples.data() + from,
-                                     static_cast<uint32_t>(count * 2), &complete);
-    };
-    kz_fpx_handle* alone = create(11025);
-    feed(alone, music, 0, music.size());
-    kz_fpx_handle* a = create(11025);
-    kz_fpx_handle* b = create(11025);
-    for (size_t at = 0; at + 32768 <= music.size(); at += 32768) {
-        feed(a, music, at, 32768);
-        feed(b, other, at, 32768);
+    const auto alone = create(fixed, pcm16, 11025, mono);
+    EXPECT_TRUE(add(alone.get(), music));
+    const auto a = create(fixed, pcm16, 11025, mono);
+    const auto b = create(fixed, pcm16, 11025, mono);
+    for (size_t at = 0; at < music.size(); at += 32768) {
+        const size_t bytes = 2 * std::min<size_t>(32768, music.size() - at);
+        add(a.get(), music.data() + at, bytes);
+        add(b.get(), other.data() + at, bytes);
     }
-    feed(a, music, music.size() / 32768 * 32768, music.size() % 32768);
-    feed(b, other, music.size() / 32768 * 32768, music.size() % 32768);
-    EXPECT_EQ(document(alone), document(a));
-    EXPECT_NE(document(a), document(b));
-    for (kz_fpx_handle* handle : {alone, a, b}) {
-        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
-    }
+    EXPECT_EQ(document_of(alone.get()), document_of(a.get()));
+    EXPECT_NE(document_of(a.get()), document_of(b.get()));
 }
 
 } // namespace kz::test

@@ -1,12 +1,11 @@
 // How much sound a fingerprint takes: one figure for every rate, both algorithms and any cuts.
 
 #include <algorithm>
-#include <vector>
 
 #include <gtest/gtest.h>
 
 #include "kzsdk/abs/startup.h"
-#include "kzsdk/fpx/fpx.h"
+#include "support/fingerprints.hpp"
 #include "support/signals.hpp"
 
 namespace kz::test {
@@ -22,38 +21,32 @@ protected:
     void TearDown() override { EXPECT_EQ(KZ_OK, kzinit_release()); }
 
     /// Whether so much sound, added in pieces of so many frames, completes a fingerprint.
-    static bool completes(uint32_t algorithm, uint32_t rate, uint32_t milliseconds, size_t piece)
+    static bool completes(Algorithm algorithm, uint32_t rate, uint32_t milliseconds, size_t piece)
     {
         const auto sound = noise(size_t{rate} * milliseconds / 1000, 0.5, rate);
-        kz_fpx_handle* handle = nullptr;
-        EXPECT_EQ(KZ_OK,
-                  kz_fpx_fingerprint_create(algorithm, KZ_FPX_FORMAT_PCM16, rate, 1, &handle));
-        uint8_t complete = 0;
+        const Handle handle = create(algorithm, pcm16, rate, mono);
+        bool complete = false;
         for (size_t at = 0; at < sound.size(); at += piece) {
-            const size_t count = std::min(piece, sound.size() - at);
-            EXPECT_EQ(KZ_OK,
-                      kz_fpx_fingerprint_add_audio(handle, sound.data() + at,
-                                                   static_cast<uint32_t>(2 * count), &complete));
+            complete = add(handle.get(), sound.data() + at, 2 * std::min(piece, sound.size() - at));
         }
-        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_free(&handle));
-        return complete == 1;
+        return complete;
     }
 };
 
 TEST_F(Needed, IsEnoughAtEveryRateInPiecesOfAnySize)
 {
-    const auto expect_enough = [](uint32_t algorithm, uint32_t rate) {
+    const auto expect_enough = [](Algorithm algorithm, uint32_t rate) {
         for (const size_t piece : {size_t{1}, size_t{rate} / 100, size_t{15} * rate}) {
             EXPECT_TRUE(completes(algorithm, rate, KZ_FPX_MILLISECONDS_NEEDED, piece))
                 << rate << " Hz in pieces of " << piece;
         }
     };
     for (const uint32_t rate : kFixedRates) {
-        expect_enough(KZ_FPX_ALGORITHM_FIXED, rate);
-        expect_enough(KZ_FPX_ALGORITHM_FLOAT, rate);
+        expect_enough(fixed, rate);
+        expect_enough(floating, rate);
     }
     for (const uint32_t rate : kOtherRates) {
-        expect_enough(KZ_FPX_ALGORITHM_FLOAT, rate);
+        expect_enough(floating, rate);
     }
 }
 
@@ -61,7 +54,7 @@ TEST_F(Needed, IsEnoughAtEveryRateInPiecesOfAnySize)
 TEST_F(Needed, IsTheLeastInHundredthsOfASecond)
 {
     for (const uint32_t rate : kFixedRates) {
-        for (const uint32_t algorithm : {KZ_FPX_ALGORITHM_FIXED, KZ_FPX_ALGORITHM_FLOAT}) {
+        for (const Algorithm algorithm : kAlgorithms) {
             EXPECT_FALSE(
                 completes(algorithm, rate, KZ_FPX_MILLISECONDS_NEEDED - 10, size_t{15} * rate))
                 << rate << " Hz";

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "kzsdk/fpx/algorithm.hpp"
+#include "support/fingerprints.hpp"
 #include "support/signals.hpp"
 #include "support/twins.hpp"
 
@@ -26,15 +27,15 @@ struct Signal {
 
 // A handle of one of the algorithms, its fingerprinter in view.
 template <class Twin>
-class Handle {
+class Context {
 public:
-    Handle(uint32_t rate, uint32_t channels) : channels_(channels)
+    Context(uint32_t rate, Channels channels) : channels_(number(channels))
     {
-        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_create(Twin::kAlgorithm, 2, rate, channels, &handle_));
+        EXPECT_EQ(KZ_OK, create(Algorithm{Twin::kAlgorithm}, pcm16, rate, channels, &handle_));
     }
-    ~Handle() { kz_fpx_fingerprint_free(&handle_); }
-    Handle(const Handle&) = delete;
-    Handle& operator=(const Handle&) = delete;
+    ~Context() { kz_fpx_fingerprint_free(&handle_); }
+    Context(const Context&) = delete;
+    Context& operator=(const Context&) = delete;
 
     bool feed(const std::vector<int16_t>& music, size_t frame, size_t frames)
     {
@@ -98,7 +99,7 @@ void expect_same_words(const Object& a, const Object& b, uint32_t rate)
 // Feeds what the interface reports as the next block, block by block, up to the end of the music or
 // of the fingerprint.
 template <class Twin>
-bool feed_blocks(Handle<Twin>& handle, const std::vector<int16_t>& music, size_t from,
+bool feed_blocks(Context<Twin>& handle, const std::vector<int16_t>& music, size_t from,
                  size_t frames)
 {
     bool complete = false;
@@ -143,8 +144,8 @@ TYPED_TEST(Numbers, PiecesOfTheNextFramesNeverShow)
             auto music = noise(static_cast<size_t>((16.0 + silence) * rate) * channels, 0.9, rate);
             std::fill_n(music.begin(), static_cast<size_t>(silence * rate) * channels, int16_t{0});
             const size_t frames = music.size() / channels;
-            Handle<TypeParam> whole(rate, channels);
-            Handle<TypeParam> pieces(rate, channels);
+            Context<TypeParam> whole(rate, Channels{channels});
+            Context<TypeParam> pieces(rate, Channels{channels});
             EXPECT_TRUE(whole.feed(music, 0, frames));
             EXPECT_TRUE(feed_blocks(pieces, music, 0, frames));
             expect_same_words(whole.object(), pieces.object(), rate);
@@ -165,8 +166,8 @@ TYPED_TEST(Numbers, NextFramesAreExactFromAnyState)
         for (uint64_t seed = 0; seed < 10; ++seed) {
             Random random(seed + rate);
             const size_t odd = 1 + random.below(rate * 3);
-            Handle<TypeParam> whole(rate, 1);
-            Handle<TypeParam> pieces(rate, 1);
+            Context<TypeParam> whole(rate, mono);
+            Context<TypeParam> pieces(rate, mono);
             whole.feed(music, 0, odd);
             pieces.feed(music, 0, odd);
             whole.feed(music, odd, music.size() - odd);
@@ -185,9 +186,9 @@ TYPED_TEST(Numbers, AStepThatOnlyProducesKeepsTheFeedGoing)
     const std::vector<int16_t> silence(8000 * 30, 0);
     uint32_t met = 0;
     for (uint32_t blocks = 2; blocks < 8; ++blocks) {
-        Handle<TypeParam> whole(8000, 1);
-        Handle<TypeParam> pieces(8000, 1);
-        for (Handle<TypeParam>* handle : {&whole, &pieces}) {
+        Context<TypeParam> whole(8000, mono);
+        Context<TypeParam> pieces(8000, mono);
+        for (Context<TypeParam>* handle : {&whole, &pieces}) {
             for (uint32_t i = 0; i < blocks; ++i) {
                 handle->feed(silence, 0, handle->next_frames());
             }
@@ -207,7 +208,7 @@ TYPED_TEST(Numbers, ReportSilenceAndProgress)
 {
     auto music = noise(11025 * 20, 0.5, 3);
     std::fill_n(music.begin(), 11025, int16_t{0});
-    Handle<TypeParam> handle(11025, 1);
+    Context<TypeParam> handle(11025, mono);
     EXPECT_EQ(0, handle.signal().found);
     EXPECT_EQ(0U, handle.progress());
     handle.feed(music, 0, 5000);
@@ -224,7 +225,7 @@ TYPED_TEST(Numbers, TimesFollowTheFrames)
 {
     auto music = noise(11025 * 20, 0.5, 3);
     std::fill_n(music.begin(), 11025, int16_t{0});
-    Handle<TypeParam> handle(11025, 1);
+    Context<TypeParam> handle(11025, mono);
     uint32_t start = 9;
     uint32_t duration = 9;
     ASSERT_EQ(KZ_OK, kz_fpx_fingerprint_get_times(handle.get(), &start, &duration));
@@ -243,7 +244,7 @@ TYPED_TEST(Numbers, TimesFollowTheFrames)
 // The document writes the sixteen bits of each value without a sign.
 TYPED_TEST(Numbers, ValuesAreThoseOfTheDocument)
 {
-    Handle<TypeParam> handle(11025, 1);
+    Context<TypeParam> handle(11025, mono);
     handle.feed(noise(11025 * 15, 0.5, 3), 0, 11025 * 15);
     std::vector<int16_t> values(31, 77);
     uint32_t count = 0;
@@ -265,7 +266,7 @@ TYPED_TEST(Numbers, ValuesAreRefusedWithTheirCount)
 {
     int16_t values[30] = {77};
     uint32_t count = 0;
-    Handle<TypeParam> handle(11025, 1);
+    Context<TypeParam> handle(11025, mono);
     EXPECT_EQ(KZ_QV_ERROR_INCOMPLETE,
               kz_fpx_fingerprint_get_values(handle.get(), values, 30, &count));
     EXPECT_EQ(30U, count);
@@ -279,7 +280,7 @@ TYPED_TEST(Numbers, ValuesAreRefusedWithTheirCount)
 
 TYPED_TEST(Numbers, RefuseNullPointers)
 {
-    const Handle<TypeParam> handle(11025, 1);
+    const Context<TypeParam> handle(11025, mono);
     uint32_t number = 0;
     int16_t value = 0;
     constexpr kz_status kRefused = KZ_FPX_ERROR_INVALID_ARGUMENT;
@@ -298,7 +299,7 @@ TYPED_TEST(Numbers, RefuseNullPointers)
 
 TYPED_TEST(Numbers, ValuesSurviveEveryFailedAllocation)
 {
-    Handle<TypeParam> handle(11025, 1);
+    Context<TypeParam> handle(11025, mono);
     handle.feed(noise(11025 * 15, 0.5, 3), 0, 11025 * 15);
     for_every_failed_allocation([&](auto fired) {
         handle.object().frame_manager->fingerprint_ready = 0;

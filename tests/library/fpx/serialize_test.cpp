@@ -4,8 +4,8 @@
 #include <string>
 #include <vector>
 
-#include "kzsdk/fpx/fpx.h"
 #include "support/allocation.hpp"
+#include "support/fingerprints.hpp"
 #include "support/signals.hpp"
 
 namespace kz::test {
@@ -17,7 +17,7 @@ protected:
     void SetUp() override
     {
         MemoryOn::SetUp();
-        ASSERT_EQ(KZ_OK, kz_fpx_fingerprint_create(1, KZ_FPX_FORMAT_PCM16, 11025, 1, &handle_));
+        ASSERT_EQ(KZ_OK, create(fixed, pcm16, 11025, mono, &handle_));
     }
     void TearDown() override
     {
@@ -25,15 +25,7 @@ protected:
         MemoryOn::TearDown();
     }
 
-    void complete()
-    {
-        const auto music = tune(11025, 1, 16);
-        uint8_t complete = 0;
-        ASSERT_EQ(KZ_OK,
-                  kz_fpx_fingerprint_add_audio(handle_, music.data(),
-                                               static_cast<uint32_t>(music.size() * 2), &complete));
-        ASSERT_EQ(1, complete);
-    }
+    void complete() { ASSERT_TRUE(add(handle_, tune(11025, 1, 16))); }
 
     kz_fpx_handle* handle_ = nullptr;
 };

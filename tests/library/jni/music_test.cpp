@@ -11,10 +11,10 @@
 
 #include "kzsdk/abs/memory.h"
 #include "kzsdk/abs/startup.h"
-#include "kzsdk/fpx/fpx.h"
 #include "kzsdk/jni/fingerprint_thread.hpp"
 #include "platform_probe.hpp"
 #include "support/allocation.hpp"
+#include "support/fingerprints.hpp"
 #include "support/signals.hpp"
 #include "worker.hpp"
 
@@ -38,22 +38,14 @@ const std::vector<uint8_t>& music()
 }
 
 /// What the extraction interface makes of it.
-std::string document_of(uint32_t format, uint32_t rate, uint32_t channels,
-                        const std::vector<uint8_t>& audio)
+std::string expected_document(Format format, uint32_t rate, Channels channels,
+                              const std::vector<uint8_t>& audio)
 {
     const kzconf_configuration configuration = {};
     EXPECT_EQ(KZ_OK, kzinit_initialize_vesk(&configuration));
-    kz_fpx_handle* handle = nullptr;
-    uint8_t complete = 0;
-    char* text = nullptr;
-    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_create(1, format, rate, channels, &handle));
-    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_add_audio(handle, audio.data(),
-                                                  static_cast<uint32_t>(audio.size()), &complete));
-    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_serialize(handle, &text));
-    std::string document = text;
-    kz_fpx_fingerprint_serialize_free(&text);
-    kz_fpx_fingerprint_free(&handle);
-    return document;
+    const Handle handle = create(fixed, format, rate, channels);
+    EXPECT_TRUE(add(handle.get(), audio));
+    return document_of(handle.get());
 }
 
 /// The code that a job returns, and what it wrote.
@@ -78,23 +70,28 @@ protected:
 
 TEST_F(Music, GivesTheDocumentOfTheExtractionInterface)
 {
-    const std::string document = document_of(2, 11025, 1, music());
+    const std::string document = expected_document(pcm16, 11025, mono, music());
     EXPECT_EQ((Outcome{0, document}), run(11025, 1, 1, 16, music()));
     EXPECT_LT(document.size(), 600U);
 }
 
 TEST_F(Music, RunsEveryEncodingThatHasAnInputFormat)
 {
-    EXPECT_EQ((Outcome{0, document_of(1, 11025, 1, music())}), run(11025, 1, 1, 8, music()));
-    EXPECT_EQ((Outcome{0, document_of(3, 11025, 1, music())}), run(11025, 1, 6, 8, music()));
-    EXPECT_EQ((Outcome{0, document_of(4, 11025, 1, music())}), run(11025, 1, 7, 8, music()));
+    EXPECT_EQ((Outcome{0, expected_document(pcm8, 11025, mono, music())}),
+              run(11025, 1, 1, 8, music()));
+    EXPECT_EQ((Outcome{0, expected_document(alaw, 11025, mono, music())}),
+              run(11025, 1, 6, 8, music()));
+    EXPECT_EQ((Outcome{0, expected_document(ulaw, 11025, mono, music())}),
+              run(11025, 1, 7, 8, music()));
 }
 
 // A wrong but well-formed fingerprint: three bytes of a sample are not two.
 TEST_F(Music, ReadsTwentyFourBitAudioAsSixteenBit)
 {
-    EXPECT_EQ((Outcome{0, document_of(2, 11025, 1, music())}), run(11025, 1, 1, 24, music()));
-    EXPECT_EQ((Outcome{0, document_of(1, 11025, 1, music())}), run(11025, 1, 1, 0, music()));
+    EXPECT_EQ((Outcome{0, expected_document(pcm16, 11025, mono, music())}),
+              run(11025, 1, 1, 24, music()));
+    EXPECT_EQ((Outcome{0, expected_document(pcm8, 11025, mono, music())}),
+              run(11025, 1, 1, 0, music()));
 }
 
 TEST_F(Music, FailsForWhatTheLibraryRefuses)
@@ -125,7 +122,7 @@ TEST_F(Music, ThatIsTooShortGivesNothing)
 // One run takes milliseconds, and the resampler and the tree make many allocations: in steps.
 TEST_F(Music, FailsOrGivesTheDocumentWhenAllocationFails)
 {
-    const std::string document = document_of(2, 11025, 1, music());
+    const std::string document = expected_document(pcm16, 11025, mono, music());
     const CapturedLog captured;
     for (const auto mode : {AllocationFault::Once, AllocationFault::FromThenOn}) {
         uint64_t failures = 0;
@@ -161,7 +158,7 @@ TEST_F(Music, FailsOrGivesTheDocumentWhenAllocationFails)
 // The first jobs of several workers may start the core at the same moment.
 TEST_F(Music, OfSeveralFirstJobsAtOnceIsFingerprinted)
 {
-    const std::string document = document_of(2, 11025, 1, music());
+    const std::string document = expected_document(pcm16, 11025, mono, music());
     for (int round = 0; round < 5; ++round) {
         Fingerprint().do_kill_vesk();
         kzmem_shutdown();
@@ -184,7 +181,7 @@ TEST_F(Music, OfSeveralFirstJobsAtOnceIsFingerprinted)
 
 TEST_F(Music, GoesThroughTheWorker)
 {
-    const std::string document = document_of(2, 11025, 1, music());
+    const std::string document = expected_document(pcm16, 11025, mono, music());
     Events::all().clear();
     FingerprintThread worker(nullptr);
     worker.setEventCallback(Events::post);

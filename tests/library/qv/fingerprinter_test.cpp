@@ -12,13 +12,11 @@ namespace kz::test {
 
 namespace {
 
-constexpr uint32_t kPcm8 = 1, kPcm16 = 2, kALaw = 3, kULaw = 4;
-
 template <class Twin>
-kz_status construct(uint32_t rate, uint32_t format, uint32_t channels)
+kz_status construct(Format format, uint32_t rate, Channels channels)
 {
     typename Twin::Object* object = nullptr;
-    const kz_status status = Twin::construct(0, rate, format, channels, &object);
+    const kz_status status = Twin::construct(0, rate, number(format), number(channels), &object);
     EXPECT_EQ(status == KZ_OK, object != nullptr);
     const OwnedObject<Twin> owner(object);
     return status;
@@ -52,30 +50,32 @@ TYPED_TEST_SUITE(Fingerprinter, Twins, TwinNames);
 TYPED_TEST(Fingerprinter, AcceptsEightRatesFourFormatsOneOrTwoChannels)
 {
     for (const uint32_t rate : {8000U, 11025U, 16000U, 22050U, 24000U, 32000U, 44100U, 48000U}) {
-        for (const uint32_t format : {kPcm8, kPcm16, kALaw, kULaw}) {
-            EXPECT_EQ(KZ_OK, construct<TypeParam>(rate, format, 1));
-            EXPECT_EQ(KZ_OK, construct<TypeParam>(rate, format, 2));
+        for (const Format format : {pcm8, pcm16, alaw, ulaw}) {
+            EXPECT_EQ(KZ_OK, construct<TypeParam>(format, rate, mono));
+            EXPECT_EQ(KZ_OK, construct<TypeParam>(format, rate, stereo));
         }
     }
 }
 
 TYPED_TEST(Fingerprinter, RefusesBadArguments)
 {
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, construct<TypeParam>(0, kPcm16, 1));
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, construct<TypeParam>(44100, 0, 1));
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, construct<TypeParam>(44100, 5, 1));
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, construct<TypeParam>(44100, kPcm16, 0));
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, construct<TypeParam>(44100, kPcm16, 3));
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, construct<TypeParam>(44100, kPcm16, 0xFFFFFFFF));
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, TypeParam::construct(1, 44100, kPcm16, 1, nullptr));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, construct<TypeParam>(pcm16, 0, mono));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, construct<TypeParam>(Format{0}, 44100, mono));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, construct<TypeParam>(Format{5}, 44100, mono));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, construct<TypeParam>(pcm16, 44100, Channels{0}));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, construct<TypeParam>(pcm16, 44100, Channels{3}));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT,
+              construct<TypeParam>(pcm16, 44100, Channels{0xFFFFFFFF}));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT,
+              TypeParam::construct(1, 44100, number(pcm16), number(mono), nullptr));
 }
 
 TYPED_TEST(Fingerprinter, StartsInAKnownState)
 {
-    const auto object = make_fingerprinter<TypeParam>(44100, kPcm16, 2);
+    const auto object = make_fingerprinter<TypeParam>(pcm16, 44100, stereo);
     EXPECT_EQ(2U, object->channel_count);
     EXPECT_EQ(44100U, object->input_rate);
-    EXPECT_EQ(kPcm16, object->input_format);
+    EXPECT_EQ(number(pcm16), object->input_format);
     EXPECT_EQ(4U, object->frame_bytes);
     EXPECT_EQ(make_config<TypeParam>()->sample_rate, object->working_rate);
     EXPECT_EQ(12U, object->frame_limit);
@@ -86,15 +86,15 @@ TYPED_TEST(Fingerprinter, StartsInAKnownState)
     EXPECT_EQ(11264U, object->hop);
     EXPECT_EQ(0U, object->frame_start);
     EXPECT_EQ(0U, object->write_position);
-    EXPECT_EQ(1U, make_fingerprinter<TypeParam>(8000, kALaw, 1)->frame_bytes);
-    EXPECT_EQ(2U, make_fingerprinter<TypeParam>(8000, kPcm8, 2)->frame_bytes);
+    EXPECT_EQ(1U, make_fingerprinter<TypeParam>(alaw, 8000, mono)->frame_bytes);
+    EXPECT_EQ(2U, make_fingerprinter<TypeParam>(pcm8, 8000, stereo)->frame_bytes);
 }
 
 TYPED_TEST(Fingerprinter, RefusesPartsOfFramesAndConsumesNothing)
 {
-    const auto mono = make_fingerprinter<TypeParam>(44100, kPcm16, 1);
-    const auto stereo = make_fingerprinter<TypeParam>(44100, kPcm16, 2);
-    const uint32_t fresh = mono->resampler->history_end;
+    const auto one = make_fingerprinter<TypeParam>(pcm16, 44100, mono);
+    const auto two = make_fingerprinter<TypeParam>(pcm16, 44100, stereo);
+    const uint32_t fresh = one->resampler->history_end;
     const uint8_t bytes[8] = {};
     const auto add = [&](auto* object, const void* data, uint32_t count) {
         uint8_t complete = 7;
@@ -102,19 +102,19 @@ TYPED_TEST(Fingerprinter, RefusesPartsOfFramesAndConsumesNothing)
         EXPECT_EQ(object == nullptr || data == nullptr ? 7 : 0, complete);
         return status;
     };
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, add(mono.get(), bytes, 3));
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, add(mono.get(), bytes, 0));
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, add(stereo.get(), bytes, 6));
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, add(decltype(mono.get())(nullptr), bytes, 2));
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, add(mono.get(), nullptr, 2));
-    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, TypeParam::add_samples(mono.get(), bytes, 2, nullptr));
-    EXPECT_EQ(fresh, mono->resampler->history_end);
-    EXPECT_EQ(0U, mono->signal_offset);
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, add(one.get(), bytes, 3));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, add(one.get(), bytes, 0));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, add(two.get(), bytes, 6));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, add(decltype(one.get())(nullptr), bytes, 2));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, add(one.get(), nullptr, 2));
+    EXPECT_EQ(KZ_QV_ERROR_INVALID_ARGUMENT, TypeParam::add_samples(one.get(), bytes, 2, nullptr));
+    EXPECT_EQ(fresh, one->resampler->history_end);
+    EXPECT_EQ(0U, one->signal_offset);
 }
 
 TYPED_TEST(Fingerprinter, SilenceOnlyGrowsTheOffset)
 {
-    const auto object = make_fingerprinter<TypeParam>(11025, kPcm16, 1);
+    const auto object = make_fingerprinter<TypeParam>(pcm16, 11025, mono);
     const std::vector<int16_t> silence(11025 * 60, 0);
     EXPECT_FALSE(feed<TypeParam>(object, silence));
     EXPECT_EQ(silence.size(), object->signal_offset);
@@ -130,7 +130,7 @@ TYPED_TEST(Fingerprinter, SilenceOnlyGrowsTheOffset)
 // and the rest of the buffer must still be used.
 TYPED_TEST(Fingerprinter, AStepThatOnlyProducesIsNotTheEnd)
 {
-    const auto object = make_fingerprinter<TypeParam>(8000, kPcm16, 1);
+    const auto object = make_fingerprinter<TypeParam>(pcm16, 8000, mono);
     std::vector<int16_t> music(95139, 0);
     const auto sound = noise(8000 * 15, 0.5, 1);
     music.insert(music.end(), sound.begin(), sound.end());
@@ -139,7 +139,7 @@ TYPED_TEST(Fingerprinter, AStepThatOnlyProducesIsNotTheEnd)
 
 TYPED_TEST(Fingerprinter, FramesAreCutEveryHopFromTheSignalsStart)
 {
-    const auto object = make_fingerprinter<TypeParam>(11025, kPcm16, 1);
+    const auto object = make_fingerprinter<TypeParam>(pcm16, 11025, mono);
     auto music = noise(11025 * 16, 0.5, 1);
     std::fill(music.begin(), music.begin() + 5000, int16_t{0});
     // One sample at a time around each border, to see the frames appear exactly there.
@@ -161,7 +161,7 @@ TYPED_TEST(Fingerprinter, FramesAreCutEveryHopFromTheSignalsStart)
 
 TYPED_TEST(Fingerprinter, FeedingAfterCompletionChangesNothing)
 {
-    const auto object = make_fingerprinter<TypeParam>(11025, kPcm16, 1);
+    const auto object = make_fingerprinter<TypeParam>(pcm16, 11025, mono);
     const auto music = noise(11025 * 20, 0.5, 2);
     EXPECT_TRUE(feed<TypeParam>(object, music));
     const std::string before = image(*object);
@@ -172,8 +172,8 @@ TYPED_TEST(Fingerprinter, FeedingAfterCompletionChangesNothing)
 TYPED_TEST(Fingerprinter, ReadsSamplesAtOddAddresses)
 {
     const auto music = tune(22050, 2, 16);
-    const auto even = make_fingerprinter<TypeParam>(22050, kPcm16, 2);
-    const auto odd = make_fingerprinter<TypeParam>(22050, kPcm16, 2);
+    const auto even = make_fingerprinter<TypeParam>(pcm16, 22050, stereo);
+    const auto odd = make_fingerprinter<TypeParam>(pcm16, 22050, stereo);
     std::vector<uint8_t> bytes(music.size() * 2 + 1);
     std::memcpy(bytes.data() + 1, music.data(), music.size() * 2);
     uint8_t complete = 0;
@@ -188,11 +188,11 @@ TYPED_TEST(Fingerprinter, ReadsSamplesAtOddAddresses)
 TYPED_TEST(Fingerprinter, CutsDoNotShowAt11025Hertz)
 {
     const auto music = tune(11025, 2, 16);
-    const auto whole = make_fingerprinter<TypeParam>(11025, kPcm16, 2);
+    const auto whole = make_fingerprinter<TypeParam>(pcm16, 11025, stereo);
     EXPECT_TRUE(feed<TypeParam>(whole, music));
     for (uint64_t seed = 0; seed < 4; ++seed) {
         Random random(seed);
-        const auto pieces = make_fingerprinter<TypeParam>(11025, kPcm16, 2);
+        const auto pieces = make_fingerprinter<TypeParam>(pcm16, 11025, stereo);
         // The signal starts with the first piece, which must be as long as a ring for its search.
         bool complete = feed<TypeParam>(pieces, music, 0, 65536);
         for (size_t at = 65536; !complete && at < music.size();) {
@@ -212,7 +212,7 @@ TYPED_TEST(Fingerprinter, CutsDoNotShowAt11025Hertz)
 
 TYPED_TEST(Fingerprinter, ProgressCountsFrames)
 {
-    const auto object = make_fingerprinter<TypeParam>(11025, kPcm16, 1);
+    const auto object = make_fingerprinter<TypeParam>(pcm16, 11025, mono);
     uint32_t percent = 77;
     const auto progress = [&] {
         EXPECT_EQ(KZ_OK, TypeParam::get_object_progress(object.get(), &percent));
@@ -230,7 +230,7 @@ TYPED_TEST(Fingerprinter, ProgressCountsFrames)
 
 TYPED_TEST(Fingerprinter, TheResultIsRefusedUntilComplete)
 {
-    const auto object = make_fingerprinter<TypeParam>(11025, kPcm16, 1);
+    const auto object = make_fingerprinter<TypeParam>(pcm16, 11025, mono);
     XMLTag* tree = nullptr;
     EXPECT_EQ(KZ_QV_ERROR_INCOMPLETE, TypeParam::get_result(object.get(), &tree));
     const auto music = noise(32768 + 10 * 11264, 0.5, 3);
@@ -249,7 +249,7 @@ TYPED_TEST(Fingerprinter, TheResultIsRefusedUntilComplete)
 
 TYPED_TEST(Fingerprinter, TimesAreMillisecondsOfWorkingRateSamples)
 {
-    const auto object = make_fingerprinter<TypeParam>(11025, kPcm16, 1);
+    const auto object = make_fingerprinter<TypeParam>(pcm16, 11025, mono);
     EXPECT_TRUE(feed<TypeParam>(object, noise(11025 * 20, 0.5, 2)));
     uint8_t bytes[60];
     qv::FingerprintTimes times{};
@@ -266,7 +266,7 @@ TYPED_TEST(Fingerprinter, TimesAreMillisecondsOfWorkingRateSamples)
 TYPED_TEST(Fingerprinter, ExtractionRefusesNullsAndSmallBuffers)
 {
     using Extract = typename TypeParam::Fingerprinter;
-    const auto object = make_fingerprinter<TypeParam>(11025, kPcm16, 1);
+    const auto object = make_fingerprinter<TypeParam>(pcm16, 11025, mono);
     uint8_t bytes[60];
     qv::FingerprintTimes times{};
     EXPECT_EQ(KZ_QV_ERROR_INCOMPLETE, Extract::extract(object.get(), bytes, 60, times));
@@ -277,7 +277,7 @@ TYPED_TEST(Fingerprinter, ExtractionRefusesNullsAndSmallBuffers)
 
 TYPED_TEST(Fingerprinter, OnlyEqualiserAndRecordsAllocateWhileFeeding)
 {
-    const auto object = make_fingerprinter<TypeParam>(48000, kPcm16, 2);
+    const auto object = make_fingerprinter<TypeParam>(pcm16, 48000, stereo);
     const auto music = tune(48000, 2, 15);
     const uint64_t before = allocation_count();
     EXPECT_TRUE(feed<TypeParam>(object, music));
@@ -289,12 +289,12 @@ TYPED_TEST(Fingerprinter, FeedingSurvivesEveryFailedAllocation)
 {
     const auto music = tune(11025, 1, 16);
     for (uint64_t nth = 1; nth <= 24; ++nth) {
-        const auto object = make_fingerprinter<TypeParam>(11025, kPcm16, 1);
+        const auto object = make_fingerprinter<TypeParam>(pcm16, 11025, mono);
         const AllocationFault fault(nth);
         EXPECT_TRUE(feed<TypeParam>(object, music));
         EXPECT_TRUE(fault.fired());
     }
-    const auto object = make_fingerprinter<TypeParam>(11025, kPcm16, 1);
+    const auto object = make_fingerprinter<TypeParam>(pcm16, 11025, mono);
     {
         const AllocationFault fault(1, AllocationFault::FromThenOn);
         EXPECT_FALSE(feed<TypeParam>(object, music));
@@ -307,7 +307,8 @@ TYPED_TEST(Fingerprinter, CreateSurvivesEveryFailedAllocation)
 {
     for_every_failed_allocation([](auto fired) {
         typename TypeParam::Object* made = nullptr;
-        const kz_status status = TypeParam::construct(0, 48000, kPcm16, 2, &made);
+        const kz_status status =
+            TypeParam::construct(0, 48000, number(pcm16), number(stereo), &made);
         const OwnedObject<TypeParam> object(made);
         EXPECT_EQ(fired() ? KZ_QV_ERROR_MEMORY : KZ_OK, status);
         EXPECT_EQ(fired(), made == nullptr);
@@ -316,7 +317,7 @@ TYPED_TEST(Fingerprinter, CreateSurvivesEveryFailedAllocation)
 
 TYPED_TEST(Fingerprinter, ResultSurvivesEveryFailedAllocation)
 {
-    const auto object = make_fingerprinter<TypeParam>(11025, kPcm16, 1);
+    const auto object = make_fingerprinter<TypeParam>(pcm16, 11025, mono);
     EXPECT_TRUE(feed<TypeParam>(object, noise(11025 * 16, 0.5, 3)));
     for_every_failed_allocation([&](auto /*fired*/) {
         object->frame_manager->fingerprint_ready = 0;

@@ -9,8 +9,6 @@ namespace kz::test {
 
 namespace {
 
-constexpr uint32_t kPcm16 = 2;
-
 class FixedFingerprinter : public MemoryOn {};
 
 bool feed(kzqvfixed_fingerprinter& object, const std::vector<int16_t>& samples, size_t from,
@@ -30,14 +28,16 @@ TEST_F(FixedFingerprinter, RefusesUnsupportedRatesAndRatesThatWouldAlias)
     for (const uint32_t rate : {1U, 2U, 12000U, 44101U, 96000U, 131072U, 131072U + 11025U,
                                 131072U + 44100U, 0xFFFFFFFFU}) {
         kzqvfixed_fingerprinter* object = nullptr;
-        EXPECT_EQ(KZ_QV_ERROR_MEMORY, kzqvfixed_constructor(1, rate, kPcm16, 1, &object)) << rate;
+        EXPECT_EQ(KZ_QV_ERROR_MEMORY,
+                  kzqvfixed_constructor(1, rate, number(pcm16), number(mono), &object))
+            << rate;
         EXPECT_EQ(nullptr, object);
     }
 }
 
 TEST_F(FixedFingerprinter, KeepsTheWorkingRateWithTwelveFractionBits)
 {
-    EXPECT_EQ(45158400U, make_fingerprinter<Fixed>(44100, kPcm16, 2)->working_rate);
+    EXPECT_EQ(45158400U, make_fingerprinter<Fixed>(pcm16, 44100, stereo)->working_rate);
 }
 
 // At rates other than 11025 Hz a cut may move a working-rate sample by the resampler's bound, never
@@ -46,12 +46,12 @@ TEST_F(FixedFingerprinter, CutsLoseNoSampleAtAnyRate)
 {
     for (const uint32_t rate : {8000U, 16000U, 22050U, 24000U, 32000U, 44100U, 48000U}) {
         const auto music = noise(static_cast<size_t>(rate * 3.9), 0.4, rate);
-        const auto whole = make_fingerprinter<Fixed>(rate, kPcm16, 1);
+        const auto whole = make_fingerprinter<Fixed>(pcm16, rate, mono);
         whole->searching_for_signal = 0;
         feed(*whole, music, 0, music.size());
         for (uint64_t seed = 0; seed < 3; ++seed) {
             Random random(seed + rate);
-            const auto pieces = make_fingerprinter<Fixed>(rate, kPcm16, 1);
+            const auto pieces = make_fingerprinter<Fixed>(pcm16, rate, mono);
             pieces->searching_for_signal = 0;
             for (size_t at = 0; at < music.size();) {
                 const size_t count =
@@ -73,26 +73,27 @@ TEST_F(FixedFingerprinter, CutsLoseNoSampleAtAnyRate)
 // count or rate and silence at another.
 TEST_F(FixedFingerprinter, TheStartOfTheSignalDependsOnChannelsAndRate)
 {
-    const auto hears = [](uint32_t rate, uint32_t channels, int16_t level) {
+    const auto hears = [](uint32_t rate, Channels count, int16_t level) {
+        const uint32_t channels = number(count);
         std::vector<int16_t> square(size_t{rate} * channels);
         for (size_t i = 0; i < square.size(); ++i) {
             const bool high = i / channels * 200 / rate % 2 == 0; // 100 Hz
             square[i] = static_cast<int16_t>(high ? level : -level);
         }
-        const auto object = make_fingerprinter<Fixed>(rate, kPcm16, channels);
+        const auto object = make_fingerprinter<Fixed>(pcm16, rate, count);
         feed(*object, square, 0, square.size());
         return object->searching_for_signal == 0;
     };
-    EXPECT_FALSE(hears(11025, 1, 40));
-    EXPECT_TRUE(hears(11025, 2, 40));
-    EXPECT_TRUE(hears(11025, 1, 80));
-    EXPECT_FALSE(hears(44100, 1, 80));
+    EXPECT_FALSE(hears(11025, mono, 40));
+    EXPECT_TRUE(hears(11025, stereo, 40));
+    EXPECT_TRUE(hears(11025, mono, 80));
+    EXPECT_FALSE(hears(44100, mono, 80));
 }
 
 // Times are for callers; the document does not contain them.
 TEST_F(FixedFingerprinter, TimesWrapAt32Bits)
 {
-    const auto object = make_fingerprinter<Fixed>(11025, kPcm16, 1);
+    const auto object = make_fingerprinter<Fixed>(pcm16, 11025, mono);
     const auto music = noise(11025 * 20, 0.5, 2);
     EXPECT_TRUE(feed(*object, music, 0, music.size()));
     uint8_t bytes[60];

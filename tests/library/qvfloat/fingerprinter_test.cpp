@@ -10,8 +10,6 @@ namespace kz::test {
 
 namespace {
 
-constexpr uint32_t kPcm8 = 1, kPcm16 = 2, kALaw = 3, kULaw = 4;
-
 class FloatFingerprinter : public MemoryOn {};
 
 template <class Byte>
@@ -27,7 +25,7 @@ bool feed(QVFP& object, const std::vector<Byte>& samples, size_t from = 0, size_
 kz_status construct(uint32_t rate)
 {
     QVFP* object = nullptr;
-    const kz_status status = QVFP_Constructor(2, rate, kPcm16, 1, &object);
+    const kz_status status = QVFP_Constructor(2, rate, number(pcm16), number(mono), &object);
     EXPECT_EQ(status == KZ_OK, object != nullptr) << rate;
     const OwnedObject<Float> owner(object);
     return status;
@@ -51,7 +49,7 @@ TEST_F(FloatFingerprinter, ARateThatNeedsAnAbsurdFilterIsShortOfMemory)
 
 TEST_F(FloatFingerprinter, SamplesReachTheRingAtTheirOwnLevel)
 {
-    const auto object = make_fingerprinter<Float>(11025, kPcm16, 1);
+    const auto object = make_fingerprinter<Float>(pcm16, 11025, mono);
     EXPECT_EQ(11025.0F, object->working_rate);
     object->searching_for_signal = 0;
     feed(*object, std::vector<int16_t>{1, -1, 32767, -32768, 0});
@@ -66,24 +64,25 @@ TEST_F(FloatFingerprinter, EveryFormatRunsThroughItsOwnConverter)
         bytes[i] = static_cast<uint8_t>(i * 151);
     }
     struct Case {
-        uint32_t format;
-        uint32_t channels;
+        Format format;
+        Channels channels;
         void (*convert)(const void*, float*, int32_t);
     };
     const Case cases[] = {
-        {kPcm8, 1, KZDSP_Offset128ToFloat}, {kPcm8, 2, KZDSP_StereoOffset128ToMonoFloat},
-        {kPcm16, 1, KZDSP_ShortToFloat},    {kPcm16, 2, KZDSP_StereoShortToMonoFloat},
-        {kALaw, 1, KZDSP_ALawToFloat},      {kALaw, 2, KZDSP_StereoALawToMonoFloat},
-        {kULaw, 1, KZDSP_uLawToFloat},      {kULaw, 2, KZDSP_StereouLawToMonoFloat},
+        {pcm8, mono, KZDSP_Offset128ToFloat}, {pcm8, stereo, KZDSP_StereoOffset128ToMonoFloat},
+        {pcm16, mono, KZDSP_ShortToFloat},    {pcm16, stereo, KZDSP_StereoShortToMonoFloat},
+        {alaw, mono, KZDSP_ALawToFloat},      {alaw, stereo, KZDSP_StereoALawToMonoFloat},
+        {ulaw, mono, KZDSP_uLawToFloat},      {ulaw, stereo, KZDSP_StereouLawToMonoFloat},
     };
     for (const Case& each : cases) {
-        const auto object = make_fingerprinter<Float>(11025, each.format, each.channels);
+        const auto object = make_fingerprinter<Float>(each.format, 11025, each.channels);
         object->searching_for_signal = 0;
         feed(*object, bytes);
         std::vector<float> expected(bytes.size() / object->frame_bytes);
         each.convert(bytes.data(), expected.data(), static_cast<int32_t>(expected.size()));
         EXPECT_EQ(expected.size(), object->write_position);
-        EXPECT_TRUE(std::equal(expected.begin(), expected.end(), object->ring)) << each.format;
+        EXPECT_TRUE(std::equal(expected.begin(), expected.end(), object->ring))
+            << number(each.format);
     }
 }
 
@@ -92,12 +91,12 @@ TEST_F(FloatFingerprinter, CutsDoNotShowAtAnyRate)
 {
     for (const uint32_t rate : {8000U, 11024U, 12345U, 22050U, 44056U, 44100U, 48000U, 96000U}) {
         const auto music = noise(static_cast<size_t>(rate * 3.9), 0.4, rate);
-        const auto whole = make_fingerprinter<Float>(rate, kPcm16, 1);
+        const auto whole = make_fingerprinter<Float>(pcm16, rate, mono);
         whole->searching_for_signal = 0;
         feed(*whole, music);
         for (uint64_t seed = 0; seed < 3; ++seed) {
             Random random(seed + rate);
-            const auto pieces = make_fingerprinter<Float>(rate, kPcm16, 1);
+            const auto pieces = make_fingerprinter<Float>(pcm16, rate, mono);
             pieces->searching_for_signal = 0;
             for (size_t at = 0; at < music.size();) {
                 const size_t count = 1 + random.below(seed == 0 ? 7 : 6000);
@@ -116,7 +115,7 @@ TEST_F(FloatFingerprinter, CutsDoNotShowAtAnyRate)
 // precision.
 TEST_F(FloatFingerprinter, TimesStayRightBeyondTheWrapOfThirtyTwoBits)
 {
-    const auto object = make_fingerprinter<Float>(11025, kPcm16, 1);
+    const auto object = make_fingerprinter<Float>(pcm16, 11025, mono);
     EXPECT_TRUE(feed(*object, noise(11025 * 20, 0.5, 2)));
     uint8_t bytes[60];
     qv::FingerprintTimes times{};
@@ -136,7 +135,7 @@ TEST_F(FloatFingerprinter, TimesStayRightBeyondTheWrapOfThirtyTwoBits)
 
 TEST_F(FloatFingerprinter, NearSilenceIsNoSignal)
 {
-    const auto object = make_fingerprinter<Float>(11025, kPcm16, 1);
+    const auto object = make_fingerprinter<Float>(pcm16, 11025, mono);
     std::vector<int16_t> hum(11025 * 4);
     for (size_t i = 0; i < hum.size(); ++i) {
         hum[i] = i % 2 == 0 ? 100 : -100; // a mean deviation of 100 does not exceed 100

@@ -10,6 +10,7 @@
 #include <gtest/gtest.h>
 
 #include "kzsdk/kzsdk.h"
+#include "support/fingerprints.hpp"
 #include "support/signals.hpp"
 
 namespace {
@@ -40,17 +41,12 @@ kz_status hist_eq_dual(const float*, uint32_t, const float*, uint32_t, float*, u
 
 namespace {
 
+using namespace kz::test;
+
 /// Takes a fingerprint of the music, and reports whether it became complete.
-bool completes(uint32_t algorithm, const std::vector<int16_t>& music)
+bool completes(Algorithm algorithm, const std::vector<int16_t>& music)
 {
-    kz_fpx_handle* handle = nullptr;
-    uint8_t complete = 0;
-    if (kz_fpx_fingerprint_create(algorithm, KZ_FPX_FORMAT_PCM16, 11025, 1, &handle) == KZ_OK) {
-        const auto bytes = static_cast<uint32_t>(2 * music.size());
-        EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_add_audio(handle, music.data(), bytes, &complete));
-    }
-    kz_fpx_fingerprint_free(&handle);
-    return complete != 0;
+    return add(create(algorithm, pcm16, 11025, mono).get(), music);
 }
 
 class Namesakes : public ::testing::Test {
@@ -68,10 +64,10 @@ TEST_F(Namesakes, AreWhatTheLoaderFindsFirst)
 
 TEST_F(Namesakes, AreNotCalledByTheLibrary)
 {
-    const auto music = kz::test::tune(11025, 1, 16);
+    const auto music = tune(11025, 1, 16);
     calls = 0;
-    EXPECT_TRUE(completes(KZ_FPX_ALGORITHM_FIXED, music));
-    EXPECT_TRUE(completes(KZ_FPX_ALGORITHM_FLOAT, music));
+    EXPECT_TRUE(completes(fixed, music));
+    EXPECT_TRUE(completes(floating, music));
     EXPECT_EQ(0u, calls);
 }
 

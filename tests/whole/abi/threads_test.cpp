@@ -11,31 +11,26 @@
 #include <gtest/gtest.h>
 
 #include "kzsdk/kzsdk.h"
+#include "support/fingerprints.hpp"
 #include "support/signals.hpp"
 
 namespace {
 
+using namespace kz::test;
+
 /// The document of a piece of music fed in pieces; what failed, when something did.
-std::string document_of(const std::vector<int16_t>& music, uint32_t rate)
+std::string document_in_pieces(const std::vector<int16_t>& music, uint32_t rate)
 {
-    kz_fpx_handle* handle = nullptr;
-    if (kz_fpx_fingerprint_create(KZ_FPX_ALGORITHM_FIXED, KZ_FPX_FORMAT_PCM16, rate, 1, &handle) !=
-        KZ_OK) {
+    const Handle handle = create(fixed, pcm16, rate, mono);
+    if (handle == nullptr) {
         return "not created";
     }
-    uint8_t complete = 0;
-    for (size_t done = 0; done < music.size() && complete == 0; done += 4096) {
-        const auto count = static_cast<uint32_t>(std::min<size_t>(4096, music.size() - done));
-        kz_fpx_fingerprint_add_audio(handle, music.data() + done, 2 * count, &complete);
+    bool complete = false;
+    for (size_t done = 0; done < music.size() && !complete; done += 4096) {
+        const size_t count = std::min<size_t>(4096, music.size() - done);
+        complete = add(handle.get(), music.data() + done, 2 * count);
     }
-    char* text = nullptr;
-    std::string document = "not complete";
-    if (kz_fpx_fingerprint_serialize(handle, &text) == KZ_OK) {
-        document = text;
-        kz_fpx_fingerprint_serialize_free(&text);
-    }
-    kz_fpx_fingerprint_free(&handle);
-    return document;
+    return complete ? document_of(handle.get()) : "not complete";
 }
 
 template <class Job>
@@ -59,13 +54,13 @@ TEST_F(Threads, HaveTheirOwnHandlesAndTheDocumentsOfOneThread)
     std::vector<std::vector<int16_t>> music;
     std::vector<std::string> alone;
     for (const auto rate : rates) {
-        music.push_back(kz::test::tune(rate, 1, 15.0, 0.5, rate));
-        alone.push_back(document_of(music.back(), rate));
+        music.push_back(tune(rate, 1, 15.0, 0.5, rate));
+        alone.push_back(document_in_pieces(music.back(), rate));
         ASSERT_TRUE(alone.back().starts_with("<?xml")) << alone.back();
     }
     std::vector<std::string> beside(2 * rates.size());
     run_beside_each_other(beside.size(), [&](size_t i) {
-        beside[i] = document_of(music[i % rates.size()], rates[i % rates.size()]);
+        beside[i] = document_in_pieces(music[i % rates.size()], rates[i % rates.size()]);
     });
     for (size_t i = 0; i < beside.size(); ++i) {
         EXPECT_EQ(alone[i % rates.size()], beside[i]) << rates[i % rates.size()] << " Hz";
@@ -93,10 +88,10 @@ TEST_F(Threads, MaySeeTheMemoryManagerSwitchedOffAndOn)
 // CTest gives each test a process of its own, so these are the first calls that need the kernels.
 TEST_F(Threads, MayMakeTheFirstCallsOfTheProcessTogether)
 {
-    const auto music = kz::test::tune(22050, 1, 15.0, 0.5, 1);
+    const auto music = tune(22050, 1, 15.0, 0.5, 1);
     std::vector<std::string> documents(4);
     run_beside_each_other(documents.size(),
-                          [&](size_t i) { documents[i] = document_of(music, 22050); });
+                          [&](size_t i) { documents[i] = document_in_pieces(music, 22050); });
     for (const auto& document : documents) {
         EXPECT_TRUE(document.starts_with("<?xml")) << document;
         EXPECT_EQ(documents[0], document);
@@ -106,7 +101,7 @@ TEST_F(Threads, MayMakeTheFirstCallsOfTheProcessTogether)
 /// A whole fingerprint and a tree, whose calls may fail anywhere and must return.
 void use_what_may_be_switched_off(const std::vector<int16_t>& music)
 {
-    document_of(music, 11025);
+    document_in_pieces(music, 11025);
     XMLTag* tag = CreateXMLTagFromStr("A", "data");
     SetXMLSubTagDataFromStr(tag, "B/C", "data", 1);
     XMLTag* clone = CloneXMLTag(tag, 1);
@@ -129,7 +124,7 @@ TEST_F(Threads, AtWorkSurviveTheMemoryManagerSwitchedOffAndOn)
 #if defined(KZ_FINDS_LEAKS)
     GTEST_SKIP() << "what leaks here is meant to";
 #endif
-    const auto music = kz::test::tune(11025, 1, 4.0, 0.5, 1);
+    const auto music = tune(11025, 1, 4.0, 0.5, 1);
     std::atomic<bool> stop{false};
     std::jthread switching([&stop] {
         while (!stop) {
@@ -144,8 +139,8 @@ TEST_F(Threads, AtWorkSurviveTheMemoryManagerSwitchedOffAndOn)
     });
     stop = true;
     switching.join();
-    const auto whole = kz::test::tune(11025, 1, 15.0, 0.5, 1);
-    EXPECT_TRUE(document_of(whole, 11025).starts_with("<?xml")) << "all works as before";
+    const auto whole = tune(11025, 1, 15.0, 0.5, 1);
+    EXPECT_TRUE(document_in_pieces(whole, 11025).starts_with("<?xml")) << "all works as before";
 }
 
 const char* renamed(const char* name) { return name[0] == 'A' ? "X" : name; }

@@ -124,12 +124,10 @@ Attempt creates_detector()
     return [] { return OwnedDetector<Twin>(Twin::create_detector(128, 100, 1000)) != nullptr; };
 }
 
-constexpr uint32_t kPcm16 = 2;
-
 template <class Twin>
 Attempt constructs()
 {
-    return [] { return make_fingerprinter<Twin>(48000, kPcm16, 2) != nullptr; };
+    return [] { return make_fingerprinter<Twin>(pcm16, 48000, stereo) != nullptr; };
 }
 
 /// Two frames' worth, into a fingerprinter of its own.
@@ -137,7 +135,7 @@ template <class Twin>
 Attempt feeds()
 {
     return [music = noise(32768 + 11264, 0.5, 5)] {
-        const auto object = make_fingerprinter<Twin>(11025, kPcm16, 1);
+        const auto object = make_fingerprinter<Twin>(pcm16, 11025, mono);
         if (object == nullptr) {
             return false;
         }
@@ -151,7 +149,7 @@ Attempt feeds()
 template <class Twin>
 Attempt gives_result()
 {
-    const std::shared_ptr object(make_fingerprinter<Twin>(11025, kPcm16, 1));
+    const std::shared_ptr object(make_fingerprinter<Twin>(pcm16, 11025, mono));
     const auto music = noise(size_t{11025} * 15, 0.5, 5);
     uint8_t complete = 0;
     Twin::add_samples(object.get(), music.data(), static_cast<uint32_t>(2 * music.size()),

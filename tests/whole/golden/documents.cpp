@@ -21,11 +21,15 @@
 
 #include "kzsdk/kzsdk.h"
 #include "support/digest.hpp"
+#include "support/fingerprints.hpp"
 #include "support/melody.hpp"
 
 namespace {
 
+using kz::test::Algorithm;
+using kz::test::Channels;
 using kz::test::Digest;
+using kz::test::Format;
 
 constexpr uint32_t kSeconds = 15; // 12 frames take 14.21 s
 
@@ -97,11 +101,11 @@ std::string status_text(kz_status status)
     return digits.data();
 }
 
-std::string outcome(uint32_t algorithm, uint32_t format, uint32_t rate, uint32_t channels,
+std::string outcome(Algorithm algorithm, Format format, uint32_t rate, Channels channels,
                     const std::vector<uint8_t>& bytes)
 {
     kz_fpx_handle* handle = nullptr;
-    kz_status status = kz_fpx_fingerprint_create(algorithm, format, rate, channels, &handle);
+    kz_status status = kz::test::create(algorithm, format, rate, channels, &handle);
     if (status != KZ_OK) {
         return status_text(status);
     }
@@ -123,14 +127,13 @@ std::string outcome(uint32_t algorithm, uint32_t format, uint32_t rate, uint32_t
 
 using Lines = std::vector<std::string>;
 
-void add_document(Lines& lines, const Piece& piece, uint32_t format, uint32_t rate,
-                  uint32_t channels)
+void add_document(Lines& lines, const Piece& piece, Format format, uint32_t rate, Channels channels)
 {
-    const auto bytes = encode(format, piece.make(rate, channels));
-    for (const uint32_t algorithm : {KZ_FPX_ALGORITHM_FIXED, KZ_FPX_ALGORITHM_FLOAT}) {
-        lines.push_back(std::string(algorithm == KZ_FPX_ALGORITHM_FIXED ? "fixed " : "float ") +
-                        std::to_string(rate) + ' ' + std::to_string(channels) + ' ' +
-                        kFormatNames[format] + ' ' + piece.name + ' ' +
+    const auto bytes = encode(number(format), piece.make(rate, number(channels)));
+    for (const Algorithm algorithm : kz::test::kAlgorithms) {
+        lines.push_back(std::string(algorithm == Algorithm::fixed ? "fixed " : "float ") +
+                        std::to_string(rate) + ' ' + std::to_string(number(channels)) + ' ' +
+                        kFormatNames[number(format)] + ' ' + piece.name + ' ' +
                         outcome(algorithm, format, rate, channels, bytes));
     }
 }
@@ -138,19 +141,19 @@ void add_document(Lines& lines, const Piece& piece, uint32_t format, uint32_t ra
 void add_documents(Lines& lines)
 {
     for (const uint32_t rate : {8000U, 11025U, 16000U, 22050U, 24000U, 32000U, 44100U, 48000U}) {
-        add_document(lines, kMusic, KZ_FPX_FORMAT_PCM16, rate, 2);
-        add_document(lines, kNoise, KZ_FPX_FORMAT_PCM16, rate, 1);
+        add_document(lines, kMusic, Format::pcm16, rate, Channels::stereo);
+        add_document(lines, kNoise, Format::pcm16, rate, Channels::mono);
     }
     for (const uint32_t rate : {12345U, 11024U, 44056U, 96000U}) { // only one algorithm takes these
-        add_document(lines, kMusic, KZ_FPX_FORMAT_PCM16, rate, 1);
+        add_document(lines, kMusic, Format::pcm16, rate, Channels::mono);
     }
     for (const Piece& piece : {kClipped, kQuiet, kLate, kSilence}) {
-        add_document(lines, piece, KZ_FPX_FORMAT_PCM16, 16000, 1);
-        add_document(lines, piece, KZ_FPX_FORMAT_PCM16, 22050, 1);
+        add_document(lines, piece, Format::pcm16, 16000, Channels::mono);
+        add_document(lines, piece, Format::pcm16, 22050, Channels::mono);
     }
-    for (const uint32_t format : {KZ_FPX_FORMAT_PCM8, KZ_FPX_FORMAT_ALAW, KZ_FPX_FORMAT_ULAW}) {
-        add_document(lines, kMusic, format, 8000, 1);
-        add_document(lines, kMusic, format, 22050, 2);
+    for (const Format format : {Format::pcm8, Format::alaw, Format::ulaw}) {
+        add_document(lines, kMusic, format, 8000, Channels::mono);
+        add_document(lines, kMusic, format, 22050, Channels::stereo);
     }
 }
 

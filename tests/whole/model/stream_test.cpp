@@ -25,7 +25,8 @@ public:
     Twins(const Ratio& ratio, Format format, size_t channels)
         : model_(ratio, format, channels, Path::filters(ratio)),
           library_(kz::test::make_fingerprinter<Library<Path>>(
-              ratio.hertz, static_cast<uint32_t>(format), static_cast<uint32_t>(channels)))
+              kz::test::Format{static_cast<uint32_t>(format)}, ratio.hertz,
+              kz::test::Channels{static_cast<uint32_t>(channels)}))
     {
         std::fill_n(library_->ring, kFrameLength, 0); // the model's begins with zeros
     }

@@ -7,8 +7,6 @@
 #include "support/melody.hpp"
 #include "whole/soak/worker.hpp"
 
-#include "kzsdk/fpx/fpx.h"
-
 namespace kz::soak {
 namespace {
 
@@ -52,8 +50,7 @@ std::vector<Recording> make_recordings(std::string& problem)
         if (format != "s16" || piece != "music" || digest.size() != 16) {
             continue;
         }
-        recording.algorithm =
-            algorithm == "fixed" ? KZ_FPX_ALGORITHM_FIXED : KZ_FPX_ALGORITHM_FLOAT;
+        recording.algorithm = algorithm == "fixed" ? test::fixed : test::floating;
         recording.name = line;
         recording.samples = test::melody(recording.rate, recording.channels, kSeconds);
         for (uint32_t way = 0; way < kCuts; ++way) {

@@ -7,12 +7,13 @@
 #include <string>
 #include <vector>
 
+#include "support/input_formats.hpp"
 #include "support/signals.hpp"
 
 namespace kz::soak {
 
 struct Recording {
-    uint32_t algorithm = 0;
+    test::Algorithm algorithm = test::fixed;
     uint32_t rate = 0;
     uint32_t channels = 0;
     std::string name; ///< of its line in the golden documents

@@ -16,12 +16,11 @@ Job some_job(const std::vector<Recording>& recordings, test::Random& random)
 
 } // namespace
 
-Job::Job(const Recording& recording, uint32_t way) : recording_(&recording), way_(way), cutter_(way)
+Job::Job(const Recording& recording, uint32_t way)
+    : recording_(&recording), way_(way), cutter_(way),
+      handle_(test::create(recording.algorithm, test::pcm16, recording.rate,
+                           test::Channels{recording.channels}))
 {
-    kz_fpx_handle* handle = nullptr;
-    kz_fpx_fingerprint_create(recording.algorithm, KZ_FPX_FORMAT_PCM16, recording.rate,
-                              recording.channels, &handle);
-    handle_.reset(handle);
 }
 
 bool Job::step()
@@ -37,13 +36,8 @@ bool Job::step()
 
 std::string Job::document() const
 {
-    char* text = nullptr;
-    if (kz_fpx_fingerprint_serialize(handle_.get(), &text) != KZ_OK) {
-        return "no document";
-    }
-    std::string document = text;
-    kz_fpx_fingerprint_serialize_free(&text);
-    return document;
+    const std::string document = test::document_of(handle_.get());
+    return document.empty() ? "no document" : document;
 }
 
 void work(const std::vector<Recording>& recordings, uint64_t seed, const std::atomic<bool>& stop,

@@ -4,11 +4,10 @@
 
 #include <atomic>
 #include <cstdint>
-#include <memory>
 #include <string>
 #include <vector>
 
-#include "kzsdk/fpx/fpx.h"
+#include "support/fingerprints.hpp"
 #include "whole/soak/recordings.hpp"
 
 namespace kz::soak {
@@ -28,15 +27,11 @@ public:
     const Recording& recording() const { return *recording_; }
 
 private:
-    struct Free {
-        void operator()(kz_fpx_handle* handle) const { kz_fpx_fingerprint_free(&handle); }
-    };
-
     const Recording* recording_;
     uint32_t way_;
     Cutter cutter_;
     uint32_t fed_ = 0;
-    std::unique_ptr<kz_fpx_handle, Free> handle_;
+    test::Handle handle_;
 };
 
 struct Tally {
