@@ -10,8 +10,16 @@
 
 #include "case.hpp"
 #include "kzsdk/kzsdk.h"
+#include "support/fingerprints.hpp"
 
 namespace kz::bench {
+
+using test::Algorithm;
+using test::Channels;
+using test::Format;
+using enum test::Algorithm;
+using enum test::Channels;
+using enum test::Format;
 
 inline constexpr uint32_t kWorkingHertz = 11025;
 inline constexpr uint32_t kFrame = 32768;
@@ -21,8 +29,8 @@ inline constexpr uint32_t kChunk = KZQVFIXED_CONVERSION_SAMPLES;
 /// Seconds of sound that a default fingerprint listens to: eleven hops and one frame.
 inline constexpr double kListened = (11.0 * kHop + kFrame) / kWorkingHertz;
 
-/// Seconds of sound to offer for one: a little more.
-inline constexpr double kOffered = 14.22;
+/// Seconds of sound to offer for one: what completes it at every rate.
+inline constexpr double kOffered = KZ_FPX_MILLISECONDS_NEEDED / 1000.0;
 
 /// Calls a family's own function to free a thing.
 template <auto Free>
@@ -48,10 +56,10 @@ using FloatDetector = Owned<QVSD, QVSD_Destroy>;
 
 /// What to listen to and how.
 struct Job {
-    uint32_t algorithm;
-    uint32_t format;
+    Algorithm algorithm;
+    Format format;
     uint32_t rate;
-    uint32_t channels;
+    Channels channels;
 };
 
 /// A fingerprint context.
@@ -59,8 +67,7 @@ class Fingerprint {
 public:
     explicit Fingerprint(const Job& job)
     {
-        require(kz_fpx_fingerprint_create(job.algorithm, job.format, job.rate, job.channels,
-                                          &handle_) == KZ_OK,
+        require(test::create(job.algorithm, job.format, job.rate, job.channels, &handle_) == KZ_OK,
                 "no fingerprint can be made");
     }
     ~Fingerprint() { kz_fpx_fingerprint_free(&handle_); }

@@ -22,8 +22,7 @@ std::string text_of(const std::vector<int16_t>& values)
 
 Prepared document()
 {
-    const auto fingerprint = std::make_shared<Fingerprint>(
-        Job{KZ_FPX_ALGORITHM_FIXED, KZ_FPX_FORMAT_PCM16, kWorkingHertz, 1});
+    const auto fingerprint = std::make_shared<Fingerprint>(Job{fixed, pcm16, kWorkingHertz, mono});
     const auto sound = kz::test::melody(kWorkingHertz, 1, kOffered);
     require(fingerprint->feed(sound.data(), sound.size() * sizeof(int16_t)), "not complete");
     const std::string values = text_of(fingerprint->values());

@@ -44,7 +44,7 @@ Prepared fingerprinter(const Job& job, const SharedBytes& bytes)
 
 std::vector<int16_t> sound_of(const Job& job)
 {
-    return kz::test::melody(job.rate, job.channels, kOffered);
+    return kz::test::melody(job.rate, number(job.channels), kOffered);
 }
 
 SharedBytes as_pcm16(const std::vector<int16_t>& sound)
@@ -90,19 +90,21 @@ SharedBytes as_alaw(const std::vector<int16_t>& sound)
 // ---- the cases
 
 /// 16-bit samples beside libchromaprint, which receives the same samples.
-Case beside_chromaprint(const std::string& name, uint32_t algorithm, uint32_t rate,
-                        uint32_t channels, double must, double goal)
+Case beside_chromaprint(const std::string& name, Algorithm algorithm, uint32_t rate,
+                        Channels channels, double must, double goal)
 {
     const auto prepare = [=] {
-        const Job job{algorithm, KZ_FPX_FORMAT_PCM16, rate, channels};
+        const Job job{algorithm, pcm16, rate, channels};
         const auto sound = sound_of(job);
         Prepared prepared = fingerprinter(job, as_pcm16(sound));
-        prepared.peers = [=] { return Peers{chromaprint_fingerprint(sound, rate, channels)}; };
+        prepared.peers = [=] {
+            return Peers{chromaprint_fingerprint(sound, rate, number(channels))};
+        };
         return prepared;
     };
     return {name,
             "a fingerprint of " + std::to_string(rate) + " Hz " +
-                (channels == 2 ? "stereo" : "mono"),
+                (channels == stereo ? "stereo" : "mono"),
             milliseconds(),
             share_of(kChromaprint, must),
             share_of(kChromaprint, goal),
@@ -110,20 +112,19 @@ Case beside_chromaprint(const std::string& name, uint32_t algorithm, uint32_t ra
 }
 
 /// Another format beside 16-bit samples of the same sound, both through us.
-Case beside_pcm16(const std::string& name, uint32_t format, uint32_t rate, uint32_t channels,
+Case beside_pcm16(const std::string& name, Format format, uint32_t rate, Channels channels,
                   SharedBytes (*encode)(const std::vector<int16_t>&))
 {
     const auto prepare = [=] {
-        const auto sound = sound_of({KZ_FPX_ALGORITHM_FIXED, format, rate, channels});
-        Prepared prepared =
-            fingerprinter({KZ_FPX_ALGORITHM_FIXED, format, rate, channels}, encode(sound));
-        const Job same{KZ_FPX_ALGORITHM_FIXED, KZ_FPX_FORMAT_PCM16, rate, channels};
+        const auto sound = sound_of({fixed, format, rate, channels});
+        Prepared prepared = fingerprinter({fixed, format, rate, channels}, encode(sound));
+        const Job same{fixed, pcm16, rate, channels};
         prepared.peers = [=] { return Peers{{kSame, fingerprinting(same, as_pcm16(sound))}}; };
         return prepared;
     };
     return {name,
-            "the same of " + std::string(format == KZ_FPX_FORMAT_ALAW ? "A-law" : "8-bit") +
-                " at " + std::to_string(rate) + " Hz",
+            "the same of " + std::string(format == alaw ? "A-law" : "8-bit") + " at " +
+                std::to_string(rate) + " Hz",
             milliseconds(),
             share_of(kSame, 1.1),
             share_of(kSame, 1.05),
@@ -135,7 +136,7 @@ Case beside_pcm16(const std::string& name, uint32_t format, uint32_t rate, uint3
 Case beside_olaf()
 {
     const auto prepare = [] {
-        const Job job{KZ_FPX_ALGORITHM_FIXED, KZ_FPX_FORMAT_PCM16, 16000, 1};
+        const Job job{fixed, pcm16, 16000, mono};
         Prepared prepared = fingerprinter(job, as_pcm16(sound_of(job)));
         prepared.peers = [] { return Peers{{kOlaf, {}, {}, 565e-6 * kListened}}; };
         return prepared;
@@ -148,10 +149,10 @@ Case beside_olaf()
             prepare};
 }
 
-Case handle_life(const std::string& name, uint32_t algorithm, double goal)
+Case handle_life(const std::string& name, Algorithm algorithm, double goal)
 {
     const auto prepare = [algorithm] {
-        const Job job{algorithm, KZ_FPX_FORMAT_PCM16, 44100, 2};
+        const Job job{algorithm, pcm16, 44100, stereo};
         return Prepared{[job] { const Fingerprint fingerprint(job); },
                         [] { return std::string("nothing"); },
                         [] { return Peers{chromaprint_life(44100, 2)}; }};
@@ -165,18 +166,16 @@ Case handle_life(const std::string& name, uint32_t algorithm, double goal)
 
 std::vector<Case> fingerprint_cases()
 {
-    constexpr uint32_t fixed = KZ_FPX_ALGORITHM_FIXED;
-    constexpr uint32_t floating = KZ_FPX_ALGORITHM_FLOAT;
     return {
-        beside_chromaprint("fp1_44100s", fixed, 44100, 2, 0.33, 0.17),
-        beside_chromaprint("fp1_48000s", fixed, 48000, 2, 0.45, 0.23),
-        beside_chromaprint("fp1_22050m", fixed, 22050, 1, 0.45, 0.22),
-        beside_chromaprint("fp1_8000m", fixed, 8000, 1, 0.75, 0.45),
-        beside_chromaprint("fp1_11025m", fixed, 11025, 1, 1.0, 0.6),
-        beside_pcm16("fp1_alaw8000", KZ_FPX_FORMAT_ALAW, 8000, 1, as_alaw),
-        beside_pcm16("fp1_pcm8", KZ_FPX_FORMAT_PCM8, 44100, 2, as_pcm8),
-        beside_chromaprint("fp2_44100s", floating, 44100, 2, 0.45, 0.25),
-        beside_chromaprint("fp2_48000s", floating, 48000, 2, 0.45, 0.25),
+        beside_chromaprint("fp1_44100s", fixed, 44100, stereo, 0.33, 0.17),
+        beside_chromaprint("fp1_48000s", fixed, 48000, stereo, 0.45, 0.23),
+        beside_chromaprint("fp1_22050m", fixed, 22050, mono, 0.45, 0.22),
+        beside_chromaprint("fp1_8000m", fixed, 8000, mono, 0.75, 0.45),
+        beside_chromaprint("fp1_11025m", fixed, 11025, mono, 1.0, 0.6),
+        beside_pcm16("fp1_alaw8000", alaw, 8000, mono, as_alaw),
+        beside_pcm16("fp1_pcm8", pcm8, 44100, stereo, as_pcm8),
+        beside_chromaprint("fp2_44100s", floating, 44100, stereo, 0.45, 0.25),
+        beside_chromaprint("fp2_48000s", floating, 48000, stereo, 0.45, 0.25),
         beside_olaf(),
         handle_life("create_free_1", fixed, 30),
         handle_life("create_free_2", floating, 60),

@@ -46,7 +46,7 @@ GrowthTable grow_document(bool thorough);
 /// The input that most of them feed: 44100 Hz stereo, 16 bits.
 inline constexpr uint32_t kRate = 44100;
 inline constexpr uint32_t kFrameBytes = 4;
-inline constexpr Job kStereo{KZ_FPX_ALGORITHM_FIXED, KZ_FPX_FORMAT_PCM16, kRate, 2};
+inline constexpr Job kStereo{fixed, pcm16, kRate, stereo};
 
 inline std::vector<int16_t> stereo_sound() { return kz::test::melody(kRate, 2, kOffered); }
 

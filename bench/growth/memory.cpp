@@ -41,11 +41,11 @@ GrowthTable grow_memory(bool /*thorough*/)
 {
     struct Twin {
         const char* name;
-        uint32_t algorithm;
+        Algorithm algorithm;
         int64_t most;
     };
-    constexpr Twin kTwins[] = {{"fixed point", KZ_FPX_ALGORITHM_FIXED, 360000},
-                               {"floating point", KZ_FPX_ALGORITHM_FLOAT, 480000}};
+    constexpr Twin kTwins[] = {{"fixed point", fixed, 360000},
+                               {"floating point", floating, 480000}};
     GrowthTable table{
         "A handle holds at most 360000 bytes of heap at a time, a floating-point one 480000, and "
         "gives all back; what the first handle leaves behind serves all later ones",
@@ -57,7 +57,7 @@ GrowthTable grow_memory(bool /*thorough*/)
         const std::string at = " at " + number(rate) + " Hz";
         for (const Twin& twin : kTwins) {
             for (const bool first : {true, false}) {
-                const Life life = live({twin.algorithm, KZ_FPX_FORMAT_PCM16, rate, 2}, sound);
+                const Life life = live({twin.algorithm, pcm16, rate, stereo}, sound);
                 table.rows.push_back({twin.name + at + (first ? ", first" : ", second"),
                                       bytes(life.created), bytes(life.peak),
                                       bytes(life.allocations), bytes(life.left)});
