@@ -1,22 +1,31 @@
-// Feeds the library what a source gives, in pieces that leave no trace in the result.
+// Feeds what a source gives to a stream of the library, on which its pieces leave no trace.
 
 #include "kzfp/fingerprinter.hpp"
 
+#include <algorithm>
 #include <cmath>
 #include <cstdio>
 #include <memory>
 
-#include "kzsdk/fpx/fpx.h"
+#include "kzsdk/stream/stream.h"
 
 namespace kzfp {
 
 namespace {
 
+constexpr size_t kBlock = 1024; ///< frames read at a time: hardly more is taken than is needed
+
 struct Free {
-    void operator()(kz_fpx_handle* handle) const { kz_fpx_fingerprint_free(&handle); }
-    void operator()(char* text) const { kz_fpx_fingerprint_serialize_free(&text); }
+    void operator()(kz_stream* stream) const { kz_stream_free(&stream); }
 };
-using Handle = std::unique_ptr<kz_fpx_handle, Free>;
+using Stream = std::unique_ptr<kz_stream, Free>;
+
+void check(const char* step, kz_status status)
+{
+    if (status != KZ_OK) {
+        fail(step, status);
+    }
+}
 
 std::string printed(const char* format, double number)
 {
@@ -35,69 +44,63 @@ std::string hundredths(double seconds)
 
 std::string needed() { return hundredths(KZ_FPX_MILLISECONDS_NEEDED / 1000.0); }
 
-uint32_t to_library_format(audio::Encoding encoding)
+uint32_t to_stream_format(audio::Encoding encoding)
 {
     switch (encoding) {
     case audio::Encoding::u8:
-        return KZ_FPX_FORMAT_PCM8;
+        return KZ_STREAM_FORMAT_PCM8;
     case audio::Encoding::alaw:
-        return KZ_FPX_FORMAT_ALAW;
+        return KZ_STREAM_FORMAT_ALAW;
     case audio::Encoding::ulaw:
-        return KZ_FPX_FORMAT_ULAW;
+        return KZ_STREAM_FORMAT_ULAW;
     case audio::Encoding::s16:
         break;
     }
-    return KZ_FPX_FORMAT_PCM16;
+    return KZ_STREAM_FORMAT_PCM16;
 }
 
-Handle create(const audio::StreamFormat& format, Algorithm algorithm)
+Stream create(const audio::StreamFormat& format, Algorithm algorithm)
 {
-    kz_fpx_handle* handle = nullptr;
-    const kz_status status = kz_fpx_fingerprint_create(static_cast<uint32_t>(algorithm),
-                                                       to_library_format(format.encoding),
-                                                       format.rate, format.channels, &handle);
-    if (status != KZ_OK) {
-        fail("making a fingerprint", status);
-    }
-    return Handle(handle);
+    kz_stream_settings settings;
+    kz_stream_initialize_settings(&settings);
+    settings.algorithm = static_cast<uint32_t>(algorithm);
+    settings.format = to_stream_format(format.encoding);
+    settings.sample_rate = format.rate;
+    settings.channels = format.channels;
+    kz_stream* stream = nullptr;
+    check("making a fingerprint", kz_stream_create(&settings, &stream));
+    return Stream(stream);
 }
 
 /// Leading silence, skipped so far.
 struct Silence {
     uint32_t samples = 0; ///< at kWorkingRate
     double seconds = 0;
-    uint8_t has_ended = 0;
 };
 
-Silence silence_of(const kz_fpx_handle& handle)
+Silence silence_of(const kz_stream& stream)
 {
     Silence silence;
-    kz_fpx_fingerprint_get_signal_offset(&handle, &silence.samples, &silence.seconds,
-                                         &silence.has_ended);
+    kz_stream_get_signal_offset(&stream, &silence.samples, &silence.seconds, nullptr);
     return silence;
 }
 
-uint32_t next_frames(const kz_fpx_handle& handle)
+/// Why a stream that has ended made no fingerprint.
+std::string too_little(const kz_stream& stream, const audio::Source& source)
 {
-    uint32_t frames = 0;
-    kz_fpx_fingerprint_get_next_frames(&handle, &frames);
-    return frames;
-}
-
-/// Why `frames` of a stream that has ended made no fingerprint.
-std::string too_little(const kz_fpx_handle& handle, const audio::Source& source, uint64_t frames)
-{
-    const double seconds = static_cast<double>(frames) / source.format().rate;
-    const Silence silence = silence_of(handle);
+    kz_stream_state state;
+    kz_stream_get_state(&stream, &state);
+    const double seconds = static_cast<double>(state.frames) / source.format().rate;
     std::string text;
-    if (frames == 0) {
+    if (state.standing == KZ_STREAM_NOTHING_FED) {
         text = "no sound";
-    } else if (silence.has_ended == 0) {
+    } else if (state.standing == KZ_STREAM_SILENT) {
         text = "nothing but silence in " + tenths(seconds);
     } else {
-        text = hundredths(std::max(0.0, seconds - silence.seconds)) + " of sound";
-        if (silence.seconds >= 0.1) {
-            text += " after " + tenths(silence.seconds) + " of silence";
+        const double silence = silence_of(stream).seconds;
+        text = hundredths(std::max(0.0, seconds - silence)) + " of sound";
+        if (silence >= 0.1) {
+            text += " after " + tenths(silence) + " of silence";
         }
     }
     if (const std::string trouble = source.trouble(); !trouble.empty()) {
@@ -106,57 +109,39 @@ std::string too_little(const kz_fpx_handle& handle, const audio::Source& source,
     return text + ", " + needed() + " needed";
 }
 
-/// Feeds a stream until the fingerprint is complete, in the pieces that the library would cut for
-/// itself out of one large buffer: leading silence is judged piece by piece, and at most rates a
-/// cut shows in the last bits of the resampled signal.
-void feed(kz_fpx_handle& handle, audio::Source& source)
+/// Reads until the fingerprint is complete, or the source ends.
+void feed(kz_stream& stream, audio::Source& source)
 {
-    const size_t frame_bytes = source.format().frame_bytes();
-    std::vector<std::byte> block;
-    uint64_t fed = 0;
+    std::vector<std::byte> block(kBlock * source.format().frame_bytes());
     uint8_t complete = 0;
-    while (complete == 0) {
-        const size_t wanted = next_frames(handle);
-        block.resize(wanted * frame_bytes);
-        const size_t got = source.read(block);
-        if (got > 0) {
-            const kz_status status = kz_fpx_fingerprint_add_audio(
-                &handle, block.data(), static_cast<uint32_t>(got * frame_bytes), &complete);
-            if (status != KZ_OK) {
-                fail("adding audio", status);
-            }
-            fed += got;
-        }
-        if (complete == 0 && got < wanted) {
-            throw audio::FileError(too_little(handle, source, fed));
-        }
+    for (size_t got = kBlock; complete == 0 && got == kBlock;) {
+        got = source.read(block);
+        const size_t bytes = got * source.format().frame_bytes();
+        check("adding audio", kz_stream_feed(&stream, block.data(), bytes, nullptr, &complete));
+    }
+    check("adding audio", kz_stream_finish(&stream, &complete));
+    if (complete == 0) {
+        throw audio::FileError(too_little(stream, source));
     }
 }
 
-std::string to_document(kz_fpx_handle& handle)
+std::string document_of(kz_stream& stream)
 {
-    char* rendered = nullptr;
-    const kz_status status = kz_fpx_fingerprint_serialize(&handle, &rendered);
-    if (status != KZ_OK) {
-        fail("writing the document", status);
-    }
-    const std::unique_ptr<char, Free> text(rendered);
-    std::string document(text.get());
+    const char* text = nullptr;
+    check("writing the document", kz_stream_get_document(&stream, &text));
+    std::string document(text);
     while (document.ends_with('\n') || document.ends_with('\r')) {
         document.pop_back();
     }
     return document;
 }
 
-std::vector<int16_t> values_of(kz_fpx_handle& handle)
+std::vector<int16_t> values_of(kz_stream& stream)
 {
     uint32_t count = 0;
-    kz_fpx_fingerprint_get_values(&handle, nullptr, 0, &count);
+    kz_stream_get_values(&stream, nullptr, 0, &count);
     std::vector<int16_t> values(count);
-    const kz_status status = kz_fpx_fingerprint_get_values(&handle, values.data(), count, &count);
-    if (status != KZ_OK) {
-        fail("reading the values", status);
-    }
+    check("reading the values", kz_stream_get_values(&stream, values.data(), count, &count));
     return values;
 }
 
@@ -164,13 +149,11 @@ std::vector<int16_t> values_of(kz_fpx_handle& handle)
 
 Fingerprint take_fingerprint(audio::Source& source, Algorithm algorithm)
 {
-    const Handle handle = create(source.format(), algorithm);
-    feed(*handle, source);
-    Fingerprint fingerprint;
-    fingerprint.document = to_document(*handle);
-    fingerprint.values = values_of(*handle);
-    fingerprint.signal_offset = silence_of(*handle).samples;
-    return fingerprint;
+    const Stream stream = create(source.format(), algorithm);
+    feed(*stream, source);
+    return {.document = document_of(*stream),
+            .values = values_of(*stream),
+            .signal_offset = silence_of(*stream).samples};
 }
 
 } // namespace kzfp

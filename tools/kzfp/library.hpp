@@ -1,5 +1,5 @@
 /// @file
-/// The library as the program uses it: its start-up, its rates, and what it says went wrong.
+/// The library as the program uses it: its rates, and what it says went wrong.
 #pragma once
 
 #include <algorithm>
@@ -27,15 +27,6 @@ constexpr bool takes_rate(Algorithm algorithm, uint32_t rate)
                ? audio::is_usual_rate(rate)
                : std::ranges::find(kFixedRates, rate) != std::end(kFixedRates);
 }
-
-/// Starts the library for as long as it lives.
-class Library {
-public:
-    Library();
-    ~Library();
-    Library(const Library&) = delete;
-    Library& operator=(const Library&) = delete;
-};
 
 /// What a status means, as the library says it, and its number.
 std::string status_text(kz_status status);

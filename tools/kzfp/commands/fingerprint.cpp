@@ -89,7 +89,6 @@ bool process_and_write(const std::string& name, const FingerprintOptions& option
 
 ExitStatus process_all(const FingerprintOptions& options)
 {
-    const Library library;
     Progress progress(options.files.size());
     ExitStatus status = all_done;
     for (size_t i = 0; i < options.files.size(); ++i) {
