@@ -1,5 +1,6 @@
-// Volume identifiers: ISO 9660 fills 32 bytes up with spaces; UDF (ECMA-167 1/7.2.12, OSTA CS0) has a
-// byte for the width of its characters, the characters, and in its last byte how many bytes are used.
+// Volume identifiers: ISO 9660 fills 32 bytes up with spaces; UDF (ECMA-167 1/7.2.12, OSTA CS0) has
+// a byte for the width of its characters, the characters, and in its last byte how many bytes are
+// used.
 
 #include "kzsdk/disc/volume.hpp"
 

@@ -43,9 +43,9 @@ enum {
 
 /**
  * Milliseconds of sound, after leading silence, that complete a default fingerprint at any rate
- * from 2000 Hz up and however the stream is cut: twelve frames, each 11264 samples at 11025 Hz after
- * the one before and the last 32768 long, and what the resampler and the search for the signal hold
- * back. There is no document of less sound.
+ * from 2000 Hz up and however the stream is cut: twelve frames, each 11264 samples at 11025 Hz
+ * after the one before and the last 32768 long, and what the resampler and the search for the
+ * signal hold back. There is no document of less sound.
  */
 #define KZ_FPX_MILLISECONDS_NEEDED UINT32_C(14220)
 
@@ -72,9 +72,9 @@ KZ_API kz_status kz_fpx_fingerprint_create(uint32_t algorithm, uint32_t format,
  * Feeds audio. May be called again with what follows, in pieces of any whole number of frames.
  *
  * Leading silence is skipped. A default fingerprint is complete after 14.22 s of what follows it
- * (KZ_FPX_MILLISECONDS_NEEDED); audio fed after that is ignored. Where the stream is cut does not show at 11025 Hz once the
- * signal has begun; at other rates it may show in the last bits of the resampled signal
- * (resampler.h says how far), and leading silence is judged piece by piece.
+ * (KZ_FPX_MILLISECONDS_NEEDED); audio fed after that is ignored. Where the stream is cut does not
+ * show at 11025 Hz once the signal has begun; at other rates it may show in the last bits of the
+ * resampled signal (resampler.h states how far), and leading silence is judged piece by piece.
  *
  * @param audio       Interleaved samples at any address; read only during the call.
  * @param byte_count  Bytes in @p audio: a whole number of frames, not 0.

@@ -159,8 +159,7 @@ KZ_API kz_status hist_eq2(const float* input, float* output, uint32_t count, uin
  *
  * A frame whose range is 1.0 or less counts as silent and is copied. The copy, which also serves
  * when memory is short, takes from @p second all samples that are missing, whatever @p second_count
- * says: unless
- * @p second is null it must then hold @p output_length less those used of @p first.
+ * says: unless @p second is null it must then hold @p output_length less those used of @p first.
  *
  * @param first, second  Pieces, the older one first. A null piece counts as no samples.
  * @param output         Room for @p output_length samples, apart from the pieces. Samples that
