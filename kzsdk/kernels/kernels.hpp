@@ -153,11 +153,18 @@ struct Variant {
     void (*track_float_extremes)(Extremes<float>& extremes, const float* samples,
                                  uint32_t count) noexcept;
 
-    /// Writes the level of each sample.
+    /// Writes the level of each sample and adds how often each occurs to `histogram`, which has
+    /// an entry for every level up to the rule's top. The levels may be written over the samples,
+    /// from the first on.
     void (*word_levels)(const WordLevels& rule, const int32_t* samples, uint8_t* levels,
-                        uint32_t count) noexcept;
+                        uint32_t count, uint32_t* histogram) noexcept;
     void (*float_levels)(const FloatLevels& rule, const float* samples, uint8_t* levels,
-                         uint32_t count) noexcept;
+                         uint32_t count, uint32_t* histogram) noexcept;
+
+    /// Writes the value of each level, both values and output being of 32 bits, whatever their
+    /// type. Levels may lie in the first quarter of the output: it is written from the end.
+    void (*replace_levels)(const void* values, const uint8_t* levels, void* output,
+                           uint32_t count) noexcept;
 
     /// Multiplies each word by a gain that grows by `step` from word to word: 4 times the product's
     /// upper 32 bits, which are truncated towards zero.

@@ -8,6 +8,7 @@
 #include <cstdint>
 
 #include "kzsdk/kernels/kernels.hpp"
+#include "kzsdk/kernels/level_counters.hpp"
 #include "kzsdk/kernels/plain.hpp"
 
 namespace {
@@ -57,16 +58,25 @@ void track_float_extremes(kz::kernels::Extremes<float>& extremes, const float* s
     kz::kernels::plain::track_float_extremes(extremes, samples + done, count - done);
 }
 
-/// Writes the bytes of whole groups of four vectors; level_of(index) gives a vector's levels.
+/// Writes the bytes of whole groups of four vectors and counts them; level_of(index) gives a
+/// vector's levels. Bytes are counted two groups after they are written: by then they need not be
+/// waited for, and counting, which takes a store for each byte, hides the arithmetic.
 template <class Simd, class LevelOf>
-uint32_t write_levels(uint8_t* levels, uint32_t count, LevelOf level_of) noexcept
+uint32_t write_levels(uint8_t* levels, uint32_t count, LevelCounters& counters,
+                      LevelOf level_of) noexcept
 {
     constexpr size_t kStep = 4 * Simd::kLanes;
+    constexpr size_t kBehind = 2 * kStep;
     const uint32_t whole = count - static_cast<uint32_t>(count % kStep);
     for (size_t i = 0; i < whole; i += kStep) {
         Simd::store_bytes(levels + i, level_of(i), level_of(i + Simd::kLanes),
                           level_of(i + 2 * Simd::kLanes), level_of(i + 3 * Simd::kLanes));
+        if (i >= kBehind) {
+            counters.count_all(levels + i - kBehind, kStep);
+        }
     }
+    const size_t left = whole < kBehind ? whole : kBehind;
+    counters.count_all(levels + whole - left, left);
     return whole;
 }
 
@@ -74,32 +84,59 @@ uint32_t write_levels(uint8_t* levels, uint32_t count, LevelOf level_of) noexcep
 // where one is, both give a level that is raised to 0.
 template <class Simd>
 void word_levels(const kz::kernels::WordLevels& rule, const int32_t* samples, uint8_t* levels,
-                 uint32_t count) noexcept
+                 uint32_t count, uint32_t* histogram) noexcept
 {
     const auto bottom = Simd::set(rule.bottom);
     const auto scale = Simd::set(rule.scale);
     const auto top = Simd::set(rule.top);
-    const uint32_t done = write_levels<Simd>(levels, count, [&](size_t i) noexcept {
+    LevelCounters counters;
+    const uint32_t done = write_levels<Simd>(levels, count, counters, [&](size_t i) noexcept {
         const auto halved = Simd::template shift_right<1>(Simd::load(samples + i));
         const auto scaled = Simd::template product_bits<32>(Simd::sub(halved, bottom), scale);
         const auto level = Simd::min(Simd::shift_right(scaled, rule.shift), top);
         return Simd::max(level, Simd::set(0));
     });
-    kz::kernels::plain::word_levels(rule, samples + done, levels + done, count - done);
+    counters.add_to(histogram, rule.top);
+    if (done != count) {
+        kz::kernels::plain::word_levels(rule, samples + done, levels + done, count - done,
+                                        histogram);
+    }
 }
 
 template <class Simd>
 void float_levels(const kz::kernels::FloatLevels& rule, const float* samples, uint8_t* levels,
-                  uint32_t count) noexcept
+                  uint32_t count, uint32_t* histogram) noexcept
 {
     const auto bottom = Simd::set(rule.bottom);
     const auto scale = Simd::set(rule.scale);
     const auto top = Simd::set(rule.top);
-    const uint32_t done = write_levels<Simd>(levels, count, [&](size_t i) noexcept {
+    LevelCounters counters;
+    const uint32_t done = write_levels<Simd>(levels, count, counters, [&](size_t i) noexcept {
         const auto scaled = Simd::mul(Simd::sub(Simd::load(samples + i), bottom), scale);
         return Simd::max(Simd::min(Simd::truncated(scaled), top), Simd::set(0));
     });
-    kz::kernels::plain::float_levels(rule, samples + done, levels + done, count - done);
+    counters.add_to(histogram, rule.top);
+    if (done != count) {
+        kz::kernels::plain::float_levels(rule, samples + done, levels + done, count - done,
+                                         histogram);
+    }
+}
+
+/// Four values at a time: a store takes as long for one as for four.
+template <class Simd>
+void replace_levels(const void* values, const uint8_t* levels, void* output,
+                    uint32_t count) noexcept
+{
+    constexpr size_t kBytes = 4;
+    const auto* words = static_cast<const uint8_t*>(values);
+    auto* to = static_cast<uint8_t*>(output);
+    const uint32_t left = count % 8;
+    size_t i = count - left;
+    kz::kernels::plain::replace_levels(values, levels + i, to + i * kBytes, left);
+    for (; i != 0; i -= 8) {
+        Simd::copy_four_words(to + (i - 4) * kBytes, words, levels + i - 4);
+        Simd::copy_four_words(to + (i - 8) * kBytes, words, levels + i - 8);
+    }
 }
 
 } // namespace

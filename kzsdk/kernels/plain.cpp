@@ -34,6 +34,7 @@ const Variant kPlainVariant = {
     .track_float_extremes = plain::track_float_extremes,
     .word_levels = plain::word_levels,
     .float_levels = plain::float_levels,
+    .replace_levels = plain::replace_levels,
     .apply_ramp = plain::apply_ramp,
     .sum_squares = plain::sum_squares,
 };

@@ -32,10 +32,12 @@ void polyphase_floats(const FloatPhases& phases, const float* oldest, uint32_t p
 void track_word_extremes(Extremes<int32_t>& extremes, const int32_t* samples,
                          uint32_t count) noexcept;
 void track_float_extremes(Extremes<float>& extremes, const float* samples, uint32_t count) noexcept;
-void word_levels(const WordLevels& rule, const int32_t* samples, uint8_t* levels,
-                 uint32_t count) noexcept;
-void float_levels(const FloatLevels& rule, const float* samples, uint8_t* levels,
-                  uint32_t count) noexcept;
+void word_levels(const WordLevels& rule, const int32_t* samples, uint8_t* levels, uint32_t count,
+                 uint32_t* histogram) noexcept;
+void float_levels(const FloatLevels& rule, const float* samples, uint8_t* levels, uint32_t count,
+                  uint32_t* histogram) noexcept;
+void replace_levels(const void* values, const uint8_t* levels, void* output,
+                    uint32_t count) noexcept;
 void apply_ramp(int32_t* words, uint32_t count, int32_t gain, int32_t step) noexcept;
 uint64_t sum_squares(const int32_t* words, uint32_t count) noexcept;
 

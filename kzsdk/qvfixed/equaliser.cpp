@@ -71,11 +71,14 @@ public:
         return std::clamp(level, 0, top_level_);
     }
 
-    // Writes the levels of all samples, one byte each: there are at most 256 levels.
-    void write_levels(Samples samples, uint8_t* levels) const noexcept
+    // Writes the levels of all samples, one byte each, and counts them: there are at most 256
+    // levels.
+    void write_levels(Samples samples, uint8_t* levels,
+                      std::span<uint32_t> histogram) const noexcept
     {
         kz::kernels::active().word_levels({bottom_, scale_q22_, shift_, top_level_}, samples.data(),
-                                          levels, static_cast<uint32_t>(samples.size()));
+                                          levels, static_cast<uint32_t>(samples.size()),
+                                          histogram.data());
     }
 
 private:
@@ -129,9 +132,8 @@ struct Equaliser {
         const std::span<FxpType> frame(output, pieces.older.size() + pieces.newer.size());
         if (histogram.size() <= kz::qv::kMaxByteLevels) {
             const kz::qv::ByteLevels<FxpType> levels(frame);
-            quantiser.write_levels(pieces.older, levels.from(0));
-            quantiser.write_levels(pieces.newer, levels.from(pieces.older.size()));
-            levels.count(histogram);
+            quantiser.write_levels(pieces.older, levels.from(0), histogram);
+            quantiser.write_levels(pieces.newer, levels.from(pieces.older.size()), histogram);
             rank_values(histogram, ranks);
             levels.replace(std::span<const uint32_t>(ranks));
             return;

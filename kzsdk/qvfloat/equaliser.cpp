@@ -54,12 +54,14 @@ public:
         return std::min(kz::to_uint32((sample - bottom_) * scale_), top_level_);
     }
 
-    // Writes the levels of all samples, one byte each: there are at most 256 levels.
-    void write_levels(Samples samples, uint8_t* levels) const noexcept
+    // Writes the levels of all samples, one byte each, and counts them: there are at most 256
+    // levels.
+    void write_levels(Samples samples, uint8_t* levels,
+                      std::span<uint32_t> histogram) const noexcept
     {
         kz::kernels::active().float_levels({bottom_, scale_, static_cast<int32_t>(top_level_)},
                                            samples.data(), levels,
-                                           static_cast<uint32_t>(samples.size()));
+                                           static_cast<uint32_t>(samples.size()), histogram.data());
     }
 
 private:
@@ -120,9 +122,8 @@ struct Equaliser {
         const auto count = static_cast<float>(frame.size());
         if (histogram.size() <= kz::qv::kMaxByteLevels) {
             const kz::qv::ByteLevels<float> levels(frame);
-            quantiser.write_levels(pieces.older, levels.from(0));
-            quantiser.write_levels(pieces.newer, levels.from(pieces.older.size()));
-            levels.count(histogram);
+            quantiser.write_levels(pieces.older, levels.from(0), histogram);
+            quantiser.write_levels(pieces.newer, levels.from(pieces.older.size()), histogram);
             rank_values(histogram, count, ranks);
             levels.replace(std::span<const float>(ranks));
             return;

@@ -4,6 +4,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <cstring>
 
 #include <immintrin.h>
 
@@ -205,6 +206,23 @@ struct Avx2 {
         const Ints order = _mm256_setr_epi32(0, 4, 1, 5, 2, 6, 3, 7);
         _mm256_storeu_si256(reinterpret_cast<__m256i*>(to),
                             _mm256_permutevar8x32_epi32(fours, order));
+    }
+
+    /// Copies the four words of 32 bits that four bytes name.
+    static void copy_four_words(uint8_t* to, const uint8_t* words, const uint8_t* indices) noexcept
+    {
+        uint32_t four = 0;
+        std::memcpy(&four, indices, sizeof four);
+        const auto word = [words](uint32_t index) noexcept {
+            int32_t at_index = 0;
+            std::memcpy(&at_index, words + sizeof at_index * index, sizeof at_index);
+            return at_index;
+        };
+        __m128i v = _mm_cvtsi32_si128(word(four & 0xff));
+        v = _mm_insert_epi32(v, word((four >> 8) & 0xff), 1);
+        v = _mm_insert_epi32(v, word((four >> 16) & 0xff), 2);
+        v = _mm_insert_epi32(v, word(four >> 24), 3);
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(to), v);
     }
 
     /// Upper halves of the products, truncated towards zero: the products are of magnitudes.

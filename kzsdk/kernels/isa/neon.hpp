@@ -5,6 +5,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <cstring>
 
 #include <arm_neon.h>
 
@@ -163,6 +164,16 @@ struct Neon {
         const int16x8_t low = vcombine_s16(vmovn_s32(a), vmovn_s32(b));
         const int16x8_t high = vcombine_s16(vmovn_s32(c), vmovn_s32(d));
         vst1q_u8(to, vcombine_u8(vqmovun_s16(low), vqmovun_s16(high)));
+    }
+
+    /// Copies the four words of 32 bits that four bytes name.
+    static void copy_four_words(uint8_t* to, const uint8_t* words, const uint8_t* indices) noexcept
+    {
+        uint32_t v[4];
+        for (size_t k = 0; k < 4; ++k) {
+            std::memcpy(&v[k], words + sizeof v[k] * indices[k], sizeof v[k]);
+        }
+        std::memcpy(to, v, sizeof v);
     }
 
     /// Upper halves of the products, truncated towards zero: the products are of magnitudes.

@@ -4,6 +4,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <cstring>
 
 #include <smmintrin.h>
 
@@ -184,6 +185,23 @@ struct Sse41 {
     {
         _mm_storeu_si128(reinterpret_cast<__m128i*>(to),
                          _mm_packus_epi16(_mm_packs_epi32(a, b), _mm_packs_epi32(c, d)));
+    }
+
+    /// Copies the four words of 32 bits that four bytes name.
+    static void copy_four_words(uint8_t* to, const uint8_t* words, const uint8_t* indices) noexcept
+    {
+        uint32_t four = 0;
+        std::memcpy(&four, indices, sizeof four);
+        const auto word = [words](uint32_t index) noexcept {
+            int32_t at_index = 0;
+            std::memcpy(&at_index, words + sizeof at_index * index, sizeof at_index);
+            return at_index;
+        };
+        __m128i v = _mm_cvtsi32_si128(word(four & 0xff));
+        v = _mm_insert_epi32(v, word((four >> 8) & 0xff), 1);
+        v = _mm_insert_epi32(v, word((four >> 16) & 0xff), 2);
+        v = _mm_insert_epi32(v, word(four >> 24), 3);
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(to), v);
     }
 
     /// Upper halves of the products, truncated towards zero: the products are of magnitudes.

@@ -57,6 +57,7 @@ constexpr kz::kernels::Variant vector_variant(const char* name) noexcept
         .track_float_extremes = track_float_extremes<Simd>,
         .word_levels = word_levels<Simd>,
         .float_levels = float_levels<Simd>,
+        .replace_levels = replace_levels<Simd>,
         .apply_ramp = apply_ramp<Simd>,
         .sum_squares = sum_squares<Simd>,
     };

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <bit>
 #include <cstdint>
+#include <cstring>
 #include <limits>
 #include <string>
 #include <vector>
@@ -104,16 +105,37 @@ TEST_P(FrameVariants, FindTheSameFloatExtremesAndPassOverNaN)
 }
 
 template <class Rule, class Sample>
-void expect_levels(void (*actual)(const Rule&, const Sample*, uint8_t*, uint32_t) noexcept,
-                   void (*plain)(const Rule&, const Sample*, uint8_t*, uint32_t) noexcept,
-                   const Rule& rule, const std::vector<Sample>& samples)
+using LevelsOf = void (*)(const Rule& rule, const Sample* samples, uint8_t* levels, uint32_t count,
+                          uint32_t* histogram) noexcept;
+
+/// Levels with one beyond the last that must stay untouched, and how often each was counted.
+struct Counted {
+    std::vector<uint8_t> levels;
+    std::vector<uint32_t> histogram;
+
+    bool operator==(const Counted&) const = default;
+};
+
+template <class Rule, class Sample>
+Counted counted(LevelsOf<Rule, Sample> levels_of, const Rule& rule,
+                const std::vector<Sample>& samples, uint32_t count)
+{
+    Counted made{std::vector<uint8_t>(samples.size() + 1, 99),
+                 std::vector<uint32_t>(static_cast<size_t>(rule.top) + 1, 7)};
+    levels_of(rule, samples.data(), made.levels.data(), count, made.histogram.data());
+    return made;
+}
+
+template <class Rule, class Sample>
+void expect_levels(LevelsOf<Rule, Sample> actual, LevelsOf<Rule, Sample> plain, const Rule& rule,
+                   const std::vector<Sample>& samples)
 {
     for (uint32_t count = 0; count <= samples.size(); ++count) {
-        std::vector<uint8_t> expected(samples.size() + 1, 99);
-        auto levels = expected;
-        plain(rule, samples.data(), expected.data(), count);
-        actual(rule, samples.data(), levels.data(), count);
-        ASSERT_EQ(expected, levels) << count << " samples";
+        const Counted expected = counted(plain, rule, samples, count);
+        ASSERT_EQ(expected, counted(actual, rule, samples, count)) << count << " samples";
+        auto histogram = expected.histogram;
+        std::for_each_n(expected.levels.begin(), count, [&](uint8_t level) { --histogram[level]; });
+        ASSERT_EQ(std::vector<uint32_t>(histogram.size(), 7), histogram) << count << " samples";
     }
 }
 
@@ -146,6 +168,47 @@ TEST_P(FrameVariants, GiveFloatsTheSameLevels)
             }
         }
     }
+}
+
+std::vector<uint8_t> noise_of_levels(size_t count)
+{
+    Random random(8);
+    std::vector<uint8_t> levels(count);
+    std::generate(levels.begin(), levels.end(),
+                  [&] { return static_cast<uint8_t>(random.next() >> 24); });
+    return levels;
+}
+
+// The levels lie in the first quarter of the words that replace them.
+TEST_P(FrameVariants, ReplaceLevelsWhereTheyLie)
+{
+    const Words values = noise_of(256, 0, 7);
+    const std::vector<uint8_t> levels = noise_of_levels(kMax);
+    for (uint32_t count = 0; count <= kMax; ++count) {
+        Words words(count + 1, 77);
+        std::memcpy(words.data(), levels.data(), count);
+        const int32_t beyond = words.back();
+        variant().replace_levels(values.data(), reinterpret_cast<const uint8_t*>(words.data()),
+                                 words.data(), count);
+        ASSERT_EQ(beyond, words.back()) << count << " levels";
+        for (uint32_t i = 0; i < count; ++i) {
+            ASSERT_EQ(values[levels[i]], words[i]) << i << " of " << count;
+        }
+    }
+}
+
+// An equaliser writes levels over the samples that they are made of.
+TEST_P(FrameVariants, WriteLevelsOverTheirSamples)
+{
+    const Words samples = noise_of(kMax, 6, 3);
+    const WordLevels rule{*std::ranges::min_element(samples) >> 1, 255 << 22, 21, 255};
+    const Counted expected = counted(plain().word_levels, rule, samples, kMax);
+    Words words = samples;
+    std::vector<uint32_t> histogram(256, 7);
+    variant().word_levels(rule, words.data(), reinterpret_cast<uint8_t*>(words.data()), kMax,
+                          histogram.data());
+    EXPECT_EQ(expected.histogram, histogram);
+    EXPECT_EQ(0, std::memcmp(expected.levels.data(), words.data(), kMax));
 }
 
 TEST_P(FrameVariants, ApplyTheSameRamp)
