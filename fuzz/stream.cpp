@@ -1,6 +1,6 @@
 // Streams: any settings, any bytes, in any cuts. Every call answers as its documentation says, the
-// outcome does not depend on the cuts, and where the extraction interface takes the sound the document
-// is that of one call.
+// outcome does not depend on the cuts, and where the extraction interface takes the sound the
+// document is that of one call.
 
 #include <algorithm>
 #include <memory>

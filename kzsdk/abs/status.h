@@ -103,11 +103,11 @@ typedef uint32_t kz_status;
 
 /** Memory is short, and the stream cannot go on: free it, free some memory and begin anew. */
 #define KZ_STREAM_ERROR_MEMORY UINT32_C(0x90090001)
-/** A pointer is null, or a reserved field is not 0: pass what stream.h states, and clear the settings
-    with kz_stream_initialize_settings(). */
+/** A pointer is null, or a reserved field is not 0: pass what stream.h states, and clear the
+    settings with kz_stream_initialize_settings(). */
 #define KZ_STREAM_ERROR_INVALID_ARGUMENT UINT32_C(0x90090004)
-/** kzinit_shutdown_vesk() was called while the stream was alive: start the library again, or free the
-    stream. */
+/** kzinit_shutdown_vesk() was called while the stream was alive: start the library again, or free
+    the stream. */
 #define KZ_STREAM_ERROR_NOT_STARTED UINT32_C(0x90090006)
 /** There is no algorithm with this number: use KZ_FPX_ALGORITHM_FIXED or KZ_FPX_ALGORITHM_FLOAT. */
 #define KZ_STREAM_ERROR_ALGORITHM UINT32_C(0x90090010)
@@ -116,8 +116,8 @@ typedef uint32_t kz_status;
 /** The algorithm cannot take the rate: use one of the rates in stream.h, use the floating-point
     algorithm, or resample the sound. */
 #define KZ_STREAM_ERROR_RATE UINT32_C(0x90090012)
-/** There are 0 channels, or more than 65535, or more than 2 in KZ_STREAM_FORMAT_PCM8: pass the channels
-    that the sound has, or use KZ_STREAM_FORMAT_LINEAR8. */
+/** There are 0 channels, or more than 65535, or more than 2 in KZ_STREAM_FORMAT_PCM8: pass the
+    channels that the sound has, or use KZ_STREAM_FORMAT_LINEAR8. */
 #define KZ_STREAM_ERROR_CHANNELS UINT32_C(0x90090013)
 /** The stream was finished: create another one for more sound. */
 #define KZ_STREAM_ERROR_FINISHED UINT32_C(0x90090014)

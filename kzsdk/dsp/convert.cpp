@@ -1,6 +1,6 @@
 // The sample converters. Which loop serves a format, and by how much sums are shifted, is decided
-// here; the loops themselves, with their A-law and mu-law arithmetic, are kernels. Words come out in
-// Q29 or Q30, floats in units of a 16-bit sample.
+// here; the loops themselves, with their A-law and mu-law arithmetic, are kernels. Words come out
+// in Q29 or Q30, floats in units of a 16-bit sample.
 
 #include "kzsdk/dsp/convert.h"
 

@@ -2,8 +2,8 @@
 /// The inner loops that exist in several variants, and the choice among them.
 ///
 /// A variant is one table of functions, compiled for one instruction set. Every variant gives the
-/// same words as the plain one for every input, the bits of NaNs apart; tests/library/kernels holds all
-/// of them to that. The best one that the processor has is taken at the first use and kept.
+/// same words as the plain one for every input, the bits of NaNs apart; tests/library/kernels holds
+/// all of them to that. The best one that the processor has is taken at the first use and kept.
 ///
 /// For tests and measurements the environment variable KZSDK_KERNELS pins a variant by its name.
 /// A name that the build or the processor does not know is ignored. It is read once, at the first
@@ -17,9 +17,9 @@
 namespace kz::kernels {
 
 /// Makes one word of each frame of interleaved samples: the sum of its `channels` samples modulo
-/// 2^32, shifted left by `shift` bits, which leaves 0 where `shift` is not 0 .. 31. Without channels,
-/// or with a negative number of them, nothing is read and sums are 0. The number of frames counts as
-/// unsigned.
+/// 2^32, shifted left by `shift` bits, which leaves 0 where `shift` is not 0 .. 31. Without
+/// channels, or with a negative number of them, nothing is read and sums are 0. The number of
+/// frames counts as unsigned.
 using ToWords = void(int32_t channels, const void* input, int32_t* output, int32_t frames,
                      int32_t shift) noexcept;
 
@@ -37,7 +37,8 @@ struct Encodings {
     Convert* ulaw_running;
 };
 
-/// What the code bytes of G.711 stand for. A-law's polarity is the opposite of the recommendation's.
+/// What the code bytes of G.711 stand for. A-law's polarity is the opposite of the
+/// recommendation's.
 using SampleTable = std::array<int16_t, 256>;
 extern const SampleTable kALawSamples;
 extern const SampleTable kULawSamples;
@@ -174,8 +175,8 @@ struct Variant {
     uint64_t (*sum_squares)(const int32_t* words, uint32_t count) noexcept;
 };
 
-/// Adds the products of samples, walked backwards from the newest, and taps, walked forwards, to `sum`
-/// one by one. The order of the additions is part of the result, so there is only this one.
+/// Adds the products of samples, walked backwards from the newest, and taps, walked forwards, to
+/// `sum` one by one. The order of the additions is part of the result, so there is only this one.
 float add_products(float sum, const float* newest, const float* taps, size_t count,
                    size_t stride) noexcept;
 

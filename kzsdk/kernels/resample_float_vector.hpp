@@ -6,8 +6,8 @@
 /// - Outputs one period of the phases apart have the same taps and windows `down` samples apart.
 ///   With that many outputs to make, the block is cut into columns of `down` samples, which are
 ///   laid side by side once; then a tap serves all lanes.
-/// - Outputs of a decimator all have the same taps. Its samples are deinterleaved into `down` streams, in
-///   which neighbouring outputs have neighbours.
+/// - Outputs of a decimator all have the same taps. Its samples are deinterleaved into `down`
+///   streams, in which neighbouring outputs have neighbours.
 /// - Else neighbouring outputs share one, and samples and taps are both transposed.
 ///
 /// Lanes beyond the outputs that are wanted work on whatever is there; nobody sees what they make.

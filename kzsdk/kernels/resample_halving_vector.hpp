@@ -13,7 +13,8 @@
 /// The centre tap is 2^31 / Down, a power of two: its product is a shift.
 ///
 /// Samples that follow each other in a window are `down` apart in the sums of neighbouring outputs:
-/// so the block is deinterleaved into `down` streams, in which neighbouring outputs have neighbours.
+/// so the block is deinterleaved into `down` streams, in which neighbouring outputs have
+/// neighbours.
 #pragma once
 
 #include <cstddef>

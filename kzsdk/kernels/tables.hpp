@@ -11,7 +11,8 @@ namespace kz::kernels {
 /// butterfly_factor(h, j), truncated. The first half serves the 16384-point transform.
 extern const int32_t kDctCoefficients[32768];
 
-/// What fill_dct_factors() writes. The first 2^n serve the floating-point transform of as many points.
+/// What fill_dct_factors() writes. The first 2^n serve the floating-point transform of as many
+/// points.
 extern const float kDctFactors[32768];
 
 /// Writes the factors of the floating-point transform of `factors.size()` points, a power of two.

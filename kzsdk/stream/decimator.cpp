@@ -1,6 +1,7 @@
 // Decimation by powers of two. A sample enters the first filter as a Q29 word (times 2^14); each
-// filter halves the level along with the rate, so a word leaves the last of n with 14 - n bits below
-// the 16 of a sample. No sum can wrap: a filter of gain 1/2 raises no peak above that of its input.
+// filter halves the level along with the rate, so a word leaves the last of n with 14 - n bits
+// below the 16 of a sample. No sum can wrap: a filter of gain 1/2 raises no peak above that of its
+// input.
 
 #include "kzsdk/stream/decimator.hpp"
 

@@ -1,6 +1,6 @@
 /// @file
-/// Frames of a rate that is two, four, eight or sixteen times one that the fixed-point fingerprinter
-/// takes, brought down to it.
+/// Frames of a rate that is two, four, eight or sixteen times one that the fixed-point
+/// fingerprinter takes, brought down to it.
 #pragma once
 
 #include <cstdint>

@@ -28,7 +28,8 @@ struct FrameLayout {
 /// Bytes of a sample; 0 for a number that is no format.
 uint32_t bytes_per_sample(uint32_t format) noexcept;
 
-/// @param decimated  The rate is one that the fingerprinter does not take: samples have to be words.
+/// @param decimated  The rate is one that the fingerprinter does not take: samples have to be
+///                   words.
 FrameLayout layout_of(uint32_t format, uint32_t channels, bool decimated) noexcept;
 
 /// Turns frames that do not go as they are into 16-bit words of `piece_channels` channels.

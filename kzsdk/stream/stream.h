@@ -24,8 +24,8 @@
  *
  * The same sound gives the same document to the bit, however it is cut: in single bytes, in the
  * middle of samples, all in one call. Where the extraction interface takes the sound too (its
- * formats and rates, one or two channels), the document is that of one kz_fpx_fingerprint_add_audio()
- * with all of it.
+ * formats and rates, one or two channels), the document is that of one
+ * kz_fpx_fingerprint_add_audio() with all of it.
  *
  * Threads: streams are independent of each other; one stream belongs to one thread at a time. A
  * call needs up to 100 KB of stack.
@@ -78,12 +78,12 @@ enum {
  * What a stream is made of; the caller's, read only by kz_stream_create(). Fill it with
  * kz_stream_initialize_settings() and change what differs.
  *
- * Rates. The fixed-point algorithm takes 8000, 11025, 16000, 22050, 24000, 32000, 44100 and
- * 48000 Hz as they are. Two, four, eight and sixteen times one of them (64000, 88200, 96000, 176400,
+ * Rates. The fixed-point algorithm takes 8000, 11025, 16000, 22050, 24000, 32000, 44100 and 48000
+ * Hz as they are. Two, four, eight and sixteen times one of them (64000, 88200, 96000, 176400,
  * 192000, ... 768000 Hz) are decimated exactly, to the highest of them, by the library's 2:1 filter
  * run once, twice, three or four times over each channel: in 32 bits from 16-bit samples times
- * 2^14, in blocks of 4096 frames counted from the start of the stream, and rounded to 16 bits at the
- * end. The floating-point algorithm takes every rate from 1 Hz to KZ_STREAM_MAX_RATE.
+ * 2^14, in blocks of 4096 frames counted from the start of the stream, and rounded to 16 bits at
+ * the end. The floating-point algorithm takes every rate from 1 Hz to KZ_STREAM_MAX_RATE.
  *
  * Channels. One and two go to the fingerprinter as they are. More become one: their sum in 16-bit
  * samples divided by the smallest power of two that is not below their number, rounded to the
@@ -108,7 +108,8 @@ KZ_API kz_status kz_stream_initialize_settings(kz_stream_settings* settings) KZ_
  * Creates a stream. It allocates what feeding needs, about 1 MB at 48000 Hz; feeding then allocates
  * only a record for each second of sound.
  *
- * @param[out] out_stream  The stream, which the caller frees with kz_stream_free(); null on failure.
+ * @param[out] out_stream  The stream, which the caller frees with kz_stream_free(); null on
+ *                         failure.
  * @return 0; KZ_STREAM_ERROR_INVALID_ARGUMENT when a pointer is null or a reserved field is not 0;
  *         KZ_STREAM_ERROR_ALGORITHM, KZ_STREAM_ERROR_FORMAT, KZ_STREAM_ERROR_CHANNELS or
  *         KZ_STREAM_ERROR_RATE for the first field that cannot be used;
@@ -123,14 +124,15 @@ KZ_API kz_status kz_stream_create(const kz_stream_settings* settings,
  *
  * @param bytes       At any address; read only during the call. May be null when there are 0.
  * @param byte_count  Of @p bytes.
- * @param[out] out_used  Bytes taken: all of them, or up to where the fingerprint was complete. Where
- *                    that is in the stream does not depend on its cuts; it may lie up to 3 s of sound
- *                    beyond what was needed. May be null.
+ * @param[out] out_used  Bytes taken: all of them, or up to where the fingerprint was complete.
+ *                    Where that is in the stream does not depend on its cuts; it may lie up to 3 s
+ *                    of sound beyond what was needed. May be null.
  * @param[out] out_complete  Set to 1 once the fingerprint is complete, else to 0.
- * @return 0; KZ_STREAM_ERROR_INVALID_ARGUMENT when a pointer is null; KZ_STREAM_ERROR_FINISHED after
- *         kz_stream_finish(), unless it is complete; KZ_STREAM_ERROR_NOT_STARTED when the library was
- *         shut down (nothing is taken); KZ_STREAM_ERROR_MEMORY when memory was short, here or on
- *         another thread of the library: frames may be lost, so this and every later feed fails.
+ * @return 0; KZ_STREAM_ERROR_INVALID_ARGUMENT when a pointer is null; KZ_STREAM_ERROR_FINISHED
+ *         after kz_stream_finish(), unless it is complete; KZ_STREAM_ERROR_NOT_STARTED when the
+ *         library was shut down (nothing is taken); KZ_STREAM_ERROR_MEMORY when memory was short,
+ *         here or on another thread of the library: frames may be lost, so this and every later
+ *         feed fails.
  */
 KZ_API kz_status kz_stream_feed(kz_stream* stream, const void* bytes, uint64_t byte_count,
                                 uint64_t* out_used, uint8_t* out_complete) KZ_NOEXCEPT;
@@ -165,7 +167,8 @@ typedef struct kz_stream_state {
     uint32_t standing;             /**< one of the numbers above */
     uint32_t percent;              /**< of the frames of the fingerprint, 0 .. 100 */
     uint32_t missing_milliseconds; /**< of sound, before the fingerprint is complete: about
-                                        KZ_FPX_MILLISECONDS_NEEDED in all; 0 when it is complete, else not 0 */
+                                        KZ_FPX_MILLISECONDS_NEEDED in all; 0 when it is complete,
+                                        else not 0 */
     uint32_t odd_bytes;            /**< bytes of a frame that is not whole yet */
     uint32_t reserved[6];          /**< 0 */
 } kz_stream_state;
@@ -182,8 +185,8 @@ KZ_API kz_status kz_stream_get_state(const kz_stream* stream,
  * Copies the values of a complete fingerprint, as kz_fpx_fingerprint_get_values() does.
  *
  * @return What that function returns, with KZ_STREAM_ERROR_INVALID_ARGUMENT when a pointer is null,
- *         KZ_STREAM_ERROR_NOT_STARTED when the library was shut down and KZ_STREAM_ERROR_MEMORY when
- *         memory is short; the call may then be repeated.
+ *         KZ_STREAM_ERROR_NOT_STARTED when the library was shut down and KZ_STREAM_ERROR_MEMORY
+ *         when memory is short; the call may then be repeated.
  */
 KZ_API kz_status kz_stream_get_values(kz_stream* stream, int16_t* values, uint32_t capacity,
                                       uint32_t* out_count) KZ_NOEXCEPT;
@@ -193,9 +196,9 @@ KZ_API kz_status kz_stream_get_values(kz_stream* stream, int16_t* values, uint32
  *
  * @param[out] out_text  NUL-terminated UTF-8, which belongs to the stream and stays until that is
  *                       freed; null on failure.
- * @return 0; KZ_STREAM_ERROR_INVALID_ARGUMENT when a pointer is null; KZ_QV_ERROR_INCOMPLETE when the
- *         fingerprint is not complete; KZ_STREAM_ERROR_NOT_STARTED when the library was shut down;
- *         KZ_STREAM_ERROR_MEMORY when memory is short. The call may then be repeated.
+ * @return 0; KZ_STREAM_ERROR_INVALID_ARGUMENT when a pointer is null; KZ_QV_ERROR_INCOMPLETE when
+ *         the fingerprint is not complete; KZ_STREAM_ERROR_NOT_STARTED when the library was shut
+ *         down; KZ_STREAM_ERROR_MEMORY when memory is short. The call may then be repeated.
  */
 KZ_API kz_status kz_stream_get_document(kz_stream* stream, const char** out_text) KZ_NOEXCEPT;
 
@@ -219,8 +222,9 @@ KZ_API kz_status kz_stream_get_times(const kz_stream* stream, uint32_t* out_star
                                      uint32_t* out_duration) KZ_NOEXCEPT;
 
 /**
- * Frees a stream with its document, gives back its hold on the library and sets the caller's pointer
- * to null. Nothing leaks after a kzinit_shutdown_vesk() either: memory is switched on for the call.
+ * Frees a stream with its document, gives back its hold on the library and sets the caller's
+ * pointer to null. Nothing leaks after a kzinit_shutdown_vesk() either: memory is switched on for
+ * the call.
  *
  * @return 0, also when *stream_ref is null; KZ_STREAM_ERROR_INVALID_ARGUMENT when @p stream_ref is
  *         null.

@@ -1,5 +1,6 @@
 /// @file
-/// Fingerprint contexts of the extraction interface, owned, and the calls on them that most tests make.
+/// Fingerprint contexts of the extraction interface, owned, and the calls on them that most tests
+/// make.
 #pragma once
 
 #include <cstdint>

@@ -4,6 +4,7 @@
 #include <fstream>
 #include <iterator>
 #include <regex>
+#include <sstream>
 
 namespace conventions {
 
@@ -45,6 +46,19 @@ void for_each_match(const File& file, const std::regex& pattern, Visit visit)
 const std::regex kTest(R"(\b(?:TEST|TEST_F|TEST_P|TYPED_TEST|TYPED_TEST_P)\(\s*(\w+),\s*(\w+)\))");
 const std::regex kMention(R"(`([A-Z]\w+)\.([A-Z]\w+|\*)`)");
 const std::regex kStatusNumber(R"(\b0[xX]90[0-9a-fA-F]{6}(?![0-9a-fA-F]))");
+
+bool is_source(const File& file)
+{
+    const std::string extension = fs::path(file.name).extension().string();
+    return Names{".h", ".hpp", ".c", ".cpp"}.contains(extension);
+}
+
+/// Characters of UTF-8: every byte but those that continue one.
+size_t columns(const std::string& line)
+{
+    return static_cast<size_t>(
+        std::ranges::count_if(line, [](char byte) { return (byte & 0xC0) != 0x80; }));
+}
 
 bool is_documentation(const File& file) { return file.name.ends_with(".md"); }
 
@@ -88,6 +102,22 @@ Complaints long_test_names(const Files& files)
                                      " characters");
             }
         });
+    }
+    return complaints;
+}
+
+Complaints wide_lines(const Files& files)
+{
+    Complaints complaints;
+    for (const File& file : files) {
+        std::istringstream in(is_source(file) ? file.text : "");
+        int number = 1;
+        for (std::string line; std::getline(in, line); ++number) {
+            if (columns(line) > kMaxColumns) {
+                complaints.push_back(file.name + ':' + std::to_string(number) + ": " +
+                                     std::to_string(columns(line)) + " columns");
+            }
+        }
     }
     return complaints;
 }

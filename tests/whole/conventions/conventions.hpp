@@ -30,6 +30,12 @@ Complaints numbers_of_statuses(const Files& files);
 /// A test's name is a sentence that fits into a line of a report.
 Complaints long_test_names(const Files& files);
 
+/// The longest line of a C or C++ file, in columns. The formatter leaves comments as they are.
+inline constexpr size_t kMaxColumns = 100;
+
+/// C and C++ files have no line that is wider.
+Complaints wide_lines(const Files& files);
+
 /// The tests that the files define, as "Suite.Name".
 Names tests_defined(const Files& files);
 

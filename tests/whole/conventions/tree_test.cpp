@@ -36,6 +36,12 @@ TEST_F(Conventions, TestsHaveShortNames)
         << "the most is " << conventions::kMaxTestName;
 }
 
+TEST_F(Conventions, SourcesFitIntoTheirColumns)
+{
+    EXPECT_EQ(Complaints{}, conventions::wide_lines(files_))
+        << "the most is " << conventions::kMaxColumns;
+}
+
 TEST_F(Conventions, DocumentationNamesTestsThatExist)
 {
     EXPECT_EQ(Complaints{}, conventions::unknown_tests(files_, tests_));
@@ -73,6 +79,16 @@ TEST(ConventionRules, NoticeALongTestName)
     EXPECT_EQ(
         (Complaints{"a_test.cpp:2: " + longest + "N has 46 characters"}),
         conventions::long_test_names({{"a_test.cpp", "\n" + head + "\n  " + longest + "N)"}}));
+}
+
+TEST(ConventionRules, NoticeAWideLine)
+{
+    const std::string widest(100, 'x');
+    EXPECT_EQ(Complaints{}, conventions::wide_lines({{"a.cpp", widest + "\n" + widest}}));
+    EXPECT_EQ(Complaints{}, conventions::wide_lines({{"a.cpp", widest.substr(1) + "\u00b5"}}));
+    EXPECT_EQ(Complaints{}, conventions::wide_lines({{"a.md", widest + "x"}}));
+    EXPECT_EQ((Complaints{"a.cpp:2: 101 columns"}),
+              conventions::wide_lines({{"a.cpp", "\n" + widest + "x"}}));
 }
 
 TEST(ConventionRules, NoticeATestThatIsOnlyDocumented)

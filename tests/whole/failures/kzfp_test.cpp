@@ -107,7 +107,8 @@ void expect_one_complaint(const ProcessResult& result)
     EXPECT_LE(lines_in(result.err), 2) << result.err; // a library under it may add its own
 }
 
-// The streams of the library report every frame that memory was too short for, so a result is whole.
+// The streams of the library report every frame that memory was too short for, so a result is
+// whole.
 void expect_same_or_complaint(const ProcessResult& whole, const ProcessResult& result)
 {
     if (result.status == 0) {
