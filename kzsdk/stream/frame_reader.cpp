@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <bit>
+#include <cassert>
 #include <cstddef>
 #include <cstring>
 
@@ -26,23 +27,25 @@ Word load(const uint8_t* bytes) noexcept
     return word;
 }
 
-// To the nearest integer, halves to the even one; clipped at full scale.
+// The bits of a magnitude in single precision are in order as integers are.
+constexpr int32_t kMagnitude = 0x7fffffff;
+constexpr int32_t kInfinity = 0x7f800000;
+constexpr int32_t kFullScale = std::bit_cast<int32_t>(32768.0F);
+constexpr int32_t kHalf = std::bit_cast<int32_t>(0.5F);
+
+// To the nearest integer, halves to the even one; clipped at full scale; what is not a number is
+// silence. Compares bits, and branches nowhere: compilers make vector instructions of that.
 int16_t from_float(float sample) noexcept
 {
-    const float scaled = sample * 32768.0F; // exact, or infinite
-    if (!(scaled > -32768.0F)) {
-        return scaled <= -32768.0F ? int16_t{-32768} : int16_t{0}; // not a number: silence
-    }
-    if (scaled >= 32767.0F) {
-        return 32767;
-    }
-    const auto whole = static_cast<int32_t>(scaled);       // towards zero
-    const float rest = scaled - static_cast<float>(whole); // exact, within (-1, 1)
-    const float beyond = rest < 0 ? -rest : rest;
-    const bool is_odd = (whole & 1) != 0;
-    const bool rounds_away = beyond > 0.5F || (beyond == 0.5F && is_odd);
-    const int32_t away = rest < 0 ? -1 : 1;
-    return static_cast<int16_t>(rounds_away ? whole + away : whole);
+    const auto bits = std::bit_cast<int32_t>(sample * 32768.0F); // exact, or infinite
+    const int32_t magnitude = bits & kMagnitude;
+    const int32_t is_number = int32_t{magnitude <= kInfinity};
+    const auto clipped = std::bit_cast<float>(std::min(magnitude, kFullScale) & -is_number);
+    const auto whole = static_cast<int32_t>(clipped);
+    const auto rest = std::bit_cast<int32_t>(clipped - static_cast<float>(whole)); // exact
+    const int32_t rounded = whole + (int32_t{rest > kHalf} | (int32_t{rest == kHalf} & whole));
+    const int32_t sign = bits >> 31; // -1 or 0
+    return static_cast<int16_t>(std::min((rounded ^ sign) - sign, 32767));
 }
 
 // Beyond full scale a double may not fit single precision, and all of it is clipped alike.
@@ -107,6 +110,7 @@ void to_words(uint32_t format, const uint8_t* bytes, size_t count, int16_t* word
 // rounded to the nearest, halves up. 65535 samples and the half fit 32 bits.
 void mix_down(int16_t* samples, uint32_t frames, uint32_t channels) noexcept
 {
+    assert(channels > 2);
     const auto shift = static_cast<uint32_t>(std::bit_width(channels - 1));
     const int32_t half = int32_t{1} << (shift - 1);
     const int16_t* next = samples;

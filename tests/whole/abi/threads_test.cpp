@@ -33,6 +33,28 @@ std::string document_in_pieces(const std::vector<int16_t>& music, uint32_t rate)
     return complete ? document_of(handle.get()) : "not complete";
 }
 
+/// The same through a stream at 8000 Hz.
+std::string document_of_stream(const std::vector<int16_t>& music)
+{
+    kz_stream_settings settings;
+    kz_stream* stream = nullptr;
+    kz_stream_initialize_settings(&settings);
+    settings.sample_rate = 8000;
+    settings.channels = 1;
+    if (kz_stream_create(&settings, &stream) != KZ_OK) {
+        return "not created";
+    }
+    uint8_t complete = 0;
+    kz_stream_feed(stream, music.data(), 2 * music.size(), nullptr, &complete);
+    const char* text = nullptr;
+    std::string document = "not complete";
+    if (kz_stream_get_document(stream, &text) == KZ_OK) {
+        document = text;
+    }
+    kz_stream_free(&stream);
+    return document;
+}
+
 template <class Job>
 void run_beside_each_other(size_t count, Job job)
 {
@@ -83,6 +105,23 @@ TEST_F(Threads, MaySeeTheMemoryManagerSwitchedOffAndOn)
         }
     });
     EXPECT_EQ(KZ_MEM_ALREADY_ON, kzmem_query_availability());
+}
+
+// Each thread starts and ends the library on its own; none ends it for the others.
+TEST(ThreadsWithoutStartUp, HoldTheLibraryByTheirStreams)
+{
+    const auto music = kz::test::tune(8000, 1, 15.0, 0.5, 1);
+    std::vector<std::string> documents(8);
+    run_beside_each_other(4, [&](size_t i) {
+        for (size_t round = 0; round < 2; ++round) {
+            documents[2 * i + round] = document_of_stream(music);
+        }
+    });
+    for (const auto& document : documents) {
+        EXPECT_TRUE(document.starts_with("<?xml")) << document;
+        EXPECT_EQ(documents[0], document);
+    }
+    EXPECT_EQ(KZ_MEM_NOT_ON, kzmem_query_availability());
 }
 
 // CTest gives each test a process of its own, so these are the first calls that need the kernels.
