@@ -1,6 +1,7 @@
-// The sample converters. Which loop serves a format, and by how much sums are shifted, is decided
-// here; the loops themselves, with their A-law and mu-law arithmetic, are kernels. Words come out
-// in Q29 or Q30, floats in units of a 16-bit sample.
+/// @file
+/// The sample converters. Which loop serves a format, and by how much sums are shifted, is decided
+/// here; the loops themselves, with their A-law and mu-law arithmetic, are kernels. Words come out
+/// in Q29 or Q30, floats in units of a 16-bit sample.
 
 #include "kzsdk/dsp/convert.h"
 
@@ -23,6 +24,8 @@ int32_t averaging_shift(int32_t channels, int32_t sample_bits) noexcept
 
 } // namespace
 
+// ---- 16-bit PCM to words. A shift by 14 makes Q29 of one sample and Q30 of the average of two.
+
 void KZDSP_PCM16ToQ29(const void* input, FxpType* output, int32_t frame_count) noexcept
 {
     to_words().pcm16(1, input, output, frame_count, 14);
@@ -44,6 +47,8 @@ void KZDSP_NChannelPCM16ToMonoQ30(int32_t channels, const void* input, FxpType* 
     to_words().pcm16(channels, input, output, frame_count, averaging_shift(channels, 16));
 }
 
+// ---- 8-bit PCM to words: the same, with 8 bits more. Bytes below silence are folded up.
+
 void KZDSP_PCM8ToQ29(const void* input, FxpType* output, int32_t frame_count) noexcept
 {
     to_words().pcm8(1, input, output, frame_count, 22);
@@ -64,6 +69,9 @@ void KZDSP_NChannelPCM8ToMonoQ30(int32_t channels, const void* input, FxpType* o
 {
     to_words().pcm8(channels, input, output, frame_count, averaging_shift(channels, 8));
 }
+
+// ---- A-law and mu-law to words, expanded to the scale of 16-bit PCM. A-law comes out inverted.
+// The sums of the N-channel converters run on from frame to frame and are never cleared.
 
 void KZDSP_ALawToQ29(const void* input, FxpType* output, int32_t frame_count) noexcept
 {
@@ -96,6 +104,8 @@ void KZDSP_NChanneluLawToMonoQ30(int32_t channels, const void* input, FxpType* o
 {
     to_words().ulaw_running(channels, input, output, frame_count, averaging_shift(channels, 16));
 }
+
+// ---- to floats: channels are added, not averaged; 8-bit PCM is brought to the scale of 16 bits
 
 void KZDSP_ShortToFloat(const void* input, float* output, int32_t frame_count) noexcept
 {
@@ -161,6 +171,8 @@ void KZDSP_NChanneluLawToMonoFloat(int32_t channels, const void* input, float* o
 {
     to_floats().ulaw_running(channels, input, output, frame_count);
 }
+
+// ---- the tables of both laws, 256 samples each
 
 const int16_t* KZDSP_GetuLawTable() noexcept { return kz::kernels::kULawSamples.data(); }
 

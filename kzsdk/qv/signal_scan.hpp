@@ -196,7 +196,11 @@ void prime(Detector& detector, std::span<const Sample> block, LevelsOf levels_of
 
 /// Brings the means up to the end of a block. What they hold then depends on its last two windows
 /// only: the deviations of the last window, and the levels from which those were taken. A longer
-/// block is entered there.
+/// block is entered there:
+///
+///     |......... skipped .........|----- W -----|----- W -----| end of the block
+///                                   levels only   levels and
+///                                                 deviations
 template <class Detector, class Sample, class LevelsOf>
 void settle(Detector& detector, std::span<const Sample> rest, LevelsOf levels_of) noexcept
 {

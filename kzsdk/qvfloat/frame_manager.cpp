@@ -101,6 +101,10 @@ struct Energy {
 // Adds the squares of all bins to the sums of several bands. Each sum is made in the order of its
 // bins, so no sum can be split; instead the sums of several bands run side by side, and none waits
 // for its own last addition. When the narrowest band is done, the others go on without it.
+//
+//     band 0  |=====|
+//     band 1  |=====+==|            one pass over as many bins as the narrowest band has left,
+//     band 2  |=====+==+====|       then one over what the next one has left, and so on
 template <size_t Count>
 void add_squares(Energy* (&bands)[Count]) noexcept
 {
