@@ -42,8 +42,6 @@ std::string hundredths(double seconds)
     return printed("%.2f s", std::floor(seconds * 100 + 1e-6) / 100);
 }
 
-std::string needed() { return hundredths(KZ_FPX_MILLISECONDS_NEEDED / 1000.0); }
-
 uint32_t to_stream_format(audio::Encoding encoding)
 {
     switch (encoding) {
@@ -106,7 +104,7 @@ std::string too_little(const kz_stream& stream, const audio::Source& source)
     if (const std::string trouble = source.trouble(); !trouble.empty()) {
         text += ", then the file is damaged (" + trouble + ")";
     }
-    return text + ", " + needed() + " needed";
+    return text + ", " + sound_needed() + " needed";
 }
 
 /// Reads until the fingerprint is complete, or the source ends.
@@ -146,6 +144,8 @@ std::vector<int16_t> values_of(kz_stream& stream)
 }
 
 } // namespace
+
+std::string sound_needed() { return hundredths(KZ_FPX_MILLISECONDS_NEEDED / 1000.0); }
 
 Fingerprint take_fingerprint(audio::Source& source, Algorithm algorithm)
 {

@@ -11,6 +11,9 @@
 
 namespace kzfp {
 
+/// How much sound a fingerprint needs: "14.22 s".
+std::string sound_needed();
+
 struct Fingerprint {
     std::string document;        ///< the query document, without a line break at its end
     std::vector<int16_t> values; ///< those of the document, signed

@@ -4,9 +4,12 @@
 #include "kzfp.hpp"
 
 #include <filesystem>
+#include <regex>
+#include <set>
 
 #include <gtest/gtest.h>
 
+#include "kzfp/commands/fingerprint_options.hpp"
 #include "kzfp/commands/table.hpp"
 
 namespace {
@@ -48,6 +51,44 @@ TEST(KzfpCommands, StandInTheSynopsisOfTheManPage)
     for (const std::string& name : command_names()) {
         EXPECT_TRUE(contains(synopsis, "\n.B kzfp " + name + "\n")) << name;
     }
+}
+
+/// The long options that a help names.
+std::set<std::string> options_in(const std::string& help)
+{
+    static const std::regex kOption("--[a-z][a-z-]*");
+    return {std::sregex_token_iterator(help.begin(), help.end(), kOption), {}};
+}
+
+// As troff writes them, with escaped hyphens.
+TEST(KzfpCommands, HaveTheirOptionsInTheManPage)
+{
+    const std::string page = contents(KZFP_MAN_PAGE);
+    for (const std::string& name : command_names()) {
+        for (const std::string& option : options_in(output_of({name, "--help"}))) {
+            const std::string word = std::regex_replace(option, std::regex("-"), "\\-");
+            EXPECT_TRUE(contains(page, word)) << name << ' ' << option;
+        }
+    }
+}
+
+template <class Value, size_t count>
+void expect_in_man_page_and_help(const ::kzfp::Choice<Value> (&choices)[count])
+{
+    const std::string page = contents(KZFP_MAN_PAGE);
+    const std::string help = output_of({"--help"});
+    for (const auto& choice : choices) {
+        const std::string name(choice.name);
+        EXPECT_TRUE(contains(page, "\n.B " + name + "\n")) << name;
+        EXPECT_TRUE(contains(help, std::string(choice.explanation))) << name;
+    }
+}
+
+TEST(KzfpCommands, HaveTheirChoicesInTheManPageAndHelp)
+{
+    expect_in_man_page_and_help(::kzfp::kOutputFormats);
+    expect_in_man_page_and_help(::kzfp::kAlgorithms);
+    expect_in_man_page_and_help(::kzfp::kEncodings);
 }
 
 TEST(KzfpCommands, HaveAHelpOfTheirOwn)

@@ -9,27 +9,11 @@
 #include <utility>
 
 #include "kzfp/commands/table.hpp"
+#include "kzfp/fingerprinter.hpp"
 
 namespace kzfp {
 
 namespace {
-
-constexpr const char* kDescription =
-    "Prints the fingerprint of each FILE: the query document that a recognition service is sent.\n"
-    "A FILE is any sound file that libsndfile reads (WAV, FLAC, OGG, MP3, AIFF, AU, ...);\n"
-    "- is standard input. 14.22 s of sound are needed after leading silence; reading stops there.";
-
-constexpr const char* kNotes =
-    "Rates:     8000, 11025, 16000, 22050, 24000, 32000, 44100 and 48000 Hz go to the library as\n"
-    "           they are, and with --algorithm float all from 1000 to 768000 Hz; any other rate of "
-    "a\n"
-    "           sound file is converted to 44100 Hz and that is said on standard error.\n"
-    "Channels:  one and two go to the library as they are; more are mixed down to one: their sum\n"
-    "           divided by the smallest power of two that is not below their number.\n"
-    "Encodings: A-law and mu-law files go to the library as they are, everything else as 16-bit\n"
-    "           PCM. That includes 8-bit files, since the library's own 8-bit input makes\n"
-    "           fingerprints that match no other encoding; --raw RATE,CHANNELS,u8 uses it.\n"
-    "Exit:      0 success, 1 a file failed (one line each on standard error), 2 wrong usage.";
 
 constexpr const char* kAboutCommands =
     "\n  Each has a help of its own: kzfp COMMAND --help. A sound file that is named like a\n"
@@ -43,19 +27,47 @@ std::optional<uint32_t> to_number(std::string_view text)
     return error == std::errc{} && stop == end ? std::optional(number) : std::nullopt;
 }
 
-/// "1000 to 768000" or "one of 8000, 11025, ..., 48000".
-std::string rates_text(Algorithm algorithm)
+/// "8000, 11025, ..., 48000", or "1000 to 768000".
+std::string rates_of(Algorithm algorithm)
 {
     if (algorithm == Algorithm::floating) {
         return std::to_string(audio::kLowestRate) + " to " + std::to_string(audio::kHighestRate);
     }
     std::string text;
     for (const uint32_t rate : kFixedRates) {
-        text += text.empty() ? "one of " : ", ";
+        text += text.empty() ? "" : ", ";
         text += std::to_string(rate);
     }
     return text;
 }
+
+std::string description()
+{
+    return "Prints the fingerprint of each FILE: the query document that a recognition service is "
+           "sent.\n"
+           "A FILE is any sound file that libsndfile reads (WAV, FLAC, OGG, MP3, AIFF, AU, ...);\n"
+           "- is standard input. " +
+           sound_needed() + " of sound are needed after leading silence; reading stops there.";
+}
+
+std::string about_rates()
+{
+    return "Rates:     " + rates_of(Algorithm::fixed) +
+           " Hz go to the library as they are,\n"
+           "           and with --algorithm float all from " +
+           rates_of(Algorithm::floating) +
+           " Hz; any other rate of a sound\n"
+           "           file is converted to " +
+           std::to_string(audio::kConvertedRate) + " Hz and that is said on standard error.\n";
+}
+
+constexpr const char* kMoreNotes =
+    "Channels:  one and two go to the library as they are; more are mixed down to one: their sum\n"
+    "           divided by the smallest power of two that is not below their number.\n"
+    "Encodings: A-law and mu-law files go to the library as they are, everything else as 16-bit\n"
+    "           PCM. That includes 8-bit files, since the library's own 8-bit input makes\n"
+    "           fingerprints that match no other encoding; --raw RATE,CHANNELS,u8 uses it.\n"
+    "Exit:      0 success, 1 a file failed (one line each on standard error), 2 wrong usage.";
 
 [[noreturn]] void refuse_raw(const std::string& what) { throw CLI::ValidationError("--raw", what); }
 
@@ -68,7 +80,7 @@ audio::StreamFormat to_raw_format(const std::string& text, Algorithm algorithm)
     const auto rate = to_number(words[0]);
     if (!rate || !takes_rate(algorithm, *rate)) {
         refuse_raw("a rate of '" + words[0] + "' Hz is not supported; it is " +
-                   rates_text(algorithm));
+                   (algorithm == Algorithm::fixed ? "one of " : "") + rates_of(algorithm));
     }
     const auto channels = to_number(words[1]);
     if (!channels || *channels < 1 || *channels > 2) {
@@ -111,17 +123,16 @@ void add_input_options(CLI::App& parser, audio::Request& request, std::optional<
 /// The help of the program as a whole also lists its commands.
 std::string notes(const Arguments& arguments)
 {
-    if (!arguments.command.empty()) {
-        return kNotes;
-    }
-    return "Commands:\n" + commands_text() + kAboutCommands + kNotes;
+    const std::string listing =
+        arguments.command.empty() ? "Commands:\n" + commands_text() + kAboutCommands : "";
+    return listing + about_rates() + kMoreNotes;
 }
 
 } // namespace
 
 std::variant<FingerprintOptions, ExitStatus> parse_fingerprint_options(const Arguments& arguments)
 {
-    CLI::App parser(kDescription, program_name(arguments));
+    CLI::App parser(description(), program_name(arguments));
     parser.footer(notes(arguments));
     FingerprintOptions options;
     std::optional<std::string> raw;
