@@ -9,7 +9,7 @@
 #include <stddef.h>
 #include <stdint.h>
 
-/** Marks a function that leaves the library. */
+/** Marks an exported function. */
 #define KZ_API __attribute__((visibility("default")))
 
 #ifdef __cplusplus

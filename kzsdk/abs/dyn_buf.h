@@ -57,8 +57,8 @@ KZ_API kz_status kz_dyn_buf_dispose(kz_dyn_buf* buffer) KZ_NOEXCEPT;
 KZ_API uint8_t* kz_dyn_buf_dispose_and_return_buffer(kz_dyn_buf* buffer) KZ_NOEXCEPT;
 
 /**
- * Appends @p count bytes. Where they do not fit, the capacity grows by the larger of the buffer's
- * step and what is missing.
+ * Appends @p count bytes. If they do not fit, the capacity grows by the larger of the buffer's step
+ * and what is missing.
  *
  * @param bytes  May lie in the buffer itself. Not null, even when @p count is 0.
  * @return 0; KZ_DYN_BUF_ERROR_INVALID_ARGUMENT when a pointer is null; KZ_DYN_BUF_ERROR_MEMORY when

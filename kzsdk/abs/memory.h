@@ -72,7 +72,7 @@ KZ_API void* _kzmem_calloc(uint32_t count, uint32_t size) KZ_NOEXCEPT;
 KZ_API void* _kzmem_realloc(void* block, uint32_t size) KZ_NOEXCEPT;
 
 /**
- * Gives a block back.
+ * Frees a block.
  *
  * @param block  A block of the library's, or null, which does nothing.
  * @return 0, or KZ_MEM_NOT_ON while the manager is off: then nothing is freed.

@@ -14,7 +14,7 @@
  *
  * Side by side: a plain start lasts through any number of counted releases. After a plain shut-down
  * the holders' allocations fail until the library is started again in either way; holders stay
- * counted, and each still makes its release.
+ * counted, and each still has to release.
  *
  * Threads: acquire and release may run at any time on any thread. A plain start-up or shut-down
  * must not run beside other calls.
@@ -28,8 +28,8 @@
 KZ_C_BEGIN
 
 /**
- * The start-up record, the caller's; read only during the call that gets it. Seventeen 32-bit words
- * where pointers have 32 bits. Clear it with kzconf_initialize_configuration() before use.
+ * The start-up record. It belongs to the caller and is read only during the call. Seventeen 32-bit
+ * words where pointers have 32 bits. Clear it with kzconf_initialize_configuration() before use.
  */
 typedef struct kzconf_configuration {
     const char* memory_arg_text; /**< decimal text, read with kz_atoi32(); null counts as 0 */
@@ -71,14 +71,14 @@ KZ_API kz_status kzinit_initialize_vesk_safe(const kzconf_configuration* record,
 KZ_API kz_status kzinit_shutdown_vesk(void) KZ_NOEXCEPT;
 
 /**
- * Counts one holder more and starts the library if it is off.
+ * Counts one more holder, and starts the library if it is off.
  *
  * @return 0: a kzinit_release() is due; KZ_INIT_ERROR_TOO_MANY_HOLDERS at 2^30 - 1 holders.
  */
 KZ_API kz_status kzinit_acquire(void) KZ_NOEXCEPT;
 
 /**
- * Counts one holder less. After the last one the library is off, unless it was started by
+ * Counts one holder fewer. After the last one the library is off, unless it was started by
  * kzinit_initialize_vesk() too: then it stays on until kzinit_shutdown_vesk().
  *
  * @return 0; KZ_INIT_ERROR_NOT_HELD when there is no holder: nothing is changed then.

@@ -7,7 +7,7 @@
  * from its allocator.
  *
  * Each family has a switch, off at first, and a last error. Both are the process's, atomic and
- * without a lock: another thread's failure may be the one that get_error returns, so look at what a
+ * without a lock: another thread's failure may be the one that get_error returns, so go by what a
  * call returns. While a family is off, open, seek, read, read_at, close, read_vol_label,
  * get_volume_label and kzdvdfs_exists() do nothing but fail with KZ_DISC_NOT_ON. The names are
  * built, and directories listed, whether it is on or off.
@@ -24,8 +24,8 @@
  * last error, unless a function says otherwise; a success leaves the last error as it was, unless a
  * function says otherwise.
  *
- * Not a security boundary: a link may take a file's place between a look and the opening, links are
- * followed wherever `open` follows them, and opening a pipe waits for its other end.
+ * Not a security boundary: a link may take a file's place between a check and the opening, links
+ * are followed wherever `open` follows them, and opening a pipe waits for its other end.
  */
 #ifndef KZSDK_DISC_DISC_H
 #define KZSDK_DISC_DISC_H
@@ -105,8 +105,8 @@ KZ_API kz_status kzbdfs_close(int32_t descriptor) KZ_NOEXCEPT;
  * first white space.
  *
  * IMPORTANT: each success leaves a descriptor of the device open that is not handed out and cannot
- * be closed. Call it once for a disc: after about a thousand labels the process can open nothing
- * any more. (A program that is started does not inherit the descriptor.)
+ * be closed. Call it once for a disc: after about a thousand labels the process cannot open
+ * anything any more. (A program that is started does not inherit the descriptor.)
  *
  * What is read is not checked: other bytes than a label come out where sector 32 does not hold the
  * volume descriptor, and none where the device ends earlier. A label of 30 characters, the most
@@ -204,7 +204,7 @@ KZ_API int32_t kzbdfs_dirent_is_file(const kzbdfs_dirent* entry) KZ_NOEXCEPT;
 /**
  * kzbdfs_dirent_is_file() for directories.
  *
- * The name begins with bn where its sisters begin with kz. Programs link to it so.
+ * The name begins with bn where the others begin with kz; programs link to it under that name.
  */
 KZ_API int32_t bnbdfs_dirent_is_dir(const kzbdfs_dirent* entry) KZ_NOEXCEPT;
 
@@ -233,8 +233,9 @@ KZ_API kz_status kzbdfs_get_cert_filename(char* destination, uint32_t number,
 /**
  * "ROOT/AACS/".
  *
- * @return As its sisters; and KZ_DISC_ERROR_MEMORY when @p size is not above the text's length
- *         modulo 65536. Of a text longer than 65535 bytes 0 may be returned although it was cut.
+ * @return As the other builders; and KZ_DISC_ERROR_MEMORY when @p size is not above the text's
+ *         length modulo 65536. Of a text longer than 65535 bytes 0 may be returned although it was
+ *         cut.
  */
 KZ_API kz_status kzbdfs_get_cert_dirname(const char* root, char* destination,
                                          uint32_t size) KZ_NOEXCEPT;

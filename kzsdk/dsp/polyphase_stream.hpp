@@ -122,7 +122,7 @@ std::span<Sample> block(Sample* samples, uint32_t count) noexcept
     return {samples, samples == nullptr ? 0 : count};
 }
 
-/// The exported call of both twins: runs `resample` unless there is no resampler, and tells the
+/// The exported call of both twins: runs `resample` unless there is no resampler, and reports the
 /// counts to whoever asks.
 template <class Resampler, class Sample, class Resample>
 void resample_call(Resampler* r, std::span<const Sample> input, std::span<Sample> output,
