@@ -3,7 +3,7 @@
  * Extraction interface: audio in, query document out, whatever the algorithm.
  *
  * Order of calls: create; add audio, once or in pieces, until the complete flag is set; serialize;
- * serialize_free; free. The library must have been started (kzinit_initialize_vesk()).
+ * serialize_free; free. The library must have been started (kzsdk/abs/startup.h).
  *
  * What may be combined:
  *
@@ -167,7 +167,7 @@ KZ_API kz_status kz_fpx_fingerprint_get_progress(const kz_fpx_handle* handle,
 /**
  * Reports how many frames the next piece should have. A stream that is fed in exactly such pieces
  * gives the same document, to the bit, as one call with the whole of it; only the last piece may
- * be shorter.
+ * be shorter. A stream (kzsdk/stream/stream.h) is cut in this way by the library.
  *
  * @param[out] out_frames  Never 0. Below 150000 for rates up to 48000 Hz, about 3 s of audio in
  *                         general.
