@@ -22,6 +22,7 @@
 #include <type_traits>
 
 #include "kzsdk/abs/owned.hpp"
+#include "kzsdk/kernels/kernels.hpp"
 
 namespace kz::dsp {
 
@@ -86,6 +87,13 @@ bool make_history(Resampler& r) noexcept
     return true;
 }
 
+/// The walk of the outputs to come.
+template <class Resampler>
+kernels::PhaseWalk walk_of(const Resampler& r) noexcept
+{
+    return {r.up, r.down, r.phase};
+}
+
 /// Input samples that are still missing for the next output.
 template <class Resampler>
 uint32_t need(const Resampler& r) noexcept
@@ -100,14 +108,16 @@ uint32_t input_for(const Resampler& r, uint32_t outputs) noexcept
     if (copies(r)) {
         return outputs;
     }
-    return saturated_to_word(need(r) + (r.phase + uint64_t{outputs} * r.down) / r.up);
+    return saturated_to_word(need(r) + walk_of(r).window_after(outputs));
 }
 
 /// The phase after `outputs` more outputs.
 template <class Resampler>
 uint32_t phase_after(const Resampler& r, uint32_t outputs) noexcept
 {
-    return static_cast<uint32_t>((r.phase + uint64_t{outputs} * r.down) % r.up);
+    auto walk = walk_of(r);
+    walk.jump(outputs);
+    return walk.phase();
 }
 
 struct BlockCounts {
@@ -159,32 +169,16 @@ void keep_tail(Resampler& r, std::span<const Sample> tail) noexcept
     r.history_end += static_cast<uint32_t>(tail.size());
 }
 
-/// Moves the phase on by some outputs. It advances before the taps are read and the window moves
-/// after: each output is up to one input sample off its ideal time, and this is how the stream is
-/// defined.
+/// Moves the phase on by some outputs.
 ///
 /// @return How many samples the window moves.
 template <class Resampler>
 uint64_t advance(Resampler& r, size_t outputs) noexcept
 {
-    const uint64_t t = r.phase + uint64_t{outputs} * r.down;
-    r.phase = static_cast<uint32_t>(t % r.up);
-    return t / r.up;
-}
-
-/// Outputs whose windows begin before sample `end` of the first window.
-template <class Resampler>
-uint64_t outputs_beginning_before(const Resampler& r, uint64_t end) noexcept
-{
-    return (end * r.up - r.phase + r.down - 1) / r.down;
-}
-
-/// Outputs whose windows all lie in a block, of which `spare` samples are left behind the first
-/// window: output i needs (phase + i * down) / up of them.
-template <class Resampler>
-uint64_t outputs_inside(const Resampler& r, uint64_t spare) noexcept
-{
-    return ((spare + 1) * r.up - 1 - r.phase) / r.down + 1;
+    auto walk = walk_of(r);
+    walk.jump(outputs);
+    r.phase = walk.phase();
+    return walk.window();
 }
 
 /// Resamples one block.
@@ -210,8 +204,9 @@ BlockCounts resample_block(Resampler& r, std::span<const Sample> input, std::spa
         return taken;
     };
     if (pending != 0 && !left.empty() && needed <= available) {
+        const auto walk = walk_of(r);
         const auto outputs = take_outputs(
-            std::min(outputs_beginning_before(r, pending), outputs_inside(r, available - needed)));
+            std::min(walk.outputs_within(pending - 1), walk.outputs_within(available - needed)));
         across(std::span<const Sample>(r.history + r.history_start, static_cast<size_t>(pending)),
                input, r.phase, outputs);
         const uint64_t moved = advance(r, outputs.size());
@@ -225,7 +220,7 @@ BlockCounts resample_block(Resampler& r, std::span<const Sample> input, std::spa
         }
     }
     if (r.history_start == r.history_end && !left.empty() && needed <= available) {
-        const auto outputs = take_outputs(outputs_inside(r, available - needed));
+        const auto outputs = take_outputs(walk_of(r).outputs_within(available - needed));
         inside(input.data() + oldest, r.phase, outputs);
         const uint64_t moved = advance(r, outputs.size());
         needed += moved;

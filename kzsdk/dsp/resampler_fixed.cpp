@@ -112,13 +112,12 @@ void make_across(const KZDSP_resampler_fixed& r, const kz::kernels::PhaseRows& r
     const auto& variant = kz::kernels::active();
     const auto convolve = r.up == 1 ? variant.convolve_from_bit_32 : variant.convolve_from_bit_31;
     const kz::dsp::JoinedSamples<int32_t> joined(older, newer, r.taps_per_phase);
-    const int32_t* window = joined.begin();
+    kz::kernels::PhaseWalk walk(r.up, r.down, phase);
     for (int32_t& output : outputs) {
-        const uint32_t t = phase + r.down;
-        phase = t % r.up;
-        output = convolve(window, rows.taps + size_t{rows.row_of[phase]} * rows.row_length,
+        const size_t row = rows.row_of[walk.tap_phase()];
+        output = convolve(joined.begin() + walk.window(), rows.taps + row * rows.row_length,
                           rows.row_length);
-        window += t / r.up;
+        walk.advance();
     }
 }
 

@@ -114,17 +114,16 @@ kz::kernels::FloatPhases phases_of(const KZDSP_resampler& r) noexcept
 void make_across(const kz::kernels::FloatPhases& phases, Samples older, Samples newer,
                  uint32_t phase, std::span<float> outputs) noexcept
 {
-    size_t begin = 0; // of the window, in the history
+    kz::kernels::PhaseWalk walk(phases.up, phases.down, phase);
     for (float& output : outputs) {
-        const uint32_t t = phase + phases.down;
-        phase = t % phases.up;
-        const Samples rest = older.subspan(begin);
+        const Samples rest = older.subspan(static_cast<size_t>(walk.window()));
         const size_t fresh = phases.taps_per_phase - rest.size();
-        output = KZDSP_DualConvolve(
-            fresh == 0 ? nullptr : &newer[fresh - 1], static_cast<uint32_t>(fresh), &rest.back(),
-            static_cast<uint32_t>(rest.size()), phases.taps + phase * phases.phase_stride,
-            static_cast<uint32_t>(phases.tap_stride));
-        begin += t / phases.up;
+        output = KZDSP_DualConvolve(fresh == 0 ? nullptr : &newer[fresh - 1],
+                                    static_cast<uint32_t>(fresh), &rest.back(),
+                                    static_cast<uint32_t>(rest.size()),
+                                    phases.taps + walk.tap_phase() * phases.phase_stride,
+                                    static_cast<uint32_t>(phases.tap_stride));
+        walk.advance();
     }
 }
 

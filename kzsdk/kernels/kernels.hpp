@@ -14,6 +14,8 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "kzsdk/kernels/phase_walk.hpp"
+
 namespace kz::kernels {
 
 /// Makes one word of each frame of interleaved samples: the sum of its `channels` samples modulo

@@ -1,5 +1,6 @@
 /// @file
-/// Fixed-point polyphase filters in vectors.
+/// Fixed-point polyphase filters in vectors, bit-identical to the plain variant. Samples are Q29 or
+/// Q30 words, taps Q31.
 ///
 /// A product is defined by 16-bit halves. With the sample x = xh 2^16 + xl and the tap
 /// t = m 2^16 + l, the low halves being unsigned, each tap adds
@@ -14,24 +15,24 @@
 ///
 /// A itself fits a word: the tap that could make it 2^31 would need m = -2^15.
 ///
-/// Where no C of a block can leave the word, the multiples of 2^15 pass through the shift:
+/// Where no C of a block can wrap (no_cross_product_wraps()), the multiples of 2^15 pass through
+/// the shift:
 ///
 ///     2 m xh + (C >> 15) = 2 xh (m + u) + (A >> 15) + m
 ///
 /// so the last term is summed beforehand, and the first one takes one multiplication for two taps,
-/// with samples of 2 xh and taps of m + u in 16 bits. That holds while |xh| + max |m| <= 2^15, and
-/// 2 xh fits while -2^14 <= xh < 2^14: so it is for all mono sound, and for most other. What is
-/// louder takes the long way.
+/// with samples of 2 xh and taps of m + u in 16 bits. 2 xh fits while -2^14 <= xh < 2^14: so it is
+/// for all mono sound, and for most other. Louder blocks take the exact way.
 ///
-/// Sums are modulo 2^32 and may be taken in any order. Outputs one period of the phases apart have
-/// the same taps, which are then loaded once for all of them.
+/// Sums are modulo 2^32 and may be taken in any order.
 #pragma once
 
 #include <cstddef>
 #include <cstdint>
 
+#include "kzsdk/kernels/cross_products.hpp"
 #include "kzsdk/kernels/kernels.hpp"
-#include "kzsdk/kernels/resample_fixed_columns.hpp"
+#include "kzsdk/kernels/phase_walk.hpp"
 #include "kzsdk/kernels/tables.hpp"
 
 namespace {
@@ -54,8 +55,10 @@ struct SplitSamples {
     static constexpr size_t kMaxSamples = 4096 + 128;
     static constexpr size_t kPadding = 16; // read for the zeros at the end of a row
 
-    int32_t flipped[kMaxSamples + kPadding];       ///< with the top bit of the low half flipped
-    int16_t doubled_highs[kMaxSamples + kPadding]; ///< valid when the high halves have 15 bits
+    /// xl' and xh: each sample with the top bit of its low half flipped.
+    alignas(64) int32_t flipped[kMaxSamples + kPadding];
+    /// 2 xh, valid where the high halves fit 15 bits.
+    alignas(64) int16_t doubled_highs[kMaxSamples + kPadding];
 
     /// @return The largest high half, or the largest complement of a negative one.
     int32_t split(const int32_t* samples, size_t count) noexcept
@@ -90,6 +93,12 @@ struct SplitSamples {
         return loudest_left >> 16;
     }
 
+    /// Whether 2 xh fits 16 bits in all samples.
+    static constexpr bool doubled_highs_fit(int32_t loudest) noexcept
+    {
+        return loudest < (1 << 14);
+    }
+
 private:
     static constexpr int32_t kFlip = 0x8000;
 
@@ -99,178 +108,214 @@ private:
     }
 };
 
+/// The block is seen in columns of one period of the phases, `down` samples apart. Outputs at the
+/// same row of all columns have the same taps, which are loaded once for all of them:
+///
+///     samples   |<------ down ------>|<------ down ------>|<--- ...
+///     column    0                    1                    2
+///     row 0     [==taps==]           [==taps==]           [==taps==]
+///     row 1       [==taps==]           [==taps==]           [==taps==]
+///     ...
+///     row up-1         [==taps==]           [==taps==]       the last column ends early
+///
+/// Row i of column j is output i + j * up.
 template <class Simd>
 class Polyphase {
     using Ints = typename Simd::Ints;
     using Samples = SplitSamples<Simd>;
 
     static constexpr size_t kLanes = Simd::kLanes;
-    static constexpr uint32_t kAnyDown = 0;
 
-    // Where the next output is made.
-    struct Place {
-        uint32_t row;
-        uint32_t phase;
-        size_t window;
+    /// How the columns of a rate lie. With a distance that is known they need one address, not one
+    /// each, and more of them find registers.
+    ///
+    /// @tparam Down     Samples from column to column.
+    /// @tparam Most     Columns that take turns at a row of taps.
+    /// @tparam Aligned  All windows begin at an aligned sample, earlier by up to a vector, because
+    ///                  loads of 32 bytes often cross cache lines. It pays where rows are so long
+    ///                  that the zeros it adds to them cost less.
+    template <uint32_t Down, uint32_t Most, bool Aligned = false>
+    struct Layout {
+        static constexpr uint32_t kDown = Down;
+        static constexpr uint32_t kMaxColumns = Most;
+        static constexpr size_t kMaxBack = Aligned ? kLanes - 1 : 0;
+    };
+    static constexpr uint32_t kLongRow = kLanes == 8 ? 80 : UINT32_MAX;
+
+    /// The walk from output to output; tap rows are stored in the order in which it meets them.
+    class RowWalk {
+    public:
+        RowWalk(const kz::kernels::PhaseRows& rows, const kz::kernels::Windows& windows) noexcept
+            : walk_(rows.up, windows.down, windows.phase), up_(rows.up),
+              row_(rows.row_of[walk_.tap_phase()])
+        {
+        }
+
+        size_t window() const noexcept { return static_cast<size_t>(walk_.window()); }
+        uint32_t row() const noexcept { return row_; }
+
+        void advance() noexcept
+        {
+            walk_.advance();
+            row_ = row_ + 1 == up_ ? 0 : row_ + 1;
+        }
+
+    private:
+        kz::kernels::PhaseWalk walk_;
+        uint32_t up_;
+        uint32_t row_;
     };
 
 public:
     static void run(const kz::kernels::PhaseRows& rows, const kz::kernels::Windows& windows,
                     int32_t* output, uint32_t count) noexcept
     {
-        kz::kernels::Windows place = windows;
+        kz::kernels::PhaseWalk walk(rows.up, windows.down, windows.phase);
         while (count != 0) {
-            uint32_t made = run_columns_of(rows, place, output, count);
-            if (made == 0) {
-                made = Polyphase(rows, place).run_block(output, count);
-            }
-            const uint64_t next = place.phase + uint64_t{made} * place.down;
-            place.oldest += next / rows.up;
-            place.phase = static_cast<uint32_t>(next % rows.up);
+            kz::kernels::Windows next = windows;
+            next.oldest += walk.window();
+            next.phase = walk.phase();
+            const uint32_t made = Polyphase(rows, next).run_block(output, count);
+            walk.jump(made);
             output += made;
             count -= made;
         }
     }
 
 private:
-    // 0 if that would not pay, or not give the same words. Not inlined, so that both kinds of
-    // scratch are never on the stack together.
-    [[gnu::noinline]] static uint32_t run_columns_of(const kz::kernels::PhaseRows& rows,
-                                                     const kz::kernels::Windows& windows,
-                                                     int32_t* output, uint32_t count) noexcept
-    {
-        return PolyphaseColumns<Simd>::suits(rows, windows, count)
-                   ? PolyphaseColumns<Simd>(rows, windows).run(output, count)
-                   : 0;
-    }
-
     Polyphase(const kz::kernels::PhaseRows& rows, const kz::kernels::Windows& windows) noexcept
-        : rows_(rows), taps_(windows.taps), whole_step_(windows.down / rows.up),
-          phase_step_(windows.down % rows.up), down_(windows.down), phase_(windows.phase),
-          oldest_(windows.oldest)
+        : rows_(rows), windows_(windows)
     {
     }
 
     // As many outputs as the split samples can serve.
     [[gnu::noinline]] uint32_t run_block(int32_t* output, uint32_t count) noexcept
     {
-        const uint64_t room = Samples::kMaxSamples - taps_;
-        const uint64_t fitting = ((room + 1) * rows_.up - 1 - phase_) / down_ + 1;
+        const kz::kernels::PhaseWalk walk(rows_.up, windows_.down, windows_.phase);
+        const uint64_t fitting = walk.outputs_within(Samples::kMaxSamples - windows_.taps);
         const auto made = fitting < count ? static_cast<uint32_t>(fitting) : count;
-        const uint64_t last = phase_ + uint64_t{made - 1} * down_;
-        const int32_t loudest =
-            samples_.split(oldest_, static_cast<size_t>(last / rows_.up) + taps_);
-        const Place first{rows_.row_of[(phase_ + phase_step_) % rows_.up], phase_, 0};
-        if (loudest < (1 << 14) && loudest + rows_.largest_high < (1 << 15)) {
-            choose_quick(first, output, made);
+        const auto last_window = static_cast<size_t>(walk.window_after(made - 1));
+        const int32_t loudest = samples_.split(windows_.oldest, last_window + windows_.taps);
+        if (Samples::doubled_highs_fit(loudest) &&
+            kz::kernels::no_cross_product_wraps(loudest, rows_.largest_high)) {
+            choose_quick(output, made);
         } else {
-            run_exact(first, output, made);
+            run_exact(output, made);
         }
         return made;
     }
 
-    void advance(Place& place) const noexcept
-    {
-        place.window += whole_step_;
-        place.phase += phase_step_;
-        if (place.phase >= rows_.up) {
-            place.phase -= rows_.up;
-            ++place.window;
-        }
-        place.row = place.row + 1 == rows_.up ? 0 : place.row + 1;
-    }
-
     // ---- no sum of cross products can wrap
 
-    // With a distance that is known the columns need one address, not one each, and more of them
-    // find registers.
-    void choose_quick(Place first, int32_t* output, uint32_t count) noexcept
+    void choose_quick(int32_t* output, uint32_t count) noexcept
     {
-        switch (down_) {
+        switch (windows_.down) {
+        case 320:
+            return run_quick<Layout<320, 7>>(output, count);
         case 640:
-            return run_quick<640>(first, output, count);
+            return rows_.used < kLongRow ? run_quick<Layout<640, 7>>(output, count)
+                                         : run_quick<Layout<640, 7, true>>(output, count);
         case 1280:
-            return run_quick<1280>(first, output, count);
+            return run_quick<Layout<1280, 4>>(output, count);
         default:
-            return run_quick<kAnyDown>(first, output, count);
+            return run_exact(output, count);
         }
     }
 
-    // Column j are the outputs from j * up on. A row of taps serves one output of each column; the
-    // last column may be shorter than the others.
-    template <uint32_t Down>
-    void run_quick(Place first, int32_t* output, uint32_t count) noexcept
+    // As few passes as will do, each over about as many columns.
+    template <class Columns>
+    void run_quick(int32_t* output, uint32_t count) noexcept
     {
-        constexpr uint32_t kMaxColumns = Down == 640 ? 7 : 4;
         const uint32_t columns = (count + rows_.up - 1) / rows_.up;
-        const uint32_t passes = (columns + kMaxColumns - 1) / kMaxColumns;
+        const uint32_t passes = (columns + Columns::kMaxColumns - 1) / Columns::kMaxColumns;
         for (uint32_t pass = 0, done = 0; pass < passes; ++pass) {
             const uint32_t width = (columns - done + passes - pass - 1) / (passes - pass);
             const uint32_t left = count - done * rows_.up; // outputs of this and later columns
-            const uint32_t most = width * rows_.up;
-            const uint32_t in_all = left < most ? left - (width - 1) * rows_.up : rows_.up;
-            Place place = first;
-            place.window += size_t{done} * down_;
-            run_columns<Down, kMaxColumns>(width, place, output + size_t{done} * rows_.up, 0,
-                                           in_all);
-            run_columns<Down, kMaxColumns>(width - 1, place, output + size_t{done} * rows_.up,
-                                           in_all, rows_.up);
+            make_columns<Columns>(size_t{done} * Columns::kDown, width,
+                                  output + size_t{done} * rows_.up, left);
             done += width;
         }
     }
 
-    template <uint32_t Down, uint32_t Width>
-    void run_columns(uint32_t width, Place& place, int32_t* output, uint32_t from,
-                     uint32_t to) noexcept
+    // `width` columns from a sample on; the last one may be shorter than the others.
+    template <class Columns>
+    void make_columns(size_t first_sample, uint32_t width, int32_t* output, uint32_t left) noexcept
+    {
+        const uint32_t whole = width * rows_.up;
+        const uint32_t in_all = left < whole ? left - (width - 1) * rows_.up : rows_.up;
+        RowWalk walk(rows_, windows_);
+        choose_width<Columns, Columns::kMaxColumns>(width, first_sample, walk, output, {0, in_all});
+        choose_width<Columns, Columns::kMaxColumns>(width - 1, first_sample, walk, output,
+                                                    {in_all, rows_.up});
+    }
+
+    struct Range {
+        uint32_t from;
+        uint32_t to;
+    };
+
+    template <class Columns, uint32_t Width>
+    void choose_width(uint32_t width, size_t first_sample, RowWalk& walk, int32_t* output,
+                      Range range) const noexcept
     {
         if (width == Width) {
-            for (uint32_t i = from; i < to; ++i) {
-                int32_t sums[(Width + 3) / 4 * 4];
-                quick_sums<Down, Width>(place, sums);
-                for (size_t j = 0; j < Width; ++j) {
-                    output[i + j * rows_.up] = sums[j];
-                }
-                advance(place);
-            }
+            make_rows<Columns, Width>(first_sample, walk, output, range);
         } else if constexpr (Width > 1) {
-            run_columns<Down, Width - 1>(width, place, output, from, to);
+            choose_width<Columns, Width - 1>(width, first_sample, walk, output, range);
         }
     }
 
-    template <uint32_t Down, size_t Width>
-    void quick_sums(const Place& place, int32_t* results) const noexcept
+    template <class Columns, uint32_t Width>
+    void make_rows(size_t first_sample, RowWalk& next, int32_t* output, Range range) const noexcept
     {
-        const size_t down = Down == kAnyDown ? down_ : Down;
-        const size_t length = (rows_.used + kLanes - 1) / kLanes * kLanes;
-        const int32_t* taps = rows_.taps + size_t{place.row} * rows_.row_length;
-        const int16_t* highs = rows_.high_parts + size_t{place.row} * rows_.row_length;
-        const int32_t* flipped = samples_.flipped + place.window;
-        const int16_t* doubled = samples_.doubled_highs + place.window;
+        const size_t up = rows_.up;
+        RowWalk walk = next; // in registers
+        for (uint32_t i = range.from; i < range.to; ++i) {
+            int32_t sums[(Width + 3) / 4 * 4];
+            quick_sums<Columns, Width>(first_sample, walk, sums);
+            for (size_t j = 0; j < Width; ++j) {
+                output[i + j * up] = sums[j];
+            }
+            walk.advance();
+        }
+        next = walk;
+    }
+
+    template <class Columns, size_t Width>
+    [[gnu::always_inline]] void quick_sums(size_t first_sample, const RowWalk& walk,
+                                           int32_t* results) const noexcept
+    {
+        const size_t length = (rows_.used + Columns::kMaxBack + kLanes - 1) / kLanes * kLanes;
+        const size_t back = walk.window() & Columns::kMaxBack; // zeros precede the taps of a row
+        const size_t row = size_t{walk.row()} * rows_.row_length;
+        const int32_t* taps = rows_.taps + row - back;
+        const int16_t* highs = rows_.high_parts + row - back;
+        const int32_t* flipped = samples_.flipped + first_sample + walk.window() - back;
+        const int16_t* doubled = samples_.doubled_highs + first_sample + walk.window() - back;
         Ints sums[Width];
         for (Ints& sum : sums) {
             sum = Simd::set(0);
         }
         size_t k = 0;
         for (; k + 2 * kLanes <= length; k += 2 * kLanes) {
-            add_middles(sums, flipped + k, down, Simd::load(taps + k));
-            add_middles(sums, flipped + k + kLanes, down, Simd::load(taps + k + kLanes));
-            const Ints high_parts = Simd::load(highs + k);
-            for (size_t j = 0; j < Width; ++j) {
-                Simd::add_to(sums[j],
-                             Simd::pair_products(Simd::load(doubled + k + j * down), high_parts));
-            }
+            add_middles<Columns>(sums, flipped + k, Simd::load(taps + k));
+            add_middles<Columns>(sums, flipped + k + kLanes, Simd::load(taps + k + kLanes));
+            add_highs<Columns>(sums, doubled + k, Simd::load(highs + k));
         }
         if (k != length) {
-            add_middles(sums, flipped + k, down, Simd::load(taps + k));
+            add_middles<Columns>(sums, flipped + k, Simd::load(taps + k));
             for (size_t j = 0; j < Width; ++j) {
-                Simd::add_to(sums[j], Simd::half_pair_products(doubled + k + j * down, highs + k));
+                Simd::add_to(sums[j],
+                             Simd::half_pair_products(doubled + k + j * Columns::kDown, highs + k));
             }
         }
-        gather(sums, rows_.high_sums[place.row], results);
+        gather(sums, rows_.high_sums[walk.row()], results);
     }
 
+    // Adds up the lanes of each sum, four sums at a time.
     template <size_t Width>
-    static void gather(const Ints (&sums)[Width], int32_t offset, int32_t* results) noexcept
+    [[gnu::always_inline]] static void gather(const Ints (&sums)[Width], int32_t offset,
+                                              int32_t* results) noexcept
     {
         if constexpr (Width == 1) {
             results[0] = wrap_add(Simd::sum_of_lanes(sums[0]), offset);
@@ -284,30 +329,44 @@ private:
         }
     }
 
-    template <size_t Width>
-    static void add_middles(Ints (&sums)[Width], const int32_t* flipped, size_t down,
-                            Ints taps) noexcept
+    // A >> 15 of a vector of taps.
+    template <class Columns, size_t Width>
+    [[gnu::always_inline]] static void add_middles(Ints (&sums)[Width], const int32_t* flipped,
+                                                   Ints taps) noexcept
     {
         for (size_t j = 0; j < Width; ++j) {
-            const Ints middles = Simd::pair_products(Simd::load(flipped + j * down), taps);
+            const Ints middles =
+                Simd::pair_products(Simd::load(flipped + j * Columns::kDown), taps);
             Simd::add_to(sums[j], Simd::template shift_right<15>(middles));
+        }
+    }
+
+    // 2 xh (m + u) of two vectors of taps.
+    template <class Columns, size_t Width>
+    [[gnu::always_inline]] static void add_highs(Ints (&sums)[Width], const int16_t* doubled,
+                                                 Ints high_parts) noexcept
+    {
+        for (size_t j = 0; j < Width; ++j) {
+            Simd::add_to(sums[j],
+                         Simd::pair_products(Simd::load(doubled + j * Columns::kDown), high_parts));
         }
     }
 
     // ---- any samples
 
-    void run_exact(Place place, int32_t* output, uint32_t count) noexcept
+    void run_exact(int32_t* output, uint32_t count) noexcept
     {
+        RowWalk walk(rows_, windows_);
         for (uint32_t i = 0; i < count; ++i) {
-            output[i] = exact_sum(place);
-            advance(place);
+            output[i] = exact_sum(walk);
+            walk.advance();
         }
     }
 
-    int32_t exact_sum(const Place& place) const noexcept
+    int32_t exact_sum(const RowWalk& walk) const noexcept
     {
-        const int32_t* row = rows_.taps + size_t{place.row} * rows_.row_length;
-        const int32_t* flipped = samples_.flipped + place.window;
+        const int32_t* row = rows_.taps + size_t{walk.row()} * rows_.row_length;
+        const int32_t* flipped = samples_.flipped + walk.window();
         const Ints high_mask = Simd::set(-0x10000);
         Ints sum = Simd::set(0);
         for (size_t k = 0; k < rows_.used; k += kLanes) {
@@ -331,12 +390,7 @@ private:
     }
 
     const kz::kernels::PhaseRows& rows_;
-    const uint32_t taps_;
-    const uint32_t whole_step_;
-    const uint32_t phase_step_;
-    const uint32_t down_;
-    const uint32_t phase_;
-    const int32_t* const oldest_;
+    const kz::kernels::Windows windows_;
     Samples samples_;
 };
 

@@ -2,13 +2,12 @@
 /// The fixed-point decimators by 2 and by 4 in vectors: one lane per output.
 ///
 /// Two samples that mirror each other at the centre share a tap and are added first. With the sum
-/// s and the tap t in halves as in polyphase.hpp, the pair adds
+/// s and the tap t in halves as in resample_fixed_vector.hpp, the pair adds
 ///
 ///     m sh + (C >> 16),    C = A + 2^15 m + 2^16 u sh    (modulo 2^32)
 ///
-/// Where C cannot leave the word, that is while |sh| + max |m| <= 2^15, u sh passes through the
-/// shift and is added to m sh. 2^15 m does not, but A + 2^15 m stays in the word by itself, because
-/// no |m| is above 2^14.
+/// Where C cannot wrap (no_cross_product_wraps()), u sh passes through the shift and is added to
+/// m sh. 2^15 m does not, but A + 2^15 m stays in the word by itself, because no |m| is above 2^14.
 ///
 /// The centre tap is 2^31 / Down, a power of two: its product is a shift.
 ///
@@ -20,6 +19,7 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "kzsdk/kernels/cross_products.hpp"
 #include "kzsdk/kernels/kernels.hpp"
 #include "kzsdk/kernels/tables.hpp"
 
@@ -75,7 +75,7 @@ private:
                 const int32_t loudest = deinterleave(input, size_t{made - 1} * Down + kWindow);
                 // The high half of a sum of two, or its complement, is at most this.
                 const int32_t high = (loudest >> 15) + 1;
-                if (high + largest_high_ < (1 << 15)) {
+                if (kz::kernels::no_cross_product_wraps(high, largest_high_)) {
                     make<true>(output, made);
                 } else {
                     make<false>(output, made);

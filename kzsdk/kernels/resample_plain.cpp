@@ -2,6 +2,7 @@
 #include <cassert>
 
 #include "kzsdk/kernels/fxp_ops.hpp"
+#include "kzsdk/kernels/phase_walk.hpp"
 #include "kzsdk/kernels/plain.hpp"
 #include "kzsdk/kernels/tables.hpp"
 
@@ -83,19 +84,14 @@ int32_t convolve(const int32_t* samples, const int32_t* row, uint32_t count) noe
 
 } // namespace
 
-// The phase advances before the taps are read and the window moves after: each output is up to one
-// input sample off its ideal time, and this is how the stream is defined.
 void polyphase(const PhaseRows& rows, const Windows& windows, int32_t* output,
                uint32_t count) noexcept
 {
-    const int32_t* window = windows.oldest;
-    uint32_t phase = windows.phase;
+    PhaseWalk walk(rows.up, windows.down, windows.phase);
     for (uint32_t i = 0; i < count; ++i) {
-        const uint32_t t = phase + windows.down;
-        phase = t % rows.up;
-        const int32_t* row = rows.taps + size_t{rows.row_of[phase]} * rows.row_length;
-        output[i] = phase_sum(window, row, windows.taps);
-        window += t / rows.up;
+        const int32_t* row = rows.taps + size_t{rows.row_of[walk.tap_phase()]} * rows.row_length;
+        output[i] = phase_sum(windows.oldest + walk.window(), row, windows.taps);
+        walk.advance();
     }
 }
 
@@ -122,12 +118,12 @@ void polyphase_floats(const FloatPhases& phases, const float* oldest, uint32_t p
                       uint32_t count) noexcept
 {
     const float* newest = oldest + phases.taps_per_phase - 1;
+    PhaseWalk walk(phases.up, phases.down, phase);
     for (uint32_t i = 0; i < count; ++i) {
-        const uint32_t t = phase + phases.down;
-        phase = t % phases.up;
-        output[i] = add_products(0.0F, newest, phases.taps + phase * phases.phase_stride,
+        output[i] = add_products(0.0F, newest + walk.window(),
+                                 phases.taps + walk.tap_phase() * phases.phase_stride,
                                  phases.taps_per_phase, phases.tap_stride);
-        newest += t / phases.up;
+        walk.advance();
     }
 }
 

@@ -1,7 +1,7 @@
 /// @file
 /// Both twins' fast cosine transform in vectors, for the lengths that fingerprints use.
 ///
-/// It runs the very butterflies and additions of plain_transform.cpp, each lane doing what one turn
+/// It runs the very butterflies and additions of transform_plain.cpp, each lane doing what one turn
 /// of the plain loop does, in another order and with less traffic:
 ///
 /// - The input's three reorderings are one: even samples forwards, then odd samples backwards.
@@ -32,8 +32,9 @@ struct FixedButterflies {
     template <int Stage, bool First>
     static void run(Lanes& a, Lanes& b, Lanes factor) noexcept
     {
+        constexpr int kShift = First ? 30 : 32 - Stage; // the factor's fraction bits
         const Lanes sum = Simd::add(a, b);
-        b = Simd::template product_bits < First ? 30 : 32 - Stage > (Simd::sub(a, b), factor);
+        b = Simd::template product_bits<kShift>(Simd::sub(a, b), factor);
         a = First ? Simd::template shift_right<1>(sum) : sum;
     }
 

@@ -46,10 +46,10 @@ struct Avx2 {
     {
         _mm256_storeu_si256(reinterpret_cast<__m256i*>(to), v);
     }
-    /// The low 16 bits of the lanes of both.
+    /// The lanes of both in 16 bits; what does not fit them gives any number.
     static void store_narrow(int16_t* to, Ints a, Ints b) noexcept
     {
-        const Ints packed = _mm256_packs_epi32(truncated_to_shorts(a), truncated_to_shorts(b));
+        const Ints packed = _mm256_packs_epi32(a, b);
         _mm256_storeu_si256(reinterpret_cast<__m256i*>(to),
                             _mm256_permute4x64_epi64(packed, 0b11011000));
     }
@@ -366,7 +366,7 @@ struct Avx2 {
     }
 
     /// Lane j of vector i becomes lane i of vector j.
-    static void transpose(Ints (&v)[kLanes]) noexcept
+    [[gnu::always_inline]] static void transpose(Ints (&v)[kLanes]) noexcept
     {
         Floats f[kLanes];
         for (size_t i = 0; i < kLanes; ++i) {
@@ -377,7 +377,7 @@ struct Avx2 {
             v[i] = _mm256_castps_si256(f[i]);
         }
     }
-    static void transpose(Floats (&v)[kLanes]) noexcept
+    [[gnu::always_inline]] static void transpose(Floats (&v)[kLanes]) noexcept
     {
         Floats pairs[kLanes];
         for (size_t i = 0; i < kLanes; i += 2) {
@@ -446,10 +446,6 @@ private:
         const Ints ab = add(_mm256_unpacklo_epi32(a, b), _mm256_unpackhi_epi32(a, b));
         const Ints cd = add(_mm256_unpacklo_epi32(c, d), _mm256_unpackhi_epi32(c, d));
         return add(_mm256_unpacklo_epi64(ab, cd), _mm256_unpackhi_epi64(ab, cd));
-    }
-    static Ints truncated_to_shorts(Ints v) noexcept
-    {
-        return _mm256_srai_epi32(_mm256_slli_epi32(v, 16), 16);
     }
     static Ints odd_lanes(Ints v) noexcept
     {

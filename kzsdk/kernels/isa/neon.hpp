@@ -39,7 +39,7 @@ struct Neon {
         return vreinterpretq_s32_u8(vld1q_u8(from));
     }
     static void store(int16_t* to, Ints v) noexcept { vst1q_s16(to, vreinterpretq_s16_s32(v)); }
-    /// The low 16 bits of the lanes of both.
+    /// The lanes of both in 16 bits; what does not fit them gives any number.
     static void store_narrow(int16_t* to, Ints a, Ints b) noexcept
     {
         vst1q_s16(to, vcombine_s16(vmovn_s32(a), vmovn_s32(b)));
@@ -311,7 +311,7 @@ struct Neon {
     }
 
     /// Lane j of vector i becomes lane i of vector j.
-    static void transpose(Ints (&v)[kLanes]) noexcept
+    [[gnu::always_inline]] static void transpose(Ints (&v)[kLanes]) noexcept
     {
         const int32x4x2_t first = vtrnq_s32(v[0], v[1]);
         const int32x4x2_t second = vtrnq_s32(v[2], v[3]);
@@ -320,7 +320,7 @@ struct Neon {
         v[2] = vcombine_s32(vget_high_s32(first.val[0]), vget_high_s32(second.val[0]));
         v[3] = vcombine_s32(vget_high_s32(first.val[1]), vget_high_s32(second.val[1]));
     }
-    static void transpose(Floats (&v)[kLanes]) noexcept
+    [[gnu::always_inline]] static void transpose(Floats (&v)[kLanes]) noexcept
     {
         Ints ints[kLanes];
         for (size_t i = 0; i < kLanes; ++i) {

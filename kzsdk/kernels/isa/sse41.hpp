@@ -46,11 +46,10 @@ struct Sse41 {
     {
         _mm_storeu_si128(reinterpret_cast<__m128i*>(to), v);
     }
-    /// The low 16 bits of the lanes of both.
+    /// The lanes of both in 16 bits; what does not fit them gives any number.
     static void store_narrow(int16_t* to, Ints a, Ints b) noexcept
     {
-        _mm_storeu_si128(reinterpret_cast<__m128i*>(to),
-                         _mm_packs_epi32(truncated_to_shorts(a), truncated_to_shorts(b)));
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(to), _mm_packs_epi32(a, b));
     }
 
     static Ints mul(Ints a, Ints b) noexcept { return _mm_mullo_epi32(a, b); }
@@ -328,7 +327,7 @@ struct Sse41 {
     }
 
     /// Lane j of vector i becomes lane i of vector j.
-    static void transpose(Ints (&v)[kLanes]) noexcept
+    [[gnu::always_inline]] static void transpose(Ints (&v)[kLanes]) noexcept
     {
         Floats f[kLanes];
         for (size_t i = 0; i < kLanes; ++i) {
@@ -339,7 +338,7 @@ struct Sse41 {
             v[i] = _mm_castps_si128(f[i]);
         }
     }
-    static void transpose(Floats (&v)[kLanes]) noexcept
+    [[gnu::always_inline]] static void transpose(Floats (&v)[kLanes]) noexcept
     {
         _MM_TRANSPOSE4_PS(v[0], v[1], v[2], v[3]);
     }
@@ -373,10 +372,6 @@ struct Sse41 {
     }
 
 private:
-    static Ints truncated_to_shorts(Ints v) noexcept
-    {
-        return _mm_srai_epi32(_mm_slli_epi32(v, 16), 16);
-    }
     static Ints odd_lanes(Ints v) noexcept
     {
         return _mm_castps_si128(_mm_movehdup_ps(_mm_castsi128_ps(v)));
