@@ -225,8 +225,6 @@ void convert_frames(Encoding encoding, const uint8_t* at, size_t frames, Word* o
 
 // ---- any number of channels
 
-constexpr size_t kMaxChannels = 512;
-
 template <size_t Count>
 struct OnesThenZeros {
     int16_t of[2 * Count];
@@ -244,12 +242,9 @@ template <class Simd>
 class Rows {
     using Ints = typename Simd::Ints;
 
-    static constexpr size_t kLanes = Simd::kLanes;
-    static constexpr size_t kStep = 2 * kLanes; ///< samples of a vector
-    static constexpr size_t kMaxSamples = kMaxChannels * kLanes;
-    static constexpr size_t kMaxFrames = kMaxSamples / 2;
-
 public:
+    static constexpr size_t kMaxChannels = 512;
+
     explicit Rows(size_t channels) noexcept
         : channels_(channels), whole_((channels - 1) / kStep * kStep),
           rest_(Simd::load(kOnes.of + kStep - (channels - whole_)))
@@ -283,6 +278,11 @@ public:
     }
 
 private:
+    static constexpr size_t kLanes = Simd::kLanes;
+    static constexpr size_t kStep = 2 * kLanes; ///< samples of a vector
+    static constexpr size_t kMaxSamples = kMaxChannels * kLanes;
+    static constexpr size_t kMaxFrames = kMaxSamples / 2;
+
     /// Writes `count` samples and, behind them, zeros for one vector.
     template <class Encoding>
     void spell_out(const Encoding& encoding, const uint8_t* at, size_t count) noexcept
@@ -349,16 +349,13 @@ bool convert(const Encoding& encoding, int32_t channels, const void* input, Word
         convert_frames<2>(encoding, at, count, output, finish);
     } else if (channels == 4) {
         convert_frames<4>(encoding, at, count, output, finish);
-    } else if (channels > 0 && static_cast<uint32_t>(channels) <= kMaxChannels) {
+    } else if (channels > 0 && static_cast<uint32_t>(channels) <= Rows<Simd>::kMaxChannels) {
         convert_rows(encoding, static_cast<uint32_t>(channels), at, count, output, finish);
     } else {
         return false;
     }
     return true;
 }
-
-constexpr kz::g711::LawParts kALawParts = kz::g711::alaw_parts();
-constexpr kz::g711::LawParts kULawParts = kz::g711::ulaw_parts();
 
 template <class Simd>
 Pcm16<Simd> pcm16() noexcept
@@ -375,13 +372,15 @@ Pcm8<Simd> pcm8() noexcept
 template <class Simd>
 Companded<Simd> alaw() noexcept
 {
-    return Companded<Simd>(kALawParts);
+    static constexpr kz::g711::LawParts kParts = kz::g711::alaw_parts();
+    return Companded<Simd>(kParts);
 }
 
 template <class Simd>
 Companded<Simd> ulaw() noexcept
 {
-    return Companded<Simd>(kULawParts);
+    static constexpr kz::g711::LawParts kParts = kz::g711::ulaw_parts();
+    return Companded<Simd>(kParts);
 }
 
 template <class Simd, auto kEncoding, kz::kernels::ToWords* kPlain, bool kRunning = false>
