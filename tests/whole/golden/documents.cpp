@@ -157,6 +157,97 @@ void add_documents(Lines& lines)
     }
 }
 
+// ---- streams
+
+struct StreamKind {
+    const char* name;
+    uint32_t format;
+    uint32_t rate;
+    uint32_t channels;
+};
+
+// What only a stream takes: wide samples, many channels, high rates.
+constexpr StreamKind kStreams[] = {
+    {"s24", KZ_STREAM_FORMAT_PCM24, 88200, 1},      {"s32", KZ_STREAM_FORMAT_PCM32, 22050, 2},
+    {"f32", KZ_STREAM_FORMAT_FLOAT32, 96000, 2},    {"f64", KZ_STREAM_FORMAT_FLOAT64, 11025, 3},
+    {"linear8", KZ_STREAM_FORMAT_LINEAR8, 8000, 2}, {"alaw", KZ_STREAM_FORMAT_ALAW, 16000, 5},
+    {"ulaw", KZ_STREAM_FORMAT_ULAW, 64000, 1},      {"s16", KZ_STREAM_FORMAT_PCM16, 192000, 1},
+};
+
+template <class Sample>
+void append(std::vector<uint8_t>& bytes, Sample sample)
+{
+    const auto held = std::bit_cast<std::array<uint8_t, sizeof(Sample)>>(sample);
+    bytes.insert(bytes.end(), held.begin(), held.end());
+}
+
+// With bits below the 16 that are kept, so that these are rounded too.
+void append_wide(std::vector<uint8_t>& bytes, uint32_t format, int16_t sample)
+{
+    const int32_t wide = sample * 65536 + (sample & 0xff) * 251;
+    switch (format) {
+    case KZ_STREAM_FORMAT_PCM24: {
+        const auto held = std::bit_cast<std::array<uint8_t, 4>>(wide);
+        const auto* const first =
+            held.begin() + (std::endian::native == std::endian::little ? 1 : 0);
+        bytes.insert(bytes.end(), first, first + 3);
+        break;
+    }
+    case KZ_STREAM_FORMAT_PCM32:
+        append(bytes, wide);
+        break;
+    case KZ_STREAM_FORMAT_FLOAT32:
+        append(bytes, static_cast<float>(wide) / 0x1p31F);
+        break;
+    case KZ_STREAM_FORMAT_FLOAT64:
+        append(bytes, wide / 0x1p31);
+        break;
+    case KZ_STREAM_FORMAT_PCM16:
+        append(bytes, sample);
+        break;
+    default:
+        bytes.push_back(static_cast<uint8_t>(static_cast<uint16_t>(sample) >> 8));
+    }
+}
+
+std::string outcome_of_stream(const StreamKind& kind, const std::vector<uint8_t>& bytes)
+{
+    kz_stream_settings settings;
+    kz_stream* stream = nullptr;
+    kz_stream_initialize_settings(&settings);
+    settings.format = kind.format;
+    settings.sample_rate = kind.rate;
+    settings.channels = kind.channels;
+    kz_status status = kz_stream_create(&settings, &stream);
+    uint8_t complete = 0;
+    if (status == KZ_OK) {
+        status = kz_stream_feed(stream, bytes.data(), bytes.size(), nullptr, &complete);
+    }
+    const char* text = nullptr;
+    if (status == KZ_OK) {
+        status = kz_stream_get_document(stream, &text);
+    }
+    Digest digest;
+    if (status == KZ_OK) {
+        digest.take(text);
+    }
+    kz_stream_free(&stream);
+    return status == KZ_OK ? digest.text() : status_text(status);
+}
+
+void add_streams(Lines& lines)
+{
+    for (const StreamKind& kind : kStreams) {
+        std::vector<uint8_t> bytes;
+        for (const int16_t sample : kMusic.make(kind.rate, kind.channels)) {
+            append_wide(bytes, kind.format, sample);
+        }
+        lines.push_back("stream fixed " + std::to_string(kind.rate) + ' ' +
+                        std::to_string(kind.channels) + ' ' + kind.name + " music " +
+                        outcome_of_stream(kind, bytes));
+    }
+}
+
 // ---- what rests on sine and cosine
 
 void add_factors(Lines& lines)
@@ -212,6 +303,7 @@ int main(int argc, char** argv)
     add_factors(lines);
     add_filters(lines);
     add_documents(lines);
+    add_streams(lines);
     int result = 0;
     if (argc > 1) {
         result = compare(lines, argv[1]);
