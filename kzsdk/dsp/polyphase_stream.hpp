@@ -26,17 +26,20 @@
 
 namespace kz::dsp {
 
+/// A length that does not fit 32 bits counts as 2^32 - 1.
 constexpr uint32_t saturated_to_word(uint64_t value) noexcept
 {
     return static_cast<uint32_t>(std::min<uint64_t>(value, std::numeric_limits<uint32_t>::max()));
 }
 
+/// Outputs that `count` more inputs yield at most.
 template <class Resampler>
 uint32_t resampled_length(const Resampler& r, uint32_t count) noexcept
 {
     return saturated_to_word(uint64_t{count} * r.up / r.down);
 }
 
+/// Inputs that `count` outputs need.
 template <class Resampler>
 uint32_t raw_length(const Resampler& r, uint32_t count) noexcept
 {
@@ -44,6 +47,7 @@ uint32_t raw_length(const Resampler& r, uint32_t count) noexcept
     return saturated_to_word((uint64_t{count} * r.down + r.up - 1) / r.up);
 }
 
+/// Whether samples pass unchanged. Then there are neither taps nor a history.
 template <class Resampler>
 bool copies(const Resampler& r) noexcept
 {
@@ -120,6 +124,7 @@ uint32_t phase_after(const Resampler& r, uint32_t outputs) noexcept
     return walk.phase();
 }
 
+/// Samples taken from the input and written to the output.
 struct BlockCounts {
     uint32_t consumed;
     uint32_t produced;
@@ -133,7 +138,7 @@ std::span<Sample> block(Sample* samples, uint32_t count) noexcept
 }
 
 /// The exported call of both twins: runs `resample` unless there is no resampler, and reports the
-/// counts to whoever asks.
+/// counts unless the caller passed null for them.
 template <class Resampler, class Sample, class Resample>
 void resample_call(Resampler* r, std::span<const Sample> input, std::span<Sample> output,
                    uint32_t* consumed, uint32_t* produced, Resample resample) noexcept
@@ -147,6 +152,7 @@ void resample_call(Resampler* r, std::span<const Sample> input, std::span<Sample
     }
 }
 
+/// As many samples as there are and fit.
 template <class Sample>
 BlockCounts copy_block(std::span<const Sample> input, std::span<Sample> output) noexcept
 {
@@ -155,7 +161,8 @@ BlockCounts copy_block(std::span<const Sample> input, std::span<Sample> output) 
     return {count, count};
 }
 
-/// Drops the samples before `history_start` and appends `tail`.
+/// Drops the samples before `history_start` and appends `tail`: what the next block still needs.
+/// That is never more than a window, so it always fits.
 template <class Resampler, class Sample>
 void keep_tail(Resampler& r, std::span<const Sample> tail) noexcept
 {
@@ -181,7 +188,8 @@ uint64_t advance(Resampler& r, size_t outputs) noexcept
     return walk.window();
 }
 
-/// Resamples one block.
+/// Resamples one block: first the outputs whose windows begin in the history, then those inside the
+/// block, as long as both input and room last.
 ///
 /// @param across  (samples of the history, samples of the block, phase, outputs): all outputs whose
 ///                windows begin in the history; the two runs of samples follow each other.
@@ -232,7 +240,8 @@ BlockCounts resample_block(Resampler& r, std::span<const Sample> input, std::spa
     return {static_cast<uint32_t>(consumed), static_cast<uint32_t>(output.size() - left.size())};
 }
 
-/// The samples of all windows that begin in a history, in one run.
+/// The samples of all windows that begin in a history, in one run: the pending ones and at most P
+/// of the block.
 template <class Sample>
 class JoinedSamples {
 public:

@@ -1,3 +1,10 @@
+/// @file
+/// The fixed-point resampler: seven rates to 11025 Hz, halving of any rate, and copying.
+///
+/// Samples are Q29 or Q30 words, taps Q31 words in two 16-bit halves; a product of the two is taken
+/// from bit 31 on, which keeps the samples' format, or for L = 1 from bit 32 on, which halves the
+/// level. Sums wrap. Windows that reach into the history take exact products, those inside a block
+/// the rounding of the kernels, so a cut may show in the last bits.
 #include "kzsdk/dsp/resampler.h"
 
 #include <span>
@@ -12,6 +19,8 @@ namespace {
 
 using namespace kz::fxp;
 
+/// A ratio that has a filter: its rates in whole hertz, L, M, and the taps in two forms. The halves
+/// are what callers can read; the rows are what the loops read, phase by phase.
 struct RatePair {
     uint32_t input_rate;
     uint32_t output_rate;
@@ -25,6 +34,7 @@ struct RatePair {
 
 constexpr RatePair kCopy{1, 1, 1, 1, nullptr, nullptr, nullptr, nullptr};
 
+// Searched in this order.
 constexpr RatePair kRatePairs[] = {
     kCopy,
     {48000, 11025, 147, 640, kzdsp_get_48000_11025_fixed_coeff_msb,
@@ -52,6 +62,8 @@ constexpr RatePair kRatePairs[] = {
      &kz::kernels::rows_8000},
 };
 
+/// Null for a rate of 0 and for different rates that the table does not have. Equal rates copy,
+/// even where the table has neither.
 const RatePair* find_rate_pair(uint32_t input_rate, uint32_t output_rate) noexcept
 {
     if (input_rate == 0 || output_rate == 0) {
@@ -67,20 +79,23 @@ const RatePair* find_rate_pair(uint32_t input_rate, uint32_t output_rate) noexce
 
 using Samples = std::span<const int32_t>;
 
+/// Taps in halves, tap i at i * stride: msb * 2^16 + lsb, Q31.
 struct Taps {
     const int16_t* msb;
     const uint16_t* lsb;
     uint32_t stride;
 };
 
-// Products of the samples, newest first, with the taps from `first_tap` on.
+// Adds the products of the samples, newest first, and the taps from `first_tap` on to a sum. Each
+// product is exact and rounded down to the bits from 32 - shift up. Under the rule for shift counts
+// a shift of 0 adds the high words, since the low ones are shifted out.
 int32_t add_products(int32_t sum, Samples samples, const Taps& taps, size_t first_tap,
                      int32_t shift) noexcept
 {
     for (size_t k = 0; k < samples.size(); ++k) {
         const size_t i = (first_tap + k) * taps.stride;
-        const int32_t tap = (taps.msb[i] * 65536) | taps.lsb[i];
-        const int64_t product = smul(samples[samples.size() - 1 - k], tap);
+        const int32_t tap_q31 = (taps.msb[i] * 65536) | taps.lsb[i];
+        const int64_t product = smul(samples[samples.size() - 1 - k], tap_q31);
         const auto high = static_cast<uint32_t>(static_cast<uint64_t>(product) >> 32);
         const auto low = static_cast<uint32_t>(low_word(product));
         const uint32_t shifted = wrap_add(shift_left(high, shift), shift_right(low, 32 - shift));
@@ -89,12 +104,14 @@ int32_t add_products(int32_t sum, Samples samples, const Taps& taps, size_t firs
     return sum;
 }
 
+// One sum over two runs; the taps go on where the newer run ends.
 int32_t dual_convolve(Samples newer, Samples older, const Taps& taps, int32_t shift) noexcept
 {
     const int32_t sum = add_products(0, newer, taps, 0, shift);
     return add_products(sum, older, taps, newer.size(), shift);
 }
 
+// Found by the ratio: the record is public and has no room for a pointer to its row.
 const kz::kernels::PhaseRows& rows_of(const KZDSP_resampler_fixed& r) noexcept
 {
     for (const RatePair& pair : kRatePairs) {
@@ -105,7 +122,9 @@ const kz::kernels::PhaseRows& rows_of(const KZDSP_resampler_fixed& r) noexcept
     return *kRatePairs[1].rows; // not reached: every resampler is made from the table
 }
 
-// Windows that reach into the history: each product is exact.
+// Outputs whose windows reach into the history: each product is exact, and taken from bit 31 on, or
+// from bit 32 on when decimating by a whole number. The few samples that such windows touch are
+// copied into one run first.
 void make_across(const KZDSP_resampler_fixed& r, const kz::kernels::PhaseRows& rows, Samples older,
                  Samples newer, uint32_t phase, std::span<int32_t> outputs) noexcept
 {
@@ -121,6 +140,7 @@ void make_across(const KZDSP_resampler_fixed& r, const kz::kernels::PhaseRows& r
     }
 }
 
+// One block: outputs across the cut by make_across(), those inside by the kernel for the ratio.
 kz::dsp::BlockCounts resample(KZDSP_resampler_fixed& r, Samples input,
                               std::span<int32_t> output) noexcept
 {
@@ -143,6 +163,7 @@ kz::dsp::BlockCounts resample(KZDSP_resampler_fixed& r, Samples input,
 
 } // namespace
 
+// Rates are Q15; their fractions are dropped.
 KZDSP_resampler_fixed* KZDSP_resampler_fixed_create(uint32_t input_rate,
                                                     uint32_t output_rate) noexcept
 {
@@ -210,6 +231,7 @@ FxpType KZDSP_DualConvolveFixed(const FxpType* first, uint32_t first_count, cons
         (second == nullptr && second_count != 0)) {
         return 0;
     }
+    // The pointers are those of the newest samples; a run begins at its oldest.
     const Samples newer(first_count == 0 ? nullptr : first - (first_count - 1), first_count);
     const Samples older(second_count == 0 ? nullptr : second - (second_count - 1), second_count);
     return dual_convolve(newer, older, {msb, lsb, stride}, shift);

@@ -1,3 +1,9 @@
+/// @file
+/// The floating-point resampler: any ratio of two rates that a filter can be designed for.
+///
+/// Everything is single precision. An output is one sum over P products, newest sample first, each
+/// product and each sum rounded: the order is the same across a cut and inside a block, so cuts do
+/// not show. Upsampling gains L / M.
 #include <limits>
 #include <memory>
 #include <span>
@@ -14,11 +20,14 @@ namespace {
 
 constexpr double kTolerance = 1e-6; // relative
 
+// Finite and above 0; NaN is neither. Two negative rates would have a quotient, but are refused.
 bool is_rate(float hertz) noexcept
 {
     return hertz > 0 && hertz <= std::numeric_limits<float>::max();
 }
 
+// L / M is the first convergent of the quotient's continued fraction that lies within one part in a
+// million. Rates that are closer than that count as equal.
 void set_ratio(KZDSP_resampler& r, float input_rate, float output_rate) noexcept
 {
     const double ratio = output_rate / input_rate; // rounded to single precision first
@@ -29,6 +38,7 @@ void set_ratio(KZDSP_resampler& r, float input_rate, float output_rate) noexcept
     r.down = static_cast<uint32_t>(down);
 }
 
+// The two stored filters belong to the library, not to the resampler.
 template <size_t Length>
 bool use_stored(KZDSP_resampler& r, const float (&taps)[Length]) noexcept
 {
@@ -37,6 +47,8 @@ bool use_stored(KZDSP_resampler& r, const float (&taps)[Length]) noexcept
     return true;
 }
 
+// The ratios of the fixed-point resampler were designed when the library was built; null for
+// others.
 const kz::kernels::DesignedFilter* find_designed(const KZDSP_resampler& r) noexcept
 {
     for (const kz::kernels::DesignedFilter& filter : kz::kernels::designed_filters) {
@@ -47,7 +59,7 @@ const kz::kernels::DesignedFilter* find_designed(const KZDSP_resampler& r) noexc
     return nullptr;
 }
 
-// Lays the taps of all phases together again: what design_windowed_sinc() would write.
+// Interleaves the taps, which are stored phase by phase: what design_windowed_sinc() would write.
 void copy_designed(const kz::kernels::DesignedFilter& filter, float* taps) noexcept
 {
     const float* tap = filter.taps;
@@ -58,12 +70,14 @@ void copy_designed(const kz::kernels::DesignedFilter& filter, float* taps) noexc
     }
 }
 
-// A factor of 0 says that the rates have no ratio.
+// A factor of 0 means that no fraction was found.
 bool is_designable(uint32_t factor) noexcept
 {
     return factor != 0 && factor <= KZDSP_LARGEST_FACTOR;
 }
 
+// Gives the resampler taps of its own. False when memory is short, which a filter beyond the
+// largest factor counts as.
 bool design(KZDSP_resampler& r) noexcept
 {
     if (!is_designable(r.up) || !is_designable(r.down)) {
@@ -85,6 +99,7 @@ bool design(KZDSP_resampler& r) noexcept
     return true;
 }
 
+// Equal rates need none; decimation by 4 and by 2 has stored filters; all others are designed.
 bool choose_filter(KZDSP_resampler& r) noexcept
 {
     if (kz::dsp::copies(r)) {
@@ -101,7 +116,8 @@ bool choose_filter(KZDSP_resampler& r) noexcept
 
 using Samples = std::span<const float>;
 
-// Shared tables serve better than the taps of the resampler, which are interleaved phase by phase.
+// The taps as the kernels read them. Tables shared by all resamplers have the taps of a phase side
+// by side and are faster to read than a resampler's own taps, where those are L apart.
 kz::kernels::FloatPhases phases_of(const KZDSP_resampler& r) noexcept
 {
     if (const kz::kernels::DesignedFilter* filter = find_designed(r)) {
@@ -110,7 +126,7 @@ kz::kernels::FloatPhases phases_of(const KZDSP_resampler& r) noexcept
     return {r.taps, 1, r.up, r.taps_per_phase, r.up, r.down};
 }
 
-// Windows that reach into the history and are too long to be joined.
+// Outputs whose windows reach into the history and are too long to be copied into one run.
 void make_across(const kz::kernels::FloatPhases& phases, Samples older, Samples newer,
                  uint32_t phase, std::span<float> outputs) noexcept
 {
