@@ -48,12 +48,24 @@ std::string expected_document(Format format, uint32_t rate, Channels channels,
     return document_of(handle.get());
 }
 
+/// How a WAVE header describes samples.
+struct Wave {
+    int32_t code;
+    int32_t bits;
+};
+constexpr Wave kPcm8 = {1, 8};
+constexpr Wave kPcm16 = {1, 16};
+constexpr Wave kPcm24 = {1, 24};
+constexpr Wave kPcmOfNoBits = {1, 0};
+constexpr Wave kALaw = {6, 8};
+constexpr Wave kULaw = {7, 8};
+
 /// The code that a job returns, and what it wrote.
-std::pair<int32_t, std::string> run(uint32_t rate, int32_t channels, int32_t code, int32_t bits,
+std::pair<int32_t, std::string> run(uint32_t rate, Channels channels, const Wave& wave,
                                     const std::vector<uint8_t>& audio)
 {
     Fingerprint job;
-    job.setGenerateConfig(rate, channels, code, bits, audio.data(),
+    job.setGenerateConfig(rate, static_cast<int32_t>(channels), wave.code, wave.bits, audio.data(),
                           static_cast<uint32_t>(audio.size()));
     std::array<char, 601> buffer = {};
     char* start = buffer.data();
@@ -71,38 +83,38 @@ protected:
 TEST_F(Music, GivesTheDocumentOfTheExtractionInterface)
 {
     const std::string document = expected_document(pcm16, 11025, mono, music());
-    EXPECT_EQ((Outcome{0, document}), run(11025, 1, 1, 16, music()));
+    EXPECT_EQ((Outcome{0, document}), run(11025, mono, kPcm16, music()));
     EXPECT_LT(document.size(), 600U);
 }
 
 TEST_F(Music, RunsEveryEncodingThatHasAnInputFormat)
 {
     EXPECT_EQ((Outcome{0, expected_document(pcm8, 11025, mono, music())}),
-              run(11025, 1, 1, 8, music()));
+              run(11025, mono, kPcm8, music()));
     EXPECT_EQ((Outcome{0, expected_document(alaw, 11025, mono, music())}),
-              run(11025, 1, 6, 8, music()));
+              run(11025, mono, kALaw, music()));
     EXPECT_EQ((Outcome{0, expected_document(ulaw, 11025, mono, music())}),
-              run(11025, 1, 7, 8, music()));
+              run(11025, mono, kULaw, music()));
 }
 
 // A wrong but well-formed fingerprint: three bytes of a sample are not two.
 TEST_F(Music, ReadsTwentyFourBitAudioAsSixteenBit)
 {
     EXPECT_EQ((Outcome{0, expected_document(pcm16, 11025, mono, music())}),
-              run(11025, 1, 1, 24, music()));
+              run(11025, mono, kPcm24, music()));
     EXPECT_EQ((Outcome{0, expected_document(pcm8, 11025, mono, music())}),
-              run(11025, 1, 1, 0, music()));
+              run(11025, mono, kPcmOfNoBits, music()));
 }
 
 TEST_F(Music, FailsForWhatTheLibraryRefuses)
 {
     for (const int32_t code : {2, 3, 17, 20, 49, 64, 80, 0}) {
-        EXPECT_EQ((Outcome{-5, ""}), run(11025, 1, code, 16, music())) << code;
+        EXPECT_EQ((Outcome{-5, ""}), run(11025, mono, Wave{code, 16}, music())) << code;
     }
     const CapturedLog captured;
-    EXPECT_EQ((Outcome{-5, ""}), run(12345, 1, 1, 16, music()));
-    EXPECT_EQ((Outcome{-5, ""}), run(11025, -1, 1, 16, music()));
-    EXPECT_EQ((Outcome{-5, ""}), run(11025, 1, 1, 16, std::vector<uint8_t>(3, 1)));
+    EXPECT_EQ((Outcome{-5, ""}), run(12345, mono, kPcm16, music()));
+    EXPECT_EQ((Outcome{-5, ""}), run(11025, Channels{UINT32_MAX}, kPcm16, music()));
+    EXPECT_EQ((Outcome{-5, ""}), run(11025, mono, kPcm16, std::vector<uint8_t>(3, 1)));
     EXPECT_EQ(
         (LogLines{
             {6, "Fingerprint - Native", "kz_fpx_fingerprint_create() failed. error=900F0001"},
@@ -115,7 +127,7 @@ TEST_F(Music, ThatIsTooShortGivesNothing)
 {
     const auto half = std::vector<uint8_t>(music().begin(), music().begin() + 100000);
     const CapturedLog captured;
-    EXPECT_EQ((Outcome{-5, ""}), run(11025, 1, 1, 16, half));
+    EXPECT_EQ((Outcome{-5, ""}), run(11025, mono, kPcm16, half));
     EXPECT_EQ(LogLines{}, captured.lines());
 }
 
@@ -132,7 +144,7 @@ TEST_F(Music, FailsOrGivesTheDocumentWhenAllocationFails)
             Outcome outcome;
             {
                 Fingerprint job;
-                job.setGenerateConfig(11025, 1, 1, 16, music().data(),
+                job.setGenerateConfig(11025, 1, kPcm16.code, kPcm16.bits, music().data(),
                                       static_cast<uint32_t>(music().size()));
                 std::array<char, 601> buffer = {};
                 char* start = buffer.data();
@@ -170,7 +182,7 @@ TEST_F(Music, OfSeveralFirstJobsAtOnceIsFingerprinted)
                 while (ready < 4) {
                     std::this_thread::yield();
                 }
-                EXPECT_EQ((Outcome{0, document}), run(11025, 1, 1, 16, music()));
+                EXPECT_EQ((Outcome{0, document}), run(11025, mono, kPcm16, music()));
             });
         }
         for (auto& thread : threads) {
