@@ -53,19 +53,22 @@ typedef struct kz_stream kz_stream;
  *
  * A-law, mu-law and KZ_STREAM_FORMAT_PCM8 go to the fingerprinter as they are where it takes the
  * rate and the channels; else the first two are expanded to 16 bits by G.711.
+ *
+ * There are two 8-bit formats. KZ_STREAM_FORMAT_LINEAR8 is that of WAV files, silent at 128: sound
+ * of 16 bits, (sample - 128) * 256. KZ_STREAM_FORMAT_PCM8 is that of the extraction interface,
+ * whose converters fold the lower half up: use it to compare with fingerprints made that way. It
+ * can neither be mixed down nor decimated.
  */
 enum {
-    KZ_STREAM_FORMAT_PCM8 = 1,  /**< KZ_FPX_FORMAT_PCM8: 8-bit offset PCM whose lower half is folded
-                                       up, for comparison with fingerprints made that way */
-    KZ_STREAM_FORMAT_PCM16 = 2, /**< 16-bit signed */
-    KZ_STREAM_FORMAT_ALAW = 3,  /**< G.711 A-law */
-    KZ_STREAM_FORMAT_ULAW = 4,  /**< G.711 mu-law */
-    KZ_STREAM_FORMAT_PCM24 = 5, /**< 24-bit signed in three bytes */
-    KZ_STREAM_FORMAT_PCM32 = 6, /**< 32-bit signed */
+    KZ_STREAM_FORMAT_PCM8 = 1,    /**< 8-bit offset PCM, folded, as KZ_FPX_FORMAT_PCM8 */
+    KZ_STREAM_FORMAT_PCM16 = 2,   /**< 16-bit signed */
+    KZ_STREAM_FORMAT_ALAW = 3,    /**< G.711 A-law */
+    KZ_STREAM_FORMAT_ULAW = 4,    /**< G.711 mu-law */
+    KZ_STREAM_FORMAT_PCM24 = 5,   /**< 24-bit signed in three bytes */
+    KZ_STREAM_FORMAT_PCM32 = 6,   /**< 32-bit signed */
     KZ_STREAM_FORMAT_FLOAT32 = 7, /**< single precision */
     KZ_STREAM_FORMAT_FLOAT64 = 8, /**< double precision */
-    KZ_STREAM_FORMAT_LINEAR8 = 9  /**< 8-bit unsigned as in WAV files, silence at 128: as 16 bits of
-                                       (sample - 128) * 256 */
+    KZ_STREAM_FORMAT_LINEAR8 = 9  /**< 8-bit unsigned, as in WAV files */
 };
 
 /** The most channels that a stream can have. */
@@ -78,12 +81,12 @@ enum {
  * What a stream is made of; the caller's, read only by kz_stream_create(). Fill it with
  * kz_stream_initialize_settings() and change what differs.
  *
- * Rates. The fixed-point algorithm takes 8000, 11025, 16000, 22050, 24000, 32000, 44100 and 48000
- * Hz as they are. Two, four, eight and sixteen times one of them (64000, 88200, 96000, 176400,
- * 192000, ... 768000 Hz) are decimated exactly, to the highest of them, by the library's 2:1 filter
- * run once, twice, three or four times over each channel: in 32 bits from 16-bit samples times
- * 2^14, in blocks of 4096 frames counted from the start of the stream, and rounded to 16 bits at
- * the end. The floating-point algorithm takes every rate from 1 Hz to KZ_STREAM_MAX_RATE.
+ * Rates. The fixed-point algorithm takes 8000, 11025, 16000, 22050, 24000, 32000, 44100 and
+ * 48000 Hz as they are. Two, four, eight and sixteen times one of them (64000, 88200, 96000,
+ * 176400, 192000, ... 768000 Hz) are decimated to the highest of them by the library's 2:1 filter,
+ * run one to four times over each channel: in 32 bits, from 16-bit samples times 2^14, in blocks
+ * of 4096 frames counted from the start of the stream, and rounded to 16 bits at the end. The
+ * floating-point algorithm takes every rate from 1 Hz to KZ_STREAM_MAX_RATE.
  *
  * Channels. One and two go to the fingerprinter as they are. More become one: their sum in 16-bit
  * samples divided by the smallest power of two that is not below their number, rounded to the
@@ -106,7 +109,7 @@ KZ_API kz_status kz_stream_initialize_settings(kz_stream_settings* settings) KZ_
 
 /**
  * Creates a stream. It allocates what feeding needs, about 1 MB at 48000 Hz; feeding then allocates
- * only a record for each second of sound.
+ * only small blocks, for each second of sound.
  *
  * @param[out] out_stream  The stream, which the caller frees with kz_stream_free(); null on
  *                         failure.
