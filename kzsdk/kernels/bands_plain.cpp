@@ -1,3 +1,8 @@
+/// @file
+/// The last steps of a fixed-point frame, one word at a time: a gain ramp and sums of squares.
+/// Words are spectrum bins in the transform's scale; gains are in the format of the caller, of
+/// which a quarter of the product's upper half is kept. Sums of squares are modulo 2^64.
+
 #include "kzsdk/kernels/fxp_ops.hpp"
 #include "kzsdk/kernels/plain.hpp"
 

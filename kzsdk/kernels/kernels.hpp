@@ -2,7 +2,7 @@
 /// The inner loops that exist in several variants, and the choice among them.
 ///
 /// A variant is one table of functions, compiled for one instruction set. Every variant gives the
-/// same words as the plain one for every input, the bits of NaNs apart; tests/library/kernels holds
+/// same bits as the plain one for every input, the bits of NaNs apart; tests/library/kernels holds
 /// all of them to that. The best one that the processor has is taken at the first use and kept.
 ///
 /// For tests and measurements the environment variable KZSDK_KERNELS pins a variant by its name.

@@ -1,3 +1,7 @@
+/// @file
+/// The equalisers' passes over a frame, one sample at a time: the extremes, the level of each
+/// sample with the histogram of all, and the value that stands for each level. Levels are bytes.
+
 #include <algorithm>
 #include <cstddef>
 #include <cstring>

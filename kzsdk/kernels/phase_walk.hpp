@@ -19,7 +19,8 @@ namespace kz::kernels {
 
 class PhaseWalk {
 public:
-    /// @param phase  The phase before the first output, below `up`.
+    /// @param up, down  At most 2^31.
+    /// @param phase     The phase before the first output, below `up`.
     [[gnu::always_inline]] constexpr PhaseWalk(uint32_t up, uint32_t down, uint32_t phase) noexcept
         : up_(up), down_(down), window_step_(down / up), phase_step_(down % up), phase_(phase)
     {
@@ -41,10 +42,9 @@ public:
     /// Moves on by one output.
     [[gnu::always_inline]] constexpr void advance() noexcept
     {
-        // Without a branch, which the processor would often predict wrongly.
         const uint32_t t = phase_ + phase_step_;
         const uint32_t wraps = t >= up_ ? 1 : 0;
-        phase_ = t - (up_ & (0U - wraps));
+        phase_ = t - wraps * up_;
         window_ += window_step_ + wraps;
     }
 

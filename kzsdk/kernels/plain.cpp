@@ -1,3 +1,6 @@
+/// @file
+/// The table of the plain variant, which defines the results and runs on every processor.
+
 #include "kzsdk/kernels/plain.hpp"
 
 namespace kz::kernels {

@@ -254,6 +254,7 @@ private:
         uint32_t to;
     };
 
+    // Makes the width a constant, so that the sums of all columns stay in registers.
     template <class Columns, uint32_t Width>
     void choose_width(uint32_t width, size_t first_sample, RowWalk& walk, int32_t* output,
                       Range range) const noexcept
@@ -265,6 +266,7 @@ private:
         }
     }
 
+    // Rows range.from .. range.to - 1 of `Width` columns.
     template <class Columns, uint32_t Width>
     void make_rows(size_t first_sample, RowWalk& next, int32_t* output, Range range) const noexcept
     {
@@ -281,6 +283,7 @@ private:
         next = walk;
     }
 
+    // One row: its output of each column.
     template <class Columns, size_t Width>
     [[gnu::always_inline]] void quick_sums(size_t first_sample, const RowWalk& walk,
                                            int32_t* results) const noexcept
@@ -363,6 +366,7 @@ private:
         }
     }
 
+    // Adds up C with all of its terms, and shifts it for each tap.
     int32_t exact_sum(const RowWalk& walk) const noexcept
     {
         const int32_t* row = rows_.taps + size_t{walk.row()} * rows_.row_length;

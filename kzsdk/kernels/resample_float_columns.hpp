@@ -94,6 +94,7 @@ private:
         return taken;
     }
 
+    // All rows at once if there are as many as find registers, else one by one.
     void make_rows(const Row (&rows)[kRows], uint32_t taken, float* output,
                    uint32_t outputs) const noexcept
     {
@@ -105,6 +106,7 @@ private:
         }
     }
 
+    // As many samples of every column as there is room for, from sample `first` on.
     void lay_out_from(size_t first) noexcept
     {
         first_ = first;

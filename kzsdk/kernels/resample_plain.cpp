@@ -1,3 +1,9 @@
+/// @file
+/// Polyphase filters and decimators, one output at a time. Fixed-point samples are Q29 or Q30 words
+/// and taps Q31, both multiplied in 16-bit halves: the product of the low halves is left out and
+/// the middle one is truncated for each tap, so no other order of shifts gives the same outputs.
+/// Floating-point sums take their products newest sample first.
+
 #include <bit>
 #include <cassert>
 

@@ -1,3 +1,7 @@
+/// @file
+/// The choice of a variant: the best one that the processor runs, or the one that the environment
+/// or the build names.
+
 #include <atomic>
 #include <cstdlib>
 #include <string_view>

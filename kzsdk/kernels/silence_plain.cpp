@@ -1,3 +1,7 @@
+/// @file
+/// The search for the signal, one sample at a time: samples become 16-bit levels, of which moving
+/// means are taken. All sums are modulo 2^32.
+
 #include "kzsdk/abs/saturate.hpp"
 #include "kzsdk/kernels/fxp_ops.hpp"
 #include "kzsdk/kernels/plain.hpp"

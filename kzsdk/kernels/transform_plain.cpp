@@ -1,3 +1,8 @@
+/// @file
+/// The cosine transforms without their scalings, butterfly by butterfly. The fixed-point transform
+/// takes words of any format and keeps it; its factors have 30 fraction bits over 2^(stage - 2), so
+/// the shift of a product depends on the stage.
+
 #include <cstddef>
 #include <span>
 

@@ -1,3 +1,7 @@
+/// @file
+/// The variant for processors with AVX2. It is compiled for them, and defines nothing but its
+/// table.
+
 #include "kzsdk/kernels/variants.hpp"
 
 #if defined(KZ_KERNELS_X86)
