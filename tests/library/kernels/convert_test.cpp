@@ -157,8 +157,7 @@ TEST_P(ConvertVariants, AreBitIdenticalForEveryCode)
     }
 }
 
-// Full scale of one sign: 512 samples reach 2^24, where floats begin to round, and a sum that is
-// never cleared passes 2^31.
+// A sum that is never cleared passes 2^31.
 TEST_P(ConvertVariants, AreBitIdenticalAtFullScale)
 {
     for (const uint8_t byte : Bytes{0x00, 0x2a, 0x7f, 0x80, 0xaa, 0xff}) {
@@ -167,12 +166,18 @@ TEST_P(ConvertVariants, AreBitIdenticalAtFullScale)
             expect_equal(variant(), plain(), {bytes.data(), channels, 300, 15});
         }
     }
-    Bytes lows(2 * 512 * 40);
-    for (size_t i = 0; i < lows.size(); i += 2) {
-        lows[i + 1] = 0x80; // -32768, little end first
-    }
-    for (const int32_t channels : {511, 512, 513}) {
-        expect_equal(variant(), plain(), {lows.data(), channels, 39, 6});
+}
+
+// Floats round from 2^24 on, which 512 samples reach: with more, the order of additions counts.
+TEST_P(ConvertVariants, RoundSumsOfManyLoudSamplesAlike)
+{
+    constexpr int32_t kFrames = 9;
+    for (const int16_t sample : std::vector<int16_t>{INT16_MIN, INT16_MIN + 1, INT16_MAX}) {
+        const std::vector<int16_t> samples(2000 * kFrames, sample);
+        const auto* bytes = reinterpret_cast<const uint8_t*>(samples.data());
+        for (const int32_t channels : {511, 512, 513, 520, 700, 1024, 2000}) {
+            expect_equal(variant(), plain(), {bytes, channels, kFrames, 6});
+        }
     }
 }
 
