@@ -121,6 +121,9 @@ void run(Choices& choices)
         arguments = {"disc", path, "--format", "json"};
     } else {
         arguments.push_back(from_standard_input ? "-" : path);
+        if (one_in(choices, 8)) {
+            arguments.insert(arguments.begin(), "fingerprint");
+        }
     }
     const StandardInput input(path);
     const int status = kzfp(arguments);
