@@ -1,7 +1,7 @@
 /// @file
 /// A byte buffer that grows by a fixed step, for documents of a few hundred bytes.
 ///
-/// The block belongs to the buffer until it is handed over. Bytes appended may lie in the buffer
+/// The block belongs to the buffer until it is returned. Bytes appended may lie in the buffer
 /// itself. A failure leaves the buffer as it was.
 #include "kzsdk/abs/dyn_buf.h"
 

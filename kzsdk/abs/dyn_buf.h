@@ -1,6 +1,6 @@
 /**
  * @file
- * A growable byte buffer, filled piece by piece and handed over as one block.
+ * A growable byte buffer, filled piece by piece and returned as one block.
  *
  * It keeps bytes only; callers that want a text append the NUL. It grows by a fixed step and not by
  * a factor: right for documents of a few hundred bytes, while a large one costs time in the square

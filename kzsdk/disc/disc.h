@@ -104,9 +104,9 @@ KZ_API kz_status kzbdfs_close(int32_t descriptor) KZ_NOEXCEPT;
  * Reads the volume label of the disc in /dev/dvd: the UDF volume identifier in sector 32, up to its
  * first white space.
  *
- * IMPORTANT: each success leaves a descriptor of the device open that is not handed out and cannot
- * be closed. Call it once for a disc: after about a thousand labels the process cannot open
- * anything any more. (A program that is started does not inherit the descriptor.)
+ * IMPORTANT: each success leaves a descriptor of the device open that is not returned and cannot be
+ * closed. Call it once for a disc: after about a thousand labels the process cannot open anything
+ * any more. (A program that is started does not inherit the descriptor.)
  *
  * What is read is not checked: other bytes than a label come out where sector 32 does not hold the
  * volume descriptor, and none where the device ends earlier. A label of 30 characters, the most

@@ -139,7 +139,7 @@ public:
         if (!is_ready()) {
             return KZ_DISC_NOT_ON;
         }
-        // The descriptor is not handed out and never closed, so at least a program that is started
+        // The descriptor is not returned and never closed, so at least a program that is started
         // does not inherit it.
         const int device = ::open(kDevice, O_RDONLY | O_CLOEXEC);
         if (device < 0) {

@@ -74,7 +74,7 @@ kz_status kz_fpx_fingerprint_free(kz_fpx_handle** handle_ref) noexcept
     }
     kz_fpx_handle* const handle = *handle_ref;
     *handle_ref = nullptr;
-    // Deliberate: a handle without an instance, which create never hands out, is forgotten.
+    // Deliberate: a handle without an instance, which create never returns, is forgotten.
     if (handle == nullptr || handle->algorithm == nullptr || handle->instance == nullptr) {
         return KZ_OK;
     }

@@ -1,5 +1,5 @@
 /// @file
-/// What a caller that cuts a stream into pieces has to know to give them room once and for all.
+/// What a caller that cuts a stream into pieces needs to allocate room for them once.
 #pragma once
 
 #include <cstdint>

@@ -151,7 +151,7 @@ jint com_orvanta_android_kzsdk_Fingerprint_native_setup(JNIEnv* env, jobject sel
     const int32_t code = start(session->thread);
     if (code != android::kOk) {
         kz::platform::log(kLogDebug, kTag, "native_setup error");
-        session->thread.withoutWorker(); // it never ran: nobody else would end the wait for it
+        session->thread.withoutWorker(); // it never ran: nothing else would end the wait for it
         kz::jni::destroy(session);       // deliberate: the reference is kept
         return code;
     }

@@ -99,8 +99,8 @@ int FingerprintThread::run() noexcept
     int32_t result = kOk;
     for (;;) {
         const Lock lock(mutex_);
-        // A request or an exit may have been signalled while nobody waited: it is looked for before
-        // the wait. There is no loop about the wait: whatever wakes the worker runs a job.
+        // A request or an exit may have been signalled while no thread waited: it is checked for
+        // before the wait. There is no loop about the wait: whatever wakes the worker runs a job.
         if (!exit_requested_ && state_ != kRequested) {
             wait();
         }

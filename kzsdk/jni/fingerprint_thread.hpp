@@ -51,7 +51,7 @@ public:
     ///         back by withoutWorker() and the destructor.
     int32_t init() noexcept;
 
-    /// Asks for a job. See Fingerprint::setGenerateConfig() for the arguments.
+    /// Requests a job. See Fingerprint::setGenerateConfig() for the arguments.
     ///
     /// @param audio  Not copied: stays valid until the event has come, and after it until the next
     ///               accepted request or release(), as a thread may wake up without reason and then
@@ -74,8 +74,9 @@ public:
     /// Stops the worker and comes back when it has acknowledged that. A running job is finished
     /// before, and reported; a request that was not begun is dropped.
     ///
-    /// Without a running worker nobody acknowledges and this waits for ever: so it does when init()
-    /// was not called or failed, and when called a second time, the destructor's call included.
+    /// Without a running worker nothing acknowledges it, and this waits for ever: so it does when
+    /// init() was not called or failed, and when called a second time, the destructor's call
+    /// included.
     ///
     /// @return kOk.
     int32_t release() noexcept;

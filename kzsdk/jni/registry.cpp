@@ -1,5 +1,5 @@
 /// @file
-/// The sessions by number. Numbers are handed out upwards, so an old one does not find a new
+/// The sessions by number. Numbers are given out in rising order, so an old one does not find a new
 /// session.
 #include "kzsdk/jni/registry.hpp"
 

@@ -41,7 +41,7 @@ public:
     /// claimed: of two that want to remove an object one does.
     Registered* claim(int32_t number) noexcept;
 
-    /// Takes a claimed object out: nobody finds it from now on. Comes back when nobody has it
+    /// Removes a claimed object: it cannot be found from now on. Returns when no thread has it
     /// pinned.
     void remove(Registered& object) noexcept;
 

@@ -62,7 +62,7 @@ JNIEnv* AndroidRuntime::getJNIEnv() noexcept
     if (vm->GetEnv(&known, JNI_VERSION_1_4) == JNI_OK) {
         return static_cast<JNIEnv*>(known);
     }
-    // The VM may not outlive an attached thread that nobody detaches.
+    // The VM cannot end before an attached thread is detached.
     pthread_once(&key_once, make_key);
     if (!key_is_there) {
         return nullptr;

@@ -5,8 +5,8 @@
 /// same bits as the plain one for every input, the bits of NaNs apart; tests/library/kernels holds
 /// all of them to that. The best one that the processor has is taken at the first use and kept.
 ///
-/// For tests and measurements the environment variable KZSDK_KERNELS pins a variant by its name.
-/// A name that the build or the processor does not know is ignored. It is read once, at the first
+/// For tests and measurements the environment variable KZSDK_KERNELS pins a variant by its name. A
+/// name that the build or the processor does not support is ignored. It is read once, at the first
 /// use; a host that changes its environment meanwhile races with that as with any getenv().
 #pragma once
 

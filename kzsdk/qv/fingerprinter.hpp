@@ -1,7 +1,7 @@
 /// @file
 /// The fingerprinter object from creation to result, which both twins share around the feed loop.
 ///
-/// A twin brings what frame_pump.hpp asks for, and the names of its parts' operations:
+/// A twin provides what frame_pump.hpp requires, and the names of its parts' operations:
 ///
 ///     Config, FrameManager
 ///     create_config, destroy_config

@@ -128,7 +128,7 @@ uint32_t drop_silence(typename Twin::Object& object, uint32_t produced) noexcept
     return remaining;
 }
 
-/// Stores what was produced and hands over the frame if it is full.
+/// Stores what was produced and passes the frame on if it is full.
 template <class Twin>
 void commit_samples(typename Twin::Object& object, uint32_t produced) noexcept
 {

@@ -8,7 +8,7 @@
 ///             FP_BLOCK TYPE="SIGNED_INT_16" COUNT="30" ENCODING="ASCII" SEPARATOR=" "
 ///
 /// FP_BLOCK holds the values in decimal with one space between them. The blocks are made first; a
-/// tree is handed out whole or not at all.
+/// tree is returned whole or not at all.
 #include "kzsdk/qv/query_document.hpp"
 
 #include <cstring>

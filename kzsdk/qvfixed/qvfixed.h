@@ -236,7 +236,7 @@ kzqvfixed_frame_manager_create(const kzqvfixed_config* config) KZ_NOEXCEPT;
 KZ_API kz_status kzqvfixed_frame_manager_destroy(kzqvfixed_frame_manager* manager) KZ_NOEXCEPT;
 
 /**
- * Drops all records and starts anew, with the configured frames to skip. Null is ignored.
+ * Drops all records and starts over, with the configured frames to skip. Null is ignored.
  *
  * @return 0.
  */

@@ -111,7 +111,7 @@ Range admitted_frames(const QVFM& m, uint32_t frames) noexcept
     return {first, end};
 }
 
-// A list of new records that is freed unless it is handed over.
+// A list of new records that is freed unless it is passed on.
 struct NewRecords {
     QVFrameRecord* records = nullptr;
     QVFrameRecord** records_tail = &records;

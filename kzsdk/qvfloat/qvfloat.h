@@ -217,7 +217,7 @@ KZ_API QVFM* QVFM_Create(const QVConfig* config) KZ_NOEXCEPT;
 KZ_API kz_status QVFM_Destroy(QVFM* manager) KZ_NOEXCEPT;
 
 /**
- * Drops all records and starts anew, with the configured frames to skip. Null is ignored.
+ * Drops all records and starts over, with the configured frames to skip. Null is ignored.
  *
  * @return 0.
  */

@@ -3,9 +3,9 @@
 ///
 ///     bytes -> unfinished frame -> words -> decimator -> piece -> kz_fpx_fingerprint_add_audio()
 ///
-/// A piece has the frames that the extraction interface asks for next, so that the fingerprint is
-/// the one of a single call. What goes as it is skips the two in the middle, and skips the piece as
-/// well when the caller's bytes hold a whole one.
+/// A piece has as many frames as the extraction interface reports for the next, so that the
+/// fingerprint is the one of a single call. What goes as it is skips the two in the middle, and
+/// skips the piece as well when the caller's bytes hold a whole one.
 #pragma once
 
 #include <cstdint>
@@ -35,7 +35,7 @@ struct kz_stream {
 
     uint64_t frames;        ///< that came in
     uint64_t judged_frames; ///< that went on
-    char* document;         ///< once it was asked for; of the extraction interface
+    char* document;         ///< once requested; of the extraction interface
     kz_status failure;      ///< of an earlier call, for good
     uint8_t is_complete;
     uint8_t is_finished;

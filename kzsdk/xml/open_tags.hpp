@@ -1,7 +1,7 @@
 /// @file
 /// The tags between the root and the place that a walk has reached.
 ///
-/// Tags do not know their parents, so a walk has to remember the way back. It does so here and not
+/// Tags do not store their parents, so a walk has to remember the way back. It does so here and not
 /// on the call stack: a tree of any depth is walked. Documents of the usual few levels need no
 /// memory for it.
 #pragma once

@@ -246,8 +246,7 @@ private:
 
 } // namespace
 
-// The text is in the buffer's own block, which is handed over as it is: it may be larger than
-// needed.
+// The text is in the buffer's own block, which is returned as it is: it may be larger than needed.
 char* RenderXMLTagToStrEx(const XMLTag* tag, uint8_t header, uint8_t indent,
                           uint8_t newlines) noexcept
 {

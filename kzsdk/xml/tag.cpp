@@ -5,7 +5,7 @@
 ///                        |                     |
 ///                     sub_tags              sub_tags
 ///
-/// A tag does not know its parent. No function recurses, so a tree may be of any depth. Every
+/// A tag does not store its parent. No function recurses, so a tree may be of any depth. Every
 /// stored text is a copy of its own.
 #include "kzsdk/xml/xml.h"
 

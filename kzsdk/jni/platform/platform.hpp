@@ -26,7 +26,7 @@ void log(LogPriority priority, const char* tag, const char* format, uint32_t val
 /// The background priority of Android, a nice value.
 inline constexpr int32_t kBackgroundPriority = 10;
 
-/// Starts a thread that nobody joins, with the system's stack size.
+/// Starts a detached thread with the system's stack size.
 ///
 /// @param name      Lives until the thread runs. The system may show only its first 15 characters.
 /// @param priority  A wish: a system that refuses it starts the thread all the same.

@@ -94,7 +94,7 @@ TEST_F(Serialize, TheSameFingerprintGivesTheSameText)
     kz_fpx_fingerprint_serialize_free(&b);
 }
 
-// Short of memory a call fails with a status of the layer that ran out, or hands out a text. The
+// Short of memory a call fails with a status of the layer that ran out, or returns a text. The
 // texts that then differ from the whole document are those of two deliberate maskings: a query that
 // succeeds after name or version failed, and an indentation that succeeds after a failure while
 // rendering.
@@ -103,8 +103,8 @@ TEST_F(Serialize, FailedAllocationsAreReportedOrMaskedAsStated)
     complete();
     char* whole = nullptr;
     ASSERT_EQ(KZ_OK, kz_fpx_fingerprint_serialize(handle_, &whole));
-    // The failed allocations after which another text was handed out: first of those that fail
-    // alone, then of those after which all later ones fail as well.
+    // The failed allocations after which another text was returned: first of those that fail alone,
+    // then of those after which all later ones fail as well.
     std::vector<std::vector<int>> masked(1);
     int nth = 0;
     for_every_failed_allocation([&](auto fired) {

@@ -289,7 +289,7 @@ TEST_F(Streams, RefuseSoundOnceFinished)
     EXPECT_EQ(0, complete);
 }
 
-// ---- Who holds the library
+// ---- Holding the library
 
 TEST_F(Streams, HoldTheLibraryWhileTheyLive)
 {

@@ -229,7 +229,7 @@ TEST(KzfpStreaming, TwoHoursOfAWavPipeAreReadForTheirFirstSeconds)
               result.out);
 }
 
-// Writers that do not know the length beforehand leave one of these in the header.
+// Writers to which the length is unknown leave one of these in the header.
 TEST(KzfpStreaming, WavPipesOfUnknownLengthAreRead)
 {
     const std::string samples = bytes_of(tune(22050, 1, 16));

@@ -1,5 +1,5 @@
-# What the library exports depends on what was asked for, never on what the machine has: without a
-# jni.h or a JDK the configuration stops and names its cures.
+# What the library exports depends on the options, never on what the machine has: without a jni.h or
+# a JDK the configuration stops and names its cures.
 #
 #   cmake -D ROOT= -D WORK_DIR= -D C_COMPILER= -D CXX_COMPILER= -D GENERATOR=
 #         -P configuration_test.cmake

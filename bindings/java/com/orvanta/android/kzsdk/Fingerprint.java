@@ -68,7 +68,7 @@ public final class Fingerprint implements AutoCloseable {
         /**
          * Called when none could be made.
          *
-         * @param source the object that was asked for it
+         * @param source the object that the request was made of
          * @param reason why
          */
         void onFailure(Fingerprint source, FingerprintException reason);
@@ -102,7 +102,7 @@ public final class Fingerprint implements AutoCloseable {
     /**
      * Delivers results to a listener on threads that are kept for that.
      *
-     * @param listener is told from the next result on; null tells nobody
+     * @param listener receives results from the next one on; null stops them
      */
     public void setListener(Listener listener) {
         setListener(listener, DELIVERY);
@@ -111,7 +111,7 @@ public final class Fingerprint implements AutoCloseable {
     /**
      * Delivers results to a listener.
      *
-     * @param listener is told from the next result on; null tells nobody
+     * @param listener receives results from the next one on; null stops them
      * @param executor runs the listener; on Android, for example, {@code
      *     context.getMainExecutor()}. An executor that runs it at once runs it on the fingerprint
      *     thread: there {@link #generate} of the same object is refused
