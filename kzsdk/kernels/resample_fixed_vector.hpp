@@ -273,7 +273,7 @@ private:
         const size_t up = rows_.up;
         RowWalk walk = next; // in registers
         for (uint32_t i = range.from; i < range.to; ++i) {
-            int32_t sums[(Width + 3) / 4 * 4];
+            int32_t sums[8]; // whole vectors are written
             quick_sums<Columns, Width>(first_sample, walk, sums);
             for (size_t j = 0; j < Width; ++j) {
                 output[i + j * up] = sums[j];
@@ -297,7 +297,7 @@ private:
         const int16_t* doubled = samples_.doubled_highs + first_sample + walk.window() - back;
         Ints sums[Width];
         for (Ints& sum : sums) {
-            sum = Simd::set(0);
+            sum = Simd::set_first(rows_.high_sums[walk.row()]);
         }
         size_t k = 0;
         for (; k + 2 * kLanes <= length; k += 2 * kLanes) {
@@ -312,22 +312,26 @@ private:
                              Simd::half_pair_products(doubled + k + j * Columns::kDown, highs + k));
             }
         }
-        gather(sums, rows_.high_sums[walk.row()], results);
+        gather(sums, results);
     }
 
-    // Adds up the lanes of each sum, four sums at a time.
+    // Adds up the lanes of each sum, as many sums at a time as will do.
     template <size_t Width>
-    [[gnu::always_inline]] static void gather(const Ints (&sums)[Width], int32_t offset,
-                                              int32_t* results) noexcept
+    [[gnu::always_inline]] static void gather(const Ints (&sums)[Width], int32_t* results) noexcept
     {
         if constexpr (Width == 1) {
-            results[0] = wrap_add(Simd::sum_of_lanes(sums[0]), offset);
+            results[0] = Simd::sum_of_lanes(sums[0]);
+        } else if constexpr (Width > 4 && Width <= kLanes) {
+            Ints padded[kLanes];
+            for (size_t j = 0; j < kLanes; ++j) {
+                padded[j] = sums[j < Width ? j : 0];
+            }
+            Simd::store(results, Simd::sums_of_lanes(padded));
         } else {
             for (size_t j = 0; j < Width; j += 4) {
                 const Ints two = j + 2 < Width ? sums[j + 2] : sums[j];
                 const Ints three = j + 3 < Width ? sums[j + 3] : sums[j];
-                Simd::store_sums(results + j, sums[j], sums[j + 1 < Width ? j + 1 : j], two, three,
-                                 offset);
+                Simd::store_sums(results + j, sums[j], sums[j + 1 < Width ? j + 1 : j], two, three);
             }
         }
     }
@@ -386,11 +390,6 @@ private:
             sum = Simd::add(sum, Simd::add(high, Simd::template shift_right<15>(cross)));
         }
         return Simd::sum_of_lanes(sum);
-    }
-
-    static int32_t wrap_add(int32_t a, int32_t b) noexcept
-    {
-        return static_cast<int32_t>(static_cast<uint32_t>(a) + static_cast<uint32_t>(b));
     }
 
     const kz::kernels::PhaseRows& rows_;

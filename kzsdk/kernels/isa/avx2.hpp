@@ -27,6 +27,11 @@ struct Avx2 {
     }
     static void store(float* to, Floats v) noexcept { _mm256_storeu_ps(to, v); }
     static Ints set(int32_t value) noexcept { return _mm256_set1_epi32(value); }
+    /// `value` in the first lane, 0 in the others.
+    static Ints set_first(int32_t value) noexcept
+    {
+        return _mm256_zextsi128_si256(_mm_cvtsi32_si128(value));
+    }
     /// Every lane holds the same two 16-bit numbers.
     static Ints set_pairs(const int16_t* pair) noexcept
     {
@@ -91,14 +96,13 @@ struct Avx2 {
         sum = _mm_add_epi32(sum, _mm_shuffle_epi32(sum, 0b10110001));
         return _mm_cvtsi128_si32(sum);
     }
-    /// `offset` and the sum of the lanes of each of four vectors.
-    static void store_sums(int32_t* to, Ints a, Ints b, Ints c, Ints d, int32_t offset) noexcept
+    /// The sum of the lanes of each of four vectors.
+    static void store_sums(int32_t* to, Ints a, Ints b, Ints c, Ints d) noexcept
     {
         const Ints abcd = sums_of_halves(a, b, c, d);
         const __m128i sums =
             _mm_add_epi32(_mm256_castsi256_si128(abcd), _mm256_extracti128_si256(abcd, 1));
-        _mm_storeu_si128(reinterpret_cast<__m128i*>(to),
-                         _mm_add_epi32(sums, _mm_set1_epi32(offset)));
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(to), sums);
     }
     /// Lane k becomes the sum of the lanes of vector k.
     static Ints sums_of_lanes(const Ints (&v)[kLanes]) noexcept

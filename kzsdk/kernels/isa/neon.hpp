@@ -22,6 +22,8 @@ struct Neon {
     static void store(int32_t* to, Ints v) noexcept { vst1q_s32(to, v); }
     static void store(float* to, Floats v) noexcept { vst1q_f32(to, v); }
     static Ints set(int32_t value) noexcept { return vdupq_n_s32(value); }
+    /// `value` in the first lane, 0 in the others.
+    static Ints set_first(int32_t value) noexcept { return vsetq_lane_s32(value, set(0), 0); }
     /// Every lane holds the same two 16-bit numbers.
     static Ints set_pairs(const int16_t* pair) noexcept
     {
@@ -82,10 +84,10 @@ struct Neon {
     {
         return vpaddq_s32(vpaddq_s32(v[0], v[1]), vpaddq_s32(v[2], v[3]));
     }
-    /// `offset` and the sum of the lanes of each of four vectors.
-    static void store_sums(int32_t* to, Ints a, Ints b, Ints c, Ints d, int32_t offset) noexcept
+    /// The sum of the lanes of each of four vectors.
+    static void store_sums(int32_t* to, Ints a, Ints b, Ints c, Ints d) noexcept
     {
-        store(to, add(sums_of_lanes({a, b, c, d}), set(offset)));
+        store(to, sums_of_lanes({a, b, c, d}));
     }
     static int32_t max_of_lanes(Ints v) noexcept { return vmaxvq_s32(v); }
 

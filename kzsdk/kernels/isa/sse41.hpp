@@ -27,6 +27,8 @@ struct Sse41 {
     }
     static void store(float* to, Floats v) noexcept { _mm_storeu_ps(to, v); }
     static Ints set(int32_t value) noexcept { return _mm_set1_epi32(value); }
+    /// `value` in the first lane, 0 in the others.
+    static Ints set_first(int32_t value) noexcept { return _mm_cvtsi32_si128(value); }
     /// Every lane holds the same two 16-bit numbers.
     static Ints set_pairs(const int16_t* pair) noexcept
     {
@@ -93,10 +95,10 @@ struct Sse41 {
         const Ints cd = add(_mm_unpacklo_epi32(v[2], v[3]), _mm_unpackhi_epi32(v[2], v[3]));
         return add(_mm_unpacklo_epi64(ab, cd), _mm_unpackhi_epi64(ab, cd));
     }
-    /// `offset` and the sum of the lanes of each of four vectors.
-    static void store_sums(int32_t* to, Ints a, Ints b, Ints c, Ints d, int32_t offset) noexcept
+    /// The sum of the lanes of each of four vectors.
+    static void store_sums(int32_t* to, Ints a, Ints b, Ints c, Ints d) noexcept
     {
-        store(to, add(sums_of_lanes({a, b, c, d}), set(offset)));
+        store(to, sums_of_lanes({a, b, c, d}));
     }
     static int32_t max_of_lanes(Ints v) noexcept
     {
