@@ -63,8 +63,8 @@ void replace_levels(const void* values, const uint8_t* levels, void* output,
     constexpr size_t kBytes = 4;
     const auto* words = static_cast<const uint8_t*>(values);
     auto* to = static_cast<uint8_t*>(output);
-    for (size_t i = count; i-- != 0;) {
-        std::memcpy(to + i * kBytes, words + levels[i] * kBytes, kBytes);
+    for (size_t i = count; i > 0; --i) {
+        std::memcpy(to + (i - 1) * kBytes, words + levels[i - 1] * kBytes, kBytes);
     }
 }
 
