@@ -33,7 +33,7 @@ protected:
         const kz_status status = family().get_volume_label(file, text.data(), size);
         EXPECT_EQ(KZ_OK, family().close(file));
         EXPECT_EQ("########", text.substr(size)) << "written beyond its size";
-        return {status, text.c_str()};
+        return {status, text.substr(0, text.find('\0'))};
     }
 
     void expect_label(const std::string& label, const std::string& path)
