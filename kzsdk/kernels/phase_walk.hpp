@@ -42,10 +42,9 @@ public:
     /// Moves on by one output.
     [[gnu::always_inline]] constexpr void advance() noexcept
     {
-        const uint32_t t = phase_ + phase_step_;
-        const uint32_t wraps = t >= up_ ? 1 : 0;
-        phase_ = t - wraps * up_;
-        window_ += window_step_ + wraps;
+        const uint32_t next = tap_phase();
+        window_ += window_step_ + (next < phase_ ? 1 : 0);
+        phase_ = next;
     }
 
     /// Moves on by `outputs` outputs.

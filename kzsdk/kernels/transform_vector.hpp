@@ -102,7 +102,8 @@ private:
 
     // Three stages of a group of 2^Stage values, eighths of which meet.
     template <int Stage, bool First>
-    static void three_stages(Lanes (&v)[8], const Word* factors, size_t j) noexcept
+    [[gnu::always_inline]] static void three_stages(Lanes (&v)[8], const Word* factors,
+                                                    size_t j) noexcept
     {
         constexpr size_t kEighth = size_t{1} << (Stage - 3);
         const Word* outer = factors + 4 * kEighth + j;
@@ -213,7 +214,7 @@ private:
 
     // Rows are fetched in reversed order, so that lanes lie as their rows are numbered in the
     // output.
-    static void load_tile(const Word* from, Lanes (&v)[kLanes]) noexcept
+    [[gnu::always_inline]] static void load_tile(const Word* from, Lanes (&v)[kLanes]) noexcept
     {
         for (size_t i = 0; i < kLanes; ++i) {
             v[i] = Simd::load(from + lane_reversed(i) * kRow);
@@ -221,7 +222,7 @@ private:
         Simd::transpose(v);
     }
 
-    static void store_tile(Word* to, const Lanes (&v)[kLanes]) noexcept
+    [[gnu::always_inline]] static void store_tile(Word* to, const Lanes (&v)[kLanes]) noexcept
     {
         for (size_t i = 0; i < kLanes; ++i) {
             Simd::store(to + lane_reversed(i) * kRow, v[i]);
@@ -229,7 +230,7 @@ private:
     }
 
     template <int Stage, bool First>
-    static void tile_stages(Lanes (&v)[kLanes], const Word* factors) noexcept
+    [[gnu::always_inline]] static void tile_stages(Lanes (&v)[kLanes], const Word* factors) noexcept
     {
         if constexpr (Stage > 0) {
             constexpr size_t kHalfWidth = size_t{1} << (Stage - 1);

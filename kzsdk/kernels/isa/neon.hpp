@@ -313,7 +313,7 @@ struct Neon {
     }
 
     /// Lane j of vector i becomes lane i of vector j.
-    [[gnu::always_inline]] static void transpose(Ints (&v)[kLanes]) noexcept
+    static void transpose(Ints (&v)[kLanes]) noexcept
     {
         const int32x4x2_t first = vtrnq_s32(v[0], v[1]);
         const int32x4x2_t second = vtrnq_s32(v[2], v[3]);
@@ -322,7 +322,7 @@ struct Neon {
         v[2] = vcombine_s32(vget_high_s32(first.val[0]), vget_high_s32(second.val[0]));
         v[3] = vcombine_s32(vget_high_s32(first.val[1]), vget_high_s32(second.val[1]));
     }
-    [[gnu::always_inline]] static void transpose(Floats (&v)[kLanes]) noexcept
+    static void transpose(Floats (&v)[kLanes]) noexcept
     {
         Ints ints[kLanes];
         for (size_t i = 0; i < kLanes; ++i) {

@@ -329,7 +329,7 @@ struct Sse41 {
     }
 
     /// Lane j of vector i becomes lane i of vector j.
-    [[gnu::always_inline]] static void transpose(Ints (&v)[kLanes]) noexcept
+    static void transpose(Ints (&v)[kLanes]) noexcept
     {
         Floats f[kLanes];
         for (size_t i = 0; i < kLanes; ++i) {
@@ -340,7 +340,7 @@ struct Sse41 {
             v[i] = _mm_castps_si128(f[i]);
         }
     }
-    [[gnu::always_inline]] static void transpose(Floats (&v)[kLanes]) noexcept
+    static void transpose(Floats (&v)[kLanes]) noexcept
     {
         _MM_TRANSPOSE4_PS(v[0], v[1], v[2], v[3]);
     }
