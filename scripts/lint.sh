@@ -1,5 +1,5 @@
 #!/bin/sh
-# Checks the tree: format, clang-tidy, cppcheck, the man page, the scripts. Every check runs; any
+# Checks the tree: format, clang-tidy, cppcheck, man page, scripts, documents. Every check runs; any
 # complaint makes the whole fail.
 #
 #   scripts/lint.sh [build-directory]     with compile_commands.json; default build/lint, made here
@@ -71,6 +71,7 @@ check clang-format format
 check "shell scripts" shell_scripts
 check "Python scripts" python_scripts
 check "man page" man_page
+check documents scripts/check_documents.py
 check cppcheck other_analyser
 check clang-tidy tidy
 

@@ -5,16 +5,16 @@
 #   scripts/make_clips.sh               everything, into build/media/clips
 #   scripts/make_clips.sh --music-only  only build/media/music.wav: half a minute of music
 #
-# The music is "Trip on the Funny Boat" by Joona Karjalainen (JDruid), 2006, Expat licence, out of the
-# Debian package funnyboat, which is downloaded (3.7 MB) and not installed. Set KZ_MEDIA to another
-# directory than build/media.
+# The music is "Trip on the Funny Boat" by Joona Karjalainen (JDruid), 2006, Expat licence, out of
+# the Debian package funnyboat, which is downloaded (3.7 MB) and not installed. Set KZ_MEDIA to
+# another directory than build/media.
 set -eu
 
 root=$(cd "$(dirname "$0")/.." && pwd)
 media=${KZ_MEDIA:-$root/build/media}
 clips=$media/clips
-package=funnyboat
-song=$media/$package.ogg
+song=$media/funnyboat.ogg
+song_path=usr/share/games/funnyboat/data/JDruid-Trip_on_the_Funny_Boat.ogg
 song_digest=1db157e12fa37b54a5add98a9f2ad6c906806e898fac53c29a96cd48a09c9278
 
 fail() {
@@ -26,43 +26,6 @@ need() {
     command -v "$1" >/dev/null || fail "$1 is missing; apt-get install $2"
 }
 
-as_root() {
-    if [ "$(id -u)" = 0 ]; then "$@"; else sudo -n "$@"; fi
-}
-
-# The package lists of a fresh machine are empty: fetched when the first try fails.
-download() {
-    apt-get download "$package" >download.log 2>&1 && return
-    as_root apt-get update >>download.log 2>&1 || true
-    apt-get download "$package" >>download.log 2>&1
-}
-
-digest_is() {
-    echo "$song_digest  $1" | sha256sum --check --status
-}
-
-provide_song() {
-    if [ -f "$song" ] && digest_is "$song"; then
-        return
-    fi
-    need apt-get apt
-    need dpkg-deb dpkg
-    work=$(mktemp -d "$media/download.XXXXXX")
-    chmod 755 "$work"
-    (
-        cd "$work"
-        download || fail "the Debian package $package, which holds the music, cannot be downloaded:
-$(grep '^E:' download.log)
-Without a network, put usr/share/games/funnyboat/data/JDruid-Trip_on_the_Funny_Boat.ogg
-out of that package at $song and try again."
-        dpkg-deb -x "$package"_*.deb .
-        cp usr/share/games/funnyboat/data/JDruid-Trip_on_the_Funny_Boat.ogg song.ogg
-        digest_is song.ogg || fail "the music in the package $package is not the one expected"
-        mv song.ogg "$song"
-    ) || { rm -rf "$work"; exit 1; }
-    rm -rf "$work"
-}
-
 # Without dither and with a fixed seed, so that the same bytes come out every time.
 sox_plain() {
     sox -D -R -V1 "$@"
@@ -71,7 +34,7 @@ sox_plain() {
 provide_music() {
     need sox "sox libsox-fmt-all"
     [ -s "$media/music.wav" ] && return
-    provide_song
+    "$root/scripts/fetch_tune.sh" funnyboat "$song_path" "$song_digest" "$song"
     sox_plain "$song" -b 16 "$media/music.part.wav" trim 30 30
     mv "$media/music.part.wav" "$media/music.wav"
 }
