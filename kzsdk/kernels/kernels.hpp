@@ -150,7 +150,7 @@ struct Variant {
     void (*polyphase_floats)(const FloatPhases& phases, const float* oldest, uint32_t phase,
                              float* output, uint32_t count) noexcept;
 
-    /// Widens the extremes by samples. NaN is passed over.
+    /// Moves the extremes apart where samples lie beyond them. NaN is passed over.
     void (*track_word_extremes)(Extremes<int32_t>& extremes, const int32_t* samples,
                                 uint32_t count) noexcept;
     void (*track_float_extremes)(Extremes<float>& extremes, const float* samples,

@@ -130,14 +130,14 @@ class Polyphase {
     /// each, and more of them find registers.
     ///
     /// @tparam Down     Samples from column to column.
-    /// @tparam Most     Columns that take turns at a row of taps.
+    /// @tparam MaxColumns  Columns that take turns at a row of taps.
     /// @tparam Aligned  All windows begin at an aligned sample, earlier by up to a vector, because
     ///                  loads of 32 bytes often cross cache lines. It pays where rows are so long
     ///                  that the zeros it adds to them cost less.
-    template <uint32_t Down, uint32_t Most, bool Aligned = false>
+    template <uint32_t Down, uint32_t MaxColumns, bool Aligned = false>
     struct Layout {
         static constexpr uint32_t kDown = Down;
-        static constexpr uint32_t kMaxColumns = Most;
+        static constexpr uint32_t kMaxColumns = MaxColumns;
         static constexpr size_t kMaxBack = Aligned ? kLanes - 1 : 0;
     };
     static constexpr uint32_t kLongRow = kLanes == 8 ? 80 : UINT32_MAX;
