@@ -9,6 +9,7 @@
 #include <cassert>
 #include <cstddef>
 #include <cstring>
+#include <limits>
 
 #include "kzsdk/dsp/convert.h"
 #include "kzsdk/fpx/fpx.h"
@@ -27,31 +28,26 @@ Word load(const uint8_t* bytes) noexcept
     return word;
 }
 
-// The bits of a magnitude in single precision are in order as integers are.
-constexpr int32_t kMagnitude = 0x7fffffff;
-constexpr int32_t kInfinity = 0x7f800000;
-constexpr int32_t kFullScale = std::bit_cast<int32_t>(32768.0F);
-constexpr int32_t kHalf = std::bit_cast<int32_t>(0.5F);
-
-// To the nearest integer, halves to the even one; clipped at full scale; what is not a number is
-// silence. Compares bits, and branches nowhere: compilers make vector instructions of that.
-int16_t from_float(float sample) noexcept
+// A float or a double to the nearest integer, halves to the even one; clipped at full scale; NaN
+// becomes silence. Compares bits, for those of a magnitude are in order as integers are, and
+// branches nowhere: compilers make vector instructions of that.
+//
+// @tparam Bits  The signed integer of the same size.
+template <class Bits, class Float>
+int16_t from_floating_point(Float sample) noexcept
 {
-    const auto bits = std::bit_cast<int32_t>(sample * 32768.0F); // exact, or infinite
-    const int32_t magnitude = bits & kMagnitude;
-    const int32_t is_number = int32_t{magnitude <= kInfinity};
-    const auto clipped = std::bit_cast<float>(std::min(magnitude, kFullScale) & -is_number);
+    constexpr auto kInfinity = std::bit_cast<Bits>(std::numeric_limits<Float>::infinity());
+    constexpr auto kFullScale = std::bit_cast<Bits>(Float{32768});
+    constexpr auto kHalf = std::bit_cast<Bits>(Float{0.5});
+    const auto bits = std::bit_cast<Bits>(sample * Float{32768}); // exact, or infinite
+    const Bits magnitude = bits & std::numeric_limits<Bits>::max();
+    const Bits is_number = Bits{magnitude <= kInfinity};
+    const auto clipped = std::bit_cast<Float>(std::min(magnitude, kFullScale) & -is_number);
     const auto whole = static_cast<int32_t>(clipped);
-    const auto rest = std::bit_cast<int32_t>(clipped - static_cast<float>(whole)); // exact
+    const auto rest = std::bit_cast<Bits>(clipped - static_cast<Float>(whole)); // exact
     const int32_t rounded = whole + (int32_t{rest > kHalf} | (int32_t{rest == kHalf} & whole));
-    const int32_t sign = bits >> 31; // -1 or 0
+    const auto sign = static_cast<int32_t>(bits >> (8 * sizeof(Bits) - 1)); // -1 or 0
     return static_cast<int16_t>(std::min((rounded ^ sign) - sign, 32767));
-}
-
-// Beyond full scale a double may not fit single precision, and all of it is clipped alike.
-int16_t from_double(double sample) noexcept
-{
-    return from_float(sample != sample ? 0.0F : static_cast<float>(std::clamp(sample, -2.0, 2.0)));
 }
 
 int16_t from_24_bits(const uint8_t* bytes) noexcept
@@ -92,12 +88,14 @@ void to_words(uint32_t format, const uint8_t* bytes, size_t count, int16_t* word
         });
         break;
     case KZ_STREAM_FORMAT_FLOAT32:
-        for_each<4>(bytes, count, words,
-                    [](const uint8_t* at) { return from_float(load<float>(at)); });
+        for_each<4>(bytes, count, words, [](const uint8_t* at) {
+            return from_floating_point<int32_t>(load<float>(at));
+        });
         break;
     case KZ_STREAM_FORMAT_FLOAT64:
-        for_each<8>(bytes, count, words,
-                    [](const uint8_t* at) { return from_double(load<double>(at)); });
+        for_each<8>(bytes, count, words, [](const uint8_t* at) {
+            return from_floating_point<int64_t>(load<double>(at));
+        });
         break;
     default: // KZ_STREAM_FORMAT_LINEAR8
         for_each<1>(bytes, count, words, [](const uint8_t* at) {

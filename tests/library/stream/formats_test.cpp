@@ -113,6 +113,44 @@ TEST(Formats, FloatsIgnoreTheRoundingMode)
 #endif
 }
 
+// Straight to 16 bits: single precision in between would make a half of what is just off it.
+TEST(Formats, DoublesAreRoundedOnce)
+{
+    const double off = 0x1p-36; // of a word; single precision loses it
+    const std::vector<double> scaled = {0.5 + off,  0.5 - off,      1.5 - off,    2.5 + off,
+                                        -0.5 - off, -1.5 + off,     1000.5 + off, 32766.5 + off,
+                                        32767.5,    -32767.5 - off, 0.5,          1.5};
+    std::vector<double> doubles(scaled);
+    std::ranges::transform(doubles, doubles.begin(), [](double d) { return d / 32768; });
+    EXPECT_EQ((std::vector<int16_t>{1, 0, 1, 3, -1, -1, 1001, 32767, 32767, -32768, 0, 2}),
+              words_of(KZ_STREAM_FORMAT_FLOAT64, doubles));
+}
+
+TEST(Formats, DoublesIgnoreTheRoundingMode)
+{
+    std::vector<double> doubles;
+    Random random(4);
+    for (int i = 0; i < 100000; ++i) {
+        const double sample = random.unit();
+        doubles.push_back(sample);
+        doubles.push_back((std::floor(sample * 32768) + 0.5) / 32768); // halves
+        doubles.push_back(std::nextafter(doubles.back(), sample));
+    }
+    const auto expected = words_of(KZ_STREAM_FORMAT_FLOAT64, doubles);
+    for (size_t i = 0; i < doubles.size(); ++i) {
+        const double scaled = std::clamp(doubles[i] * 32768, -32768.0, 32767.0);
+        ASSERT_EQ(std::lrint(scaled), expected[i]) << doubles[i];
+    }
+#if defined(FE_UPWARD) && defined(FE_DOWNWARD) && defined(FE_TOWARDZERO)
+    for (const int mode : {FE_UPWARD, FE_DOWNWARD, FE_TOWARDZERO}) {
+        ASSERT_EQ(0, std::fesetround(mode));
+        const auto words = words_of(KZ_STREAM_FORMAT_FLOAT64, doubles);
+        std::fesetround(FE_TONEAREST);
+        EXPECT_EQ(expected, words) << mode;
+    }
+#endif
+}
+
 // The sum over the next power of two, rounded, halves up.
 TEST(Formats, ManyChannelsBecomeOne)
 {
