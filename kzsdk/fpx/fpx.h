@@ -110,12 +110,13 @@ KZ_API kz_status kz_fpx_fingerprint_serialize_free(char** text_ref) KZ_NOEXCEPT;
 /**
  * Copies the values of a complete fingerprint: those that the document holds, with their sign.
  *
- * @param values     Room for @p capacity values. May be null when @p capacity is 0, to read the
- *                   count alone.
+ * @param values     Room for @p capacity values. Null, with a @p capacity of 0, asks for the count
+ *                   alone.
  * @param capacity   Values that fit; a default fingerprint has 30: the means of 15 bands from low
  *                   to high, then their spreads, each a share of its half's sum in units of
  *                   2^-15. A share of 1 wraps to -32768.
- * @param[out] out_count  The number of values there are, also when they are not copied.
+ * @param[out] out_count  The number of values there are, also when the fingerprint is not complete
+ *                   or the room too small; 0 on every other failure.
  * @return 0; KZ_FPX_ERROR_INVALID_ARGUMENT when a pointer is null; KZ_QV_ERROR_INCOMPLETE when the
  *         fingerprint is not complete; KZ_FPX_ERROR_ROOM when @p capacity is below the count;
  *         KZ_FPX_ERROR_MEMORY when memory is short. Nothing is copied on failure.
@@ -170,7 +171,8 @@ KZ_API kz_status kz_fpx_fingerprint_get_progress(const kz_fpx_handle* handle,
  * be shorter. A stream (kzsdk/stream/stream.h) is cut in this way by the library.
  *
  * @param[out] out_frames  Never 0. Below 150000 for rates up to 48000 Hz, about 3 s of audio in
- *                         general.
+ *                         general, but never more than the 2^32 - 1 bytes that one
+ *                         kz_fpx_fingerprint_add_audio() takes.
  * @return 0; KZ_FPX_ERROR_INVALID_ARGUMENT when a pointer is null.
  */
 KZ_API kz_status kz_fpx_fingerprint_get_next_frames(const kz_fpx_handle* handle,

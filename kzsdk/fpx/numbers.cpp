@@ -2,6 +2,8 @@
 /// What a fingerprint context reports as numbers: the values, where the signal starts, the times
 /// and the progress. Each call reads the algorithm's own object and converts nothing but units.
 
+#include <algorithm>
+
 #include "kzsdk/fpx/algorithm.hpp"
 #include "kzsdk/fpx/fpx.h"
 #include "kzsdk/fpx/pieces.hpp"
@@ -37,7 +39,11 @@ void store(Number* out, Number number) noexcept
 kz_status kz_fpx_fingerprint_get_values(kz_fpx_handle* handle, int16_t* values, uint32_t capacity,
                                         uint32_t* out_count) noexcept
 {
-    if (handle == nullptr || out_count == nullptr || (values == nullptr && capacity != 0)) {
+    if (out_count == nullptr) {
+        return KZ_FPX_ERROR_INVALID_ARGUMENT;
+    }
+    *out_count = 0;
+    if (handle == nullptr || (values == nullptr && capacity != 0)) {
         return KZ_FPX_ERROR_INVALID_ARGUMENT;
     }
     return visit(*handle, [=](auto fingerprinter, const auto& object) {
@@ -45,6 +51,9 @@ kz_status kz_fpx_fingerprint_get_values(kz_fpx_handle* handle, int16_t* values, 
         *out_count = bytes / static_cast<uint32_t>(sizeof(int16_t));
         if (!fingerprinter.is_complete(object)) {
             return KZ_QV_ERROR_INCOMPLETE;
+        }
+        if (values == nullptr) {
+            return KZ_OK; // only the count was asked for
         }
         if (capacity < *out_count) {
             return KZ_FPX_ERROR_ROOM;
@@ -103,8 +112,10 @@ kz_status kz_fpx_fingerprint_get_next_frames(const kz_fpx_handle* handle,
     if (handle == nullptr || out_frames == nullptr) {
         return KZ_FPX_ERROR_INVALID_ARGUMENT;
     }
-    *out_frames =
-        visit(*handle, [](auto, const auto& object) { return kz::qv::next_step_frames(object); });
+    *out_frames = visit(*handle, [](auto, const auto& object) {
+        const uint32_t most = UINT32_MAX / object.frame_bytes; // that one call takes
+        return std::min(kz::qv::next_step_frames(object), most);
+    });
     return KZ_OK;
 }
 

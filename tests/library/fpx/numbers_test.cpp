@@ -274,8 +274,36 @@ TYPED_TEST(Numbers, ValuesAreRefusedWithTheirCount)
     count = 0;
     EXPECT_EQ(KZ_FPX_ERROR_ROOM, kz_fpx_fingerprint_get_values(handle.get(), values, 29, &count));
     EXPECT_EQ(30U, count);
-    EXPECT_EQ(KZ_FPX_ERROR_ROOM, kz_fpx_fingerprint_get_values(handle.get(), nullptr, 0, &count));
+    EXPECT_EQ(KZ_FPX_ERROR_ROOM, kz_fpx_fingerprint_get_values(handle.get(), values, 0, &count));
     EXPECT_EQ(77, values[0]) << "copied on failure";
+    count = 9;
+    EXPECT_NE(KZ_OK, kz_fpx_fingerprint_get_values(nullptr, nullptr, 0, &count));
+    EXPECT_EQ(0U, count);
+}
+
+TYPED_TEST(Numbers, ValuesMayBeCountedAlone)
+{
+    uint32_t count = 0;
+    Context<TypeParam> handle(11025, mono);
+    EXPECT_EQ(KZ_QV_ERROR_INCOMPLETE,
+              kz_fpx_fingerprint_get_values(handle.get(), nullptr, 0, &count));
+    EXPECT_EQ(30U, count);
+    handle.feed(noise(11025 * 15, 0.5, 3), 0, 11025 * 15);
+    count = 0;
+    EXPECT_EQ(KZ_OK, kz_fpx_fingerprint_get_values(handle.get(), nullptr, 0, &count));
+    EXPECT_EQ(30U, count);
+}
+
+// What is reported as the next piece can be handed over: its bytes are counted in 32 bits.
+TYPED_TEST(Numbers, NextFramesFitOneCall)
+{
+    if (TypeParam::kAlgorithm == KZ_FPX_ALGORITHM_FLOAT) {
+        for (const uint32_t rate : {361000000U, 400000000U, 1000000000U}) {
+            const Context<TypeParam> handle(rate, stereo);
+            EXPECT_GT(handle.next_frames(), 0U);
+            EXPECT_LE(uint64_t{handle.next_frames()} * 4, UINT32_MAX) << rate;
+        }
+    }
 }
 
 TYPED_TEST(Numbers, RefuseNullPointers)
