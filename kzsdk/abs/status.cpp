@@ -34,8 +34,8 @@ constexpr Entry kTexts[] = {
     {KZ_MEM_NOT_ON,
      "The memory manager is off: start the library up first, and free before it is shut down."},
 
-    {KZ_INIT_ERROR_NOT_HELD,
-     "Nobody holds the library: call kzinit_release() only once for each kzinit_acquire()."},
+    {KZ_INIT_ERROR_NOT_HELD, "The library has no holder left to release: call kzinit_release() "
+                             "only once for each kzinit_acquire()."},
     {KZ_INIT_ERROR_NO_RECORD,
      "The start-up record is null: pass one that kzconf_initialize_configuration() has cleared."},
     {KZ_INIT_ERROR_TOO_MANY_HOLDERS,
@@ -78,7 +78,7 @@ constexpr Entry kTexts[] = {
      "KZ_FPX_ALGORITHM_FLOAT."},
 
     {KZ_STREAM_ERROR_MEMORY,
-     "Memory for the stream was short, and sound may be lost: free some memory and begin anew."},
+     "Memory for the stream or its result is short: free some, and repeat the call."},
     {KZ_STREAM_ERROR_INVALID_ARGUMENT,
      "A pointer is null or a reserved field is not 0: pass what stream.h states, in settings that "
      "kz_stream_initialize_settings() has filled."},
@@ -89,12 +89,16 @@ constexpr Entry kTexts[] = {
     {KZ_STREAM_ERROR_FORMAT,
      "The stream's sample format is unknown: use one of KZ_STREAM_FORMAT_PCM8 and the others."},
     {KZ_STREAM_ERROR_RATE,
-     "The algorithm does not take the stream's rate: compare with stream.h, use the "
-     "floating-point algorithm, or resample the sound."},
+     "The algorithm does not take the stream's rate: compare with stream.h, use "
+     "KZ_STREAM_FORMAT_LINEAR8 instead of KZ_STREAM_FORMAT_PCM8, use the floating-point "
+     "algorithm, or resample the sound."},
     {KZ_STREAM_ERROR_CHANNELS,
-     "A stream has 1 to 65535 channels, in KZ_STREAM_FORMAT_PCM8 1 or 2: pass the number of the "
-     "sound, or use KZ_STREAM_FORMAT_LINEAR8."},
+     "A stream has 1 to 65535 channels, in KZ_STREAM_FORMAT_PCM8 1 or 2: pass the sound's "
+     "channel count, or use KZ_STREAM_FORMAT_LINEAR8."},
     {KZ_STREAM_ERROR_FINISHED, "The stream was finished: create another one for more sound."},
+    {KZ_STREAM_ERROR_FAILED,
+     "Memory was short while the stream took sound, so it cannot go on: free the stream and some "
+     "memory, create another one, and feed it from the start."},
 
     {KZ_QV_ERROR_MEMORY,
      "Memory is short or the algorithm does not take the sample rate: compare the rate with the "
@@ -117,5 +121,5 @@ const char* kz_status_text(kz_status status) noexcept
             return entry.text;
         }
     }
-    return "This is no status of the library: pass one that its calls returned.";
+    return "This is not a status code of this library: pass one that its calls returned.";
 }

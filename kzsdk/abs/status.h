@@ -49,7 +49,7 @@ typedef uint32_t kz_status;
 
 /* ---- Library start-up (module 0x05) ---------------------------------------------------------- */
 
-/** Nobody holds the library: call kzinit_release() once for each kzinit_acquire(). */
+/** There is no holder left to release: call kzinit_release() once for each kzinit_acquire(). */
 #define KZ_INIT_ERROR_NOT_HELD UINT32_C(0x90050006)
 /** The configuration record is null: pass one, even if it is cleared. */
 #define KZ_INIT_ERROR_NO_RECORD UINT32_C(0x90050990)
@@ -101,7 +101,7 @@ typedef uint32_t kz_status;
 
 /* ---- Streams (module 0x09) ------------------------------------------------------------------- */
 
-/** Memory is short, and the stream cannot go on: free it, free some memory and begin anew. */
+/** Memory for the stream or its result is short: free some, and repeat the call. */
 #define KZ_STREAM_ERROR_MEMORY UINT32_C(0x90090001)
 /** A pointer is null, or a reserved field is not 0: pass what stream.h states, and clear the
     settings with kz_stream_initialize_settings(). */
@@ -113,7 +113,8 @@ typedef uint32_t kz_status;
 #define KZ_STREAM_ERROR_ALGORITHM UINT32_C(0x90090010)
 /** There is no sample format with this number: use one of KZ_STREAM_FORMAT_... */
 #define KZ_STREAM_ERROR_FORMAT UINT32_C(0x90090011)
-/** The algorithm cannot take the rate: use one of the rates in stream.h, use the floating-point
+/** The algorithm cannot take the rate, or only by decimation, which KZ_STREAM_FORMAT_PCM8 does not
+    allow: use one of the rates in stream.h, KZ_STREAM_FORMAT_LINEAR8 or the floating-point
     algorithm, or resample the sound. */
 #define KZ_STREAM_ERROR_RATE UINT32_C(0x90090012)
 /** There are 0 channels, or more than 65535, or more than 2 in KZ_STREAM_FORMAT_PCM8: pass the
@@ -121,6 +122,9 @@ typedef uint32_t kz_status;
 #define KZ_STREAM_ERROR_CHANNELS UINT32_C(0x90090013)
 /** The stream was finished: create another one for more sound. */
 #define KZ_STREAM_ERROR_FINISHED UINT32_C(0x90090014)
+/** Memory was short while the stream took sound, and it cannot go on: free it and some memory,
+    create another one, and feed that from the start. */
+#define KZ_STREAM_ERROR_FAILED UINT32_C(0x90090015)
 
 /* ---- Fingerprinters, both algorithms (module 0x0F) ------------------------------------------- */
 

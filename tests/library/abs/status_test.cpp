@@ -90,6 +90,7 @@ TEST(Status, OfStreamsIsMadeOfModuleAndReason)
     EXPECT_EQ(code(0x09, 0x012), KZ_STREAM_ERROR_RATE);
     EXPECT_EQ(code(0x09, 0x013), KZ_STREAM_ERROR_CHANNELS);
     EXPECT_EQ(code(0x09, 0x014), KZ_STREAM_ERROR_FINISHED);
+    EXPECT_EQ(code(0x09, 0x015), KZ_STREAM_ERROR_FAILED);
 }
 
 TEST(Status, HasItsOwnText)
