@@ -12,7 +12,9 @@
  *     const char* document = NULL;
  *
  *     kz_stream_initialize_settings(&settings);             16 bits, 44100 Hz, stereo
- *     kz_stream_create(&settings, &stream);
+ *     if (kz_stream_create(&settings, &stream) != KZ_OK) {
+ *         return;                                           kz_status_text() says why
+ *     }
  *     while (!complete && more audio is at hand) {
  *         kz_stream_feed(stream, audio, byte_count, NULL, &complete);
  *     }

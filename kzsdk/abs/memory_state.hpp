@@ -58,8 +58,18 @@ private:
 bool acquire_memory() noexcept;
 bool release_memory() noexcept;
 
-/// Allocations of the process that have failed so far, modulo 2^32; those while the manager was off
+/// Allocations of this thread that have failed so far, modulo 2^32; those while the manager was off
 /// are among them. It lets a caller notice a failure that the functions between conceal.
 uint32_t failed_allocations() noexcept;
+
+/// While it lives, _kzmem_free() on this thread frees although the manager is off. For owners that
+/// may outlive a plain shut-down; at most one per thread.
+class FreesWhileOff {
+public:
+    FreesWhileOff() noexcept;
+    ~FreesWhileOff();
+    FreesWhileOff(const FreesWhileOff&) = delete;
+    FreesWhileOff& operator=(const FreesWhileOff&) = delete;
+};
 
 } // namespace kz

@@ -1,4 +1,4 @@
-// What a stream reports: how it stands, and its fingerprint once that is complete.
+// What a stream reports: its state, and its fingerprint once that is complete.
 
 #include <algorithm>
 
@@ -9,16 +9,29 @@ namespace {
 constexpr uint64_t kNeeded = KZ_FPX_MILLISECONDS_NEEDED;
 constexpr uint32_t kWorkingRate = 11025;
 
-uint64_t milliseconds(uint64_t frames, uint32_t rate) noexcept
+// How many units of a rate the frames of another one last.
+uint64_t units(uint64_t frames, uint32_t rate, uint32_t unit_rate) noexcept
 {
-    return frames / rate * 1000 + frames % rate * 1000 / rate;
+    return frames / rate * unit_rate + frames % rate * unit_rate / rate;
 }
+
+uint64_t milliseconds(uint64_t frames, uint32_t rate) noexcept { return units(frames, rate, 1000); }
 
 // Leading silence, as far as the stream was analysed.
 struct Silence {
     uint64_t milliseconds;
     bool has_ended;
 };
+
+// The signal's offset is counted modulo 2^32. It lies near the end of what was analysed: from there
+// on the fingerprint is complete within seconds.
+uint64_t silent_samples(const kz_stream& stream, uint32_t offset) noexcept
+{
+    const uint64_t end = units(stream.judged_frames, stream.piece_rate, kWorkingRate);
+    const uint64_t distance = (uint64_t{1} << 32) + offset - static_cast<uint32_t>(end);
+    const auto signed_distance = static_cast<int32_t>(static_cast<uint32_t>(distance));
+    return static_cast<uint64_t>(static_cast<int64_t>(end) + signed_distance);
+}
 
 Silence silence_of(const kz_stream& stream) noexcept
 {
@@ -27,12 +40,12 @@ Silence silence_of(const kz_stream& stream) noexcept
     static_cast<void>(
         kz_fpx_fingerprint_get_signal_offset(stream.handle, &samples, nullptr, &found));
     if (found != 0) {
-        return {milliseconds(samples, kWorkingRate), true};
+        return {milliseconds(silent_samples(stream, samples), kWorkingRate), true};
     }
     return {milliseconds(stream.judged_frames, stream.piece_rate), false};
 }
 
-uint32_t standing_of(const kz_stream& stream, bool is_silent) noexcept
+uint32_t phase_of(const kz_stream& stream, bool is_silent) noexcept
 {
     if (stream.failure != KZ_OK) {
         return KZ_STREAM_FAILED;
@@ -80,19 +93,23 @@ kz_status kz_stream_get_state(const kz_stream* stream, kz_stream_state* out_stat
     const uint64_t taken = milliseconds(stream->frames, stream->rate);
     state.silence_milliseconds = std::min(silence.milliseconds, taken);
     state.sound_milliseconds = taken - state.silence_milliseconds;
-    state.standing = standing_of(*stream, !silence.has_ended && stream->judged_frames != 0);
-    if (state.standing != KZ_STREAM_COMPLETE) {
+    state.phase = phase_of(*stream, !silence.has_ended && stream->judged_frames != 0);
+    if (state.phase != KZ_STREAM_COMPLETE) {
         state.missing_milliseconds = missing(state.sound_milliseconds);
     }
     static_cast<void>(kz_fpx_fingerprint_get_progress(stream->handle, &state.percent));
-    state.odd_bytes = stream->unfinished_bytes;
+    state.partial_frame_bytes = stream->unfinished_bytes;
     return KZ_OK;
 }
 
 kz_status kz_stream_get_values(kz_stream* stream, int16_t* values, uint32_t capacity,
                                uint32_t* out_count) noexcept
 {
-    if (stream == nullptr || out_count == nullptr || (values == nullptr && capacity != 0)) {
+    if (out_count == nullptr) {
+        return KZ_STREAM_ERROR_INVALID_ARGUMENT;
+    }
+    *out_count = 0;
+    if (stream == nullptr || (values == nullptr && capacity != 0)) {
         return KZ_STREAM_ERROR_INVALID_ARGUMENT;
     }
     if (!kz::stream::library_is_on()) {

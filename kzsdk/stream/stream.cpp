@@ -18,7 +18,7 @@ using kz::stream::library_is_on;
 constexpr uint32_t kBlockSamples = 8192; ///< read together, of all channels
 constexpr uint32_t kFixedRates[] = {8000, 11025, 16000, 22050, 24000, 32000, 44100, 48000};
 
-// Gives back all that a stream owns. Memory must be on.
+// Gives back all that a stream owns. Memory must be on, or a kz::FreesWhileOff alive.
 struct Destroy {
     void operator()(kz_stream* stream) const noexcept
     {
@@ -53,6 +53,7 @@ uint32_t halvings_of(uint32_t algorithm, uint32_t rate) noexcept
     return halvings;
 }
 
+// In the order of the record.
 kz_status check(const kz_stream_settings& settings) noexcept
 {
     if (std::ranges::any_of(settings.reserved, [](uint32_t word) { return word != 0; })) {
@@ -66,13 +67,15 @@ kz_status check(const kz_stream_settings& settings) noexcept
         return KZ_STREAM_ERROR_FORMAT;
     }
     const bool folds = settings.format == KZ_STREAM_FORMAT_PCM8;
-    if (settings.channels == 0 || settings.channels > (folds ? 2 : KZ_STREAM_MAX_CHANNELS)) {
-        return KZ_STREAM_ERROR_CHANNELS;
-    }
     const uint32_t halvings = halvings_of(settings.algorithm, settings.sample_rate);
     const bool is_taken = settings.sample_rate != 0 && settings.sample_rate <= KZ_STREAM_MAX_RATE &&
                           halvings <= (folds ? 0 : kz::stream::kMaxHalvings);
-    return is_taken ? KZ_OK : KZ_STREAM_ERROR_RATE;
+    if (!is_taken) {
+        return KZ_STREAM_ERROR_RATE;
+    }
+    const uint32_t most_channels = folds ? 2 : KZ_STREAM_MAX_CHANNELS;
+    return settings.channels != 0 && settings.channels <= most_channels ? KZ_OK
+                                                                        : KZ_STREAM_ERROR_CHANNELS;
 }
 
 // Asks the extraction interface how long the next piece is to be.
@@ -133,7 +136,7 @@ void feed_piece(kz_stream& stream, const uint8_t* piece, uint32_t byte_count) no
     const kz_status status =
         kz_fpx_fingerprint_add_audio(stream.handle, piece, byte_count, &stream.is_complete);
     stream.judged_frames += byte_count / stream.layout.piece_frame_bytes();
-    stream.failure = watch.saw_failure() ? KZ_STREAM_ERROR_MEMORY : status;
+    stream.failure = watch.saw_failure() ? KZ_STREAM_ERROR_FAILED : status;
     if (stream.failure != KZ_OK) {
         stream.is_complete = 0;
     }
@@ -145,7 +148,7 @@ bool goes_on(const kz_stream& stream) noexcept
     return stream.failure == KZ_OK && stream.is_complete == 0;
 }
 
-// Adds frames as they go on; what comes after the fingerprint's end is dropped.
+// Adds frames that the fingerprinter takes; what comes after the fingerprint's end is dropped.
 void add_to_piece(kz_stream& stream, const uint8_t* bytes, uint64_t byte_count) noexcept
 {
     while (byte_count != 0 && goes_on(stream)) {
@@ -317,8 +320,11 @@ kz_status kz_stream_feed(kz_stream* stream, const void* bytes, uint64_t byte_cou
     if (out_used != nullptr) {
         *out_used = 0;
     }
-    if (stream == nullptr || out_complete == nullptr || (bytes == nullptr && byte_count != 0) ||
-        byte_count > SIZE_MAX) {
+    if (out_complete == nullptr) {
+        return KZ_STREAM_ERROR_INVALID_ARGUMENT;
+    }
+    *out_complete = 0;
+    if (stream == nullptr || (bytes == nullptr && byte_count != 0) || byte_count > SIZE_MAX) {
         return KZ_STREAM_ERROR_INVALID_ARGUMENT;
     }
     std::span rest(static_cast<const uint8_t*>(bytes), static_cast<size_t>(byte_count));
@@ -326,13 +332,17 @@ kz_status kz_stream_feed(kz_stream* stream, const void* bytes, uint64_t byte_cou
     if (out_used != nullptr) {
         *out_used = byte_count - rest.size();
     }
-    *out_complete = stream->is_complete;
+    *out_complete = status == KZ_OK ? stream->is_complete : 0;
     return status;
 }
 
 kz_status kz_stream_finish(kz_stream* stream, uint8_t* out_complete) noexcept
 {
-    if (stream == nullptr || out_complete == nullptr) {
+    if (out_complete == nullptr) {
+        return KZ_STREAM_ERROR_INVALID_ARGUMENT;
+    }
+    *out_complete = 0;
+    if (stream == nullptr) {
         return KZ_STREAM_ERROR_INVALID_ARGUMENT;
     }
     kz_status status = refusal(*stream);
@@ -341,7 +351,7 @@ kz_status kz_stream_finish(kz_stream* stream, uint8_t* out_complete) noexcept
         drain(*stream);
         status = stream->failure;
     }
-    *out_complete = stream->is_complete;
+    *out_complete = status == KZ_OK ? stream->is_complete : 0;
     return status;
 }
 
@@ -353,12 +363,11 @@ kz_status kz_stream_free(kz_stream** stream_ref) noexcept
     kz_stream* const stream = *stream_ref;
     *stream_ref = nullptr;
     if (stream != nullptr) {
-        const bool is_held = kz::acquire_memory(); // also when it was shut down under the stream
-        Destroy{}(stream);
-        static_cast<void>(kz::release_memory()); // the stream's own
-        if (is_held) {
-            static_cast<void>(kz::release_memory());
+        {
+            const kz::FreesWhileOff frees; // also when it was shut down under the stream
+            Destroy{}(stream);
         }
+        static_cast<void>(kzinit_release());
     }
     return KZ_OK;
 }

@@ -7,7 +7,9 @@
  *     uint8_t complete = 0;
  *     kz_stream_initialize_settings(&settings);        fixed algorithm, 16 bits, 44100 Hz, stereo
  *     settings.format = KZ_STREAM_FORMAT_FLOAT32;
- *     kz_stream_create(&settings, &stream);
+ *     if (kz_stream_create(&settings, &stream) != KZ_OK) {
+ *         return;                                      kz_status_text() says why
+ *     }
  *     while (!complete && bytes are at hand) {
  *         kz_stream_feed(stream, bytes, byte_count, NULL, &complete);
  *     }
@@ -48,8 +50,9 @@ typedef struct kz_stream kz_stream;
  *
  * Formats with more than 16 bits are taken as 16 bits, without dither. Integers lose their low bits
  * (rounded down). Of floating-point samples full scale is 1: they are multiplied by 32768, rounded
- * to the nearest integer, halves to the even one, and clipped at -32768 and 32767; what is not a
- * number is silence; doubles become single precision first.
+ * to the nearest integer, halves to the even one, and clipped at -32768 and 32767; NaN becomes
+ * silence. Doubles are rounded only once, straight to 16 bits. The caller's rounding mode has no
+ * influence.
  *
  * A-law, mu-law and KZ_STREAM_FORMAT_PCM8 go to the fingerprinter as they are where it takes the
  * rate and the channels; else the first two are expanded to 16 bits by G.711.
@@ -57,7 +60,8 @@ typedef struct kz_stream kz_stream;
  * There are two 8-bit formats. KZ_STREAM_FORMAT_LINEAR8 is that of WAV files, silent at 128: sound
  * of 16 bits, (sample - 128) * 256. KZ_STREAM_FORMAT_PCM8 is that of the extraction interface,
  * whose converters fold the lower half up: use it to compare with fingerprints made that way. It
- * can neither be mixed down nor decimated.
+ * can neither be mixed down nor decimated: with more channels, or at a rate that has to be
+ * decimated, use KZ_STREAM_FORMAT_LINEAR8.
  */
 enum {
     KZ_STREAM_FORMAT_PCM8 = 1,    /**< 8-bit offset PCM, folded, as KZ_FPX_FORMAT_PCM8 */
@@ -114,8 +118,8 @@ KZ_API kz_status kz_stream_initialize_settings(kz_stream_settings* settings) KZ_
  * @param[out] out_stream  The stream, which the caller frees with kz_stream_free(); null on
  *                         failure.
  * @return 0; KZ_STREAM_ERROR_INVALID_ARGUMENT when a pointer is null or a reserved field is not 0;
- *         KZ_STREAM_ERROR_ALGORITHM, KZ_STREAM_ERROR_FORMAT, KZ_STREAM_ERROR_CHANNELS or
- *         KZ_STREAM_ERROR_RATE for the first field that cannot be used;
+ *         KZ_STREAM_ERROR_ALGORITHM, KZ_STREAM_ERROR_FORMAT, KZ_STREAM_ERROR_RATE or
+ *         KZ_STREAM_ERROR_CHANNELS for the first field that cannot be used;
  *         KZ_INIT_ERROR_TOO_MANY_HOLDERS; KZ_STREAM_ERROR_MEMORY when memory is short.
  */
 KZ_API kz_status kz_stream_create(const kz_stream_settings* settings,
@@ -130,27 +134,28 @@ KZ_API kz_status kz_stream_create(const kz_stream_settings* settings,
  * @param[out] out_used  Bytes taken: all of them, or up to where the fingerprint was complete.
  *                    Where that is in the stream does not depend on its cuts; it may lie up to 3 s
  *                    of sound beyond what was needed. May be null.
- * @param[out] out_complete  Set to 1 once the fingerprint is complete, else to 0.
+ * @param[out] out_complete  Set to 1 once the fingerprint is complete, else to 0, also on every
+ *                    failure.
  * @return 0; KZ_STREAM_ERROR_INVALID_ARGUMENT when a pointer is null; KZ_STREAM_ERROR_FINISHED
  *         after kz_stream_finish(), unless it is complete; KZ_STREAM_ERROR_NOT_STARTED when the
- *         library was shut down (nothing is taken); KZ_STREAM_ERROR_MEMORY when memory was short,
- *         here or on another thread of the library: frames may be lost, so this and every later
- *         feed fails.
+ *         library was shut down (nothing is taken); KZ_STREAM_ERROR_FAILED when memory was short in
+ *         this feed or an earlier one: frames may be lost, so every later call that feeds, finishes
+ *         or asks for results fails too.
  */
 KZ_API kz_status kz_stream_feed(kz_stream* stream, const void* bytes, uint64_t byte_count,
                                 uint64_t* out_used, uint8_t* out_complete) KZ_NOEXCEPT;
 
 /**
  * Ends the sound: what is kept is analysed, but for the bytes of an unfinished frame
- * (kz_stream_state.odd_bytes). May be repeated.
+ * (kz_stream_state.partial_frame_bytes). May be repeated.
  *
- * @param[out] out_complete  1 when the fingerprint is complete; else 0, and kz_stream_get_state()
- *                           reports what it lacks.
+ * @param[out] out_complete  1 when the fingerprint is complete; else 0, also on every failure,
+ *                           and kz_stream_get_state() reports what it lacks.
  * @return As kz_stream_feed() does, but for KZ_STREAM_ERROR_FINISHED.
  */
 KZ_API kz_status kz_stream_finish(kz_stream* stream, uint8_t* out_complete) KZ_NOEXCEPT;
 
-/** How a stream stands. */
+/** The state of a stream. */
 enum {
     KZ_STREAM_COMPLETE = 0,    /**< the fingerprint is complete */
     KZ_STREAM_NOTHING_FED = 1, /**< no whole frame has come yet */
@@ -167,17 +172,17 @@ typedef struct kz_stream_state {
     uint64_t frames;               /**< whole frames taken so far */
     uint64_t silence_milliseconds; /**< leading silence that was skipped */
     uint64_t sound_milliseconds;   /**< the rest of what was taken */
-    uint32_t standing;             /**< one of the numbers above */
+    uint32_t phase;                /**< one of the numbers above */
     uint32_t percent;              /**< of the frames of the fingerprint, 0 .. 100 */
     uint32_t missing_milliseconds; /**< of sound, before the fingerprint is complete: about
                                         KZ_FPX_MILLISECONDS_NEEDED in all; 0 when it is complete,
                                         else not 0 */
-    uint32_t odd_bytes;            /**< bytes of a frame that is not whole yet */
+    uint32_t partial_frame_bytes;  /**< bytes of a frame that is not whole yet */
     uint32_t reserved[6];          /**< 0 */
 } kz_stream_state;
 
 /**
- * Reports how a stream stands, at any time.
+ * Reports the state of a stream, at any time.
  *
  * @return 0; KZ_STREAM_ERROR_INVALID_ARGUMENT when a pointer is null.
  */
@@ -187,9 +192,15 @@ KZ_API kz_status kz_stream_get_state(const kz_stream* stream,
 /**
  * Copies the values of a complete fingerprint, as kz_fpx_fingerprint_get_values() does.
  *
- * @return What that function returns, with KZ_STREAM_ERROR_INVALID_ARGUMENT when a pointer is null,
- *         KZ_STREAM_ERROR_NOT_STARTED when the library was shut down and KZ_STREAM_ERROR_MEMORY
- *         when memory is short; the call may then be repeated.
+ * @param values     Room for @p capacity values. Null, with a @p capacity of 0, asks for the count
+ *                   alone.
+ * @param[out] out_count  The number of values there are, also when the fingerprint is not complete
+ *                   or the room too small; 0 on every other failure.
+ * @return 0; KZ_STREAM_ERROR_INVALID_ARGUMENT when a pointer is null; KZ_QV_ERROR_INCOMPLETE when
+ *         the fingerprint is not complete; KZ_FPX_ERROR_ROOM when @p capacity is below the count;
+ *         KZ_STREAM_ERROR_NOT_STARTED when the library was shut down; KZ_STREAM_ERROR_FAILED when
+ *         the stream cannot go on; KZ_STREAM_ERROR_MEMORY when memory is short: the call may then
+ *         be repeated.
  */
 KZ_API kz_status kz_stream_get_values(kz_stream* stream, int16_t* values, uint32_t capacity,
                                       uint32_t* out_count) KZ_NOEXCEPT;
@@ -201,7 +212,8 @@ KZ_API kz_status kz_stream_get_values(kz_stream* stream, int16_t* values, uint32
  *                       freed; null on failure.
  * @return 0; KZ_STREAM_ERROR_INVALID_ARGUMENT when a pointer is null; KZ_QV_ERROR_INCOMPLETE when
  *         the fingerprint is not complete; KZ_STREAM_ERROR_NOT_STARTED when the library was shut
- *         down; KZ_STREAM_ERROR_MEMORY when memory is short. The call may then be repeated.
+ *         down; KZ_STREAM_ERROR_FAILED when the stream cannot go on; KZ_STREAM_ERROR_MEMORY when
+ *         memory is short: the call may then be repeated.
  */
 KZ_API kz_status kz_stream_get_document(kz_stream* stream, const char** out_text) KZ_NOEXCEPT;
 
@@ -226,8 +238,7 @@ KZ_API kz_status kz_stream_get_times(const kz_stream* stream, uint32_t* out_star
 
 /**
  * Frees a stream with its document, gives back its hold on the library and sets the caller's
- * pointer to null. Nothing leaks after a kzinit_shutdown_vesk() either: memory is switched on for
- * the call.
+ * pointer to null. Nothing leaks after a kzinit_shutdown_vesk() either; the library stays off then.
  *
  * @return 0, also when *stream_ref is null; KZ_STREAM_ERROR_INVALID_ARGUMENT when @p stream_ref is
  *         null.

@@ -4,8 +4,8 @@
 ///     bytes -> unfinished frame -> words -> decimator -> piece -> kz_fpx_fingerprint_add_audio()
 ///
 /// A piece has as many frames as the extraction interface reports for the next, so that the
-/// fingerprint is the one of a single call. What goes as it is skips the two in the middle, and
-/// skips the piece as well when the caller's bytes hold a whole one.
+/// fingerprint is the one of a single call. Frames that need no conversion are copied to the piece
+/// directly; where the caller's bytes hold a whole piece, it is fed from there.
 #pragma once
 
 #include <cstdint>

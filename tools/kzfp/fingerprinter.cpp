@@ -90,9 +90,9 @@ std::string too_little(const kz_stream& stream, const audio::Source& source)
     kz_stream_get_state(&stream, &state);
     const double seconds = static_cast<double>(state.frames) / source.format().rate;
     std::string text;
-    if (state.standing == KZ_STREAM_NOTHING_FED) {
+    if (state.phase == KZ_STREAM_NOTHING_FED) {
         text = "no sound";
-    } else if (state.standing == KZ_STREAM_SILENT) {
+    } else if (state.phase == KZ_STREAM_SILENT) {
         text = "nothing but silence in " + tenths(seconds);
     } else {
         const double silence = silence_of(stream).seconds;

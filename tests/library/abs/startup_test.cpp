@@ -236,4 +236,30 @@ TEST_F(Startup, FailedAllocationsAreCounted)
     EXPECT_EQ(KZ_OK, kzinit_release());
 }
 
+TEST_F(Startup, FailedAllocationsCountByThread)
+{
+    const uint32_t before = kz::failed_allocations();
+    std::thread([] {
+        EXPECT_EQ(nullptr, _kzmem_malloc(1));
+        EXPECT_EQ(1U, kz::failed_allocations());
+    }).join();
+    EXPECT_EQ(before, kz::failed_allocations());
+}
+
+TEST_F(Startup, OwnersMayFreeWhileItIsOff)
+{
+    ASSERT_EQ(KZ_OK, kzinit_acquire());
+    void* const block = _kzmem_malloc(1);
+    ASSERT_EQ(KZ_OK, kzinit_release());
+    EXPECT_EQ(KZ_MEM_NOT_ON, _kzmem_free(block));
+    {
+        const kz::FreesWhileOff frees;
+        EXPECT_FALSE(is_on());
+        EXPECT_EQ(nullptr, _kzmem_malloc(1)) << "it allocates nothing";
+        std::thread([] { EXPECT_EQ(KZ_MEM_NOT_ON, _kzmem_free(nullptr)); }).join();
+        EXPECT_EQ(KZ_OK, _kzmem_free(block));
+    }
+    EXPECT_EQ(KZ_MEM_NOT_ON, _kzmem_free(nullptr));
+}
+
 } // namespace

@@ -43,7 +43,7 @@ Outcome run(const kz_stream_settings& settings, const Bytes& sound, NextSize nex
         complete = taken.complete;
         at += count;
     }
-    EXPECT_EQ(finish(stream.get()), state_of(stream.get()).standing == KZ_STREAM_COMPLETE);
+    EXPECT_EQ(finish(stream.get()), state_of(stream.get()).phase == KZ_STREAM_COMPLETE);
     outcome.document = document_of(stream.get());
     outcome.state = state_of(stream.get());
     return outcome;
@@ -209,7 +209,7 @@ TEST_P(Cuts, NeverShowInStreamsThatEndEarly)
         const auto settings = settings_of(GetParam(), KZ_STREAM_FORMAT_PCM16, rate, channels);
         const Outcome whole = run_whole(settings, sound);
         EXPECT_EQ("", whole.document);
-        EXPECT_EQ(sound.size() % (2U * channels), whole.state.odd_bytes);
+        EXPECT_EQ(sound.size() % (2U * channels), whole.state.partial_frame_bytes);
         expect_equal(whole, run_at_random(settings, sound, 1000U + random.below(1000)));
     }
 }

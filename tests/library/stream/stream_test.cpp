@@ -4,6 +4,8 @@
 #include <thread>
 
 #include "kzsdk/abs/memory.h"
+#include "kzsdk/fpx/algorithm.hpp"
+#include "kzsdk/qvfixed/qvfixed.h"
 #include "kzsdk/stream/stream_record.hpp"
 #include "library/stream/streams.hpp"
 #include "support/allocation.hpp"
@@ -85,6 +87,9 @@ TEST_F(Streams, RefuseSettingsFieldByField)
     EXPECT_EQ(KZ_STREAM_ERROR_ALGORITHM, creation(3, kPcm16, 44100, 2));
     EXPECT_EQ(KZ_STREAM_ERROR_FORMAT, creation(kFixed, 0, 44100, 2));
     EXPECT_EQ(KZ_STREAM_ERROR_FORMAT, creation(kFixed, 10, 44100, 2));
+    EXPECT_EQ(KZ_STREAM_ERROR_ALGORITHM, creation(0, 0, 0, 0)) << "in the order of the record";
+    EXPECT_EQ(KZ_STREAM_ERROR_FORMAT, creation(kFixed, 0, 0, 0));
+    EXPECT_EQ(KZ_STREAM_ERROR_RATE, creation(kFixed, kPcm16, 0, 0));
     EXPECT_EQ(KZ_STREAM_ERROR_CHANNELS, creation(kFixed, kPcm16, 44100, 0));
     EXPECT_EQ(KZ_STREAM_ERROR_CHANNELS, creation(kFixed, kPcm16, 44100, 65536));
     EXPECT_EQ(KZ_STREAM_ERROR_CHANNELS, creation(kFixed, KZ_STREAM_FORMAT_PCM8, 44100, 3));
@@ -125,7 +130,7 @@ TEST_F(Streams, TakeAnyNumberOfChannels)
         const Bytes frames(size_t{channels} * 8 * 3 - 1);
         feed(stream.get(), frames.data(), frames.size());
         EXPECT_EQ(2U, state_of(stream.get()).frames);
-        EXPECT_EQ(channels * 8 - 1, state_of(stream.get()).odd_bytes);
+        EXPECT_EQ(channels * 8 - 1, state_of(stream.get()).partial_frame_bytes);
     }
 }
 
@@ -162,6 +167,27 @@ TEST_F(Streams, RefuseNullPointers)
     EXPECT_EQ(0U, state_of(stream.get()).frames);
 }
 
+TEST_F(Streams, ClearTheirResultsOnFailure)
+{
+    Stream stream = stream_of_44100_hz();
+    uint8_t complete = 9;
+    EXPECT_NE(KZ_OK, kz_stream_feed(nullptr, &complete, 1, nullptr, &complete));
+    EXPECT_EQ(0, complete);
+    complete = 9;
+    EXPECT_NE(KZ_OK, kz_stream_finish(nullptr, &complete));
+    EXPECT_EQ(0, complete);
+    uint32_t count = 9;
+    EXPECT_NE(KZ_OK, kz_stream_get_values(nullptr, nullptr, 0, &count));
+    EXPECT_EQ(0U, count);
+    EXPECT_TRUE(feed_music(stream, 0, 16).complete);
+    ASSERT_EQ(KZ_OK, kzinit_shutdown_vesk());
+    EXPECT_EQ(KZ_STREAM_ERROR_NOT_STARTED, kz_stream_finish(stream.get(), &complete));
+    EXPECT_EQ(0, complete);
+    count = 9;
+    EXPECT_EQ(KZ_STREAM_ERROR_NOT_STARTED, kz_stream_get_values(stream.get(), nullptr, 0, &count));
+    EXPECT_EQ(0U, count);
+}
+
 // ---- Reports
 
 TEST_F(Streams, ReportNothingFed)
@@ -169,7 +195,7 @@ TEST_F(Streams, ReportNothingFed)
     const Stream stream = stream_of_44100_hz();
     for (const bool finished : {false, true}) {
         const auto state = state_of(stream.get());
-        EXPECT_EQ(uint32_t{KZ_STREAM_NOTHING_FED}, state.standing) << finished;
+        EXPECT_EQ(uint32_t{KZ_STREAM_NOTHING_FED}, state.phase) << finished;
         EXPECT_EQ(14220U, state.missing_milliseconds);
         EXPECT_EQ(0U, state.percent);
         EXPECT_FALSE(finish(stream.get()));
@@ -181,12 +207,12 @@ TEST_F(Streams, ReportSilence)
     const Stream stream = stream_of_44100_hz();
     feed_music(stream, 10, 0);
     auto state = state_of(stream.get());
-    EXPECT_EQ(uint32_t{KZ_STREAM_SILENT}, state.standing);
+    EXPECT_EQ(uint32_t{KZ_STREAM_SILENT}, state.phase);
     EXPECT_EQ(10000U, state.silence_milliseconds + state.sound_milliseconds);
     EXPECT_LE(state.sound_milliseconds, 3000U) << "not yet analysed";
     EXPECT_FALSE(finish(stream.get()));
     state = state_of(stream.get());
-    EXPECT_EQ(uint32_t{KZ_STREAM_SILENT}, state.standing);
+    EXPECT_EQ(uint32_t{KZ_STREAM_SILENT}, state.phase);
     EXPECT_EQ(10000U, state.silence_milliseconds);
     EXPECT_EQ(0U, state.sound_milliseconds);
     EXPECT_EQ(14220U, state.missing_milliseconds);
@@ -198,7 +224,7 @@ TEST_F(Streams, ReportHowMuchIsMissing)
     feed_music(stream, 5, 8);
     EXPECT_FALSE(finish(stream.get()));
     const auto state = state_of(stream.get());
-    EXPECT_EQ(uint32_t{KZ_STREAM_TOO_SHORT}, state.standing);
+    EXPECT_EQ(uint32_t{KZ_STREAM_TOO_SHORT}, state.phase);
     EXPECT_EQ(13000U, state.silence_milliseconds + state.sound_milliseconds);
     EXPECT_NEAR(5000, static_cast<double>(state.silence_milliseconds), 10);
     EXPECT_EQ(14220 - state.sound_milliseconds, state.missing_milliseconds);
@@ -212,6 +238,27 @@ TEST_F(Streams, ReportHowMuchIsMissing)
     EXPECT_NEAR(5, seconds, 0.01);
 }
 
+// The signal's offset is counted in 32 bits, which wrap after 4.5 days of silence.
+TEST_F(Streams, CountDaysOfSilence)
+{
+    for (const uint64_t days : {4U, 5U, 9U, 40U}) {
+        const Stream stream = create(settings_of(kFixed, kPcm16, 22050, 1));
+        const uint64_t seconds = days * 24 * 3600;
+        stream->frames = seconds * 22050; // as if so many had been fed
+        stream->judged_frames = stream->frames;
+        auto* const object = static_cast<kzqvfixed_fingerprinter*>(stream->handle->instance);
+        object->signal_offset = static_cast<uint32_t>(seconds * 11025);
+        EXPECT_EQ(seconds * 1000, state_of(stream.get()).silence_milliseconds) << days;
+        feed_music(stream, 5, 8, 22050);
+        const auto state = state_of(stream.get());
+        EXPECT_EQ(uint32_t{KZ_STREAM_TOO_SHORT}, state.phase);
+        EXPECT_NEAR(static_cast<double>(seconds * 1000 + 5000),
+                    static_cast<double>(state.silence_milliseconds), 10)
+            << days;
+        EXPECT_EQ((seconds + 13) * 1000, state.silence_milliseconds + state.sound_milliseconds);
+    }
+}
+
 // What it says is missing is enough, and little more than that.
 TEST_F(Streams, MissingSoundCompletesTheFingerprint)
 {
@@ -220,7 +267,7 @@ TEST_F(Streams, MissingSoundCompletesTheFingerprint)
         feed_music(stream, 0, 8, rate);
         const double rest = state_of(stream.get()).missing_milliseconds / 1000.0;
         feed_music(stream, 0, rest - 0.05, rate);
-        EXPECT_EQ(uint32_t{KZ_STREAM_TOO_SHORT}, state_of(stream.get()).standing) << rate;
+        EXPECT_EQ(uint32_t{KZ_STREAM_TOO_SHORT}, state_of(stream.get()).phase) << rate;
         feed_music(stream, 0, 0.05, rate);
         EXPECT_TRUE(finish(stream.get())) << rate;
         EXPECT_EQ(0U, state_of(stream.get()).missing_milliseconds);
@@ -248,6 +295,9 @@ TEST_F(Streams, ReportTheFingerprintOnceComplete)
     EXPECT_EQ(nullptr, text);
     EXPECT_TRUE(feed_music(stream, 1, 16).complete);
     EXPECT_EQ(KZ_FPX_ERROR_ROOM, kz_stream_get_values(stream.get(), values, 29, &count));
+    count = 0;
+    EXPECT_EQ(KZ_OK, kz_stream_get_values(stream.get(), nullptr, 0, &count)) << "the count alone";
+    EXPECT_EQ(30U, count);
     EXPECT_EQ(KZ_OK, kz_stream_get_values(stream.get(), values, 30, &count));
     EXPECT_EQ(30U, count);
     EXPECT_EQ(KZ_OK, kz_stream_get_document(stream.get(), &text));
@@ -334,6 +384,23 @@ TEST_F(Streams, SurviveAPlainShutdown)
     EXPECT_FALSE(is_on());
 }
 
+// The library stays off for every user, also for a stream that is still alive.
+TEST_F(Streams, FreeingDoesNotUndoAPlainShutdown)
+{
+    Stream first = stream_of_44100_hz();
+    Stream second = stream_of_44100_hz();
+    ASSERT_EQ(KZ_OK, kzinit_shutdown_vesk());
+    first.reset();
+    EXPECT_FALSE(is_on());
+    const uint8_t bytes[2] = {};
+    uint8_t complete = 9;
+    EXPECT_EQ(KZ_STREAM_ERROR_NOT_STARTED,
+              kz_stream_feed(second.get(), bytes, 2, nullptr, &complete));
+    EXPECT_EQ(KZ_MEM_NOT_ON, _kzmem_free(nullptr)) << "only the stream's own blocks are freed";
+    second.reset();
+    EXPECT_EQ(KZ_INIT_ERROR_NOT_HELD, kzinit_release()) << "both holds were given back";
+}
+
 TEST_F(Streams, WorkBesideEachOtherOnThreads)
 {
     std::vector<std::string> documents(4);
@@ -386,27 +453,29 @@ TEST_F(Streams, NeverConcealALostFrame)
         uint8_t complete = 9;
         const kz_status status =
             kz_stream_feed(stream.get(), sound.data(), sound.size(), nullptr, &complete);
-        EXPECT_EQ(fired() ? KZ_STREAM_ERROR_MEMORY : KZ_OK, status);
+        EXPECT_EQ(fired() ? KZ_STREAM_ERROR_FAILED : KZ_OK, status);
         EXPECT_EQ(status == KZ_OK ? 1 : 0, complete);
         if (status != KZ_OK) {
-            EXPECT_EQ(uint32_t{KZ_STREAM_FAILED}, state_of(stream.get()).standing);
-            EXPECT_EQ(KZ_STREAM_ERROR_MEMORY, kz_stream_finish(stream.get(), &complete));
+            EXPECT_EQ(uint32_t{KZ_STREAM_FAILED}, state_of(stream.get()).phase);
+            EXPECT_EQ(KZ_STREAM_ERROR_FAILED, kz_stream_finish(stream.get(), &complete));
             EXPECT_EQ(0, complete);
             const char* text = nullptr;
-            EXPECT_EQ(KZ_STREAM_ERROR_MEMORY, kz_stream_get_document(stream.get(), &text));
+            EXPECT_EQ(KZ_STREAM_ERROR_FAILED, kz_stream_get_document(stream.get(), &text));
         }
     });
 }
 
-// Allocations are counted for the whole process: better a stream too many fails than one too few.
-TEST_F(Streams, CountFailuresOfOtherThreadsAsTheirs)
+TEST_F(Streams, IgnoreFailuresOfOtherThreads)
 {
     const Stream stream = stream_of_44100_hz();
     const stream::AllocationWatch watch;
-    EXPECT_FALSE(watch.saw_failure());
     const AllocationFault fault(1);
-    std::thread([] { EXPECT_EQ(nullptr, _kzmem_malloc(1)); }).join();
-    EXPECT_TRUE(watch.saw_failure());
+    std::thread([] {
+        const stream::AllocationWatch own;
+        EXPECT_EQ(nullptr, _kzmem_malloc(1));
+        EXPECT_TRUE(own.saw_failure());
+    }).join();
+    EXPECT_FALSE(watch.saw_failure());
 }
 
 TEST_F(Streams, ResultsMayBeAskedForAgain)

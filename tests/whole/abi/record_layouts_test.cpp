@@ -286,10 +286,10 @@ TEST(RecordLayout, OfTheStateOfAStream)
         FIELD(Record, frames),
         FIELD(Record, silence_milliseconds),
         FIELD(Record, sound_milliseconds),
-        FIELD(Record, standing),
+        FIELD(Record, phase),
         FIELD(Record, percent),
         FIELD(Record, missing_milliseconds),
-        FIELD(Record, odd_bytes),
+        FIELD(Record, partial_frame_bytes),
         FIELD(Record, reserved),
     });
     static_assert(sizeof(Record) == 64);
