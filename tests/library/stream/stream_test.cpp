@@ -110,6 +110,9 @@ TEST_F(Streams, FixedAlgorithmTakesEightRatesAndDoubles)
         EXPECT_EQ(KZ_STREAM_ERROR_RATE, creation(kFixed, kPcm16, rate, 1)) << rate;
     }
     EXPECT_EQ(KZ_STREAM_ERROR_RATE, creation(kFixed, KZ_STREAM_FORMAT_PCM8, 96000, 1));
+    EXPECT_EQ(KZ_OK, creation(kFixed, KZ_STREAM_FORMAT_LINEAR8, 96000, 1)) << "its cure";
+    EXPECT_NE(nullptr,
+              std::strstr(kz_status_text(KZ_STREAM_ERROR_RATE), "KZ_STREAM_FORMAT_LINEAR8"));
 }
 
 TEST_F(Streams, FloatAlgorithmTakesEveryRate)
