@@ -6,7 +6,7 @@
 
 PROGRAM is a kzbench. Each variant of the inner loops has its own figures; one that this machine or
 this build does not have is skipped, and keeps its figures when others are recorded. Counts
-depend on the compiler, so figures of another one are not compared.
+depend on the compiler, so those of another compiler are not compared.
 """
 
 import argparse

@@ -74,8 +74,8 @@ bool process_and_write(const std::string& name, const FingerprintOptions& option
     try {
         const Result result = process(name, options);
         if (!takes_rate(options.algorithm, result.facts.rate)) {
-            report("the library does not take " + std::to_string(result.facts.rate) +
-                   " Hz, converted to " + std::to_string(audio::kConvertedRate) + " Hz");
+            report("converted from " + std::to_string(result.facts.rate) + " Hz to " +
+                   std::to_string(audio::kConvertedRate) + " Hz");
         }
         progress.clear();
         write_output(to_output(options, name, result));

@@ -58,7 +58,7 @@ std::string about_rates()
            rates_of(Algorithm::floating) +
            " Hz; any other rate of a sound\n"
            "           file is converted to " +
-           std::to_string(audio::kConvertedRate) + " Hz and that is said on standard error.\n";
+           std::to_string(audio::kConvertedRate) + " Hz, with a note on standard error.\n";
 }
 
 constexpr const char* kMoreNotes =
