@@ -165,7 +165,7 @@ public class FingerprintTest {
     }
 
     @Test
-    public void refusesARequestOnTheFingerprintThreadInsteadOfWaitingForItself() throws Exception {
+    public void refusesARequestOnTheFingerprintThread() throws Exception {
         BlockingQueue<Throwable> thrown = new LinkedBlockingQueue<>();
         try (Fingerprint fingerprint = new Fingerprint()) {
             fingerprint.setListener(new Told() {

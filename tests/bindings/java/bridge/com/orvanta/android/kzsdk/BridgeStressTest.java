@@ -28,7 +28,7 @@ public class BridgeStressTest {
     }
 
     @Test
-    public void noRequestIsLostThatIsMadeTheMomentTheEventHasCome() throws Exception {
+    public void noRequestMadeAsTheEventArrivesIsLost() throws Exception {
         Fingerprint object = new Fingerprint();
         Fingerprint.Events events = new Fingerprint.Events();
         assertEquals(0, object.native_setup(events));

@@ -138,7 +138,7 @@ public class BridgeTest {
     }
 
     @Test
-    public void aWorkerThatWakesWithoutReasonRepeatsItsLastJob() throws Exception {
+    public void aSpuriousWakeRepeatsTheLastJob() throws Exception {
         start();
         assertEquals(0, request(AUDIO));
         events.next();
@@ -172,7 +172,7 @@ public class BridgeTest {
     }
 
     @Test
-    public void aFinalizedObjectKeepsItsNumberWhichFindsNothing() {
+    public void theNumberOfAFinalizedObjectFindsNothing() {
         start();
         int number = object.mNativeContext;
         object.native_finalize();
@@ -226,7 +226,7 @@ public class BridgeTest {
     }
 
     @Test
-    public void aTextOfSixHundredCharactersArrivesWholeAndNothingBehindIt() throws Exception {
+    public void onlySixHundredCharactersOfATextArrive() throws Exception {
         start();
         for (int length : new int[] {599, 600, 601, 5000}) {
             Script.text(repeat('x', length));
@@ -251,7 +251,7 @@ public class BridgeTest {
     }
 
     @Test
-    public void theTextCanBeFetchedFromTheEventOfAJobThatAReleaseWaitsFor() throws Exception {
+    public void theTextCanBeFetchedWhileAReleaseWaits() throws Exception {
         AtomicReference<String> text = new AtomicReference<>();
         events.during = () -> text.set(object.native_getFingerprint());
         start();
@@ -278,7 +278,7 @@ public class BridgeTest {
     }
 
     @Test
-    public void anExceptionFromTheEventIsClearedAndTheWorkerGoesOn() throws Exception {
+    public void theWorkerGoesOnAfterAnEventThatThrows() throws Exception {
         events.during = () -> {
             throw new IllegalStateException("thrown by a listener; to be seen on standard error");
         };

@@ -28,7 +28,7 @@ public class LibraryTest {
     }
 
     @Test
-    public void musicGivesADocumentInEveryEncodingThatIsSupported() throws Exception {
+    public void musicGivesADocumentInEverySupportedEncoding() throws Exception {
         String sixteen = outcome(11025, 1, 1, 16, MUSIC);
         assertTrue(sixteen, sixteen.startsWith("0 0 0:<?xml"));
         assertTrue(sixteen, sixteen.contains("COUNT=\"30\""));
@@ -85,7 +85,7 @@ public class LibraryTest {
     }
 
     @Test
-    public void eightObjectsInEightThreadsWorkWhileGarbageIsCollected() throws Exception {
+    public void eightThreadsWorkWhileGarbageIsCollected() throws Exception {
         String expected = outcome(11025, 1, 1, 16, MUSIC);
         AtomicReference<Throwable> failure = new AtomicReference<>();
         AtomicBoolean done = new AtomicBoolean();
