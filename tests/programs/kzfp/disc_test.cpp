@@ -155,7 +155,7 @@ TEST(KzfpDisc, TellsOnlyLabelsOfVolumesThatAreThere)
     EXPECT_EQ(json(), json_of(kImages + "plain.iso")["udf_label"]);
 }
 
-TEST(KzfpDisc, TellsLabelsAsAWhole)
+TEST(KzfpDisc, PrintsLabelsInFull)
 {
     EXPECT_EQ("ISO 9660 label: ABCDEFGHIJKLMNOPQRSTUVWXYZ012345\n"
               "UDF label: ABCDEFGHIJKLMNOPQRSTUVWXYZ0123\n",
