@@ -44,8 +44,27 @@ void for_each_match(const File& file, const std::regex& pattern, Visit visit)
 }
 
 const std::regex kTest(R"(\b(?:TEST|TEST_F|TEST_P|TYPED_TEST|TYPED_TEST_P)\(\s*(\w+),\s*(\w+)\))");
-const std::regex kMention(R"(`([A-Z]\w+)\.([A-Z]\w+|\*)`)");
+/// A method of JUnit's; other annotations and modifiers may stand in between.
+const std::regex kJavaTest(R"(@Test\b[^;{]*?\bvoid\s+(\w+)\s*\()");
+/// A lower-case name is a test's only behind a class of tests: `CMakeLists.txt` is a file.
+const std::regex kMention(R"(`([A-Z]\w+\.(?:[A-Z]\w+|\*)|[A-Z]\w*Test\.[a-z]\w*)`)");
 const std::regex kStatusNumber(R"(\b0[xX]90[0-9a-fA-F]{6}(?![0-9a-fA-F]))");
+
+/// Calls @p visit with suite, name and offset of each test in the file. Java's class is its file's.
+template <typename Visit>
+void for_each_test(const File& file, Visit visit)
+{
+    const fs::path path = file.name;
+    if (path.extension() == ".java") {
+        for_each_match(file, kJavaTest, [&](const std::smatch& match) {
+            visit(path.stem().string(), match[1].str(), match.position(1));
+        });
+    } else {
+        for_each_match(file, kTest, [&](const std::smatch& match) {
+            visit(match[1].str(), match[2].str(), match.position());
+        });
+    }
+}
 
 bool is_source(const File& file)
 {
@@ -95,11 +114,10 @@ Complaints long_test_names(const Files& files)
 {
     Complaints complaints;
     for (const File& file : files) {
-        for_each_match(file, kTest, [&](const std::smatch& match) {
-            if (match[2].length() > static_cast<std::ptrdiff_t>(kMaxTestName)) {
-                complaints.push_back(place(file, static_cast<size_t>(match.position())) + ": " +
-                                     match[2].str() + " has " + std::to_string(match[2].length()) +
-                                     " characters");
+        for_each_test(file, [&](const std::string&, const std::string& name, auto offset) {
+            if (name.size() > kMaxTestName) {
+                complaints.push_back(place(file, static_cast<size_t>(offset)) + ": " + name +
+                                     " has " + std::to_string(name.size()) + " characters");
             }
         });
     }
@@ -126,9 +144,9 @@ Names tests_defined(const Files& files)
 {
     Names names;
     for (const File& file : files) {
-        for_each_match(file, kTest, [&](const std::smatch& match) {
-            names.insert(match[1].str() + '.' + match[2].str());
-            names.insert(match[1].str() + ".*");
+        for_each_test(file, [&](const std::string& suite, const std::string& name, auto) {
+            names.insert(suite + '.' + name);
+            names.insert(suite + ".*");
         });
     }
     return names;
@@ -140,7 +158,7 @@ Complaints unknown_tests(const Files& files, const Names& defined)
     for (const File& file : files) {
         if (is_documentation(file)) {
             for_each_match(file, kMention, [&](const std::smatch& match) {
-                if (!defined.contains(match[1].str() + '.' + match[2].str())) {
+                if (!defined.contains(match[1].str())) {
                     complaints.push_back(place(file, static_cast<size_t>(match.position())) + ": " +
                                          match.str());
                 }

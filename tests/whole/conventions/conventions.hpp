@@ -27,7 +27,7 @@ inline constexpr size_t kMaxTestName = 45;
 /// A status is spelled with its name: its number stands in status.h alone.
 Complaints numbers_of_statuses(const Files& files);
 
-/// A test's name is a sentence that fits into a line of a report.
+/// A test's name, in C++ or in Java, is a sentence that fits into a line of a report.
 Complaints long_test_names(const Files& files);
 
 /// The longest line of a C or C++ file, in columns. The formatter leaves comments as they are.
@@ -36,7 +36,7 @@ inline constexpr size_t kMaxColumns = 100;
 /// C and C++ files have no line that is wider.
 Complaints wide_lines(const Files& files);
 
-/// The tests that the files define, as "Suite.Name".
+/// The tests that the files define, as "Suite.Name"; Java's as "ClassTest.name".
 Names tests_defined(const Files& files);
 
 /// Documentation names tests, or with "Suite.*" whole suites, that exist.

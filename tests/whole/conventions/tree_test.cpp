@@ -18,6 +18,7 @@ protected:
         ASSERT_GT(files_.size(), 300u) << "no sources in " KZ_SOURCE_DIR;
         tests_ = conventions::tests_defined(files_);
         ASSERT_GT(tests_.size(), 500u);
+        ASSERT_TRUE(tests_.contains("FingerprintTest.*")) << "no tests in Java";
     }
 
     static inline Files files_;
@@ -81,6 +82,20 @@ TEST(ConventionRules, NoticeALongTestName)
         conventions::long_test_names({{"a_test.cpp", "\n" + head + "\n  " + longest + "N)"}}));
 }
 
+TEST(ConventionRules, NoticeALongNameOfAJavaTest)
+{
+    const std::string longest(45, 'n');
+    const std::string head = "@Test\n@Ignore(\"slow\")\n"
+                             "public void ";
+    EXPECT_EQ(Complaints{}, conventions::long_test_names(
+                                {{"ATest.java", head + longest + "() {\n"},
+                                 {"Helper.java", "@Override\npublic void " + longest + "n() {\n"},
+                                 {"a_test.cpp", head + longest + "n() {\n"}}));
+    EXPECT_EQ((Complaints{"ATest.java:5: " + longest + "n has 46 characters"}),
+              conventions::long_test_names({{"ATest.java", "@Test public void a() {\n}\n" + head +
+                                                               longest + "n() throws E {"}}));
+}
+
 TEST(ConventionRules, NoticeAWideLine)
 {
     const std::string widest(100, 'x');
@@ -98,6 +113,17 @@ TEST(ConventionRules, NoticeATestThatIsOnlyDocumented)
     const Files pages = {{"a.md", "`Suite.Name` and `Suite.*`\n`Suite.Other`, `Other.*`, `x.Name`"},
                          {"a.cpp", "`Suite.Other`"}};
     EXPECT_EQ((Complaints{"a.md:2: `Suite.Other`", "a.md:2: `Other.*`"}),
+              conventions::unknown_tests(pages, defined));
+}
+
+TEST(ConventionRules, NoticeAJavaTestThatIsOnlyDocumented)
+{
+    const Names defined = conventions::tests_defined(
+        {{"java/ATest.java", "@Test(timeout = 9)\npublic void name() {}\nvoid helper() {}"}});
+    const Files pages = {{"a.md", "`ATest.name`, `ATest.*`, `CMakeLists.txt`, `Class.method`\n"
+                                  "`ATest.other`, `ATest.helper`, `BTest.name`, `BTest.*`"}};
+    EXPECT_EQ((Complaints{"a.md:2: `ATest.other`", "a.md:2: `ATest.helper`", "a.md:2: `BTest.name`",
+                          "a.md:2: `BTest.*`"}),
               conventions::unknown_tests(pages, defined));
 }
 
