@@ -84,6 +84,27 @@ TEST_F(Layers, LetDiscsStandAlone)
         plan_.rooms, [](const auto& room) { return room.second.below.contains("kzsdk/disc"); }));
 }
 
+// The fingerprinters share only qv and what lies below it; sound, text and discs are unrelated.
+TEST_F(Layers, KeepIndependentRoomsApart)
+{
+    for (const auto& apart :
+         {Names{"kzsdk/qvfixed", "kzsdk/qvfloat"}, Names{"kzsdk/dsp", "kzsdk/xml", "kzsdk/disc"}}) {
+        for (const auto& room : apart) {
+            for (const auto& below : plan_.rooms.at(room).below) {
+                EXPECT_FALSE(apart.contains(below)) << room << " may include " << below;
+            }
+        }
+    }
+}
+
+TEST_F(Layers, KeepTheBridgeOnTop)
+{
+    ASSERT_TRUE(plan_.rooms.contains("kzsdk/jni"));
+    for (const auto& [name, room] : plan_.rooms) {
+        EXPECT_FALSE(room.below.contains("kzsdk/jni")) << name;
+    }
+}
+
 TEST_F(Layers, RestOnTheLowestRoom)
 {
     for (const auto& [name, room] : plan_.rooms) {
