@@ -21,17 +21,16 @@ if(Java_JAVAC_EXECUTABLE)
   cmake_path(GET javac PARENT_PATH bin)
   cmake_path(GET bin PARENT_PATH KZ_JAVA_HOME)
 endif()
+# Looked for at every configuration: a JDK that was installed after the first one comes before Android's
+# header, which may have served until then.
 if(ANDROID)
-  find_path(KZ_JNI_INCLUDE_DIR jni.h)
+  find_path(KZ_JNI_INCLUDE_DIR jni.h NO_CACHE)
 else()
   find_path(KZ_JNI_INCLUDE_DIR jni.h HINTS "${KZ_JAVA_HOME}/include" "$ENV{JAVA_HOME}/include"
-            PATH_SUFFIXES android/nativehelper DOC "Where jni.h is")
+            PATH_SUFFIXES android/nativehelper NO_CACHE)
 endif()
-find_path(
-  KZ_JNI_MD_INCLUDE_DIR jni_md.h
-  HINTS "${KZ_JNI_INCLUDE_DIR}/linux" "${KZ_JNI_INCLUDE_DIR}/darwin"
-  DOC "Where the jni_md.h that jni.h includes is")
-mark_as_advanced(KZ_JNI_INCLUDE_DIR KZ_JNI_MD_INCLUDE_DIR)
+find_path(KZ_JNI_MD_INCLUDE_DIR jni_md.h HINTS "${KZ_JNI_INCLUDE_DIR}/linux"
+          "${KZ_JNI_INCLUDE_DIR}/darwin" NO_CACHE)
 
 set(platform_default portable)
 if(ANDROID)

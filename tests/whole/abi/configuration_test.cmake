@@ -65,3 +65,13 @@ file(WRITE "${WORK_DIR}/another/CMakeLists.txt"
      "cmake_minimum_required(VERSION 3.22)\nproject(another C CXX)\nadd_subdirectory(\"${ROOT}\" kzsdk)\n")
 configure(as_a_part "${WORK_DIR}/another" ${no_java})
 expect_setting(as_a_part KZ_JNI OFF)
+
+# A JDK that comes after the first configuration is used by the next one.
+configure(later "${ROOT}" ${alone} -DCMAKE_DISABLE_FIND_PACKAGE_Java=ON)
+execute_process(
+  COMMAND "${CMAKE_COMMAND}" -S "${ROOT}" -B "${WORK_DIR}/later" -DCMAKE_DISABLE_FIND_PACKAGE_Java=OFF
+  RESULT_VARIABLE status OUTPUT_QUIET ERROR_VARIABLE said)
+file(READ "${WORK_DIR}/later/compile_commands.json" commands)
+if(NOT status EQUAL 0 OR commands MATCHES "android/nativehelper")
+  message(SEND_ERROR "later: the header of the JDK is not used:\n${said}")
+endif()
