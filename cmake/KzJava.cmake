@@ -21,8 +21,8 @@ if(Java_JAVAC_EXECUTABLE)
   cmake_path(GET javac PARENT_PATH bin)
   cmake_path(GET bin PARENT_PATH KZ_JAVA_HOME)
 endif()
-# Looked for at every configuration: a JDK that was installed after the first one comes before Android's
-# header, which may have served until then.
+# Looked for at every configuration: a JDK that was installed after the first one comes before
+# Android's header, which may have served until then.
 if(ANDROID)
   find_path(KZ_JNI_INCLUDE_DIR jni.h NO_CACHE)
 else()
