@@ -1,0 +1,39 @@
+/// @file
+/// The codes that a query is compared with, wherever they lie.
+#pragma once
+
+#include <cstdint>
+#include <span>
+#include <vector>
+
+#include "catalogue/model/profile.hpp"
+
+namespace kzcat {
+
+/// The codes of one track among those of a segment.
+struct TrackSpan {
+    int64_t id = 0;
+    uint64_t first = 0; ///< index into the codes of the segment
+    uint64_t count = 0;
+};
+
+/// Tracks whose codes lie one behind the other: a mapped file, or memory. Owns nothing.
+struct Segment {
+    std::span<const Code> codes;
+    std::span<const TrackSpan> tracks; ///< ids rise
+
+    std::span<const Code> of(const TrackSpan& track) const
+    {
+        return codes.subspan(track.first, track.count);
+    }
+};
+
+/// All tracks of a catalogue. Ids rise from segment to segment too.
+struct Corpus {
+    std::vector<Segment> segments;
+
+    uint64_t code_count() const;
+    uint64_t track_count() const;
+};
+
+} // namespace kzcat

@@ -1,0 +1,14 @@
+/// @file
+/// CRC-32C (Castagnoli), as RFC 3720 has it.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <span>
+
+namespace kzcat {
+
+/// The checksum of bytes, `earlier` being that of what comes before them.
+uint32_t crc32c(std::span<const std::byte> bytes, uint32_t earlier = 0);
+
+} // namespace kzcat
