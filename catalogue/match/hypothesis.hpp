@@ -2,6 +2,7 @@
 /// Readings of a query: at some pitch and tempo, at each phase of the codes' grid.
 #pragma once
 
+#include <array>
 #include <cstdint>
 #include <vector>
 
@@ -17,10 +18,16 @@ struct Hypothesis {
     bool operator==(const Hypothesis&) const = default;
 };
 
+/// How far each bit of a code is from being the other one: the change of its pair's difference in
+/// units of 1/32 octave, without its sign, rounded down, 255 at most.
+using BitStrengths = std::array<uint8_t, kPairs>;
+
 /// Codes of a query, one every kCodeHop samples of the track, and which of their bits count.
 struct Sequence {
     std::vector<Code> codes;
     std::vector<Code> masks;
+    std::vector<BitStrengths>
+        strengths;    ///< one for each code, or none at all when they are unknown
     double start = 0; ///< of the first code's frame, seconds of the track after the clip's start
 };
 
