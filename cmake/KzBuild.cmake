@@ -70,35 +70,63 @@ target_compile_options(
   INTERFACE
     "$<$<CONFIG:Release,MinSizeRel>:-ffile-prefix-map=${PROJECT_BINARY_DIR}=build;-ffile-prefix-map=${PROJECT_SOURCE_DIR}=.>")
 
-# Objects that go into the library.
-function(kz_library_objects target)
+# Objects that go into a library.
+function(kz_objects target)
   add_library(${target} OBJECT ${ARGN})
   target_link_libraries(${target} PRIVATE kz_settings)
   target_include_directories(${target} PRIVATE "${PROJECT_SOURCE_DIR}")
-  target_compile_options(${target} PRIVATE -fno-exceptions -fno-rtti)
   if(KZ_HAS_AUTO_VAR_INIT AND KZ_HARDEN AND NOT KZ_SANITIZE)
     target_compile_options(${target} PRIVATE -ftrivial-auto-var-init=zero)
   endif()
   set_target_properties(
-    ${target} PROPERTIES POSITION_INDEPENDENT_CODE ON CXX_VISIBILITY_PRESET hidden
+    ${target} PROPERTIES LINKER_LANGUAGE CXX POSITION_INDEPENDENT_CODE ON CXX_VISIBILITY_PRESET hidden
                          VISIBILITY_INLINES_HIDDEN ON)
 endfunction()
 
-# kz_test(<file>_test [ROOMS <room>...] [LIBS <target>...] [FIXTURE <name>])
+# Those of kzsdk, which nothing of the C++ run-time library serves.
+function(kz_library_objects target)
+  kz_objects(${target} ${ARGN})
+  target_compile_options(${target} PRIVATE -fno-exceptions -fno-rtti)
+endfunction()
+
+# kz_instruction_set(<sse41 | avx2 | avx512 | neon> <file>...)
+#
+# These files of the folder hold inner loops for processors with this instruction set, and are
+# compiled for them; what the processor runs is chosen when the program runs. On another
+# architecture such a file must be empty. What it defines must not be needed elsewhere: an inline
+# function of a header that the linker took from it would end the program on other processors.
+function(kz_instruction_set set)
+  set(options "")
+  if(CMAKE_SYSTEM_PROCESSOR MATCHES "^(i[3-6]86|x86|x86_64|amd64|AMD64)$")
+    set(options_sse41 -msse4.1)
+    set(options_avx2 -mavx2)
+    set(options_avx512 -mavx2 -mavx512f -mavx512bw -mavx512dq -mavx512vl -mavx512vpopcntdq)
+    set(options ${options_${set}})
+  endif()
+  # Scratch of the loops is written before it is read.
+  if(KZ_HAS_AUTO_VAR_INIT)
+    list(APPEND options -ftrivial-auto-var-init=uninitialized)
+  endif()
+  set_property(SOURCE ${ARGN} APPEND PROPERTY COMPILE_OPTIONS ${options})
+endfunction()
+
+# kz_test(<file>_test [ROOMS <room>...] [LIBS <target>...] [SOURCES <file>...] [FIXTURE <name>])
 #
 # Builds <file>_test.cpp of this folder over its room's objects and everything below, with the
 # allocator wrapped so that tests can count blocks and make the n-th allocation fail, and registers
-# each of its test cases with CTest. The folder's name is the room's, unless ROOMS names others, and
-# the target is <folder>_<file>_test. FIXTURE names what has to be set up first.
+# each of its test cases with CTest. The room is the one that the folder mirrors, unless ROOMS names
+# others: tests/library/<room> for kzsdk's, tests/catalogue/<room> for the catalogue's. The target is
+# <room>_<file>_test, with kzcat_ before it for the catalogue's. FIXTURE names what has to be set up
+# first.
 function(kz_test file)
   cmake_parse_arguments(PARSE_ARGV 1 test "" "FIXTURE" "ROOMS;LIBS;SOURCES")
-  cmake_path(GET CMAKE_CURRENT_SOURCE_DIR FILENAME folder)
-  set(target ${folder}_${file})
+  kz_mirrored_room(room target)
+  string(APPEND target "_${file}")
   if(NOT test_ROOMS)
-    set(test_ROOMS ${folder})
+    set(test_ROOMS ${room})
   endif()
   kz_room_closure(rooms ${test_ROOMS})
-  kz_room_objects(objects ${test_ROOMS})
+  kz_room_objects(objects ${rooms})
   kz_record_test(${target} ${rooms})
   add_executable(${target} ${file}.cpp ${test_SOURCES})
   target_link_libraries(${target} PRIVATE kz_settings ${objects} kz_test_support ${test_LIBS})
@@ -112,7 +140,7 @@ function(kz_public_test file)
   cmake_parse_arguments(PARSE_ARGV 1 test "" "" "LIBS;SOURCES")
   cmake_path(GET CMAKE_CURRENT_SOURCE_DIR FILENAME folder)
   set(target ${folder}_${file})
-  get_property(rooms GLOBAL PROPERTY KZ_ROOMS)
+  get_property(rooms GLOBAL PROPERTY KZ_ROOMS_OF_kzsdk)
   kz_record_test(${target} ${rooms})
   add_executable(${target} ${file}.cpp ${test_SOURCES})
   target_link_libraries(${target} PRIVATE kz_settings kzsdk_shared GTest::gtest_main ${test_LIBS})

@@ -12,7 +12,7 @@ install(
 
 # Headers keep their place below kzsdk/, so that one spelling of an include serves in the tree and
 # out of it.
-get_property(public_headers GLOBAL PROPERTY KZ_PUBLIC_HEADERS)
+get_property(public_headers GLOBAL PROPERTY KZ_PUBLIC_HEADERS_OF_kzsdk)
 foreach(header IN LISTS public_headers ITEMS "${PROJECT_SOURCE_DIR}/kzsdk/kzsdk.h")
   cmake_path(RELATIVE_PATH header BASE_DIRECTORY "${PROJECT_SOURCE_DIR}" OUTPUT_VARIABLE place)
   cmake_path(GET place PARENT_PATH place)

@@ -1,5 +1,5 @@
-# Which folder may see which, and which room of the library lies above which. Declared once, here
-# and in each room's CMakeLists.txt; kz_write_layers() writes it to layers.txt in the build folder,
+# Which folder may see which, and which room of a library lies above which. Declared once, here and
+# in each room's CMakeLists.txt; kz_write_layers() writes it to layers.txt in the build folder,
 # from which tests/whole/layers and scripts/mutate.py read it.
 
 # kz_house(<folder> [PUBLIC <folder>...] [SEES <folder>...] [INSIDE <folder>...])
@@ -16,51 +16,96 @@ function(kz_house folder)
 endfunction()
 
 # kz_room(<name> [IF <condition>] [BELOW <room>...] [DOOR <header>...] [HEADERS <header>...]
-#         SOURCES <file>...)
+#         [LIBS <target>...] SOURCES <file>...)
 #
-# A room of the library becomes an object library. A room sees, and its tests link, only what is
-# named in BELOW and what lies below that: a call upwards does not link. HEADERS are public. Where
-# DOOR is given, other rooms include only the headers that it names. Where the variable after IF is
-# false the room is declared, so that its rules hold, but not built.
+# A room of a library becomes an object library, kz_<name> for those of kzsdk and kzcat_<name> for
+# those of the catalogue. A room sees, and its tests link, only what is named in BELOW and what lies
+# below that: a call upwards does not link. HEADERS are public. Where DOOR is given, other rooms
+# include only the headers that it names. LIBS are other libraries that it uses. Where the variable
+# after IF is false the room is declared, so that its rules hold, but not built.
+#
+# A room is named by its folder, as kzsdk/dsp, or by the last part of that where the house is plain.
 function(kz_room name)
-  cmake_parse_arguments(PARSE_ARGV 1 room "" "IF" "BELOW;DOOR;HEADERS;SOURCES")
-  set(closure ${name})
+  cmake_parse_arguments(PARSE_ARGV 1 room "" "IF" "BELOW;DOOR;HEADERS;LIBS;SOURCES")
+  cmake_path(RELATIVE_PATH CMAKE_CURRENT_SOURCE_DIR BASE_DIRECTORY "${PROJECT_SOURCE_DIR}" OUTPUT_VARIABLE path)
+  kz_house_of(house ${path})
+  set(closure ${path})
   foreach(below IN LISTS room_BELOW)
-    get_property(lower GLOBAL PROPERTY KZ_ROOM_${below}_CLOSURE)
+    get_property(lower GLOBAL PROPERTY KZ_ROOM_${house}/${below}_CLOSURE)
     if(NOT lower)
-      message(FATAL_ERROR "kz_room(${name}): ${below} is not declared before it; kzsdk/CMakeLists.txt lists the "
+      message(FATAL_ERROR "kz_room(${name}): ${below} is not declared before it; ${house}/CMakeLists.txt lists the "
                           "rooms, lowest first")
     endif()
     list(APPEND closure ${lower})
   endforeach()
   list(REMOVE_DUPLICATES closure)
-  set_property(GLOBAL PROPERTY KZ_ROOM_${name}_CLOSURE ${closure})
-  kz_record_room(${name})
-  if(room_IF AND NOT ${room_IF})
+  set_property(GLOBAL PROPERTY KZ_ROOM_${path}_CLOSURE ${closure})
+  kz_record_room(${path})
+  if((room_IF AND NOT ${room_IF}) OR (house STREQUAL "catalogue" AND NOT KZ_BUILD_CATALOGUE))
     return()
   endif()
-  kz_library_objects(kz_${name} ${room_SOURCES})
-  set_property(GLOBAL APPEND PROPERTY KZ_ROOMS ${name})
-  list(TRANSFORM room_HEADERS PREPEND "${CMAKE_CURRENT_SOURCE_DIR}/")
-  set_property(GLOBAL APPEND PROPERTY KZ_PUBLIC_HEADERS ${room_HEADERS})
+  kz_build_room()
 endfunction()
 
+# The rest of kz_room(), whose variables it reads: the object library.
+macro(kz_build_room)
+  if(house STREQUAL "catalogue")
+    set(target kzcat_${name})
+    kz_objects(${target} ${room_SOURCES})
+    # For what links the room's objects alone: tests, benchmarks, fuzz targets.
+    target_link_libraries(${target} PUBLIC kzsdk_static ${room_LIBS})
+  else()
+    set(target kz_${name})
+    kz_library_objects(${target} ${room_SOURCES})
+  endif()
+  set_property(GLOBAL PROPERTY KZ_ROOM_${path}_TARGET ${target})
+  set_property(GLOBAL APPEND PROPERTY KZ_ROOMS_OF_${house} ${path})
+  list(TRANSFORM room_HEADERS PREPEND "${CMAKE_CURRENT_SOURCE_DIR}/")
+  set_property(GLOBAL APPEND PROPERTY KZ_PUBLIC_HEADERS_OF_${house} ${room_HEADERS})
+endmacro()
+
 # The rest of kz_room(), whose variables it reads: the line of layers.txt.
-function(kz_record_room name)
+function(kz_record_room path)
   set(below ${closure})
-  list(REMOVE_ITEM below ${name})
-  list(TRANSFORM below PREPEND "kzsdk/")
+  list(REMOVE_ITEM below ${path})
   list(JOIN below "," below)
   list(JOIN room_DOOR "," door)
   list(JOIN room_HEADERS "," headers)
-  set_property(GLOBAL APPEND PROPERTY KZ_LAYERS "room kzsdk/${name} below=${below} door=${door} headers=${headers}")
+  set_property(GLOBAL APPEND PROPERTY KZ_LAYERS "room ${path} below=${below} door=${door} headers=${headers}")
 endfunction()
 
-# kz_room_closure(<variable> <room>...): these rooms and all below them.
+# kz_house_of(<variable> <path>): the first part of a path, such as kzsdk.
+function(kz_house_of variable path)
+  string(REGEX MATCH "^[^/]+" house "${path}")
+  set(${variable} ${house} PARENT_SCOPE)
+endfunction()
+
+# kz_mirrored_room(<room> <prefix>): the room that this folder of tests mirrors, and how the names
+# of its targets begin. A folder of tests that mirrors none has its own name for both.
+function(kz_mirrored_room room prefix)
+  cmake_path(RELATIVE_PATH CMAKE_CURRENT_SOURCE_DIR BASE_DIRECTORY "${PROJECT_SOURCE_DIR}/tests" OUTPUT_VARIABLE path)
+  cmake_path(GET path FILENAME folder)
+  set(targets ${folder})
+  if(path MATCHES "^catalogue")
+    set(folder ${path})
+    string(REGEX REPLACE "^catalogue" "kzcat" targets "${path}")
+    string(REPLACE "/" "_" targets "${targets}")
+  endif()
+  set(${room} ${folder} PARENT_SCOPE)
+  set(${prefix} ${targets} PARENT_SCOPE)
+endfunction()
+
+# kz_room_closure(<variable> <room>...): these rooms and all below them, by their folders.
 function(kz_room_closure variable)
   set(rooms "")
   foreach(name IN LISTS ARGN)
+    if(NOT name MATCHES "/" AND NOT name STREQUAL "catalogue")
+      set(name kzsdk/${name})
+    endif()
     get_property(closure GLOBAL PROPERTY KZ_ROOM_${name}_CLOSURE)
+    if(NOT closure)
+      message(FATAL_ERROR "there is no room ${name}")
+    endif()
     list(APPEND rooms ${closure})
   endforeach()
   list(REMOVE_DUPLICATES rooms)
@@ -70,16 +115,29 @@ endfunction()
 # kz_room_objects(<variable> <room>...): the object libraries of these rooms and of all below them.
 function(kz_room_objects variable)
   kz_room_closure(rooms ${ARGN})
-  list(TRANSFORM rooms PREPEND "kz_")
-  set(${variable} ${rooms} PARENT_SCOPE)
+  set(targets "")
+  foreach(room IN LISTS rooms)
+    get_property(target GLOBAL PROPERTY KZ_ROOM_${room}_TARGET)
+    list(APPEND targets ${target})
+  endforeach()
+  set(${variable} ${targets} PARENT_SCOPE)
+endfunction()
+
+# kz_add_objects(<library> <house>): the objects of all rooms of the house. They go in as sources,
+# not as linked targets: what is installed has no rooms.
+function(kz_add_objects library house)
+  get_property(rooms GLOBAL PROPERTY KZ_ROOMS_OF_${house})
+  foreach(room IN LISTS rooms)
+    get_property(target GLOBAL PROPERTY KZ_ROOM_${room}_TARGET)
+    target_sources(${library} PRIVATE $<TARGET_OBJECTS:${target}>)
+  endforeach()
 endfunction()
 
 # kz_record_test(<target> <room>...): a test program of this folder, and the rooms whose code it
 # runs.
 function(kz_record_test target)
   set(rooms ${ARGN})
-  list(FILTER rooms EXCLUDE REGEX "^platform_")
-  list(TRANSFORM rooms PREPEND "kzsdk/")
+  list(FILTER rooms EXCLUDE REGEX "/platform$")
   list(JOIN rooms "," rooms)
   cmake_path(RELATIVE_PATH CMAKE_CURRENT_BINARY_DIR BASE_DIRECTORY "${PROJECT_BINARY_DIR}" OUTPUT_VARIABLE place)
   set_property(GLOBAL APPEND PROPERTY KZ_LAYERS "test ${place}/${target} rooms=${rooms}")

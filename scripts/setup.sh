@@ -1,8 +1,8 @@
 #!/bin/sh
 # Installs what is missing to build and test the library on Debian 12.
 #
-#   scripts/setup.sh [build] [java] [tools] [test] [clips] [bench] [lint] [clang] [fuzz]
-#                    [coverage] [arch] [wide]
+#   scripts/setup.sh [build] [catalogue] [java] [tools] [test] [clips] [bench] [lint] [clang]
+#                    [fuzz] [coverage] [arch] [wide]
 #                                 default: all of them but the last three
 #
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
@@ -12,6 +12,7 @@ packages_of() {
     case $1 in
     # Also a jni.h, for the library's Java front.
     build) echo "g++ cmake ninja-build make android-libnativehelper-dev" ;;
+    catalogue) echo "libsqlite3-dev sqlite3" ;; # what keeps its tracks, and a second reader for tests
     tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev" ;;
     test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso python3" ;;
     # The Java front and its tests; Android's log and threads as a desktop has them.
@@ -37,7 +38,7 @@ installed() {
     [ "$(dpkg-query -W -f '${db:Status-Status}' "$1" 2>/dev/null || true)" = installed ]
 }
 
-[ $# -gt 0 ] || set -- build java tools test clips bench lint clang fuzz
+[ $# -gt 0 ] || set -- build catalogue java tools test clips bench lint clang fuzz
 
 wanted=
 for group in "$@"; do

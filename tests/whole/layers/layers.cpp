@@ -63,9 +63,24 @@ std::string target_of(const Include& include, const Tree& tree)
     return {};
 }
 
+/// The room that holds this file. A room that is a house's own folder holds only what lies directly
+/// in it: what lies deeper is in a room of its own, or in none.
+std::string room_of(const std::string& path, const Plan& plan)
+{
+    const auto room = place_of(path, plan.rooms);
+    const auto folder = fs::path(path).parent_path().generic_string();
+    return plan.houses.contains(room) && folder != room ? std::string() : room;
+}
+
 std::string complaint(const Include& include)
 {
     return include.file + ":" + std::to_string(include.line) + " includes " + include.what;
+}
+
+/// Spelled as the headers of the C++ library are: no file that a package installs has such a name.
+bool is_of_the_cxx_library(const std::string& what)
+{
+    return what.find_first_of("./") == std::string::npos;
 }
 
 bool is_header(const std::string& file) { return file.ends_with(".h"); }
@@ -114,13 +129,42 @@ const Names kEverywhere = {
     "tuple",    "type_traits", "utility",
 };
 
+/// Printing is for programs.
+const Names kOfPrograms = {"iostream"};
+
+const Names kVectors = {"arm_neon.h", "immintrin.h"};
+const Names kMappedFiles = {"fcntl.h", "sys/file.h", "sys/mman.h", "sys/stat.h", "unistd.h"};
+
 const std::map<std::string, Names> kOfRooms = {
+    {"catalogue/model", kVectors},
+    {"catalogue/match", kVectors},
+    {"catalogue/index", kMappedFiles},
+    {"catalogue/store", {"sqlite3.h"}},
     {"kzsdk/kernels", {"arm_neon.h", "immintrin.h", "smmintrin.h"}},
     {"kzsdk/disc", {"dirent.h", "fcntl.h", "sys/stat.h", "unistd.h"}},
     {"kzsdk/jni",
      {"android/log.h", "ctime", "jni.h", "pthread.h", "sys/resource.h", "unistd.h",
       "utils/AndroidThreads.h"}},
 };
+
+/// A quoted include must bring in a library's file; kzsdk rests on nothing but itself.
+bool is_of_the_tree(const Include& include, const std::string& target)
+{
+    return is_below(target, "kzsdk") ||
+           (is_below(target, "catalogue") && is_below(include.file, "catalogue"));
+}
+
+/// An include in angle brackets that a file of this library may have.
+bool is_at_hand(const Include& include)
+{
+    const auto room = kOfRooms.find(place_of(include.file, kOfRooms));
+    if (kEverywhere.contains(include.what) ||
+        (room != kOfRooms.end() && room->second.contains(include.what))) {
+        return true;
+    }
+    return is_below(include.file, "catalogue") && is_of_the_cxx_library(include.what) &&
+           !kOfPrograms.contains(include.what);
+}
 
 } // namespace
 
@@ -172,8 +216,8 @@ Complaints undeclared_folders(const Plan& plan, const Tree& tree)
 {
     Complaints found;
     for (const auto& file : tree.files) {
-        const bool in_a_room = file == "kzsdk/kzsdk.h" || !place_of(file, plan.rooms).empty();
-        if (place_of(file, plan.houses).empty() || (is_below(file, "kzsdk") && !in_a_room)) {
+        const bool in_a_room = file == "kzsdk/kzsdk.h" || !room_of(file, plan).empty();
+        if (place_of(file, plan.houses).empty() || (is_of_a_library(file) && !in_a_room)) {
             found.push_back(file);
         }
     }
@@ -197,9 +241,14 @@ Complaints folders_seeing_too_much(const Plan& plan, const Tree& tree)
 Complaints rooms_including_upwards(const Plan& plan, const Tree& tree)
 {
     return complaints_of(tree, [&](const Include& include, const std::string& target) {
-        const auto from = place_of(include.file, plan.rooms);
-        const auto to = place_of(target, plan.rooms);
+        const auto from = room_of(include.file, plan);
+        const auto to = room_of(target, plan);
+        const auto house = plan.houses.find(place_of(include.file, plan.houses));
         if (from.empty() || target.empty() || from == to) {
+            return true;
+        }
+        if (house != plan.houses.end() &&
+            house->second.public_of.contains(place_of(target, plan.houses))) {
             return true;
         }
         return plan.rooms.at(from).below.contains(to);
@@ -209,10 +258,9 @@ Complaints rooms_including_upwards(const Plan& plan, const Tree& tree)
 Complaints ways_around_doors(const Plan& plan, const Tree& tree)
 {
     return complaints_of(tree, [&](const Include& include, const std::string& target) {
-        const auto to = place_of(target, plan.rooms);
+        const auto to = room_of(target, plan);
         const auto house = plan.houses.find(place_of(include.file, plan.houses));
-        if (to.empty() || place_of(include.file, plan.rooms) == to ||
-            plan.rooms.at(to).door.empty()) {
+        if (to.empty() || room_of(include.file, plan) == to || plan.rooms.at(to).door.empty()) {
             return true;
         }
         if (house != plan.houses.end() &&
@@ -248,7 +296,7 @@ Complaints public_headers_not_declared(const Plan& plan, const Tree& tree)
     }
     Complaints found;
     for (const auto& file : tree.files) {
-        if (is_below(file, "kzsdk") && is_header(file) != declared.contains(file)) {
+        if (is_of_a_library(file) && is_header(file) != declared.contains(file)) {
             found.push_back(file);
         }
     }
@@ -257,15 +305,9 @@ Complaints public_headers_not_declared(const Plan& plan, const Tree& tree)
 
 Complaints foreign_headers(const Tree& tree)
 {
-    return complaints_of(tree, [&](const Include& include, const std::string& target) {
-        if (!is_below(include.file, "kzsdk") || kEverywhere.contains(include.what)) {
-            return true;
-        }
-        if (include.quoted) {
-            return is_below(target, "kzsdk");
-        }
-        const auto room = kOfRooms.find(place_of(include.file, kOfRooms));
-        return room != kOfRooms.end() && room->second.contains(include.what);
+    return complaints_of(tree, [](const Include& include, const std::string& target) {
+        return !is_of_a_library(include.file) ||
+               (include.quoted ? is_of_the_tree(include, target) : is_at_hand(include));
     });
 }
 

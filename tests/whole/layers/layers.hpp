@@ -21,7 +21,7 @@ struct House {
     Names inside;    ///< of these, everything
 };
 
-/// A room of the library.
+/// A room of a library.
 struct Room {
     Names below;   ///< the rooms that it may include
     Names door;    ///< the headers that others may include; every header if empty
@@ -53,11 +53,11 @@ Plan read_plan(std::istream& in);
 Tree read_tree(const std::filesystem::path& root);
 void read_includes(const std::string& file, std::istream& in, Tree& tree);
 
-/// Every source lies in a declared folder, and every one of the library's in a declared room.
+/// Every source lies in a declared folder, and every one of a library in a declared room.
 Complaints undeclared_folders(const Plan& plan, const Tree& tree);
 /// A folder includes of another only what its declaration allows.
 Complaints folders_seeing_too_much(const Plan& plan, const Tree& tree);
-/// A room of the library includes only rooms below it.
+/// A room includes only rooms below it, and what its folder may include of others.
 Complaints rooms_including_upwards(const Plan& plan, const Tree& tree);
 /// A room that has a door is included through it.
 Complaints ways_around_doors(const Plan& plan, const Tree& tree);
@@ -67,8 +67,8 @@ Complaints includes_not_from_the_root(const Tree& tree);
 Complaints private_headers_in_public_ones(const Tree& tree);
 /// A .h is public, and the build installs it; nothing else is.
 Complaints public_headers_not_declared(const Plan& plan, const Tree& tree);
-/// The library uses the C library and headers that bring in no C++ run-time library; a few rooms
-/// query the system or the processor.
+/// kzsdk uses the C library and headers that bring in no C++ run-time library; the catalogue all of
+/// the C++ library but what prints. A few rooms use the system, the processor or a database.
 Complaints foreign_headers(const Tree& tree);
 
 } // namespace layers

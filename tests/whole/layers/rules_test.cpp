@@ -22,6 +22,8 @@ layers::Plan made_up_plan()
         "room kzsdk/low below= door= headers=low.h\n"
         "room kzsdk/loops below=kzsdk/low door=door.hpp headers=\n"
         "room kzsdk/high below=kzsdk/loops,kzsdk/low door= headers=high.h,more.h\n"
+        "room catalogue/plain below= door= headers=\n"
+        "room catalogue below=catalogue/plain door= headers=kzcat.h\n"
         "test tests/library/low/low_test rooms=kzsdk/low\n");
     return layers::read_plan(lines);
 }
@@ -42,8 +44,11 @@ layers::Tree made_up_tree()
     file("kzsdk/high/high.h", "#include \"kzsdk/low/low.h\"\n");
     file("kzsdk/high/more.h", "");
     file("kzsdk/high/high.cpp", "#include \"kzsdk/loops/door.hpp\"\n");
-    file("catalogue/index.cpp", "#include \"kzsdk/kzsdk.h\"\n#include <vector>\n");
     file("catalogue/kzcat.h", "");
+    file("catalogue/plain/plain.cpp", "#include \"kzsdk/high/high.h\"\n#include <vector>\n");
+    file("catalogue/plain/plain.hpp", "#include <string>\n");
+    file("catalogue/index.cpp",
+         "#include \"kzsdk/kzsdk.h\"\n#include \"catalogue/plain/plain.hpp\"\n");
     file("tools/kzfp/main.cpp", "#include \"kzsdk/high/high.h\"\n#include \"catalogue/kzcat.h\"\n");
     file("bench/bench.cpp", "#include \"kzsdk/loops/door.hpp\"\n");
     file("tests/loops_test.cpp", "#include \"kzsdk/loops/inner.hpp\"\n#include <gtest/gtest.h>\n");
@@ -97,8 +102,10 @@ TEST(LayerRules, RefuseASourceInNoDeclaredFolder)
 
 TEST(LayerRules, RefuseASourceInNoDeclaredRoom)
 {
-    const auto tree = tree_with("kzsdk/attic/new.cpp", "<span>");
-    EXPECT_EQ(Complaints{"kzsdk/attic/new.cpp"}, layers::undeclared_folders(made_up_plan(), tree));
+    for (const std::string file : {"kzsdk/attic/new.cpp", "catalogue/attic/new.cpp"}) {
+        const auto tree = tree_with(file, "<span>");
+        EXPECT_EQ(Complaints{file}, layers::undeclared_folders(made_up_plan(), tree));
+    }
 }
 
 TEST(LayerRules, RefuseALibraryThatLooksOutside)
@@ -138,6 +145,9 @@ TEST(LayerRules, RefuseAnIncludeUpwards)
     const auto tree = tree_with("kzsdk/low/low.cpp", "\"kzsdk/high/high.h\"");
     EXPECT_EQ(Complaints{"kzsdk/low/low.cpp:1 includes kzsdk/high/high.h"},
               layers::rooms_including_upwards(made_up_plan(), tree));
+    const auto other = tree_with("catalogue/plain/plain.cpp", "\"catalogue/kzcat.h\"");
+    EXPECT_EQ(Complaints{"catalogue/plain/plain.cpp:1 includes catalogue/kzcat.h"},
+              layers::rooms_including_upwards(made_up_plan(), other));
 }
 
 TEST(LayerRules, RefuseARoomThatIncludesTheUmbrella)
@@ -172,9 +182,10 @@ TEST(LayerRules, RefuseAPrivateHeaderInAPublicOne)
 
 TEST(LayerRules, RefuseAPublicHeaderNotDeclared)
 {
-    const auto tree = tree_with("kzsdk/high/new.h", "<stdint.h>");
-    EXPECT_EQ(Complaints{"kzsdk/high/new.h"},
-              layers::public_headers_not_declared(made_up_plan(), tree));
+    for (const std::string file : {"kzsdk/high/new.h", "catalogue/plain/new.h"}) {
+        const auto tree = tree_with(file, "<stdint.h>");
+        EXPECT_EQ(Complaints{file}, layers::public_headers_not_declared(made_up_plan(), tree));
+    }
 }
 
 TEST(LayerRules, RefuseContainersAndStrangers)
@@ -184,6 +195,23 @@ TEST(LayerRules, RefuseContainersAndStrangers)
         EXPECT_EQ(Complaints{"kzsdk/high/high.cpp:1 includes " + what},
                   layers::foreign_headers(tree));
     }
+}
+
+TEST(LayerRules, LetTheCatalogueUseTheCxxLibraryOnly)
+{
+    for (const std::string what : {"iostream", "sndfile.h", "boost/regex.hpp", "unistd.h"}) {
+        const auto tree = tree_with("catalogue/index.cpp", "<" + what + ">");
+        EXPECT_EQ(Complaints{"catalogue/index.cpp:1 includes " + what},
+                  layers::foreign_headers(tree));
+    }
+}
+
+TEST(LayerRules, LetOneRoomAloneMeetTheDatabase)
+{
+    EXPECT_EQ(Complaints{},
+              layers::foreign_headers(tree_with("catalogue/store/file.cpp", "<sqlite3.h>")));
+    EXPECT_EQ(Complaints{"catalogue/plain/plain.cpp:1 includes sqlite3.h"},
+              layers::foreign_headers(tree_with("catalogue/plain/plain.cpp", "<sqlite3.h>")));
 }
 
 TEST(LayerRules, RefuseAFileThatIsNotThere)
