@@ -100,7 +100,7 @@ function(kz_instruction_set set)
   if(CMAKE_SYSTEM_PROCESSOR MATCHES "^(i[3-6]86|x86|x86_64|amd64|AMD64)$")
     set(options_sse41 -msse4.1)
     set(options_avx2 -mavx2)
-    set(options_avx512 -mavx2 -mavx512f -mavx512bw -mavx512dq -mavx512vl -mavx512vpopcntdq)
+    set(options_avx512 -mavx2 -mavx512f -mavx512bw -mavx512vpopcntdq)
     set(options ${options_${set}})
   endif()
   # Scratch of the loops is written before it is read.

@@ -20,8 +20,8 @@ struct Candidate {
         0; ///< of the sequence's first code among those of the track; may be negative
 };
 
-/// Finds where a reading may lie. A scan looks everywhere, an index only where parts of codes agree,
-/// and a database elsewhere answers over the network.
+/// Finds where a reading may lie. A scan looks everywhere, an index only where parts of codes
+/// agree, and a database elsewhere answers over the network.
 class Searcher {
 public:
     virtual ~Searcher() = default;

@@ -18,7 +18,8 @@
 
 namespace kzcat {
 
-/// Why a store could not do what it was asked, in a sentence that names a cure. Nothing was changed.
+/// Why a store could not do what it was asked, in a sentence that names a cure. Nothing was
+/// changed.
 class StoreError : public std::runtime_error {
 public:
     enum class Kind {
@@ -128,7 +129,8 @@ public:
     virtual std::optional<SourceInfo> find_hash(const FileHash& hash) = 0;
     virtual std::optional<TrackInfo> find_track(int64_t track) = 0;
 
-    /// Tracks in the order of their ids, from the one after `after`; stops when `visit` gives false.
+    /// Tracks in the order of their ids, from the one after `after`; stops when `visit` gives
+    /// false.
     virtual void visit_tracks(int64_t after,
                               const std::function<bool(const TrackInfo&)>& visit) = 0;
 
