@@ -9,7 +9,9 @@ uint64_t Corpus::code_count() const
 {
     uint64_t count = 0;
     for (const auto& segment : segments) {
-        count += segment.codes.size();
+        for (const auto& track : segment.tracks) {
+            count += track.count;
+        }
     }
     return count;
 }

@@ -17,7 +17,8 @@ struct TrackSpan {
     uint64_t count = 0;
 };
 
-/// Tracks whose codes lie one behind the other: a mapped file, or memory. Owns nothing.
+/// Tracks whose codes lie one behind the other: a mapped file, or memory. Codes of removed tracks may
+/// lie between them, and count for nothing. Owns nothing.
 struct Segment {
     std::span<const Code> codes;
     std::span<const TrackSpan> tracks; ///< ids rise
@@ -28,7 +29,8 @@ struct Segment {
     }
 };
 
-/// All tracks of a catalogue. Ids rise from segment to segment too.
+/// All tracks of a catalogue. Ids rise from segment to segment too; where one segment ends makes no
+/// difference to any answer.
 struct Corpus {
     std::vector<Segment> segments;
 

@@ -29,6 +29,10 @@ public:
     /// The best places, the most likely first, at most `limit` tracks.
     virtual std::vector<Candidate> find(const Reading& reading, size_t limit) = 0;
 
+    /// Looks everywhere, for when nothing that find() gave reaches its threshold; nullptr when find()
+    /// does so itself, or nothing more is wanted.
+    virtual Searcher* thorough() { return nullptr; }
+
     /// The codes of a track; empty when it is no longer there.
     virtual std::span<const Code> codes(int64_t track) = 0;
 

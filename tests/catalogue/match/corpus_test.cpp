@@ -22,6 +22,13 @@ TEST(Corpus, CountsOverAllItsSegments)
     EXPECT_EQ(3U, corpus.track_count());
 }
 
+TEST(Corpus, CountsNoCodesBetweenItsTracks)
+{
+    const std::array<Code, 9> codes{};
+    const std::array spans{TrackSpan{1, 0, 2}, TrackSpan{2, 5, 3}};
+    EXPECT_EQ(5U, kzcat::Corpus{{{codes, spans}}}.code_count());
+}
+
 TEST(Corpus, CountsNothingWithoutSegments)
 {
     EXPECT_EQ(0U, kzcat::Corpus{}.code_count());
