@@ -19,19 +19,25 @@ foreach(header IN LISTS public_headers ITEMS "${PROJECT_SOURCE_DIR}/kzsdk/kzsdk.
   install(FILES "${header}" DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}/${place}")
 endforeach()
 
-# find_package(kzsdk)
-set(package_dir "${CMAKE_INSTALL_LIBDIR}/cmake/kzsdk")
-install(
-  EXPORT kzsdkTargets
-  NAMESPACE kzsdk::
-  DESTINATION "${package_dir}")
-configure_package_config_file(
-  "${PROJECT_SOURCE_DIR}/packaging/kzsdkConfig.cmake.in" "${PROJECT_BINARY_DIR}/kzsdkConfig.cmake"
-  INSTALL_DESTINATION "${package_dir}" NO_SET_AND_CHECK_MACRO)
-write_basic_package_version_file("${PROJECT_BINARY_DIR}/kzsdkConfigVersion.cmake"
-                                 COMPATIBILITY SameMajorVersion)
-install(FILES "${PROJECT_BINARY_DIR}/kzsdkConfig.cmake"
-              "${PROJECT_BINARY_DIR}/kzsdkConfigVersion.cmake" DESTINATION "${package_dir}")
+# kz_install_package(<name> <version> <export set>...): what find_package(<name>) reads.
+function(kz_install_package name version)
+  set(package_dir "${CMAKE_INSTALL_LIBDIR}/cmake/${name}")
+  foreach(set IN LISTS ARGN)
+    install(
+      EXPORT ${set}
+      NAMESPACE ${name}::
+      DESTINATION "${package_dir}")
+  endforeach()
+  configure_package_config_file(
+    "${PROJECT_SOURCE_DIR}/packaging/${name}Config.cmake.in" "${PROJECT_BINARY_DIR}/${name}Config.cmake"
+    INSTALL_DESTINATION "${package_dir}" NO_SET_AND_CHECK_MACRO)
+  write_basic_package_version_file("${PROJECT_BINARY_DIR}/${name}ConfigVersion.cmake" VERSION ${version}
+                                   COMPATIBILITY SameMajorVersion)
+  install(FILES "${PROJECT_BINARY_DIR}/${name}Config.cmake"
+                "${PROJECT_BINARY_DIR}/${name}ConfigVersion.cmake" DESTINATION "${package_dir}")
+endfunction()
+
+kz_install_package(kzsdk ${PROJECT_VERSION} kzsdkTargets)
 
 # pkg-config: the file finds its prefix from its own place, so an installed tree can be moved.
 set(pkgconfig_dir "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
@@ -48,6 +54,24 @@ else()
 endif()
 configure_file("${PROJECT_SOURCE_DIR}/packaging/kzsdk.pc.in" "${PROJECT_BINARY_DIR}/kzsdk.pc" @ONLY)
 install(FILES "${PROJECT_BINARY_DIR}/kzsdk.pc" DESTINATION "${pkgconfig_dir}")
+
+# The catalogue, with its one header beside the folder of the other library's. What a program needs
+# that links it statically is in an export set of its own: others need no SQLite to build with.
+if(KZ_BUILD_KZCAT)
+  install(
+    TARGETS kzcat_shared
+    EXPORT kzcatTargets
+    LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}"
+    RUNTIME DESTINATION "${CMAKE_INSTALL_BINDIR}")
+  install(
+    TARGETS kzcat_static
+    EXPORT kzcatStaticTargets
+    ARCHIVE DESTINATION "${CMAKE_INSTALL_LIBDIR}")
+  install(FILES "${PROJECT_SOURCE_DIR}/catalogue/kzcat.h" DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}")
+  kz_install_package(kzcat ${KZCAT_VERSION} kzcatTargets kzcatStaticTargets)
+  configure_file("${PROJECT_SOURCE_DIR}/packaging/kzcat.pc.in" "${PROJECT_BINARY_DIR}/kzcat.pc" @ONLY)
+  install(FILES "${PROJECT_BINARY_DIR}/kzcat.pc" DESTINATION "${pkgconfig_dir}")
+endif()
 
 install(FILES "${PROJECT_SOURCE_DIR}/LICENSE" DESTINATION "${CMAKE_INSTALL_DOCDIR}")
 install(FILES "${PROJECT_SOURCE_DIR}/examples/fingerprint_tune.c"

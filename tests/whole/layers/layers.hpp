@@ -61,7 +61,7 @@ Complaints folders_seeing_too_much(const Plan& plan, const Tree& tree);
 Complaints rooms_including_upwards(const Plan& plan, const Tree& tree);
 /// A room that has a door is included through it.
 Complaints ways_around_doors(const Plan& plan, const Tree& tree);
-/// One spelling, from the root, serves in the tree and once installed.
+/// One spelling serves in the tree and once installed: from the root, but "kzcat.h" alone.
 Complaints includes_not_from_the_root(const Tree& tree);
 /// A private header is not installed, so a public one that includes it does not compile for users.
 Complaints private_headers_in_public_ones(const Tree& tree);

@@ -49,7 +49,7 @@ layers::Tree made_up_tree()
     file("catalogue/plain/plain.hpp", "#include <string>\n");
     file("catalogue/index.cpp",
          "#include \"kzsdk/kzsdk.h\"\n#include \"catalogue/plain/plain.hpp\"\n");
-    file("tools/kzfp/main.cpp", "#include \"kzsdk/high/high.h\"\n#include \"catalogue/kzcat.h\"\n");
+    file("tools/kzfp/main.cpp", "#include \"kzsdk/high/high.h\"\n#include \"kzcat.h\"\n");
     file("bench/bench.cpp", "#include \"kzsdk/loops/door.hpp\"\n");
     file("tests/loops_test.cpp", "#include \"kzsdk/loops/inner.hpp\"\n#include <gtest/gtest.h>\n");
     return tree;
@@ -110,8 +110,8 @@ TEST(LayerRules, RefuseASourceInNoDeclaredRoom)
 
 TEST(LayerRules, RefuseALibraryThatLooksOutside)
 {
-    const auto tree = tree_with("kzsdk/high/high.cpp", "\"catalogue/kzcat.h\"");
-    const Complaints expected = {"kzsdk/high/high.cpp:1 includes catalogue/kzcat.h"};
+    const auto tree = tree_with("kzsdk/high/high.cpp", "\"kzcat.h\"");
+    const Complaints expected = {"kzsdk/high/high.cpp:1 includes kzcat.h"};
     EXPECT_EQ(expected, layers::folders_seeing_too_much(made_up_plan(), tree));
     EXPECT_EQ(expected, layers::rooms_including_upwards(made_up_plan(), tree));
     EXPECT_EQ(expected, layers::foreign_headers(tree));
@@ -145,8 +145,8 @@ TEST(LayerRules, RefuseAnIncludeUpwards)
     const auto tree = tree_with("kzsdk/low/low.cpp", "\"kzsdk/high/high.h\"");
     EXPECT_EQ(Complaints{"kzsdk/low/low.cpp:1 includes kzsdk/high/high.h"},
               layers::rooms_including_upwards(made_up_plan(), tree));
-    const auto other = tree_with("catalogue/plain/plain.cpp", "\"catalogue/kzcat.h\"");
-    EXPECT_EQ(Complaints{"catalogue/plain/plain.cpp:1 includes catalogue/kzcat.h"},
+    const auto other = tree_with("catalogue/plain/plain.cpp", "\"kzcat.h\"");
+    EXPECT_EQ(Complaints{"catalogue/plain/plain.cpp:1 includes kzcat.h"},
               layers::rooms_including_upwards(made_up_plan(), other));
 }
 
@@ -171,6 +171,15 @@ TEST(LayerRules, RefuseAnIncludeNotFromTheRoot)
     const auto tree = tree_with("kzsdk/low/low.cpp", "\"low.h\"");
     EXPECT_EQ(Complaints{"kzsdk/low/low.cpp:1 includes low.h"},
               layers::includes_not_from_the_root(tree));
+}
+
+TEST(LayerRules, RefuseAHeaderSpelledAsUsersCannot)
+{
+    for (const std::string file : {"catalogue/index.cpp", "tools/kzfp/main.cpp"}) {
+        const auto tree = tree_with(file, "\"catalogue/kzcat.h\"");
+        EXPECT_EQ(Complaints{file + ":1 includes catalogue/kzcat.h"},
+                  layers::includes_not_from_the_root(tree));
+    }
 }
 
 TEST(LayerRules, RefuseAPrivateHeaderInAPublicOne)
