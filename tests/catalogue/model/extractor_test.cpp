@@ -1,0 +1,145 @@
+// Trails and queries, against features worked out in double precision, and against each other.
+
+#include <algorithm>
+#include <cmath>
+#include <cstring>
+#include <span>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "catalogue/model/extractor.hpp"
+#include "kzsdk/stream/stream.h"
+#include "reference_features.hpp"
+#include "support/melody.hpp"
+
+namespace {
+
+using kzcat::Code;
+using kzcat::QueryBands;
+using kzcat::QueryExtractor;
+using kzcat::SoundFormat;
+using kzcat::Trail;
+using kzcat::TrailExtractor;
+
+template <class Sample>
+std::span<const std::byte> bytes_of(const std::vector<Sample>& samples)
+{
+    return std::as_bytes(std::span(samples));
+}
+
+constexpr SoundFormat kWorking{KZ_STREAM_FORMAT_PCM16, kzcat::kWorkingRate, 1};
+
+Trail trail_of(const SoundFormat& format, std::span<const std::byte> bytes)
+{
+    TrailExtractor extractor(format);
+    extractor.feed(bytes);
+    return extractor.finish();
+}
+
+QueryBands query_of(const SoundFormat& format, std::span<const std::byte> bytes)
+{
+    QueryExtractor extractor(format);
+    extractor.feed(bytes);
+    return extractor.finish();
+}
+
+std::vector<float> floats_of(const std::vector<int16_t>& samples)
+{
+    return {samples.begin(), samples.end()};
+}
+
+// A change over time, from differences of all frames; frames beyond the ends are those at the ends.
+template <class Frames>
+double change_at(const Frames& frames, size_t centre, size_t pair, size_t lag)
+{
+    const size_t after = std::min(centre + lag, frames.size() - 1);
+    return static_cast<double>(frames[after][pair]) -
+           static_cast<double>(frames[centre - std::min(centre, lag)][pair]);
+}
+
+TEST(TrailExtractor, AgreesWithDoublePrecision)
+{
+    const auto sound = kz::test::melody(kzcat::kWorkingRate, 1, 30);
+    const Trail trail = trail_of(kWorking, bytes_of(sound));
+    const auto samples = floats_of(sound);
+    const auto frames = kz::test::reference_differences_of(samples, kzcat::kTrailHop);
+    ASSERT_EQ((frames.size() + 1) / 2, trail.codes.size());
+    size_t different = 0;
+    for (size_t c = 0; c < trail.codes.size(); ++c) {
+        for (size_t pair = 0; pair < kzcat::kPairs; ++pair) {
+            const double change = change_at(frames, 2 * c, pair, kzcat::pair_lag(pair));
+            if ((change > 0) != ((trail.codes[c] >> pair & 1) != 0)) {
+                EXPECT_LT(std::fabs(change), 1e-3) << "code " << c << " pair " << pair;
+                ++different;
+            }
+        }
+    }
+    EXPECT_LE(different * 1000, trail.codes.size() * kzcat::kPairs);
+}
+
+// A band far below the loudest of its frame holds the rounding errors of that one: hence the width.
+TEST(PairDifferences, AgreeWithDoublePrecision)
+{
+    constexpr double kTolerance = 3e-3;
+    const auto sound = kz::test::melody(kzcat::kWorkingRate, 1, 2);
+    const QueryBands query = query_of(kWorking, bytes_of(sound));
+    const auto samples = floats_of(sound);
+    for (const int steps : {-6, -3, 0, 1, 6}) {
+        const auto frames = kz::test::reference_differences_of(samples, kzcat::kQueryHop, steps);
+        ASSERT_EQ(frames.size(), query.frames());
+        for (size_t m = 0; m < frames.size(); ++m) {
+            std::array<float, kzcat::kPairs> differences;
+            kzcat::pair_differences(query.frame(m), steps, differences);
+            for (size_t pair = 0; pair < kzcat::kPairs; ++pair) {
+                EXPECT_NEAR(frames[m][pair], static_cast<double>(differences[pair]), kTolerance)
+                    << "steps " << steps << " frame " << m << " pair " << pair;
+            }
+        }
+    }
+}
+
+TEST(QueryExtractor, GivesTheTrailsCodesAtPhaseZero)
+{
+    const auto sound = kz::test::melody(44100, 2, 20);
+    const SoundFormat format{KZ_STREAM_FORMAT_PCM16, 44100, 2};
+    const Trail trail = trail_of(format, bytes_of(sound));
+    const QueryBands query = query_of(format, bytes_of(sound));
+    ASSERT_EQ(trail.samples, query.samples);
+    std::vector<std::array<float, kzcat::kPairs>> frames(query.frames());
+    for (size_t m = 0; m < frames.size(); ++m) {
+        kzcat::pair_differences(query.frame(m), 0, frames[m]);
+    }
+    for (size_t c = 2; c + 2 < trail.codes.size(); ++c) {
+        Code code = 0;
+        for (size_t pair = 0; pair < kzcat::kPairs; ++pair) {
+            const bool rises = change_at(frames, 4 * c, pair, 2 * kzcat::pair_lag(pair)) > 0;
+            code |= Code{rises} << pair;
+        }
+        EXPECT_EQ(trail.codes[c], code) << c;
+    }
+}
+
+TEST(TrailExtractor, ShowsNoCuts)
+{
+    const auto sound = kz::test::melody(48000, 2, 5);
+    const SoundFormat format{KZ_STREAM_FORMAT_PCM16, 48000, 2};
+    const Trail whole = trail_of(format, bytes_of(sound));
+    for (const size_t cut : {1U, 7U, 4096U, 100001U}) {
+        TrailExtractor extractor(format);
+        std::vector<Code> codes;
+        for (auto rest = bytes_of(sound); !rest.empty();) {
+            const size_t count = std::min(cut, rest.size());
+            extractor.feed(rest.first(count));
+            rest = rest.subspan(count);
+            const auto taken = extractor.take_codes();
+            codes.insert(codes.end(), taken.begin(), taken.end());
+        }
+        const Trail end = extractor.finish();
+        codes.insert(codes.end(), end.codes.begin(), end.codes.end());
+        EXPECT_EQ(whole.codes, codes) << "cut every " << cut;
+        EXPECT_EQ(whole.samples, end.samples) << "cut every " << cut;
+    }
+}
+
+} // namespace
