@@ -26,7 +26,8 @@ TEST(Corpus, CountsNoCodesBetweenItsTracks)
 {
     const std::array<Code, 9> codes{};
     const std::array spans{TrackSpan{1, 0, 2}, TrackSpan{2, 5, 3}};
-    EXPECT_EQ(5U, kzcat::Corpus{{{codes, spans}}}.code_count());
+    const kzcat::Segment segment{codes, spans};
+    EXPECT_EQ(5U, kzcat::Corpus{{segment}}.code_count());
 }
 
 TEST(Corpus, CountsNothingWithoutSegments)
