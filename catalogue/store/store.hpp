@@ -14,6 +14,7 @@
 #include <string_view>
 #include <vector>
 
+#include "catalogue/model/document_bands.hpp"
 #include "catalogue/model/trail.hpp"
 
 namespace kzcat {
@@ -59,9 +60,6 @@ struct Source {
     std::optional<FileHash> hash;
     bool operator==(const Source&) const = default;
 };
-
-/// Band energies for answering documents: 15 to a frame, log2 * 256, a frame every 5632 samples.
-using DocumentBands = std::vector<uint16_t>;
 
 struct NewTrack {
     Trail trail;

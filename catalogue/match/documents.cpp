@@ -1,0 +1,128 @@
+/// @file
+/// The search for the tracks that have a stretch like a document.
+#include "catalogue/match/documents.hpp"
+
+#include <algorithm>
+#include <cmath>
+
+namespace kzcat {
+
+namespace {
+
+// x^0.11 from square roots alone, which are the same on every processor: 0.11 is 0.00011100001010 in
+// binary.
+double power_of_growth(double x)
+{
+    constexpr unsigned kExponent = 0b00011100001010; // of 2^14
+    double power = 1;
+    double root = x;
+    for (unsigned bit = 1U << 13U; bit != 0; bit >>= 1U) {
+        root = std::sqrt(root);
+        power *= (kExponent & bit) != 0 ? root : 1;
+    }
+    return power;
+}
+
+// A best track this much further away than the threshold allows is still worth a mention.
+constexpr double kNearlyFound = 1.1;
+
+Verdict verdict_of(const std::vector<DocumentMatch>& candidates)
+{
+    if (candidates.empty()) {
+        return Verdict::no_match;
+    }
+    const DocumentMatch& best = candidates.front();
+    if (best.score >= best.threshold) {
+        return Verdict::match;
+    }
+    return best.score >= best.threshold * kNearlyFound ? Verdict::not_sure : Verdict::no_match;
+}
+
+} // namespace
+
+double document_threshold(uint64_t rows)
+{
+    constexpr double kDistance = 65; // that no stranger came below among so many rows
+    constexpr double kMeasuredRows = 73000;
+    const double growth = std::max(1.0, static_cast<double>(rows) / kMeasuredRows);
+    return -kDistance / power_of_growth(growth);
+}
+
+DocumentSearch::DocumentSearch(const DocumentValues& values)
+    : row_(document_row(values)),
+      silent_(std::all_of(values.begin(), values.end(), [](int16_t value) { return value == 0; }))
+{
+}
+
+void DocumentSearch::offer(int64_t track, std::span<const uint16_t> bands)
+{
+    offer(track, std::span<const DocumentRow>(document_rows(bands)));
+}
+
+void DocumentSearch::offer(int64_t track, std::span<const DocumentRow> rows)
+{
+    Best best{track, UINT32_MAX, 0};
+    for (size_t row = 0; row < rows.size(); ++row) {
+        const uint32_t distance = document_distance(row_, rows[row]);
+        if (distance < best.distance) {
+            best = {track, distance, row};
+        }
+    }
+    rows_ += rows.size();
+    if (!rows.empty()) {
+        best_.push_back(best);
+    }
+}
+
+DocumentMatch DocumentSearch::match_of(const Best& best) const
+{
+    const double score = -kDocumentRowUnit * best.distance;
+    return {.track = best.track,
+            .score = score,
+            .threshold = document_threshold(rows_),
+            .offset = static_cast<double>(best.row) * kDocumentHopSeconds,
+            .weak = score < kSureDocument};
+}
+
+DocumentAnswer DocumentSearch::finish(size_t candidates) const
+{
+    DocumentAnswer answer;
+    if (silent_) {
+        answer.verdict = Verdict::too_quiet;
+        return answer;
+    }
+    std::vector<Best> sorted = best_;
+    std::sort(sorted.begin(), sorted.end(), [](const Best& a, const Best& b) {
+        return a.distance != b.distance ? a.distance < b.distance : a.track < b.track;
+    });
+    std::vector<DocumentMatch> all(sorted.size());
+    std::transform(sorted.begin(), sorted.end(), all.begin(),
+                   [this](const Best& best) { return match_of(best); });
+    answer.verdict = verdict_of(all);
+    answer.runner_up = all.size() < 2 ? 0 : all[1].score;
+    const auto end = std::find_if(all.begin(), all.end(), [](const DocumentMatch& match) {
+        return match.score < match.threshold;
+    });
+    answer.matches.assign(all.begin(), end);
+    all.resize(std::min(all.size(), candidates));
+    answer.candidates = std::move(all);
+    return answer;
+}
+
+void DocumentTable::set(int64_t track, std::span<const uint16_t> bands)
+{
+    rows_[track] = document_rows(bands);
+}
+
+void DocumentTable::erase(int64_t track) { rows_.erase(track); }
+
+DocumentAnswer DocumentTable::find(const DocumentValues& values, size_t candidates) const
+{
+    DocumentSearch search(values);
+    for (const auto& [track, rows] : rows_) {
+        search.offer(track, rows);
+    }
+    return search.finish(candidates);
+}
+
+} // namespace kzcat
