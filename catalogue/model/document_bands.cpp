@@ -9,7 +9,7 @@
 #include <new>
 #include <utility>
 
-#include "kzsdk/abs/startup.h"
+#include "catalogue/model/library_hold.hpp"
 #include "kzsdk/qvfloat/qvfloat.h"
 
 namespace kzcat {
@@ -72,20 +72,6 @@ Manager make_manager()
     }
     return manager;
 }
-
-// Keeps the library started.
-class Hold {
-public:
-    Hold()
-    {
-        if (kzinit_acquire() != KZ_OK) {
-            throw std::bad_alloc();
-        }
-    }
-    ~Hold() { static_cast<void>(kzinit_release()); }
-    Hold(const Hold&) = delete;
-    Hold& operator=(const Hold&) = delete;
-};
 
 // ---- the 30 values
 
@@ -167,7 +153,7 @@ float decode_band_energy(uint16_t number)
 
 // Samples are kept from the start of the next frame on, so never more than a frame of them.
 struct DocumentBandExtractor::State {
-    Hold hold;
+    LibraryHold library; // before what it is needed for
     Manager manager = make_manager();
     std::vector<float> frame;
     DocumentBands numbers;

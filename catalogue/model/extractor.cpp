@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <array>
+#include <optional>
 #include <stdexcept>
 #include <utility>
 
@@ -36,7 +37,19 @@ struct TrailExtractor::State {
     static constexpr uint64_t kLongestLag = 3;
     static constexpr uint64_t kFramesPerCode = kCodeHop / kTrailHop;
 
-    explicit State(const SoundFormat& format) : feeder(format, kTrailHop) {}
+    State(const SoundFormat& format, bool document_bands) : feeder(format, kTrailHop)
+    {
+        if (document_bands) {
+            documents.emplace();
+        }
+    }
+
+    void hear(std::span<const float> samples)
+    {
+        if (documents) {
+            documents->feed(samples);
+        }
+    }
 
     void add(Frame frame)
     {
@@ -78,10 +91,12 @@ struct TrailExtractor::State {
     uint64_t frames = 0;
     uint64_t made = 0; // codes, also those taken
     std::vector<Code> codes;
+    std::optional<DocumentBandExtractor> documents;
     bool ended = false;
 };
 
-TrailExtractor::TrailExtractor(const SoundFormat& format) : state_(std::make_unique<State>(format))
+TrailExtractor::TrailExtractor(const SoundFormat& format, bool document_bands)
+    : state_(std::make_unique<State>(format, document_bands))
 {
 }
 TrailExtractor::TrailExtractor(TrailExtractor&&) noexcept = default;
@@ -91,10 +106,17 @@ TrailExtractor::~TrailExtractor() = default;
 void TrailExtractor::feed(std::span<const std::byte> bytes)
 {
     require_open(state_->ended);
-    state_->feeder.feed(bytes, [this](Frame frame) { state_->add(frame); });
+    state_->feeder.feed(
+        bytes, [this](Frame frame) { state_->add(frame); },
+        [this](std::span<const float> samples) { state_->hear(samples); });
 }
 
 std::vector<Code> TrailExtractor::take_codes() { return std::exchange(state_->codes, {}); }
+
+DocumentBands TrailExtractor::take_document_bands()
+{
+    return state_->documents ? state_->documents->take() : DocumentBands{};
+}
 
 Trail TrailExtractor::finish()
 {
@@ -135,7 +157,8 @@ QueryExtractor::~QueryExtractor() = default;
 void QueryExtractor::feed(std::span<const std::byte> bytes)
 {
     require_open(state_->ended);
-    state_->feeder.feed(bytes, [this](Frame frame) { state_->add(frame); });
+    state_->feeder.feed(
+        bytes, [this](Frame frame) { state_->add(frame); }, [](std::span<const float>) {});
 }
 
 QueryBands QueryExtractor::finish()

@@ -7,6 +7,7 @@
 #include <memory>
 #include <span>
 
+#include "catalogue/model/document_bands.hpp"
 #include "catalogue/model/fine_bands.hpp"
 #include "catalogue/model/trail.hpp"
 
@@ -26,8 +27,10 @@ struct SoundFormat {
 /// for the codes not yet taken.
 class TrailExtractor {
 public:
+    /// @param document_bands  Also compute what documents are answered from.
+    ///
     /// Throws std::invalid_argument with a sentence when the format cannot be used.
-    explicit TrailExtractor(const SoundFormat& format);
+    explicit TrailExtractor(const SoundFormat& format, bool document_bands = false);
     TrailExtractor(TrailExtractor&&) noexcept;
     TrailExtractor& operator=(TrailExtractor&&) noexcept;
     ~TrailExtractor();
@@ -36,6 +39,10 @@ public:
 
     /// The codes that are complete, oldest first; each is given once. finish() then gives the rest.
     std::vector<Code> take_codes();
+
+    /// The band energies that are complete, oldest frame first; each is given once. finish() adds
+    /// none. Empty unless the extractor was made to compute them.
+    DocumentBands take_document_bands();
 
     /// Ends the stream and returns the trail of everything that was fed, less codes already taken.
     Trail finish();

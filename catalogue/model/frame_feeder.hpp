@@ -20,14 +20,16 @@ public:
     /// Throws std::invalid_argument with a sentence when the format cannot be used.
     FrameFeeder(const SoundFormat& format, uint32_t hop);
 
-    /// Calls `take(frame)` for every frame that the bytes complete.
-    template <class Take>
-    void feed(std::span<const std::byte> bytes, Take take)
+    /// Calls `take(frame)` for every frame that the bytes complete, and `hear(samples)` for every
+    /// piece of the signal at the working rate.
+    template <class Take, class Hear>
+    void feed(std::span<const std::byte> bytes, Take take, Hear hear)
     {
         while (!bytes.empty()) {
             const size_t before = samples_.size();
             converter_.convert(reader_.read(bytes), samples_);
             total_ += samples_.size() - before;
+            hear(std::span<const float>(samples_).subspan(before));
             take_frames(take);
         }
     }

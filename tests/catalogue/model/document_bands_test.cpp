@@ -9,6 +9,7 @@
 #include <gtest/gtest.h>
 
 #include "catalogue/model/document_sounds.hpp"
+#include "catalogue/model/extractor.hpp"
 #include "kzsdk/abs/startup.h"
 #include "kzsdk/qvfloat/qvfloat.h"
 
@@ -153,6 +154,21 @@ TEST_F(DocumentBandsTest, SilenceHasNoEnergy)
 {
     const std::vector<int16_t> silence(kDocumentFrame);
     EXPECT_EQ(DocumentBands(kDocumentBandCount), bands_of(silence));
+}
+
+// Sound at 11025 Hz is the signal itself.
+TEST_F(DocumentBandsTest, TrailExtractorsMakeThemOnRequest)
+{
+    const auto sound = kz::test::tune(kzcat::kWorkingRate, 1, 5);
+    const kzcat::SoundFormat format{KZ_STREAM_FORMAT_PCM16, kzcat::kWorkingRate, 1};
+    kzcat::TrailExtractor extractor(format, true);
+    kzcat::TrailExtractor without(format);
+    extractor.feed(std::as_bytes(std::span(sound)));
+    without.feed(std::as_bytes(std::span(sound)));
+    EXPECT_EQ(bands_of(sound), extractor.take_document_bands());
+    EXPECT_TRUE(extractor.take_document_bands().empty());
+    EXPECT_TRUE(without.take_document_bands().empty());
+    EXPECT_EQ(without.finish(), extractor.finish());
 }
 
 // The frames are handed to the library as frame data, which then makes a document of them.
