@@ -93,8 +93,9 @@ endfunction()
 #
 # These files of the folder hold inner loops for processors with this instruction set, and are
 # compiled for them; what the processor runs is chosen when the program runs. On another
-# architecture such a file must be empty. What it defines must not be needed elsewhere: an inline
+# architecture such a file must be empty. What it defines must not serve elsewhere: an inline
 # function of a header that the linker took from it would end the program on other processors.
+# tests/whole/variants looks for such.
 function(kz_instruction_set set)
   set(options "")
   if(CMAKE_SYSTEM_PROCESSOR MATCHES "^(i[3-6]86|x86|x86_64|amd64|AMD64)$")
@@ -108,6 +109,9 @@ function(kz_instruction_set set)
     list(APPEND options -ftrivial-auto-var-init=uninitialized)
   endif()
   set_property(SOURCE ${ARGN} APPEND PROPERTY COMPILE_OPTIONS ${options})
+  # For tests/whole/variants.
+  cmake_path(RELATIVE_PATH CMAKE_CURRENT_SOURCE_DIR BASE_DIRECTORY "${PROJECT_SOURCE_DIR}" OUTPUT_VARIABLE folder)
+  set_property(GLOBAL APPEND PROPERTY KZ_VARIANTS_IN_${folder} ${ARGN})
 endfunction()
 
 # kz_test(<file>_test [ROOMS <room>...] [LIBS <target>...] [SOURCES <file>...] [FIXTURE <name>])
@@ -131,6 +135,9 @@ function(kz_test file)
   add_executable(${target} ${file}.cpp ${test_SOURCES})
   target_link_libraries(${target} PRIVATE kz_settings ${objects} kz_test_support ${test_LIBS})
   kz_register_test(${target} ${test_FIXTURE})
+  if(target MATCHES "^kzcat_")
+    add_dependencies(catalogue_tests ${target})
+  endif()
 endfunction()
 
 # kz_public_test(<file>_test [LIBS <target>...] [SOURCES <file>...])

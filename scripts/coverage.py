@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Lists the lines and branches of kzsdk/ that did not run, and what share of each room did.
+"""Lists the lines and branches of both libraries that did not run, and what share of each room did.
 
 scripts/coverage.py EXPORT.json..., the exports of llvm-cov, one of each program. A line or branch that
 several programs or instances of a template hold counts once, and has run when one of its copies has. A
@@ -11,6 +11,7 @@ import pathlib
 import sys
 
 ROOT = str(pathlib.Path(__file__).resolve().parent.parent) + "/"
+LIBRARIES = ("kzsdk/", "catalogue/")
 
 
 def lines_of(segments):
@@ -40,14 +41,14 @@ def collect(export, lines, branches):
     for data in export["data"]:
         for file in data["files"]:
             name = file["filename"].removeprefix(ROOT)
-            if not name.startswith("kzsdk/"):
+            if not name.startswith(LIBRARIES):
                 continue
             for line, times in lines_of(file["segments"]).items():
                 lines[name, line] += times
         for function in data["functions"]:
             names = [name.removeprefix(ROOT) for name in function["filenames"]]
             for line, column, _, _, true, false, file, *_ in function["branches"]:
-                if names[file].startswith("kzsdk/"):
+                if names[file].startswith(LIBRARIES):
                     counts = branches[names[file], line, column]
                     counts[0] += true
                     counts[1] += false
@@ -58,7 +59,8 @@ def percent(ran, of):
 
 
 def room_of(name):
-    return name.split("/")[1]
+    """kzsdk/dsp; catalogue alone for the files that lie in that folder itself."""
+    return "/".join(name.split("/")[:-1][:2])
 
 
 def main():
@@ -78,12 +80,12 @@ def main():
         for times, side in zip(counts, ("true", "false")):
             if not times:
                 print(f"{name}:{line}:{column}: never {side}: {text[name][line - 1].strip()}")
-    print("room         lines                          branches")
+    print("room             lines                          branches")
     for room in [*sorted({room_of(name) for name, _ in lines}), "all"]:
         ran = [times > 0 for (name, _), times in lines.items() if room in ("all", room_of(name))]
         sides = [times > 0 for (name, *_), counts in branches.items() for times in counts
                  if room in ("all", room_of(name))]
-        print(f"{room:8} {percent(sum(ran), len(ran))}    {percent(sum(sides), len(sides))}")
+        print(f"{room:15} {percent(sum(ran), len(ran))}    {percent(sum(sides), len(sides))}")
 
 
 main()

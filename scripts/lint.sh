@@ -49,7 +49,7 @@ tidy() {
 other_analyser() {
     cppcheck --quiet --std=c++20 --enable=warning,performance,portability --inconclusive \
         --suppressions-list=scripts/cppcheck_suppressions.txt --error-exitcode=1 -j "$jobs" -I . \
-        --template='{file}:{line}: {severity}: {message} [{id}]' kzsdk tables tools examples
+        --template='{file}:{line}: {severity}: {message} [{id}]' kzsdk catalogue tables tools examples
 }
 
 man_page() {

@@ -1,5 +1,5 @@
-# What the library exports depends on the options, never on what the machine has: without a jni.h or
-# a JDK the configuration stops and names its cures.
+# What the libraries export depends on the options, never on what the machine has: without a jni.h, a
+# JDK or SQLite the configuration stops and names its cures.
 #
 #   cmake -D ROOT= -D WORK_DIR= -D C_COMPILER= -D CXX_COMPILER= -D GENERATOR=
 #         -P configuration_test.cmake
@@ -60,11 +60,23 @@ configure(by_itself "${ROOT}" ${alone})
 expect_setting(by_itself KZ_JNI ON)
 expect_setting(by_itself KZ_JAVA OFF)
 expect_setting(by_itself KZ_SMALL_MAP OFF)
+expect_setting(by_itself KZ_BUILD_CATALOGUE OFF)
+
+set(no_sqlite -DCMAKE_DISABLE_FIND_PACKAGE_SQLite3=ON)
+configure(no_sqlite "${ROOT}" ${alone} ${no_sqlite} -DKZ_BUILD_CATALOGUE=ON)
+expect_stop(no_sqlite "needs SQLite 3.40 or later" libsqlite3-dev -DKZ_BUILD_CATALOGUE=OFF)
+
+configure(no_database "${ROOT}" ${alone} ${no_sqlite} -DKZ_BUILD_CATALOGUE=ON -DKZ_SQLITE=OFF)
+expect_setting(no_database KZ_SQLITE OFF)
+
+configure(no_catalogue "${ROOT}" -DKZ_BUILD_TESTS=OFF -DKZ_BUILD_TOOLS=ON -DKZ_BUILD_CATALOGUE=OFF)
+expect_stop(no_catalogue "uses the catalogue" -DKZ_BUILD_CATALOGUE=ON -DKZ_BUILD_TOOLS=OFF)
 
 file(WRITE "${WORK_DIR}/another/CMakeLists.txt"
      "cmake_minimum_required(VERSION 3.22)\nproject(another C CXX)\nadd_subdirectory(\"${ROOT}\" kzsdk)\n")
 configure(as_a_part "${WORK_DIR}/another" ${no_java})
 expect_setting(as_a_part KZ_JNI OFF)
+expect_setting(as_a_part KZ_BUILD_CATALOGUE OFF)
 
 # A JDK that comes after the first configuration is used by the next one.
 configure(later "${ROOT}" ${alone} -DCMAKE_DISABLE_FIND_PACKAGE_Java=ON)
