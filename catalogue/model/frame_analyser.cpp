@@ -10,6 +10,7 @@
 
 #include "catalogue/model/band_edges.hpp"
 #include "catalogue/model/hann_window.hpp"
+#include "catalogue/model/lanes.hpp"
 #include "catalogue/model/logarithm.hpp"
 
 namespace kzcat {
@@ -19,8 +20,6 @@ namespace {
 constexpr size_t kLevels = 256;
 constexpr int kOrder = 12;
 static_assert(1 << kOrder == kFrameLength);
-
-constexpr size_t kLanes = 8;
 
 struct Extremes {
     float low;
@@ -90,12 +89,6 @@ void write_windowed(std::span<const uint8_t> levels, const std::array<float, kLe
         output[i] = ranks[levels[i]] * weight;
         output[mirrored] = ranks[levels[mirrored]] * weight;
     }
-}
-
-float sum_of_lanes(const std::array<float, kLanes>& lanes)
-{
-    const auto half = [&lanes](size_t i) { return lanes[i] + lanes[i + 4]; };
-    return (half(0) + half(2)) + (half(1) + half(3));
 }
 
 // Lane l adds up every eighth bin from bin l of those that lie wholly inside.

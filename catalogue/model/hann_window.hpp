@@ -7,26 +7,14 @@
 #include <cstddef>
 
 #include "catalogue/model/profile.hpp"
+#include "catalogue/model/series.hpp"
 
 namespace kzcat {
-
-/// cos(x) for 0 <= x <= pi/2, by its power series; to 1e-16.
-constexpr double cosine(double x)
-{
-    double term = 1;
-    double sum = 1;
-    for (int n = 1; n <= 12; ++n) {
-        term = -term * x * x / ((2 * n - 1) * (2 * n));
-        sum = sum + term;
-    }
-    return sum;
-}
 
 /// Half of the window: value i is 1/2 - cos(2 pi (i + 1/2) / kFrameLength) / 2, and the other half
 /// mirrors it.
 constexpr std::array<float, kFrameLength / 2> make_hann_half()
 {
-    constexpr double kPi = 3.141592653589793;
     constexpr size_t kQuarter = kFrameLength / 4;
     std::array<float, kFrameLength / 2> half{};
     for (size_t i = 0; i < kQuarter; ++i) {

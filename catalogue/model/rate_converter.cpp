@@ -1,10 +1,12 @@
 /// @file
-/// High rates are brought down by the library's stored 4:1 and 2:1 filters first, which cost a few
-/// products a sample; one resampler then reaches the working rate.
+/// The way to the working rate. High rates are brought down by the library's stored 4:1 and 2:1
+/// filters first, which cost a few products a sample; one more filter, also stored for the usual
+/// rates, reaches the working rate.
 
 #include "catalogue/model/rate_converter.hpp"
 
 #include <algorithm>
+#include <iterator>
 #include <new>
 
 #include "catalogue/model/profile.hpp"
@@ -14,22 +16,11 @@ namespace kzcat {
 namespace {
 
 // Rates of which the library has the filter to the working rate stored.
-constexpr uint32_t kStoredRates[] = {44100, 48000, 32000, 24000, 22050, 16000};
+constexpr uint32_t kStoredRates[] = {8000, 16000, 22050, 24000, 32000, 44100, 48000};
 
-// Whether a rate, halved some times, is one of those with a stored filter.
-uint32_t halvings_to_stored(uint32_t rate)
-{
-    for (const uint32_t stored : kStoredRates) {
-        for (uint32_t halvings = 1; halvings < 8; ++halvings) {
-            if (stored << halvings == rate) {
-                return halvings;
-            }
-        }
-    }
-    return 0;
-}
+constexpr uint32_t kMostHalvings = 8;
 
-bool is_stored(uint32_t rate)
+bool is_stored(uint64_t rate)
 {
     return std::find(std::begin(kStoredRates), std::end(kStoredRates), rate) !=
            std::end(kStoredRates);
@@ -39,11 +30,10 @@ bool is_stored(uint32_t rate)
 // it stays at or above four times the working rate.
 uint32_t halvings_of(uint32_t rate)
 {
-    if (is_stored(rate)) {
-        return 0;
-    }
-    if (const uint32_t halvings = halvings_to_stored(rate)) {
-        return halvings;
+    for (uint32_t halvings = 0; halvings <= kMostHalvings; ++halvings) {
+        if (rate % (1U << halvings) == 0 && is_stored(rate >> halvings)) {
+            return halvings;
+        }
     }
     uint32_t halvings = 0;
     while ((rate >> (halvings + 1)) >= 4 * kWorkingRate) {
@@ -52,27 +42,36 @@ uint32_t halvings_of(uint32_t rate)
     return halvings;
 }
 
+// Raising the rate raises the level alike in the library's filters.
+double level_after(uint32_t rate)
+{
+    return is_stored(rate) && rate < kWorkingRate ? static_cast<double>(kWorkingRate) / rate : 1;
+}
+
 } // namespace
 
 RateConverter::RateConverter(uint32_t rate, double gain)
+    : gain_(static_cast<float>(gain / level_after(rate)))
 {
-    double now = rate;
-    uint32_t halvings = halvings_of(rate);
-    for (; halvings >= 2; halvings -= 2, now /= 4) {
+    const uint32_t halvings = halvings_of(rate);
+    for (uint32_t i = 0; i < halvings / 2; ++i) {
         add_stage(4, 1);
     }
-    for (; halvings >= 1; halvings -= 1, now /= 2) {
+    if (halvings % 2 != 0) {
         add_stage(2, 1);
     }
-    if (now != kWorkingRate) {
-        add_stage(now, kWorkingRate);
+    const uint64_t target = uint64_t{kWorkingRate} << halvings;
+    if (rate == target) {
+        return;
     }
-    // Raising the rate raises the level alike.
-    const double raised = now < kWorkingRate ? kWorkingRate / now : 1;
-    gain_ = static_cast<float>(gain / raised);
+    if (is_stored(rate >> halvings) && rate % (1U << halvings) == 0) {
+        add_stage(rate >> halvings, kWorkingRate);
+    } else {
+        last_.emplace(rate, target);
+    }
 }
 
-void RateConverter::add_stage(double from, double to)
+void RateConverter::add_stage(uint32_t from, uint32_t to)
 {
     Stage stage;
     stage.resampler.reset(KZDSP_CreateResampler(static_cast<float>(from), static_cast<float>(to)));
@@ -82,28 +81,34 @@ void RateConverter::add_stage(double from, double to)
     stages_.push_back(std::move(stage));
 }
 
+std::span<const float> RateConverter::run(Stage& stage, std::span<const float> samples)
+{
+    size_t made = 0;
+    uint32_t consumed = 0;
+    uint32_t produced = 0;
+    do {
+        const auto count = static_cast<uint32_t>(samples.size());
+        const size_t room = size_t{KZDSP_ComputeResampledLength(stage.resampler.get(), count)} + 2;
+        stage.output.resize(std::max(stage.output.size(), made + room));
+        KZDSP_Resample(stage.resampler.get(), samples.data(), count, stage.output.data() + made,
+                       static_cast<uint32_t>(room), &consumed, &produced);
+        samples = samples.subspan(consumed);
+        made += produced;
+    } while (consumed != 0 || produced != 0);
+    return std::span(stage.output).first(made);
+}
+
 void RateConverter::convert(std::span<const float> samples, std::vector<float>& output)
 {
     for (Stage& stage : stages_) {
-        size_t made = 0;
-        uint32_t consumed = 0;
-        uint32_t produced = 0;
-        do {
-            const auto count = static_cast<uint32_t>(samples.size());
-            const size_t room =
-                size_t{KZDSP_ComputeResampledLength(stage.resampler.get(), count)} + 2;
-            stage.output.resize(std::max(stage.output.size(), made + room));
-            KZDSP_Resample(stage.resampler.get(), samples.data(), count, stage.output.data() + made,
-                           static_cast<uint32_t>(room), &consumed, &produced);
-            samples = samples.subspan(consumed);
-            made += produced;
-        } while (consumed != 0 || produced != 0);
-        samples = std::span(stage.output).first(made);
+        samples = run(stage, samples);
     }
-    const size_t before = output.size();
-    output.resize(before + samples.size());
-    std::transform(samples.begin(), samples.end(),
-                   output.begin() + static_cast<std::ptrdiff_t>(before),
+    if (last_) {
+        last_output_.clear();
+        last_->convert(samples, last_output_);
+        samples = last_output_;
+    }
+    std::transform(samples.begin(), samples.end(), std::back_inserter(output),
                    [gain = gain_](float sample) { return sample * gain; });
 }
 

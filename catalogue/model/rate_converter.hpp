@@ -4,15 +4,17 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <span>
 #include <vector>
 
+#include "catalogue/model/sinc_resampler.hpp"
 #include "kzsdk/dsp/resampler.h"
 
 namespace kzcat {
 
 /// A stream of mono samples on its way to kWorkingRate. How it is cut into blocks does not show in
-/// the bits.
+/// the bits, and these are the same on every processor.
 class RateConverter {
 public:
     /// @param gain  Every sample comes out times this.
@@ -25,14 +27,18 @@ private:
     struct Destroy {
         void operator()(KZDSP_resampler* resampler) const { KZDSP_DestroyResampler(resampler); }
     };
+    // A filter that the library has stored.
     struct Stage {
         std::unique_ptr<KZDSP_resampler, Destroy> resampler;
-        std::vector<float> output; ///< of the last block
+        std::vector<float> output; // of the last block
     };
 
-    void add_stage(double from, double to);
+    void add_stage(uint32_t from, uint32_t to);
+    static std::span<const float> run(Stage& stage, std::span<const float> samples);
 
     std::vector<Stage> stages_;
+    std::optional<SincResampler> last_; ///< for rates that have no stored filter
+    std::vector<float> last_output_;
     float gain_ = 1;
 };
 

@@ -17,7 +17,7 @@ namespace kzcat {
 
 namespace {
 
-constexpr size_t kBlockBytes = 32768; // samples and sums of a block stay in the first cache
+constexpr size_t kBlockBytes = 32768; // samples and sums of a block fit the first caches
 constexpr double kFullScale = 32768;
 constexpr double kLoudest = 16 * kFullScale;
 
@@ -147,7 +147,8 @@ void require_usable(const SoundFormat& format)
 
 SoundReader::SoundReader(const SoundFormat& format)
     : format_(format), frame_bytes_(bytes_per_sample(format.encoding) * format.channels),
-      block_frames_(std::max<size_t>(1, kBlockBytes / frame_bytes_)), sums_(block_frames_)
+      block_frames_(std::clamp<size_t>(kBlockBytes / frame_bytes_, 1, format.rate)),
+      sums_(block_frames_)
 {
     partial_.reserve(frame_bytes_);
 }

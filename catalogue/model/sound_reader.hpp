@@ -22,8 +22,8 @@ public:
     /// `format` is usable.
     explicit SoundReader(const SoundFormat& format);
 
-    /// Reads whole frames from the front of `bytes`, up to a block of them, and keeps the bytes of
-    /// a frame that is not yet whole.
+    /// Reads whole frames from the front of `bytes`, up to a block of them and no more than
+    /// a second, and keeps the bytes of a frame that is not yet whole.
     ///
     /// @return The sums, one a frame, valid until the next call; empty when all bytes are used.
     std::span<const float> read(std::span<const std::byte>& bytes);

@@ -2,19 +2,24 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstring>
 #include <span>
+#include <stdexcept>
 #include <vector>
 
 #include <gtest/gtest.h>
 
 #include "catalogue/model/extractor.hpp"
+#include "extracted.hpp"
 #include "kzsdk/stream/stream.h"
 #include "reference_features.hpp"
 #include "support/melody.hpp"
 
 namespace {
 
+using kz::test::bytes_of;
+using kz::test::query_of;
+using kz::test::trail_in_pieces;
+using kz::test::trail_of;
 using kzcat::Code;
 using kzcat::QueryBands;
 using kzcat::QueryExtractor;
@@ -22,27 +27,7 @@ using kzcat::SoundFormat;
 using kzcat::Trail;
 using kzcat::TrailExtractor;
 
-template <class Sample>
-std::span<const std::byte> bytes_of(const std::vector<Sample>& samples)
-{
-    return std::as_bytes(std::span(samples));
-}
-
 constexpr SoundFormat kWorking{KZ_STREAM_FORMAT_PCM16, kzcat::kWorkingRate, 1};
-
-Trail trail_of(const SoundFormat& format, std::span<const std::byte> bytes)
-{
-    TrailExtractor extractor(format);
-    extractor.feed(bytes);
-    return extractor.finish();
-}
-
-QueryBands query_of(const SoundFormat& format, std::span<const std::byte> bytes)
-{
-    QueryExtractor extractor(format);
-    extractor.feed(bytes);
-    return extractor.finish();
-}
 
 std::vector<float> floats_of(const std::vector<int16_t>& samples)
 {
@@ -126,20 +111,60 @@ TEST(TrailExtractor, ShowsNoCuts)
     const SoundFormat format{KZ_STREAM_FORMAT_PCM16, 48000, 2};
     const Trail whole = trail_of(format, bytes_of(sound));
     for (const size_t cut : {1U, 7U, 4096U, 100001U}) {
-        TrailExtractor extractor(format);
-        std::vector<Code> codes;
-        for (auto rest = bytes_of(sound); !rest.empty();) {
-            const size_t count = std::min(cut, rest.size());
-            extractor.feed(rest.first(count));
-            rest = rest.subspan(count);
-            const auto taken = extractor.take_codes();
-            codes.insert(codes.end(), taken.begin(), taken.end());
-        }
-        const Trail end = extractor.finish();
-        codes.insert(codes.end(), end.codes.begin(), end.codes.end());
-        EXPECT_EQ(whole.codes, codes) << "cut every " << cut;
-        EXPECT_EQ(whole.samples, end.samples) << "cut every " << cut;
+        EXPECT_EQ(whole, trail_in_pieces(format, bytes_of(sound), cut)) << "cut every " << cut;
     }
+}
+
+TEST(QueryExtractor, ShowsNoCuts)
+{
+    const auto sound = kz::test::melody(44056, 1, 2);
+    const SoundFormat format{KZ_STREAM_FORMAT_PCM16, 44056, 1};
+    const QueryBands whole = query_of(format, bytes_of(sound));
+    QueryExtractor extractor(format);
+    for (auto rest = bytes_of(sound); !rest.empty();) {
+        const size_t count = std::min<size_t>(rest.size(), 333);
+        extractor.feed(rest.first(count));
+        rest = rest.subspan(count);
+    }
+    const QueryBands pieces = extractor.finish();
+    EXPECT_EQ(whole.samples, pieces.samples);
+    EXPECT_EQ(whole.levels, pieces.levels);
+    EXPECT_EQ(whole.energies, pieces.energies);
+}
+
+// Code c is that of frame 2c, and its longest lag looks three frames ahead.
+TEST(TrailExtractor, GivesACodeWithItsLastFrame)
+{
+    const auto sound = kz::test::melody(kzcat::kWorkingRate, 1, 3);
+    TrailExtractor extractor(kWorking);
+    const size_t first = (3 * kzcat::kTrailHop + kzcat::kFrameLength) * sizeof sound[0];
+    extractor.feed(bytes_of(sound).first(first - 1));
+    EXPECT_TRUE(extractor.take_codes().empty());
+    extractor.feed(bytes_of(sound).subspan(first - 1, 1));
+    EXPECT_EQ(1U, extractor.take_codes().size());
+    extractor.feed(bytes_of(sound).subspan(first, 2 * kzcat::kTrailHop * sizeof sound[0]));
+    EXPECT_EQ(1U, extractor.take_codes().size());
+}
+
+TEST(TrailExtractor, OfAnythingShortIsEmpty)
+{
+    const std::vector<int16_t> sound(kzcat::kFrameLength - 1, 1000);
+    EXPECT_EQ((Trail{kzcat::Profile::standard, kzcat::kFrameLength - 1, {}}),
+              trail_of(kWorking, bytes_of(sound)));
+    EXPECT_EQ(Trail{}, trail_of(kWorking, {}));
+    EXPECT_EQ(0U, query_of(kWorking, bytes_of(sound)).frames());
+}
+
+TEST(TrailExtractor, EndsOnce)
+{
+    TrailExtractor trail(kWorking);
+    static_cast<void>(trail.finish());
+    EXPECT_THROW(trail.finish(), std::logic_error);
+    EXPECT_THROW(trail.feed({}), std::logic_error);
+    QueryExtractor query(kWorking);
+    static_cast<void>(query.finish());
+    EXPECT_THROW(query.finish(), std::logic_error);
+    EXPECT_THROW(query.feed({}), std::logic_error);
 }
 
 } // namespace
