@@ -146,7 +146,7 @@ const std::map<std::string, Names> kOfRooms = {
     {"catalogue/model", kVectors},
     {"catalogue/match", kVectors},
     {"catalogue/index", kMappedFiles},
-    {"catalogue/store", {"sqlite3.h"}},
+    {"catalogue/store", {"nettle/sha2.h", "sqlite3.h"}},
     {"kzsdk/kernels", {"arm_neon.h", "immintrin.h", "smmintrin.h"}},
     {"kzsdk/disc", {"dirent.h", "fcntl.h", "sys/stat.h", "unistd.h"}},
     {"kzsdk/jni",
