@@ -13,7 +13,6 @@
 #include <cstdint>
 #include <cstdio>
 #include <cstring>
-#include <fstream>
 #include <functional>
 #include <span>
 #include <string>
@@ -23,6 +22,7 @@
 #include "support/digest.hpp"
 #include "support/fingerprints.hpp"
 #include "support/melody.hpp"
+#include "whole/golden/lines.hpp"
 
 namespace {
 
@@ -125,7 +125,7 @@ std::string outcome(Algorithm algorithm, Format format, uint32_t rate, Channels 
     return status == KZ_OK ? digest.text() : status_text(status);
 }
 
-using Lines = std::vector<std::string>;
+using kz::golden::Lines;
 
 void add_document(Lines& lines, const Piece& piece, Format format, uint32_t rate, Channels channels)
 {
@@ -272,26 +272,6 @@ void add_filters(Lines& lines)
     }
 }
 
-int compare(const Lines& lines, const char* path)
-{
-    std::ifstream file(path);
-    Lines expected;
-    for (std::string line; std::getline(file, line);) {
-        expected.push_back(line);
-    }
-    size_t differences = 0;
-    for (size_t i = 0; i < std::max(lines.size(), expected.size()); ++i) {
-        const std::string is = i < lines.size() ? lines[i] : "(nothing)";
-        const std::string was = i < expected.size() ? expected[i] : "(nothing)";
-        if (is != was) {
-            std::printf("is  %s\nwas %s\n", is.c_str(), was.c_str());
-            ++differences;
-        }
-    }
-    std::printf("%zu of %zu differ\n", differences, lines.size());
-    return differences == 0 ? 0 : 1;
-}
-
 } // namespace
 
 int main(int argc, char** argv)
@@ -304,14 +284,7 @@ int main(int argc, char** argv)
     add_filters(lines);
     add_documents(lines);
     add_streams(lines);
-    int result = 0;
-    if (argc > 1) {
-        result = compare(lines, argv[1]);
-    } else {
-        for (const std::string& line : lines) {
-            std::printf("%s\n", line.c_str());
-        }
-    }
+    const int result = kz::golden::report(lines, argc > 1 ? argv[1] : nullptr);
     static_cast<void>(kzmem_shutdown());
     return result;
 }
