@@ -21,6 +21,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <type_traits>
 
 namespace {
 
@@ -392,9 +393,16 @@ private:
     }
 };
 
+/// False for an order that fingerprints do not use. Only frames of floats are ever as short as 2^12.
 template <class Simd, template <class> class Butterflies, class Word>
 bool transform(Word* x, const Word* factors, int32_t order) noexcept
 {
+    if constexpr (std::is_same_v<Word, float>) {
+        if (order == 12) {
+            Transform<Simd, Butterflies<Simd>, 12>::run(x, factors);
+            return true;
+        }
+    }
     if (order == 14) {
         Transform<Simd, Butterflies<Simd>, 14>::run(x, factors);
         return true;
