@@ -11,19 +11,31 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstring>
 
 namespace kzcat {
 
 namespace {
 
-constexpr size_t kLanes = 16; ///< bands of a frame, and one that is always 0
-using Lanes = std::array<float, kLanes>;
+// The bands of a frame and a zero, four to a vector. Arithmetic on vectors is that on their lanes,
+// whatever registers the processor has.
+constexpr size_t kVectors = 4;
+constexpr size_t kVectorLanes = 4;
+using Vector = float __attribute__((vector_size(kVectorLanes * sizeof(float))));
+using Lanes = std::array<Vector, kVectors>;
 
-/// Bands of all frames of a track.
 struct Frames {
     std::vector<Lanes> energies;
     std::vector<Lanes> amplitudes;
 };
+
+Vector root(Vector value)
+{
+    for (size_t lane = 0; lane < kVectorLanes; ++lane) {
+        value[lane] = std::sqrt(value[lane]);
+    }
+    return value;
+}
 
 // One energy for each number that can be stored: decoding is then a matter of looking up.
 const std::vector<float>& energies_of_numbers()
@@ -38,6 +50,17 @@ const std::vector<float>& energies_of_numbers()
     return table;
 }
 
+Lanes amplitudes_of(const Lanes& energies)
+{
+    Lanes amplitudes;
+    for (size_t i = 0; i < kVectors; ++i) {
+        Vector bins;
+        std::memcpy(&bins, &kDocumentBandBins[i * kVectorLanes], sizeof bins);
+        amplitudes[i] = root(energies[i] / bins);
+    }
+    return amplitudes;
+}
+
 Frames decode(std::span<const uint16_t> bands)
 {
     const std::vector<float>& table = energies_of_numbers();
@@ -45,81 +68,88 @@ Frames decode(std::span<const uint16_t> bands)
     frames.energies.resize(bands.size() / kDocumentBandCount);
     frames.amplitudes.resize(frames.energies.size());
     for (size_t frame = 0; frame < frames.energies.size(); ++frame) {
-        Lanes& energies = frames.energies[frame];
+        std::array<float, kVectors * kVectorLanes> energies{};
         for (size_t band = 0; band < kDocumentBandCount; ++band) {
             energies[band] = table[bands[frame * kDocumentBandCount + band]];
         }
-        energies.back() = 0;
-        Lanes& amplitudes = frames.amplitudes[frame];
-        for (size_t lane = 0; lane < kLanes; ++lane) {
-            amplitudes[lane] = std::sqrt(energies[lane] / kDocumentBandBins[lane]);
-        }
+        std::memcpy(&frames.energies[frame], energies.data(), sizeof energies);
+        frames.amplitudes[frame] = amplitudes_of(frames.energies[frame]);
     }
     return frames;
 }
 
-Lanes sum_of_frames(const std::vector<Lanes>& frames, size_t first)
+// Sums a term over the frames of the document that begins at `first`, oldest first.
+template <class Term>
+Vector sum_of_frames(const std::vector<Lanes>& frames, size_t first, size_t vector, Term term)
 {
-    Lanes sums{};
+    Vector sum{};
     for (size_t frame = 0; frame < kDocumentFrames; ++frame) {
-        const Lanes& lanes = frames[first + frame * kDocumentStride];
-        for (size_t lane = 0; lane < kLanes; ++lane) {
-            sums[lane] += lanes[lane];
-        }
+        sum += term(frames[first + frame * kDocumentStride][vector]);
     }
-    return sums;
+    return sum;
 }
 
 // Root mean energies.
-Lanes means_of(const std::vector<Lanes>& energies, size_t first)
+Vector mean_of(const std::vector<Lanes>& energies, size_t first, size_t vector)
 {
-    Lanes means = sum_of_frames(energies, first);
-    for (float& mean : means) {
-        mean = std::sqrt(mean / float{kDocumentFrames});
-    }
-    return means;
+    const Vector sum = sum_of_frames(energies, first, vector, [](Vector energy) { return energy; });
+    return root(sum / float{kDocumentFrames});
 }
 
 // Standard deviations of the amplitudes.
-Lanes spreads_of(const std::vector<Lanes>& amplitudes, size_t first)
+Vector spread_of(const std::vector<Lanes>& amplitudes, size_t first, size_t vector)
 {
-    Lanes averages = sum_of_frames(amplitudes, first);
-    for (float& average : averages) {
-        average /= float{kDocumentFrames};
-    }
-    Lanes squares{};
-    for (size_t frame = 0; frame < kDocumentFrames; ++frame) {
-        const Lanes& lanes = amplitudes[first + frame * kDocumentStride];
-        for (size_t lane = 0; lane < kLanes; ++lane) {
-            const float deviation = lanes[lane] - averages[lane];
-            squares[lane] += deviation * deviation;
-        }
-    }
-    for (float& square : squares) {
-        square = std::sqrt(square / float{kDocumentFrames - 1});
-    }
-    return squares;
+    const Vector average = sum_of_frames(amplitudes, first, vector, [](Vector a) { return a; }) /
+                           float{kDocumentFrames};
+    const Vector squares = sum_of_frames(amplitudes, first, vector, [average](Vector amplitude) {
+        return (amplitude - average) * (amplitude - average);
+    });
+    return root(squares / float{kDocumentFrames - 1});
 }
 
-int16_t root_of(int32_t share)
+// The sum of the bands, from the lowest one up.
+float sum_of_bands(const Lanes& values)
 {
-    constexpr auto kUnits = static_cast<float>(1 / kDocumentRowUnit);
-    return static_cast<int16_t>(std::sqrt(static_cast<float>(share)) * kUnits + 0.5F);
+    float sum = 0;
+    for (size_t band = 0; band < kDocumentBandCount; ++band) {
+        sum += values[band / kVectorLanes][band % kVectorLanes];
+    }
+    return sum;
 }
+
+// Roots of whole shares in units of kDocumentRowUnit, rounded to the nearest.
+constexpr auto kUnits = static_cast<float>(1 / kDocumentRowUnit);
 
 // The shares of the bands in their sum, as whole numbers, and their roots.
 void store_roots(const Lanes& values, int16_t* destination)
 {
-    float sum = 0;
-    for (size_t band = 0; band < kDocumentBandCount; ++band) {
-        sum += values[band];
-    }
+    const float sum = sum_of_bands(values);
     const float divisor = sum > 0 ? sum : 1;
-    std::array<int16_t, kLanes> roots{};
-    for (size_t lane = 0; lane < kLanes; ++lane) {
-        roots[lane] = root_of(static_cast<int32_t>(32768 * (values[lane] / divisor)));
+    using Whole = int32_t __attribute__((vector_size(sizeof(Vector))));
+    std::array<int16_t, kVectors * kVectorLanes> roots{};
+    for (size_t i = 0; i < kVectors; ++i) {
+        const auto shares = __builtin_convertvector(32768 * (values[i] / divisor), Whole);
+        const auto units = __builtin_convertvector(
+            root(__builtin_convertvector(shares, Vector)) * kUnits + 0.5F, Whole);
+        for (size_t lane = 0; lane < kVectorLanes; ++lane) {
+            roots[i * kVectorLanes + lane] = static_cast<int16_t>(units[lane]);
+        }
     }
     std::copy_n(roots.begin(), kDocumentBandCount, destination);
+}
+
+DocumentRow row_at(const Frames& frames, size_t first)
+{
+    Lanes means;
+    Lanes spreads;
+    for (size_t i = 0; i < kVectors; ++i) {
+        means[i] = mean_of(frames.energies, first, i);
+        spreads[i] = spread_of(frames.amplitudes, first, i);
+    }
+    DocumentRow row{};
+    store_roots(means, row.data());
+    store_roots(spreads, row.data() + kDocumentBandCount);
+    return row;
 }
 
 size_t count_rows(size_t frames) { return frames < kDocumentSpan ? 0 : frames - kDocumentSpan + 1; }
@@ -129,8 +159,10 @@ size_t count_rows(size_t frames) { return frames < kDocumentSpan ? 0 : frames - 
 DocumentRow document_row(const DocumentValues& values)
 {
     DocumentRow row{};
-    std::transform(values.begin(), values.end(), row.begin(),
-                   [](int16_t value) { return root_of(static_cast<uint16_t>(value)); });
+    std::transform(values.begin(), values.end(), row.begin(), [](int16_t value) {
+        const auto share = static_cast<float>(static_cast<uint16_t>(value));
+        return static_cast<int16_t>(std::sqrt(share) * kUnits + 0.5F);
+    });
     return row;
 }
 
@@ -148,8 +180,7 @@ std::vector<DocumentRow> document_rows(std::span<const uint16_t> bands)
     const Frames frames = decode(bands);
     std::vector<DocumentRow> rows(count_rows(frames.energies.size()));
     for (size_t first = 0; first < rows.size(); ++first) {
-        store_roots(means_of(frames.energies, first), rows[first].data());
-        store_roots(spreads_of(frames.amplitudes, first), rows[first].data() + kDocumentBandCount);
+        rows[first] = row_at(frames, first);
     }
     return rows;
 }

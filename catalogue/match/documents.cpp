@@ -76,7 +76,7 @@ void DocumentSearch::offer(int64_t track, std::span<const DocumentRow> rows)
 
 DocumentMatch DocumentSearch::match_of(const Best& best) const
 {
-    const double score = -kDocumentRowUnit * best.distance;
+    const double score = 0 - kDocumentRowUnit * best.distance; // 0, not -0, at best
     return {.track = best.track,
             .score = score,
             .threshold = document_threshold(rows_),
