@@ -34,7 +34,7 @@ tests() {
 
 benchmarks() {
     cmake -S . -B build/bench -G Ninja -DKZ_WERROR=ON -DKZ_BUILD_BENCH=ON -DKZ_BUILD_TESTS=OFF \
-        -DKZ_BUILD_TOOLS=OFF && cmake --build build/bench --target kzbench
+        -DKZ_BUILD_TOOLS=OFF -DKZ_BUILD_CATALOGUE=ON && cmake --build build/bench --target kzbench
 }
 
 if [ "${1:-}" = --long ]; then
