@@ -3,7 +3,6 @@
 /// compiler, whose arithmetic is the same for every processor.
 #pragma once
 
-#include <array>
 #include <cstddef>
 #include <cstdint>
 
@@ -89,19 +88,21 @@ constexpr BandBins bins_between(double low, double high)
             static_cast<float>(high - last)};
 }
 
-constexpr std::array<BandBins, kFineBands> make_band_bins()
+/// An array that can be read without a function: the inner loops must not share any.
+struct BandTable {
+    BandBins bands[kFineBands];
+};
+
+constexpr BandTable make_band_bins()
 {
-    std::array<BandBins, kFineBands> bands{};
+    BandTable table{};
     for (size_t i = 0; i < kFineBands; ++i) {
         const int j = kFirstFineBand + static_cast<int>(i);
-        bands[i] = bins_between(edge_position(j), edge_position(j + 1));
+        table.bands[i] = bins_between(edge_position(j), edge_position(j + 1));
     }
-    return bands;
+    return table;
 }
 
-inline constexpr std::array<BandBins, kFineBands> kBandBins = make_band_bins();
-
-/// Bins that any band uses: those below this.
-inline constexpr uint32_t kUsedBins = kBandBins[kFineBands - 1].last + 1;
+inline constexpr BandTable kBandBins = make_band_bins();
 
 } // namespace kzcat

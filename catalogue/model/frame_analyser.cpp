@@ -1,5 +1,5 @@
 /// @file
-/// Every sum below is taken in one stated order, which suits vectors of up to eight lanes.
+/// A frame's way through equaliser, window, transform and bands.
 
 #include "catalogue/model/frame_analyser.hpp"
 
@@ -8,8 +8,7 @@
 #include <cmath>
 #include <new>
 
-#include "catalogue/model/band_edges.hpp"
-#include "catalogue/model/hann_window.hpp"
+#include "catalogue/model/frame_kernels.hpp"
 #include "catalogue/model/lanes.hpp"
 #include "catalogue/model/logarithm.hpp"
 
@@ -21,37 +20,28 @@ constexpr size_t kLevels = 256;
 constexpr int kOrder = 12;
 static_assert(1 << kOrder == kFrameLength);
 
-struct Extremes {
-    float low;
-    float high;
-
-    // Range of a frame that says nothing: one step of 16-bit audio, or what a resampler leaves of a
-    // constant.
-    bool is_silent() const
-    {
-        const float distance = std::max(std::fabs(low), std::fabs(high));
-        return high - low <= std::max(1.0F, distance * (1.0F / 256));
-    }
-};
-
-Extremes extremes_of(Frame frame)
+// Range of a frame that says nothing: one step of 16-bit audio, or what a resampler leaves of a
+// constant.
+bool is_silent(Extremes ends)
 {
-    Extremes ends{frame[0], frame[0]};
-    for (const float sample : frame) {
-        ends.low = std::min(ends.low, sample);
-        ends.high = std::max(ends.high, sample);
-    }
-    return ends;
+    const float distance = std::max(std::fabs(ends.low), std::fabs(ends.high));
+    return ends.high - ends.low <= std::max(1.0F, distance * (1.0F / 256));
 }
 
-// Quantises the samples to levels between the extremes.
-void write_levels(Frame frame, Extremes ends, std::span<uint8_t> levels)
+// How often each level occurs. Equal ones that follow each other would wait for one another's
+// counter, so there are four counters of each.
+std::array<int32_t, kLevels> counts_of(std::span<const uint8_t> levels)
 {
-    const float scale = static_cast<float>(kLevels - 1) / (ends.high - ends.low);
-    for (size_t i = 0; i < kFrameLength; ++i) {
-        const auto level = static_cast<int32_t>((frame[i] - ends.low) * scale);
-        levels[i] = static_cast<uint8_t>(std::min<int32_t>(level, kLevels - 1));
+    std::array<std::array<int32_t, kLevels>, 4> counters{};
+    for (size_t i = 0; i < kFrameLength; i += counters.size()) {
+        for (size_t k = 0; k < counters.size(); ++k) {
+            ++counters[k][levels[i + k]];
+        }
     }
+    for (size_t level = 0; level < kLevels; ++level) {
+        counters[0][level] += counters[1][level] + counters[2][level] + counters[3][level];
+    }
+    return counters[0];
 }
 
 // The share of samples at or below each level, less the mean of that over the frame. Shares are
@@ -59,10 +49,7 @@ void write_levels(Frame frame, Extremes ends, std::span<uint8_t> levels)
 // values are whole numbers of 2^-24.
 std::array<float, kLevels> ranks_of(std::span<const uint8_t> levels)
 {
-    std::array<int32_t, kLevels> counts{};
-    for (const uint8_t level : levels) {
-        ++counts[level];
-    }
+    const std::array<int32_t, kLevels> counts = counts_of(levels);
     std::array<int32_t, kLevels> below{};
     int32_t cumulative = 0;
     int32_t total = 0;
@@ -77,33 +64,6 @@ std::array<float, kLevels> ranks_of(std::span<const uint8_t> levels)
     return ranks;
 }
 
-// Windowed ranks, 2^14 times their size.
-void write_windowed(std::span<const uint8_t> levels, const std::array<float, kLevels>& ranks,
-                    std::span<float> output)
-{
-    constexpr float kScale = 0x1p-24F * 16384;
-    constexpr size_t kHalf = kFrameLength / 2;
-    for (size_t i = 0; i < kHalf; ++i) {
-        const float weight = kHannHalf[i] * kScale;
-        const size_t mirrored = kFrameLength - 1 - i;
-        output[i] = ranks[levels[i]] * weight;
-        output[mirrored] = ranks[levels[mirrored]] * weight;
-    }
-}
-
-// Lane l adds up every eighth bin from bin l of those that lie wholly inside.
-float energy_of(const BandBins& band, std::span<const float> bins)
-{
-    std::array<float, kLanes> lanes{};
-    const auto whole = bins.subspan(band.whole_begin, band.whole_count);
-    for (size_t k = 0; k < whole.size(); ++k) {
-        lanes[k % kLanes] += whole[k] * whole[k];
-    }
-    const float first = bins[band.first] * bins[band.first];
-    const float last = bins[band.last] * bins[band.last];
-    return (first * band.first_weight + last * band.last_weight) + sum_of_lanes(lanes);
-}
-
 } // namespace
 
 FrameAnalyser::FrameAnalyser()
@@ -116,16 +76,17 @@ FrameAnalyser::FrameAnalyser()
 
 void FrameAnalyser::analyse(Frame frame, std::span<float, kFineBands> energies)
 {
-    const Extremes ends = extremes_of(frame);
-    if (ends.is_silent()) {
+    const FrameKernels& kernels = frame_kernels();
+    const Extremes ends = kernels.extremes(frame.data());
+    if (is_silent(ends)) {
         std::fill(energies.begin(), energies.end(), 0.0F);
         return;
     }
-    write_levels(frame, ends, levels_);
-    write_windowed(levels_, ranks_of(levels_), transformed_);
+    const float scale = static_cast<float>(kLevels - 1) / (ends.high - ends.low);
+    kernels.write_levels(frame.data(), ends.low, scale, levels_.data());
+    kernels.write_windowed(levels_.data(), ranks_of(levels_).data(), transformed_.data());
     KZDSP_ComputeDCT(dct_.get(), transformed_.data(), 0);
-    std::transform(kBandBins.begin(), kBandBins.end(), energies.begin(),
-                   [this](const BandBins& band) { return energy_of(band, transformed_); });
+    kernels.band_energies(transformed_.data(), energies.data());
 }
 
 float level_of(Frame frame)

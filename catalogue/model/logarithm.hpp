@@ -14,10 +14,12 @@ struct SplitNumber {
     float fraction;
 };
 
+/// The bits of the largest float below sqrt(1/2).
+inline constexpr int32_t kRootOfHalf = 0x3f3504f3;
+
 /// `x` is a normal number above 0.
 inline SplitNumber split(float x)
 {
-    constexpr int32_t kRootOfHalf = 0x3f3504f3; // the bits of the largest float below sqrt(1/2)
     const auto bits = std::bit_cast<int32_t>(x);
     const int32_t exponent = (bits - kRootOfHalf) >> 23;
     return {exponent, std::bit_cast<float>(bits - exponent * (1 << 23)) - 1.0F};

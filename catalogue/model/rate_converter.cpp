@@ -108,7 +108,9 @@ void RateConverter::convert(std::span<const float> samples, std::vector<float>& 
         last_->convert(samples, last_output_);
         samples = last_output_;
     }
-    std::transform(samples.begin(), samples.end(), std::back_inserter(output),
+    const size_t before = output.size();
+    output.resize(before + samples.size());
+    std::transform(samples.begin(), samples.end(), output.data() + before,
                    [gain = gain_](float sample) { return sample * gain; });
 }
 

@@ -7,7 +7,7 @@ namespace kzcat {
 
 inline constexpr double kPi = 3.141592653589793;
 
-/// cos(x) for -pi/2 <= x <= pi/2, to 1e-16.
+/// cos(x) for -pi/2 <= x <= pi/2, to 5e-16.
 constexpr double cosine(double x)
 {
     double term = 1;
@@ -19,7 +19,7 @@ constexpr double cosine(double x)
     return sum;
 }
 
-/// sin(x) for -pi/2 <= x <= pi/2, to 1e-16.
+/// sin(x) for -pi/2 <= x <= pi/2, to 5e-16.
 constexpr double sine(double x)
 {
     double term = x;
