@@ -12,13 +12,20 @@
 #include "catalogue/store/hash.hpp"
 #include "catalogue/store/memory/memory_store.hpp"
 #include "catalogue/store/rules.hpp"
+#include "catalogue/store/sqlite/sqlite_store.hpp"
 #include "tests/catalogue/store/tracks.hpp"
+#include "tests/support/scratch_directory.hpp"
 
 namespace kzcat::test {
 namespace {
 
 struct InMemory {
     std::unique_ptr<Store> store = make_memory_store();
+};
+
+struct InAFile {
+    kz::test::ScratchDirectory folder;
+    std::unique_ptr<Store> store = open_sqlite_store(folder.path("a.kzc"), Access::create);
 };
 
 template <class Place>
@@ -51,7 +58,7 @@ private:
     Place place_;
 };
 
-using Places = ::testing::Types<InMemory>;
+using Places = ::testing::Types<InMemory, InAFile>;
 TYPED_TEST_SUITE(EveryStore, Places);
 
 TYPED_TEST(EveryStore, BeginsEmpty)
