@@ -62,8 +62,10 @@ OpenedInput Input::open_sound_file()
     auto sound_file = std::make_unique<SoundFile>(file, request_.accepts_rate);
     recognised_ = true;
     sound_file->select(request_.section);
-    InputFacts facts = {
-        .rate = sound_file->file_rate(), .channels = sound_file->file_channels(), .duration = {}};
+    InputFacts facts = {.rate = sound_file->file_rate(),
+                        .channels = sound_file->file_channels(),
+                        .duration = {},
+                        .tags = sound_file->tags()};
     if (!spool_ || spool_->holds_everything()) {
         facts.duration = sound_file->duration();
     }
@@ -76,7 +78,8 @@ OpenedInput Input::open_sound_file()
 OpenedInput Input::open_raw(const StreamFormat& format) const
 {
     const auto frame_bytes = format.frame_bytes();
-    InputFacts facts = {.rate = format.rate, .channels = format.channels, .duration = {}};
+    InputFacts facts = {
+        .rate = format.rate, .channels = format.channels, .duration = {}, .tags = {}};
     if (is_regular_) {
         if (size_ % frame_bytes != 0) {
             throw FileError(odd_bytes_text(size_ % frame_bytes, format));

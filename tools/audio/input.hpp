@@ -5,6 +5,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "audio/descriptor.hpp"
 #include "audio/source.hpp"
@@ -24,6 +25,7 @@ struct InputFacts {
     uint32_t rate = 0;              ///< of the file itself, hertz
     uint32_t channels = 0;          ///< of the file itself
     std::optional<double> duration; ///< of the whole file, seconds; unknown for a pipe
+    std::vector<Tag> tags;          ///< of the file
 };
 
 /// An input, opened at the start of the section that is listened to.

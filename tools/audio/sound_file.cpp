@@ -9,6 +9,7 @@
 #include <cmath>
 #include <cstring>
 #include <limits>
+#include <utility>
 
 #include <unistd.h>
 
@@ -82,6 +83,21 @@ std::optional<double> SoundFile::duration() const
         return {};
     }
     return static_cast<double>(info_.frames) / info_.samplerate;
+}
+
+std::vector<Tag> SoundFile::tags() const
+{
+    constexpr std::pair<int, const char*> kStrings[] = {
+        {SF_STR_TITLE, "title"}, {SF_STR_ARTIST, "artist"}, {SF_STR_ALBUM, "album"},
+        {SF_STR_DATE, "date"},   {SF_STR_GENRE, "genre"},   {SF_STR_TRACKNUMBER, "tracknumber"}};
+    std::vector<Tag> tags;
+    for (const auto& [number, name] : kStrings) {
+        const char* const text = sf_get_string(file_.get(), number);
+        if (text != nullptr && *text != 0) {
+            tags.push_back({.name = name, .value = to_utf8(text)});
+        }
+    }
+    return tags;
 }
 
 StreamFormat SoundFile::format() const

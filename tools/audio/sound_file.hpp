@@ -30,6 +30,9 @@ public:
     uint32_t file_channels() const { return static_cast<uint32_t>(info_.channels); }
     std::optional<double> duration() const;
 
+    /// Title, artist and the like, as far as the file has them.
+    std::vector<Tag> tags() const;
+
     StreamFormat format() const override;
     size_t read(std::span<std::byte> bytes) override;
     std::string trouble() const override;

@@ -22,6 +22,16 @@ FileError system_error(const std::string& what, int error);
 /// The file ends before the requested section begins; both in seconds.
 FileError start_beyond_end(double end, double start);
 
+/// What a sound file says about itself.
+struct Tag {
+    std::string name;  ///< in lower case: "title", "artist"
+    std::string value; ///< UTF-8
+};
+
+/// The text itself when it is UTF-8; else its bytes as characters of Latin-1, which old tags are
+/// mostly written in.
+std::string to_utf8(const std::string& text);
+
 /// A stream of samples in one of the encodings, with one or two channels.
 class Source {
 public:
