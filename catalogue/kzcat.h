@@ -191,9 +191,10 @@ enum {
 /** How an open catalogue behaves; filled by kzcat_initialize_settings(). */
 typedef struct kzcat_settings {
     uint32_t plan;         /**< one of KZCAT_PLAN_..., KZCAT_PLAN_MEASURED at first */
-    uint32_t index_file;   /**< 1 (at first): what makes look-ups fast is kept in a file beside the
-                                catalogue, named like it with ".idx" behind it. It may be deleted at
-                                any time. 0: none is read or written */
+    uint32_t index_file;   /**< 1 (at first): what makes look-ups in a large catalogue fast is kept
+                                in a file beside it, named like it with ".idx" behind it, whatever
+                                the access. It may be deleted at any time: that costs time, never
+                                an answer. 0: none is read or written */
     uint32_t fall_back;    /**< 1 (at first): scan when the table of parts finds nothing */
     uint32_t reserved[13]; /**< 0 */
 } kzcat_settings;
@@ -409,10 +410,9 @@ typedef struct kzcat_new_track {
 
 /** What became of a track that was to be added. */
 typedef struct kzcat_added {
-    int64_t track; /**< its id, above 0; never given out twice, also after it was removed */
-    uint32_t
-        is_new; /**< 0 when a track with the very same codes was there: that has one source more,
-                          and keeps its tags */
+    int64_t track;     /**< its id, above 0; never given out twice, also after it was removed */
+    uint32_t is_new;   /**< 0 when a track with the very same codes was there: it has one source
+                            more now, and the tags whose names it lacked */
     uint32_t reserved; /**< 0 */
 } kzcat_added;
 
@@ -426,8 +426,8 @@ typedef struct kzcat_added {
  * @param tracks  @p count of them.
  * @param[out] out_added  Room for @p count records, in the same order; may be null.
  * @return 0; KZCAT_ERROR_INVALID_ARGUMENT, also for a trail without codes;
- *         KZCAT_ERROR_OTHER_PROFILE, KZCAT_ERROR_READ_ONLY, KZCAT_ERROR_BUSY, KZCAT_ERROR_FULL, KZCAT_ERROR_DAMAGED,
- *         KZCAT_ERROR_MEMORY or KZCAT_ERROR_FAILED.
+ *         KZCAT_ERROR_OTHER_PROFILE, KZCAT_ERROR_READ_ONLY, KZCAT_ERROR_BUSY, KZCAT_ERROR_FULL,
+ *         KZCAT_ERROR_DAMAGED, KZCAT_ERROR_MEMORY or KZCAT_ERROR_FAILED.
  */
 KZ_API kzcat_status kzcat_add(kzcat_catalogue* catalogue, const kzcat_new_track* tracks,
                               uint64_t count, kzcat_added* out_added) KZ_NOEXCEPT;
@@ -600,7 +600,8 @@ KZ_API kzcat_status kzcat_query_create_from_document(const char* text, uint64_t 
 /**
  * The same from the 30 values of a document, as kz_stream_get_values() has them.
  *
- * @return 0; KZCAT_ERROR_INVALID_ARGUMENT, also when @p count is not 30; KZCAT_ERROR_MEMORY.
+ * @return 0; KZCAT_ERROR_INVALID_ARGUMENT, also when @p count is not 30; KZCAT_ERROR_NOT_READABLE
+ *         for values that no sound has; KZCAT_ERROR_MEMORY.
  */
 KZ_API kzcat_status kzcat_query_create_from_values(const int16_t* values, uint32_t count,
                                                    kzcat_query** out_query) KZ_NOEXCEPT;
@@ -694,8 +695,8 @@ typedef struct kzcat_match {
  * @param options  Null for what is usual; read only during the call.
  * @param[out] out_result  Freed by the caller with kzcat_result_free(); null on failure.
  * @return 0, also when nothing was found: the summary has the verdict;
- *         KZCAT_ERROR_INVALID_ARGUMENT; KZCAT_ERROR_ORDER for a query that is not finished; KZCAT_ERROR_OTHER_PROFILE,
- *         KZCAT_ERROR_DAMAGED, KZCAT_ERROR_MEMORY or KZCAT_ERROR_FAILED.
+ *         KZCAT_ERROR_INVALID_ARGUMENT; KZCAT_ERROR_ORDER for a query that is not finished;
+ *         KZCAT_ERROR_OTHER_PROFILE, KZCAT_ERROR_DAMAGED, KZCAT_ERROR_MEMORY or KZCAT_ERROR_FAILED.
  */
 KZ_API kzcat_status kzcat_recognise(kzcat_catalogue* catalogue, const kzcat_query* query,
                                     const kzcat_match_options* options,
