@@ -6,9 +6,14 @@
 #include <cstdint>
 #include <span>
 
+#include "catalogue/model/processor.hpp"
+
 namespace kzcat {
 
 /// The checksum of bytes, `earlier` being that of what comes before them.
 uint32_t crc32c(std::span<const std::byte> bytes, uint32_t earlier = 0);
+
+/// The same with what one instruction set has for it; all give the same.
+uint32_t crc32c(std::span<const std::byte> bytes, uint32_t earlier, Instructions instructions);
 
 } // namespace kzcat

@@ -18,4 +18,10 @@ struct Trail {
     bool operator==(const Trail&) const = default;
 };
 
+/// The codes of a recording of `samples`: one for every second frame.
+constexpr uint64_t code_count(uint64_t samples)
+{
+    return samples < kFrameLength ? 0 : (samples - kFrameLength) / kCodeHop + 1;
+}
+
 } // namespace kzcat

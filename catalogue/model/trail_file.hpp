@@ -11,14 +11,16 @@
 
 namespace kzcat {
 
-/// What is wrong with the bytes of a trail, in a sentence.
+/// What is wrong with a trail or with the bytes of one, in a sentence.
 struct TrailError : std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
+/// The bytes of a file, the same on every machine. Throws TrailError for a trail that is not whole:
+/// it has code_count(samples) codes.
 std::vector<std::byte> write_trail(const Trail& trail);
 
-/// Throws TrailError.
+/// Throws TrailError. A trail that was read is whole.
 Trail read_trail(std::span<const std::byte> bytes);
 
 } // namespace kzcat

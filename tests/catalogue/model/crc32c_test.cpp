@@ -35,6 +35,22 @@ TEST(Crc32c, AgreesWithTheStandardsExamples)
     EXPECT_EQ(0xE3069283U, kzcat::crc32c(bytes_of("123456789")));
 }
 
+TEST(Crc32c, IsTheSameWithEveryInstructionSet)
+{
+    const auto bytes = rising(300);
+    const std::span all(bytes);
+    for (const kzcat::Instructions one : kzcat::runnable_instructions()) {
+        for (size_t begin = 0; begin < 9; ++begin) {
+            for (size_t count = 0; begin + count <= all.size(); ++count) {
+                const auto part = all.subspan(begin, count);
+                EXPECT_EQ(kzcat::crc32c(part, 7, kzcat::Instructions::plain),
+                          kzcat::crc32c(part, 7, one))
+                    << name_of(one) << ' ' << begin << ' ' << count;
+            }
+        }
+    }
+}
+
 TEST(Crc32c, OfNothingIsZero) { EXPECT_EQ(0U, kzcat::crc32c({})); }
 
 TEST(Crc32c, GoesOnFromWhatCameBefore)
