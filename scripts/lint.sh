@@ -58,11 +58,11 @@ man_page() {
 
 # It takes functions that are called by name for unreachable.
 shell_scripts() {
-    shellcheck --external-sources --exclude=SC2317 run .ci/run scripts/*.sh packaging/*.sh fuzz/*.sh
+    shellcheck --external-sources --exclude=SC2317 run .ci/run scripts/*.sh packaging/*.sh fuzz/*.sh evaluation/*.sh
 }
 
 python_scripts() {
-    for script in bench/*.py fuzz/*.py packaging/*.py scripts/*.py; do
+    for script in bench/*.py evaluation/*.py fuzz/*.py packaging/*.py scripts/*.py; do
         python3 -c 'import ast, sys; ast.parse(open(sys.argv[1]).read(), sys.argv[1])' "$script" || return 1
     done
 }

@@ -3,7 +3,7 @@
 #
 #   scripts/setup.sh [build] [catalogue] [java] [tools] [test] [clips] [bench] [lint] [clang]
 #                    [fuzz] [coverage] [arch] [wide]
-#                                 default: all of them but the last three
+#                                 default: all of them but the last four
 #
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
 set -eu
@@ -21,6 +21,8 @@ packages_of() {
     # Tools that count instructions and print tables, and the peers, each of which may be missing.
     bench) echo "valgrind python3 pkg-config libcli11-dev nlohmann-json3-dev libchromaprint-dev libfftw3-dev libswresample-dev libavutil-dev libsoxr-dev libspeexdsp-dev libpugixml-dev libtinyxml2-dev libxml2-dev" ;;
     fuzz) echo "libexpat1-dev python3" ;; # a parser to read what is rendered, and the seeds
+    # The programs that degrade music, and the peer that is packaged.
+    evaluation) echo "ffmpeg sox libsox-fmt-all espeak-ng libchromaprint-tools python3 python3-numpy" ;;
     lint) echo "clang-format-14 clang-tidy-14 cppcheck mandoc shellcheck" ;;
     clang) echo "clang-14 libclang-rt-14-dev" ;;
     coverage) echo "llvm-14" ;; # what counts
