@@ -11,7 +11,7 @@ import sys
 
 TARGETS = (
     "extraction stream tags paths render exchange resampler_fixed resampler_float converters dyn_buf "
-    "disc_names disc_files kzfp_options kzfp_files"
+    "disc_names disc_files documents kzfp_options kzfp_files"
 ).split()
 
 
@@ -76,6 +76,21 @@ def stream():
                 seed.number(min(kind, 1), 0, 2)
             seed.number(4096 + 7 * form, 1, 100000)
             yield seed.all()
+
+
+def documents():
+    """A document as the library writes it, and one with everything else that is read."""
+    numbers = " ".join(str(1000 + 30 * i) for i in range(30)).encode()
+    block = b'TYPE="SIGNED_INT_16" COUNT="30" ENCODING="ASCII" SEPARATOR=" "'
+    for text in (
+            b'<?xml version="1.0" encoding="UTF-8" ?>\n<KZFPX_FP_QUERY VERSION="1.0">\n  <ALGORITHM>\n'
+            b"    <NAME>Quenvar</NAME>\n    <VERSION>1.1</VERSION>\n    <QUERY>Quenvar&quot;1.1</QUERY>\n"
+            b"  </ALGORITHM>\n  <FP_BLOCKS>\n    <FP_BLOCK " + block + b">" + numbers +
+            b"</FP_BLOCK>\n  </FP_BLOCKS>\n</KZFPX_FP_QUERY>\n",
+            b"<!-- -->\r\n<KZFPX_FP_QUERY VERSION='1.0'><A B='&#x41;&lt;' C='\t'/><FP_BLOCKS><FP_BLOCK "
+            + block + b">\n0 32768 &#32;" + numbers[10:] + b"<!-- 31 --></FP_BLOCK></FP_BLOCKS>"
+            b"</KZFPX_FP_QUERY>"):
+        yield text + bytes(reversed((0).to_bytes(2, "big")))
 
 
 def kzfp_files():

@@ -161,7 +161,7 @@ DocumentRow document_row(const DocumentValues& values)
     DocumentRow row{};
     std::transform(values.begin(), values.end(), row.begin(), [](int16_t value) {
         const auto share = static_cast<float>(static_cast<uint16_t>(value));
-        return static_cast<int16_t>(std::sqrt(share) * kUnits + 0.5F);
+        return static_cast<int16_t>(std::floor(std::sqrt(share) * kUnits + 0.5F));
     });
     return row;
 }

@@ -19,16 +19,17 @@ namespace {
 // ---- the scale of the stored numbers
 
 constexpr size_t kStepsPerOctave = 256;
+constexpr size_t kHalfSteps = 512; // per octave
 constexpr int kOctaves = 64;
 
 // 2^(i / 512) for i = 0 .. 511, from nothing but products and square roots, which every processor
 // rounds alike: the result is the same everywhere.
-std::array<double, 2 * kStepsPerOctave> half_step_powers()
+std::array<double, kHalfSteps> half_step_powers()
 {
-    std::array<double, 2 * kStepsPerOctave> powers{};
+    std::array<double, kHalfSteps> powers{};
     powers[0] = 1;
     double root = 2;
-    for (size_t bit = kStepsPerOctave; bit > 0; bit /= 2) {
+    for (size_t bit = kHalfSteps / 2; bit > 0; bit /= 2) {
         root = std::sqrt(root); // 2^(bit / 512)
         powers[bit] = root;
     }
@@ -39,7 +40,7 @@ std::array<double, 2 * kStepsPerOctave> half_step_powers()
     return powers;
 }
 
-const std::array<double, 2 * kStepsPerOctave>& scale()
+const std::array<double, kHalfSteps>& scale()
 {
     static const auto powers = half_step_powers();
     return powers;
@@ -136,8 +137,8 @@ uint16_t encode_band_energy(float energy)
         return kOctaves * kStepsPerOctave;
     }
     const auto& powers = scale();
-    const auto above = std::upper_bound(powers.begin(), powers.end(), mantissa);
-    const auto half_steps = static_cast<size_t>(above - powers.begin()) - 1;
+    const auto half_steps = static_cast<size_t>(
+        std::upper_bound(powers.begin(), powers.end(), mantissa) - powers.begin() - 1);
     return static_cast<uint16_t>(static_cast<size_t>(exponent) * kStepsPerOctave +
                                  (half_steps + 1) / 2);
 }

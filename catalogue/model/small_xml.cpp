@@ -26,9 +26,23 @@ bool is_character(uint32_t c)
     return (c >= 32 && c < 128) || c == '\t' || c == '\n' || c == '\r';
 }
 
+// Lines end with a line feed, whatever they end with in the text.
+std::string with_line_feeds(std::string_view text)
+{
+    std::string result;
+    for (size_t i = 0; i < text.size(); ++i) {
+        if (text[i] != '\r') {
+            result += text[i];
+        } else if (!text.substr(i + 1).starts_with('\n')) {
+            result += '\n';
+        }
+    }
+    return result;
+}
+
 class Reader {
 public:
-    explicit Reader(std::string_view text) : text_(text) {}
+    explicit Reader(std::string text) : text_(std::move(text)) {}
 
     XmlElement read()
     {
@@ -56,7 +70,12 @@ private:
     }
 
     bool at_end() const { return place_ == text_.size(); }
-    std::string_view rest() const { return text_.substr(place_); }
+    std::string_view rest() const
+    {
+        std::string_view text = text_;
+        text.remove_prefix(place_);
+        return text;
+    }
 
     char next()
     {
@@ -126,17 +145,29 @@ private:
         }
     }
 
+    bool skip_comments()
+    {
+        if (!skip("<!--")) {
+            return false;
+        }
+        skip_comment();
+        return true;
+    }
+
     void skip_between_elements()
     {
         do {
             skip_white_space();
-        } while (skip("<!--") && (skip_comment(), true));
+        } while (skip_comments());
     }
 
     std::string read_name()
     {
-        const auto end = std::find_if_not(rest().begin(), rest().end(), is_name_part);
-        const std::string name(rest().begin(), end);
+        size_t end = place_;
+        while (end < text_.size() && is_name_part(text_[end])) {
+            ++end;
+        }
+        std::string name = text_.substr(place_, end - place_);
         if (name.empty() || !is_letter(name.front())) {
             fail("has an element or an attribute without a valid name; document types, processing "
                  "instructions and CDATA sections are not read");
@@ -253,7 +284,7 @@ private:
         }
     }
 
-    std::string_view text_;
+    std::string text_;
     size_t place_ = 0;
 };
 
@@ -274,6 +305,6 @@ const XmlElement* XmlElement::child(std::string_view wanted) const
     return found == children.end() ? nullptr : &*found;
 }
 
-XmlElement read_small_xml(std::string_view text) { return Reader(text).read(); }
+XmlElement read_small_xml(std::string_view text) { return Reader(with_line_feeds(text)).read(); }
 
 } // namespace kzcat

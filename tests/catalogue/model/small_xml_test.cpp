@@ -63,6 +63,11 @@ TEST(SmallXml, WhiteSpaceInAttributesBecomesSpaces)
     EXPECT_EQ("1 2 3", *read_small_xml("<a x='1\n2\t3'/>").attribute("x"));
 }
 
+TEST(SmallXml, LinesEndWithALineFeed)
+{
+    EXPECT_EQ("1\n2\n3\n\n4\n\r", read_small_xml("<a>1\r\n2\r3\r\r\n4\n&#13;</a>").text);
+}
+
 TEST(SmallXml, RefusesWhatIsNotWellFormed)
 {
     for (const char* text : {"",
@@ -122,7 +127,7 @@ TEST(SmallXml, RefusesEndlessNesting)
 {
     std::string text;
     for (int depth = 1; depth <= kzcat::kDeepestElement; ++depth) {
-        text = "<a>" + text + "</a>";
+        text.insert(0, "<a>").append("</a>");
     }
     EXPECT_EQ("", fault_of(text));
     EXPECT_TRUE(holds(fault_of("<a>" + text + "</a>"), "too deep"));
