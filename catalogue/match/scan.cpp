@@ -1,0 +1,270 @@
+/// @file
+/// The scan. Codes of a segment are scanned in one go, across the ends of tracks: a sequence that
+/// overhangs an end meets codes of the next track there, which weakens the agreement but little.
+
+#include "catalogue/match/scan.hpp"
+
+#include <algorithm>
+#include <bit>
+#include <cmath>
+#include <optional>
+
+#include "catalogue/match/scan_kernels.hpp"
+#include "catalogue/match/score.hpp"
+#include "catalogue/match/thresholds.hpp"
+
+namespace kzcat {
+namespace {
+
+constexpr double kCoarseDeviations = 2.0;
+
+/// Codes of the coarse pass at each phase: of the clip as it is, which most clips are, and of other
+/// readings, of which there are 18 times as many.
+constexpr size_t kCoarseCodes = 24;
+constexpr size_t kCoarseCodesOfOthers = 10;
+
+/// Positions that are scanned at a time, at all phases: their codes stay in the first cache.
+constexpr size_t kBlock = 2048;
+
+/// The sequence with all codes masked but `kept` of them: those with the most bits that count, one
+/// of each of as many equal parts.
+Sequence thinned(const Sequence& sequence, size_t kept)
+{
+    const size_t length = sequence.codes.size();
+    Sequence result = sequence;
+    if (kept >= length) {
+        return result;
+    }
+    std::fill(result.masks.begin(), result.masks.end(), 0);
+    for (size_t part = 0; part < kept; ++part) {
+        size_t best = part * length / kept;
+        for (size_t i = best; i < (part + 1) * length / kept; ++i) {
+            if (std::popcount(sequence.masks[i]) > std::popcount(sequence.masks[best])) {
+                best = i;
+            }
+        }
+        result.masks[best] = sequence.masks[best];
+    }
+    return result;
+}
+
+/// One phase of a reading, ready for the scan.
+struct CoarsePhase {
+    uint32_t phase;
+    const Sequence* sequence;
+    ScanSequence coarse;
+    ScanSequence whole;
+    Spread spread;                 ///< of the whole sequence
+    std::optional<uint32_t> limit; ///< on the coarse distance; none when no place can pass
+
+    CoarsePhase(const Reading& reading, uint32_t number, const Corpus& population)
+        : phase(number), sequence(&reading.sequences[number]),
+          coarse(thinned(*sequence,
+                         reading.hypothesis == Hypothesis{} ? kCoarseCodes : kCoarseCodesOfOthers)),
+          whole(*sequence), spread(population_spread(whole, population))
+    {
+        const Spread thin = population_spread(coarse, population);
+        const double bits = coarse.weight();
+        const double least = thin.mean + kCoarseDeviations * thin.deviation;
+        const double most = std::floor((bits - std::sqrt(bits) * least) / 2);
+        if (most >= 0 && bits > 0) {
+            limit = static_cast<uint32_t>(most);
+        }
+    }
+};
+
+std::vector<CoarsePhase> coarse_phases(const Reading& reading, const Corpus& population)
+{
+    std::vector<CoarsePhase> phases;
+    for (uint32_t i = 0; i < reading.sequences.size(); i += 2) {
+        phases.emplace_back(reading, i, population);
+    }
+    return phases;
+}
+
+/// The best place of each track of a segment.
+struct BestPlace {
+    double deviations = 0; ///< above the catalogue's mean
+    uint32_t phase = 0;
+    int64_t position = 0;
+    bool found = false;
+};
+
+class SegmentScan {
+public:
+    SegmentScan(const Segment& segment, std::span<const CoarsePhase> phases)
+        : segment_(segment), phases_(phases), best_(segment.tracks.size()), near_(kBlock)
+    {
+    }
+
+    const std::vector<BestPlace>& run()
+    {
+        for (const CoarsePhase& phase : phases_) {
+            longest_ = std::max(longest_, phase.coarse.length());
+        }
+        if (longest_ > 0 && !segment_.tracks.empty()) {
+            scan_beginning();
+            scan_whole();
+            scan_end();
+            look_at_short_tracks();
+        }
+        return best_;
+    }
+
+private:
+    /// Positions that begin before the segment or reach beyond it see zeros there.
+    void scan_beginning()
+    {
+        std::vector<Code> padded(longest_, 0);
+        const size_t count = std::min(segment_.codes.size(), longest_);
+        padded.insert(padded.end(), segment_.codes.begin(),
+                      segment_.codes.begin() + static_cast<std::ptrdiff_t>(count));
+        padded.resize(3 * longest_, 0);
+        scan_block(padded.data(), longest_, -static_cast<int64_t>(longest_));
+    }
+    void scan_end()
+    {
+        const size_t count = std::min(segment_.codes.size(), longest_);
+        std::vector<Code> padded(segment_.codes.end() - static_cast<std::ptrdiff_t>(count),
+                                 segment_.codes.end());
+        padded.resize(count + longest_, 0);
+        scan_block(padded.data(), count, static_cast<int64_t>(segment_.codes.size() - count));
+    }
+    void scan_whole()
+    {
+        const size_t size = segment_.codes.size();
+        const size_t positions = size > longest_ ? size - longest_ : 0;
+        for (size_t begin = 0; begin < positions; begin += kBlock) {
+            scan_block(segment_.codes.data() + begin, std::min(kBlock, positions - begin),
+                       static_cast<int64_t>(begin));
+        }
+    }
+
+    void scan_block(const Code* codes, size_t positions, int64_t first)
+    {
+        for (const CoarsePhase& phase : phases_) {
+            if (!phase.limit) {
+                continue;
+            }
+            const auto probes = phase.coarse.probes();
+            const size_t found = scan_kernels().near(codes, positions, probes.data(), probes.size(),
+                                                     *phase.limit, near_.data());
+            for (size_t i = 0; i < found; ++i) {
+                look_at(phase, first + near_[i]);
+            }
+        }
+    }
+
+    /// Scores the whole sequence at a position of the segment, on the tracks that it lies on.
+    void look_at(const CoarsePhase& phase, int64_t at)
+    {
+        const auto end = at + static_cast<int64_t>(phase.whole.length());
+        const auto tracks = segment_.tracks;
+        const auto ends_before = [](const TrackSpan& track, int64_t place) {
+            return static_cast<int64_t>(track.first + track.count) <= place;
+        };
+        auto track = std::lower_bound(tracks.begin(), tracks.end(), at, ends_before);
+        for (; track != tracks.end() && static_cast<int64_t>(track->first) < end; ++track) {
+            take(phase, static_cast<size_t>(track - tracks.begin()),
+                 at - static_cast<int64_t>(track->first));
+        }
+    }
+
+    void take(const CoarsePhase& phase, size_t number, int64_t position)
+    {
+        const auto codes = segment_.of(segment_.tracks[number]);
+        const auto agreed = agreement_at(phase.whole, *phase.sequence, codes, position);
+        if (!agreed) {
+            return;
+        }
+        const double deviations = (*agreed - phase.spread.mean) / phase.spread.deviation;
+        BestPlace& best = best_[number];
+        if (!best.found || deviations > best.deviations) {
+            best = {.deviations = deviations,
+                    .phase = phase.phase,
+                    .position = position,
+                    .found = true};
+        }
+    }
+
+    /// On tracks shorter than the sequence a few codes spread over it may all miss.
+    void look_at_short_tracks()
+    {
+        for (size_t number = 0; number < best_.size(); ++number) {
+            const auto count = static_cast<int64_t>(segment_.tracks[number].count);
+            for (const CoarsePhase& phase : phases_) {
+                const auto length = static_cast<int64_t>(phase.whole.length());
+                for (int64_t at = -length; count < length && at < count; ++at) {
+                    take(phase, number, at);
+                }
+            }
+        }
+    }
+
+    const Segment& segment_;
+    std::span<const CoarsePhase> phases_;
+    std::vector<BestPlace> best_;
+    std::vector<uint32_t> near_;
+    size_t longest_ = 0;
+};
+
+struct Ranked {
+    double deviations;
+    Candidate candidate;
+};
+
+/// The higher first; of equals the older track.
+bool comes_first(const Ranked& a, const Ranked& b)
+{
+    return a.deviations != b.deviations ? a.deviations > b.deviations
+                                        : a.candidate.track < b.candidate.track;
+}
+
+} // namespace
+
+ScanSearcher::ScanSearcher(Corpus catalogue)
+    : catalogue_(std::move(catalogue)), population_(choose_population(catalogue_)),
+      code_count_(catalogue_.code_count())
+{
+}
+
+std::vector<Candidate> ScanSearcher::find(const Reading& reading, size_t limit)
+{
+    const auto phases = coarse_phases(reading, population());
+    std::vector<Ranked> ranked;
+    for (const Segment& segment : catalogue_.segments) {
+        SegmentScan scan(segment, phases);
+        const auto& best = scan.run();
+        for (size_t i = 0; i < best.size(); ++i) {
+            if (best[i].found) {
+                ranked.push_back({best[i].deviations,
+                                  {.track = segment.tracks[i].id,
+                                   .phase = best[i].phase,
+                                   .position = best[i].position}});
+            }
+        }
+    }
+    const size_t kept = std::min(limit, ranked.size());
+    std::partial_sort(ranked.begin(), ranked.begin() + static_cast<std::ptrdiff_t>(kept),
+                      ranked.end(), comes_first);
+    std::vector<Candidate> result;
+    for (size_t i = 0; i < kept; ++i) {
+        result.push_back(ranked[i].candidate);
+    }
+    return result;
+}
+
+std::span<const Code> ScanSearcher::codes(int64_t track)
+{
+    const auto before = [](const TrackSpan& one, int64_t id) { return one.id < id; };
+    for (const Segment& segment : catalogue_.segments) {
+        const auto found =
+            std::lower_bound(segment.tracks.begin(), segment.tracks.end(), track, before);
+        if (found != segment.tracks.end() && found->id == track) {
+            return segment.of(*found);
+        }
+    }
+    return {};
+}
+
+} // namespace kzcat

@@ -1,0 +1,51 @@
+/// @file
+/// The numbers by which recognising decides. All that is measured rather than derived is here.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+namespace kzcat {
+
+/// What a clip's score has to reach in a catalogue of kReferenceCodes codes or fewer, when it is
+/// read as it is, and how much more when it had to be read at another speed, tempo or pitch: each
+/// of those readings is one more chance for a stranger.
+constexpr double kBaseThreshold = 7.6;
+constexpr double kFurtherMargin = 1.0;
+
+/// The highest score of strangers grows by this much whenever the number of places that are
+/// compared doubles, and so does the threshold.
+constexpr double kThresholdGrowth = 0.12;
+constexpr double kReferenceCodes = 216000;
+
+/// A score this far below its threshold is "not sure" rather than "no match".
+constexpr double kUnsureBelow = 0.5;
+
+/// From here on the clip as it is has been recognised beyond doubt, and further readings are not
+/// tried.
+constexpr double kBeyondDoubt = 9.0;
+
+/// The share of a window's bits that are masked because they are the weakest, and the change, in
+/// octaves of energy, up to which a bit says nothing whatever its neighbours do.
+constexpr double kMaskedShare = 0.25;
+constexpr float kNoChange = 0.02F;
+
+/// Codes with bits that count which a window must have; fewer are "too quiet". 2.2 s.
+constexpr size_t kFewestCodes = 12;
+
+/// The share of a clip, or of a track that is shorter, that must lie within the other.
+constexpr double kFewestOverlap = 0.8;
+
+/// A track is compared with its own other places when it has more of them than this.
+constexpr size_t kOwnPlaces = 50;
+
+/// The spread of a track's own places counts at least as this share of the catalogue's.
+constexpr double kLeastOwnSpread = 0.3;
+
+/// What of the score against the catalogue is kept however much a track resembles itself.
+constexpr double kLoopShare = 0.6;
+
+/// The threshold of a catalogue for a clip of some windows that are searched one by one.
+double threshold_for(uint64_t codes, size_t windows);
+
+} // namespace kzcat
