@@ -15,5 +15,6 @@ std::vector<Case> frame_cases();
 std::vector<Case> converter_cases();
 std::vector<Case> detector_cases();
 std::vector<Case> document_cases();
+std::vector<Case> trail_cases();
 
 } // namespace kz::bench
