@@ -68,7 +68,7 @@ struct NewTrack {
     std::vector<Tag> tags;
     Source source;       ///< none when its uri is empty
     int64_t added = 0;   ///< seconds since 1970; 0: now
-    bool yields = false; ///< a source that another track has stays with that track
+    bool yields = false; ///< what is known stays: sources are only added, and so are tags
 };
 
 struct Added {

@@ -89,10 +89,10 @@ public:
             enrich(known, track);
         }
         const int64_t owner = track.source.uri.empty() ? 0 : track_of(track.source.uri);
-        if (track.yields && owner != 0 && owner != added.track) {
-            added.has_source = false;
-        } else {
+        if (!track.yields || owner == 0) {
             give(added.track, track.source);
+        } else {
+            added.has_source = owner == added.track;
         }
         return added;
     }
@@ -171,8 +171,8 @@ private:
     void enrich(int64_t known, const NewTrack& track)
     {
         Row changed = *row(known);
-        const bool same_source =
-            !track.source.uri.empty() && track_of(track.source.uri) == changed.info.id;
+        const bool same_source = !track.yields && !track.source.uri.empty() &&
+                                 track_of(track.source.uri) == changed.info.id;
         changed.info.tags = merge_tags(changed.info.tags, track.tags, same_source);
         if (changed.bands == nullptr) {
             set_bands(changed, track.document_bands);

@@ -50,10 +50,10 @@ public:
         }
         Added added{.track = id, .is_new = !known, .has_source = true};
         const int64_t owner = track.source.uri.empty() ? 0 : owner_of(track.source.uri);
-        if (track.yields && owner != 0 && owner != id) {
-            added.has_source = false;
-        } else {
+        if (!track.yields || owner == 0) {
             give(id, track.source);
+        } else {
+            added.has_source = owner == id;
         }
         return added;
     }
@@ -156,7 +156,8 @@ private:
 
     void enrich(int64_t id, const NewTrack& track)
     {
-        const bool same_source = !track.source.uri.empty() && owner_of(track.source.uri) == id;
+        const bool same_source =
+            !track.yields && !track.source.uri.empty() && owner_of(track.source.uri) == id;
         const std::vector<Tag> kept = read_tags(connection_, id);
         const std::vector<Tag> tags = merge_tags(kept, track.tags, same_source);
         if (tags != kept) {

@@ -252,6 +252,19 @@ TYPED_TEST(EveryStore, AYieldingSourceStaysWhereItIs)
     EXPECT_TRUE(add(this->store(), make_track(1)).has_source) << "its own is no conflict";
 }
 
+TYPED_TEST(EveryStore, AYieldingTrackOnlyAddsToWhatIsKnown)
+{
+    const int64_t id = add(this->store(), make_track(1)).track;
+    NewTrack again = make_track(1);
+    again.tags = {{"title", "Other"}, {"album", "A"}};
+    again.source.size = 5;
+    again.yields = true;
+    add(this->store(), again);
+    EXPECT_EQ(std::vector{make_source(1)}, this->info(id).sources);
+    EXPECT_EQ((std::vector<Tag>{{"title", "Track 1"}, {"artist", "Nobody"}, {"album", "A"}}),
+              this->info(id).tags);
+}
+
 TYPED_TEST(EveryStore, KeepsTracksWithoutSources)
 {
     NewTrack track = make_track(1);
