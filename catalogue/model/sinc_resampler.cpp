@@ -86,7 +86,7 @@ void SincResampler::write_taps(size_t place, double cutoff)
 float SincResampler::output_at(const float* samples) const
 {
     const uint64_t scaled = rest_ * kPlaces;
-    const float* row = &taps_[scaled / to_ * row_];
+    const float* row = &taps_[static_cast<size_t>(scaled / to_) * row_];
     const float share =
         static_cast<float>(static_cast<double>(scaled % to_) / static_cast<double>(to_));
     const float before = dot(samples, row, row_);
@@ -105,7 +105,7 @@ void SincResampler::convert(std::span<const float> samples, std::vector<float>& 
 {
     pending_.insert(pending_.end(), samples.begin(), samples.end());
     for (; skip_ + row_ <= pending_.size(); advance()) {
-        output.push_back(output_at(&pending_[skip_]));
+        output.push_back(output_at(&pending_[static_cast<size_t>(skip_)]));
     }
     const uint64_t drop = std::min<uint64_t>(skip_, pending_.size());
     pending_.erase(pending_.begin(), pending_.begin() + static_cast<std::ptrdiff_t>(drop));
