@@ -1,7 +1,7 @@
 #!/bin/sh
-# Builds the library in several ways, for several processors, and compares what it makes of some
-# sixty pieces of sound with tests/whole/golden/documents.txt. Prints one line for each way; any
-# difference fails.
+# Builds the libraries in several ways, for several processors, and compares what they make of some
+# sixty pieces of sound with tests/whole/golden/documents.txt, and the catalogue's trails and answers
+# with tests/whole/golden/catalogue.txt. Prints one line for each way; any difference fails.
 #
 #   scripts/check_arch.sh          g++ at -O0, clang++ at -O3; at -O2 64-bit ARM, S/390, 32-bit x86
 #   scripts/check_arch.sh all      also the other levels, -march=native, 32-bit ARM with and without
@@ -20,7 +20,7 @@ set -eu
 cd "$(dirname "$0")/.."
 
 jobs=${JOBS:-$(getconf _NPROCESSORS_ONLN)}
-golden=tests/whole/golden/documents.txt
+golden=tests/whole/golden
 quick="g++-O0 clang++-O3 aarch64-O2 s390x-O2 i686-O2"
 rest="g++-O1 g++-O2 g++-O3 g++-O3-native clang++-O0 clang++-O1 clang++-O2 clang++-O3-native \
 aarch64-O0 aarch64-O3 armhf-O0 armhf-O2 armhf-O3 armel-O2 s390x-O0 s390x-O3 i686-O0 i686-O3 \
@@ -74,7 +74,7 @@ configure() {
     # shellcheck disable=SC2086 # the options are meant to be split
     cmake -S . -B "$2" -G Ninja $compiler -DCMAKE_BUILD_TYPE=None -DCMAKE_C_FLAGS="$flags" \
         -DCMAKE_CXX_FLAGS="$flags" -DKZ_JNI=OFF -DKZ_BUILD_TOOLS=OFF $what -DKZ_BUILD_GOLDEN=ON \
-        -DKZ_WERROR=ON
+        -DKZ_BUILD_CATALOGUE=ON -DKZ_SQLITE=OFF -DKZ_WERROR=ON
 }
 
 # What starts a program of this way.
@@ -95,28 +95,34 @@ emulator() {
     esac
 }
 
-# The variants that programs of this way may have; one that the processor lacks is the default
-# again.
+# The variants that programs of this way may have; one that the processor or the library lacks is the
+# default again.
 variants() {
     case $1 in
     *-O0) echo "default" ;;
     aarch64-*) echo "plain neon" ;;
-    g++-* | clang++-* | i686-*) echo "plain sse41 avx2" ;;
+    g++-* | clang++-* | i686-*) echo "plain sse41 avx2 avx512" ;;
     *) echo "default" ;;
     esac
 }
 
-compare_documents() {
+# compare_with_record <way> <build> <variant> <documents | catalogue>
+compare_with_record() {
+    # shellcheck disable=SC2046 # the words are meant to be split
+    if KZSDK_KERNELS=$3 KZCAT_KERNELS=$3 $(emulator "$1") "$2/tests/whole/golden/golden_$4" \
+        "$golden/$4.txt" >"$2/result"; then
+        echo "$1, $3: $(wc -l <"$golden/$4.txt") digests of $4, all the same"
+    else
+        cat "$2/result"
+        echo "$1, $3: $4 DIFFERENT"
+        return 1
+    fi
+}
+
+compare_digests() {
     for variant in $(variants "$1"); do
-        # shellcheck disable=SC2046 # the words are meant to be split
-        if KZSDK_KERNELS=$variant $(emulator "$1") "$2/tests/whole/golden/golden_documents" "$golden" \
-            >"$2/result"; then
-            echo "$1, $variant: $(wc -l <"$golden") digests, all the same"
-        else
-            cat "$2/result"
-            echo "$1, $variant: DIFFERENT"
-            return 1
-        fi
+        compare_with_record "$1" "$2" "$variant" documents &&
+            compare_with_record "$1" "$2" "$variant" catalogue || return 1
     done
 }
 
@@ -135,9 +141,10 @@ check() {
     mkdir -p "$build"
     case $1 in
     *-tests) target=all run=run_tests ;;
-    *) target=golden_documents run=compare_documents ;;
+    *) target="golden_documents golden_catalogue" run=compare_digests ;;
     esac
-    if ! { configure "$1" "$build" && cmake --build "$build" --parallel "$jobs" --target "$target"; } \
+    # shellcheck disable=SC2086 # the names are meant to be split
+    if ! { configure "$1" "$build" && cmake --build "$build" --parallel "$jobs" --target $target; } \
         >"$build/log" 2>&1; then
         tail -n 20 "$build/log"
         echo "$1: not built"
