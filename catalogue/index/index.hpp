@@ -4,7 +4,6 @@
 #pragma once
 
 #include <cstdint>
-#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
@@ -20,33 +19,40 @@ struct IndexFacts {
     Plan plan = Plan::scan;
     uint64_t codes = 0;
     uint64_t tracks = 0;
-    uint64_t tail_tracks = 0; ///< added since the side file was written; scanned
+    uint64_t tail_tracks = 0; ///< not in the side file: kept in memory and scanned
     uint64_t file_bytes = 0;  ///< 0 when there is no side file
     double scan_ms =
         0; ///< of a look-up of 14.3 s, as measured when the file was written; 0 when not
     double parts_ms = 0;
-    std::string note; ///< why the side file was not used, empty when it was
+    std::string note; ///< what was wrong with the side file, or with writing it; empty when nothing
 };
 
 struct IndexOptions {
     std::string path;         ///< of the side file; empty: none is read or written
     bool write = true;        ///< write the side file when it is worth it
-    bool fall_back = true;    ///< scan when the parts find nothing
-    std::optional<Plan> plan; ///< use this plan whatever was measured
+    bool fall_back = true;    ///< offer a scan when the parts find nothing
+    std::optional<Plan> plan; ///< use this plan whatever was measured; parts need a side file
+    uint64_t write_from = 4'000'000; ///< codes from which on a side file is worth it; 3 000 tracks
+    /// Lists of parts that a look-up may read, counted in lists of average length: twice as many
+    /// take twice as long, and find more that is buried in noise. 0 takes the usual number.
+    uint32_t lists = 0;
 };
 
 /// A searcher over all tracks of a store as they were when it was opened or last refreshed. Find
-/// calls from several threads are allowed; refresh() is exclusive.
+/// calls from several threads are allowed; refresh() is exclusive. The store may be closed between
+/// the calls that name it.
 class Index : public Searcher {
 public:
     virtual IndexFacts facts() const = 0;
 
-    /// Takes in what has changed in the store since.
+    /// Takes in what has changed in the store since. What throws has changed nothing.
     virtual void refresh(Store& store) = 0;
 };
 
 /// Opens the side file, or derives everything from the store when it is missing, damaged or of
-/// another catalogue: that costs time, never an answer.
+/// another catalogue: that costs time, never an answer. Writes it again when it is, or when a tenth
+/// of what it has or of the catalogue has changed since. Throws StoreError where reading the store
+/// does.
 std::unique_ptr<Index> open_index(Store& store, const IndexOptions& options);
 
 } // namespace kzcat

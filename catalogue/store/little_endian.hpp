@@ -23,11 +23,17 @@ void put_little_endian(Number number, std::byte* bytes)
 template <std::unsigned_integral Number>
 Number get_little_endian(const std::byte* bytes)
 {
-    uint64_t number = 0;
-    for (size_t i = 0; i < sizeof(Number); ++i) {
-        number |= std::to_integer<uint64_t>(bytes[i]) << (8 * i);
+    if constexpr (std::endian::native == std::endian::little) {
+        Number number = 0;
+        std::memcpy(&number, bytes, sizeof number);
+        return number;
+    } else {
+        uint64_t number = 0;
+        for (size_t i = 0; i < sizeof(Number); ++i) {
+            number |= std::to_integer<uint64_t>(bytes[i]) << (8 * i);
+        }
+        return static_cast<Number>(number);
     }
-    return static_cast<Number>(number);
 }
 
 /// `bytes` has room for exactly the numbers.

@@ -1,0 +1,64 @@
+// A folder for a test's files, deleted with everything in it.
+#pragma once
+
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <span>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+namespace kzcat::test {
+
+class ScratchFolder {
+public:
+    ScratchFolder()
+    {
+        std::string name = (std::filesystem::temp_directory_path() / "kzcat-XXXXXX").string();
+        if (mkdtemp(name.data()) == nullptr) {
+            throw std::runtime_error("cannot make a folder for the test");
+        }
+        path_ = name;
+    }
+    ScratchFolder(const ScratchFolder&) = delete;
+    ScratchFolder& operator=(const ScratchFolder&) = delete;
+    ~ScratchFolder()
+    {
+        std::error_code ignored;
+        std::filesystem::permissions(path_, std::filesystem::perms::owner_all, ignored);
+        std::filesystem::remove_all(path_, ignored);
+    }
+
+    const std::filesystem::path& path() const { return path_; }
+    std::string file(const std::string& name) const { return (path_ / name).string(); }
+
+    size_t files() const
+    {
+        const std::filesystem::directory_iterator entries(path_);
+        return static_cast<size_t>(std::distance(begin(entries), end(entries)));
+    }
+
+private:
+    std::filesystem::path path_;
+};
+
+using Bytes = std::vector<std::byte>;
+
+inline Bytes read_file(const std::string& path)
+{
+    std::ifstream in(path, std::ios::binary);
+    const std::string text{std::istreambuf_iterator<char>(in), {}};
+    const auto bytes = std::as_bytes(std::span(text));
+    return {bytes.begin(), bytes.end()};
+}
+
+inline void write_file(const std::string& path, std::span<const std::byte> bytes)
+{
+    std::ofstream out(path, std::ios::binary | std::ios::trunc);
+    out.write(reinterpret_cast<const char*>(bytes.data()),
+              static_cast<std::streamsize>(bytes.size()));
+}
+
+} // namespace kzcat::test
