@@ -1,5 +1,5 @@
 /// @file
-/// The inner loops over a frame. Every variant gives the same bits: sums run in eight lanes in each
+/// The inner loops over samples and frames. Every variant gives the same bits: sums run in eight lanes in each
 /// of them (lanes.hpp), and no product is contracted with a sum.
 #pragma once
 
@@ -34,6 +34,10 @@ struct FrameKernels {
 
     /// The differences of all pairs. `bands` begins where the lowest pair does.
     void (*pair_differences)(const float* bands, float* differences);
+
+    /// Between the sums of the products of samples with a row of taps and with the row after it:
+    /// before + share * (after - before). A row is a multiple of kLanes long.
+    float (*interpolated)(const float* samples, const float* taps, size_t row, float share);
 };
 
 /// Those of the instruction set that was chosen for this process.

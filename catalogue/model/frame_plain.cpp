@@ -76,9 +76,29 @@ void pair_differences(const float* bands, float* differences)
     }
 }
 
+// Lane l adds up every eighth product.
+float dot(const float* samples, const float* taps, size_t count)
+{
+    std::array<float, kLanes> lanes{};
+    for (size_t i = 0; i < count; i += kLanes) {
+        for (size_t lane = 0; lane < kLanes; ++lane) {
+            lanes[lane] += samples[i + lane] * taps[i + lane];
+        }
+    }
+    return sum_of_lanes(lanes);
+}
+
+float interpolated(const float* samples, const float* taps, size_t row, float share)
+{
+    const float before = dot(samples, taps, row);
+    const float after = dot(samples, taps + row, row);
+    return before + share * (after - before);
+}
+
 } // namespace
 
-constinit const FrameKernels kPlainFrame{"plain",        extremes,      write_levels,
-                                         write_windowed, band_energies, pair_differences};
+constinit const FrameKernels kPlainFrame{
+    "plain", extremes, write_levels, write_windowed, band_energies, pair_differences, interpolated,
+};
 
 } // namespace kzcat

@@ -198,6 +198,23 @@ void vector_differences(const float* bands, float* differences)
 }
 
 template <class V>
+float vector_interpolated(const float* samples, const float* taps, size_t row, float share)
+{
+    typename V::Floats products[kWidth];
+    for (auto& lanes : products) {
+        lanes = V::set(0);
+    }
+    for (size_t i = 0; i < row; i += kWidth) {
+        const auto v = V::load(samples + i);
+        products[0] = V::add(products[0], V::mul(v, V::load(taps + i)));
+        products[1] = V::add(products[1], V::mul(v, V::load(taps + row + i)));
+    }
+    float sums[kWidth];
+    V::store_sums(sums, products);
+    return sums[0] + share * (sums[1] - sums[0]);
+}
+
+template <class V>
 constexpr kzcat::FrameKernels vector_frame_kernels(const char* name)
 {
     return {name,
@@ -205,7 +222,8 @@ constexpr kzcat::FrameKernels vector_frame_kernels(const char* name)
             vector_levels<V>,
             vector_windowed<V>,
             vector_band_energies<V>,
-            vector_differences<V>};
+            vector_differences<V>,
+            vector_interpolated<V>};
 }
 
 } // namespace

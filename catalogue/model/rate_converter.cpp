@@ -60,7 +60,7 @@ RateConverter::RateConverter(uint32_t rate, double gain)
     if (halvings % 2 != 0) {
         add_stage(2, 1);
     }
-    const uint64_t target = uint64_t{kWorkingRate} << halvings;
+    const uint32_t target = kWorkingRate << halvings;
     if (rate == target) {
         return;
     }

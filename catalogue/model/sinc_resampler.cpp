@@ -4,14 +4,14 @@
 ///
 ///     h(u) = sinc(c u) (0.54 + 0.46 cos(pi c u / 10))      for |c u| < 10
 ///
-/// Sums are taken in eight lanes, each of which adds up every eighth product.
 
 #include "catalogue/model/sinc_resampler.hpp"
 
 #include <algorithm>
-#include <array>
+#include <cassert>
 #include <cmath>
 
+#include "catalogue/model/frame_kernels.hpp"
 #include "catalogue/model/lanes.hpp"
 #include "catalogue/model/series.hpp"
 
@@ -41,22 +41,12 @@ double hamming(double x)
     return 0.54 + 0.46 * (2 * half * half - 1);
 }
 
-float dot(const float* samples, const float* taps, size_t count)
-{
-    std::array<float, kLanes> lanes{};
-    for (size_t i = 0; i < count; i += kLanes) {
-        for (size_t lane = 0; lane < kLanes; ++lane) {
-            lanes[lane] += samples[i + lane] * taps[i + lane];
-        }
-    }
-    return sum_of_lanes(lanes);
-}
-
 } // namespace
 
 // The first output lies at the first sample: it is preceded by as many zeros as it reaches back.
-SincResampler::SincResampler(uint64_t from, uint64_t to) : from_(from), to_(to)
+SincResampler::SincResampler(uint32_t from, uint32_t to) : from_(from), to_(to)
 {
+    assert(to <= kHighestOutput);
     const double cutoff = std::min(1.0, static_cast<double>(to) / static_cast<double>(from));
     reach_ = static_cast<size_t>(std::ceil(kCrossings / cutoff));
     row_ = (2 * reach_ + kLanes - 1) / kLanes * kLanes;
@@ -85,20 +75,21 @@ void SincResampler::write_taps(size_t place, double cutoff)
 
 float SincResampler::output_at(const float* samples) const
 {
-    const uint64_t scaled = rest_ * kPlaces;
-    const float* row = &taps_[static_cast<size_t>(scaled / to_) * row_];
-    const float share =
+    const uint32_t scaled = rest_ * kPlaces;
+    const float* row = &taps_[scaled / to_ * row_];
+    const auto share =
         static_cast<float>(static_cast<double>(scaled % to_) / static_cast<double>(to_));
-    const float before = dot(samples, row, row_);
-    const float after = dot(samples, row + row_, row_);
-    return before + share * (after - before);
+    return frame_kernels().interpolated(samples, row, row_, share);
 }
 
 void SincResampler::advance()
 {
-    rest_ += from_;
-    skip_ += rest_ / to_;
-    rest_ %= to_;
+    skip_ += from_ / to_;
+    rest_ += from_ % to_;
+    if (rest_ >= to_) {
+        rest_ -= to_;
+        ++skip_;
+    }
 }
 
 void SincResampler::convert(std::span<const float> samples, std::vector<float>& output)

@@ -18,27 +18,30 @@ namespace kzcat {
 /// the error is below -100 dB. The gain at 0 Hz is 1 at every place.
 class SincResampler {
 public:
+    /// The highest rate of the output, in whatever unit.
+    static constexpr uint32_t kHighestOutput = UINT32_MAX / 512;
+
     /// Rates in the same unit, both above 0.
-    SincResampler(uint64_t from, uint64_t to);
+    SincResampler(uint32_t from, uint32_t to);
 
     /// Appends the outputs that `samples` complete. How a stream is cut does not show.
     void convert(std::span<const float> samples, std::vector<float>& output);
 
 private:
-    static constexpr size_t kPlaces = 512;
+    static constexpr uint32_t kPlaces = 512;
 
     void write_taps(size_t place, double cutoff);
     float output_at(const float* samples) const;
     void advance();
 
-    uint64_t from_;
-    uint64_t to_;
+    uint32_t from_;
+    uint32_t to_;
     size_t reach_; ///< samples on either side of an output's place
     size_t row_;   ///< taps of one place, a multiple of the lanes
     std::vector<float> taps_;
     std::vector<float> pending_; ///< samples that later outputs need, the next one's first
     uint64_t skip_ = 0;          ///< samples before those, which no output needs any more
-    uint64_t rest_ = 0;          ///< place of the next output beyond a sample, in 1 / to_ of one
+    uint32_t rest_ = 0;          ///< place of the next output beyond a sample, in 1 / to_ of one
 };
 
 } // namespace kzcat

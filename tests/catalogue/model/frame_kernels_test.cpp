@@ -132,6 +132,19 @@ TEST_P(FrameKernelVariants, GiveTheSameDifferences)
     }
 }
 
+TEST_P(FrameKernelVariants, InterpolateAlike)
+{
+    const auto samples = random_numbers(200, 1000, 6);
+    const auto taps = random_numbers(400, 1, 7);
+    for (size_t row = 8; row <= 200; row += 8) {
+        for (const float share : {0.0F, 0.3F, 0.9999F}) {
+            EXPECT_EQ(plain().interpolated(samples.data(), taps.data(), row, share),
+                      variant().interpolated(samples.data(), taps.data(), row, share))
+                << row;
+        }
+    }
+}
+
 INSTANTIATE_TEST_SUITE_P(All, FrameKernelVariants,
                          testing::ValuesIn(kzcat::runnable_instructions().begin(),
                                            kzcat::runnable_instructions().end()),
