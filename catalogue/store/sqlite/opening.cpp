@@ -74,6 +74,9 @@ void check_path(const std::string& path, Access access)
                    "); check the path, and the permissions of its folder");
     } else if (status.type() != fs::file_type::regular) {
         refuse(Kind::cannot_open, path, "it is not a file; give the path of a catalogue file");
+    } else if (fs::file_size(path, error) == 1) {
+        // SQLite would take it as empty, and overwrite it.
+        refuse(Kind::cannot_open, path, "it is not a catalogue; check the path");
     }
 }
 
