@@ -11,6 +11,7 @@
 
 #include "catalogue/model/frame_analyser.hpp"
 #include "catalogue/model/frame_feeder.hpp"
+#include "catalogue/model/level_meter.hpp"
 #include "catalogue/model/library_hold.hpp"
 
 namespace kzcat {
@@ -137,12 +138,13 @@ struct QueryExtractor::State {
         bands.energies.resize(before + kFineBands);
         analyser.analyse(frame,
                          std::span<float, kFineBands>(bands.energies.data() + before, kFineBands));
-        bands.levels.push_back(level_of(frame));
+        bands.levels.push_back(meter.measure(frame));
     }
 
     LibraryHold library; // before what it is needed for
     FrameFeeder feeder;
     FrameAnalyser analyser;
+    LevelMeter meter;
     QueryBands bands;
     bool ended = false;
 };

@@ -23,7 +23,7 @@ constexpr size_t kFineBands = 160 + kMaxPitchSteps - kFirstFineBand;
 struct QueryBands {
     uint64_t samples = 0;        ///< of the clip, at the working rate
     std::vector<float> energies; ///< frames x kFineBands
-    std::vector<float> levels;   ///< log2 of the un-equalised energy; -infinity is never stored
+    std::vector<float> levels;   ///< log2 of the frames' energy plus 1; 41 for a full sine
 
     size_t frames() const { return levels.size(); }
     std::span<const float> frame(size_t index) const

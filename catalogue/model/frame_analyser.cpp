@@ -9,8 +9,6 @@
 #include <new>
 
 #include "catalogue/model/frame_kernels.hpp"
-#include "catalogue/model/lanes.hpp"
-#include "catalogue/model/logarithm.hpp"
 
 namespace kzcat {
 
@@ -87,25 +85,6 @@ void FrameAnalyser::analyse(Frame frame, std::span<float, kFineBands> energies)
     kernels.write_windowed(levels_.data(), ranks_of(levels_).data(), transformed_.data());
     KZDSP_ComputeDCT(dct_.get(), transformed_.data(), 0);
     kernels.band_energies(transformed_.data(), energies.data());
-}
-
-float level_of(Frame frame)
-{
-    std::array<double, kLanes> sums{};
-    std::array<double, kLanes> squares{};
-    for (size_t i = 0; i < kFrameLength; ++i) {
-        const double sample = frame[i];
-        sums[i % kLanes] += sample;
-        squares[i % kLanes] += sample * sample;
-    }
-    double sum = 0;
-    double square = 0;
-    for (size_t lane = 0; lane < kLanes; ++lane) {
-        sum += sums[lane];
-        square += squares[lane];
-    }
-    const double about_mean = std::max(0.0, square - sum * sum / kFrameLength);
-    return log2_of(static_cast<float>(about_mean) + 1);
 }
 
 } // namespace kzcat

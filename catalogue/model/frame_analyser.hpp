@@ -34,8 +34,4 @@ private:
     std::vector<uint8_t> levels_;
 };
 
-/// log2 of the frame's energy about its mean, the sum of the squares of kFrameLength samples, plus
-/// one: 0 for silence and DC, 41 for a sine at full scale.
-float level_of(Frame frame);
-
 } // namespace kzcat

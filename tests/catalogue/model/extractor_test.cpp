@@ -13,6 +13,7 @@
 #include "kzsdk/stream/stream.h"
 #include "reference_features.hpp"
 #include "support/melody.hpp"
+#include "support/signals.hpp"
 
 namespace {
 
@@ -130,6 +131,33 @@ TEST(QueryExtractor, ShowsNoCuts)
     EXPECT_EQ(whole.samples, pieces.samples);
     EXPECT_EQ(whole.levels, pieces.levels);
     EXPECT_EQ(whole.energies, pieces.energies);
+}
+
+// The energy of a frame's 4096 samples about their mean; a sine has half of its square.
+TEST(QueryExtractor, MeasuresTheLevelOfEveryFrame)
+{
+    auto sound = kz::test::sine(kzcat::kWorkingRate, 441, 2, 1);
+    for (size_t i = 0; i < sound.size() / 2; ++i) {
+        sound[i] = static_cast<int16_t>(sound[i] / 100 + 5000);
+    }
+    const QueryBands query = query_of(kWorking, bytes_of(sound));
+    for (size_t m = 0; m < query.frames(); ++m) {
+        const auto frame = std::span(sound).subspan(m * kzcat::kQueryHop, kzcat::kFrameLength);
+        double mean = 0;
+        for (const int16_t sample : frame) {
+            mean += sample / 4096.0;
+        }
+        double energy = 1;
+        for (const int16_t sample : frame) {
+            energy += (sample - mean) * (sample - mean);
+        }
+        EXPECT_NEAR(std::log2(energy), static_cast<double>(query.levels[m]), 1e-5) << m;
+    }
+    EXPECT_NEAR(41, static_cast<double>(query.levels.back()), 0.01);
+    const std::vector<int16_t> constant(10000, -32768);
+    for (const float level : query_of(kWorking, bytes_of(constant)).levels) {
+        EXPECT_EQ(0, level);
+    }
 }
 
 // Code c is that of frame 2c, and its longest lag looks three frames ahead.
