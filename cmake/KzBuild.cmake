@@ -119,9 +119,9 @@ endfunction()
 # Builds <file>_test.cpp of this folder over its room's objects and everything below, with the
 # allocator wrapped so that tests can count blocks and make the n-th allocation fail, and registers
 # each of its test cases with CTest. The room is the one that the folder mirrors, unless ROOMS names
-# others: tests/library/<room> for kzsdk's, tests/catalogue/<room> for the catalogue's. The target is
-# <room>_<file>_test, with kzcat_ before it for the catalogue's. FIXTURE names what has to be set up
-# first.
+# others: tests/library/<room> for kzsdk's, tests/catalogue/<room> for the catalogue's. The target
+# is <room>_<file>_test, with kzcat_ before it for the catalogue's. FIXTURE names what has to be set
+# up first.
 function(kz_test file)
   cmake_parse_arguments(PARSE_ARGV 1 test "" "FIXTURE" "ROOMS;LIBS;SOURCES")
   kz_mirrored_room(room target)

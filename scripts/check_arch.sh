@@ -1,7 +1,8 @@
 #!/bin/sh
 # Builds the libraries in several ways, for several processors, and compares what they make of some
-# sixty pieces of sound with tests/whole/golden/documents.txt, and the catalogue's trails and answers
-# with tests/whole/golden/catalogue.txt. Prints one line for each way; any difference fails.
+# sixty pieces of sound with tests/whole/golden/documents.txt, and the catalogue's trails and
+# answers with catalogue.txt beside it. Prints a line for each way and variant of the inner loops;
+# any difference fails.
 #
 #   scripts/check_arch.sh          g++ at -O0, clang++ at -O3; at -O2 64-bit ARM, S/390, 32-bit x86
 #   scripts/check_arch.sh all      also the other levels, -march=native, 32-bit ARM with and without
@@ -95,8 +96,8 @@ emulator() {
     esac
 }
 
-# The variants that programs of this way may have; one that the processor or the library lacks is the
-# default again.
+# The variants that programs of this way may have; one that the processor or the library lacks is
+# the default again.
 variants() {
     case $1 in
     *-O0) echo "default" ;;

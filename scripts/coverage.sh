@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
-# Reports how much of kzsdk/ and catalogue/ runs in the unit tests, and how much on the corpus of the
-# fuzz targets.
+# Reports how much of kzsdk/ and catalogue/ runs in the unit tests, and how much on the corpus of
+# the fuzz targets.
 #
 #   scripts/coverage.sh [tests | corpus]...   default: both
 #

@@ -92,7 +92,7 @@ bool is_of_a_library(const std::string& file)
     return is_below(file, "kzsdk") || is_below(file, "catalogue");
 }
 
-/// How a file is included: by its path, but for the one header that is installed beside all folders.
+/// How a file is included: by its path, but for the one header that is installed in no folder.
 std::string spelling_of(const std::string& file)
 {
     return file == "catalogue/kzcat.h" ? "kzcat.h" : file;
