@@ -41,13 +41,13 @@ std::vector<std::string> symbols_of(const std::string& object)
     return symbols;
 }
 
-/// The letter before the name says how a symbol may be defined: these are for weak and unique ones,
-/// of which the linker keeps one and drops the others.
+/// The letter before the name says what a symbol is: these are for code of which the linker keeps
+/// one definition and drops the others. (Of data it does not matter which one it keeps.)
 bool may_be_shared(const std::string& symbol)
 {
     const size_t space = symbol.find(' ');
     return space != std::string::npos &&
-           std::string("VvWwu").find(symbol[space + 1]) != std::string::npos;
+           std::string("Wwi").find(symbol[space + 1]) != std::string::npos;
 }
 
 TEST_P(VariantObject, DefinesNothingThatMayServeElsewhere)
