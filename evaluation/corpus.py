@@ -252,7 +252,9 @@ def fetch_package(package, tracks):
         if digest(data) != track["sha256"]:
             complaints.append(f"{package}: {path} is not the file of the manifest")
             continue
-        decode(data, pathlib.Path(path).suffix.lower(), CACHE / "tracks" / f"{track['id']}.wav")
+        found = decode(data, pathlib.Path(path).suffix.lower(), CACHE / "tracks" / f"{track['id']}.wav")
+        if found is None or found["frames"] != track["frames"]:
+            complaints.append(f"{package}: {path} decodes to another length than in the manifest")
     return complaints + [f"{package}: {path} is missing in the package" for path in wanted]
 
 
