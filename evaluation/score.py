@@ -26,10 +26,10 @@ import sys
 
 import corpus
 import degrade
+from scoring import Clip, accept_above_strangers, row_of, share, track_of
 
 HERE = pathlib.Path(__file__).resolve().parent
 BATCH = 100  # files a process
-NEAR = 0.030  # seconds
 
 
 def catalogue_of(half):
@@ -93,41 +93,12 @@ def run(kzfp, half, kinds):
         print(f"{half} {kind}: {len(lines)} clips", file=sys.stderr, flush=True)
 
 
-def track_of(found):
-    """The track's id: kzfp reports the file it was added from, a peer the id."""
-    return pathlib.Path(found["source"]).stem if "source" in found else found["track"]
-
-
 def shared_pairs():
     pairs = set()
     for line in (HERE / "shared.tsv").read_text(encoding="utf-8").splitlines():
         if line and not line.startswith("#"):
             pairs.add(frozenset(line.split("\t")[:2]))
     return pairs
-
-
-class Clip:
-    """What one method said about a clip, beside the truth."""
-
-    def __init__(self, truth, answer, shared):
-        self.truth = truth
-        self.answer = answer
-        self.known = truth["role"] == "known"
-        candidates = answer.get("candidates") or answer.get("matches") or []
-        self.best = candidates[0] if candidates else None
-        self.score = self.best["score"] if self.best else -math.inf
-        self.found = track_of(self.best) if self.best else None
-        self.threshold = self.best.get("threshold", math.inf) if self.best else math.inf
-        self.related = self.found is not None and frozenset((self.found, truth["track"])) in shared
-        self.right = self.known and self.found == truth["track"]
-        self.accepted = answer.get("verdict") == "match"
-        if self.accepted and answer["matches"]:
-            self.found = track_of(answer["matches"][0])
-
-    @property
-    def error(self):
-        """How far the place is off, in seconds."""
-        return abs(self.best["offset"] - self.truth["seconds"])
 
 
 def clips_of(half, method):
@@ -144,41 +115,8 @@ def clips_of(half, method):
             if answer["file"] in by_file:
                 clips[kind].append(Clip(by_file[answer["file"]], answer, shared))
     if method != "kzfp":
-        every = [clip for some in clips.values() for clip in some]
-        highest = max((clip.score for clip in every if not clip.known and not clip.related), default=1)
-        for clip in every:
-            clip.accepted = clip.score > highest
+        accept_above_strangers([clip for some in clips.values() for clip in some])
     return clips
-
-
-def share(flags):
-    flags = list(flags)
-    return sum(flags) / len(flags) if flags else math.nan
-
-
-def quantile(values, part):
-    values = sorted(values)
-    return values[min(len(values) - 1, int(part * len(values)))] if values else math.nan
-
-
-def row_of(clips):
-    """What is told of one kind by one method."""
-    known = [clip for clip in clips if clip.known and not (clip.related and not clip.right)]
-    strangers = [clip for clip in clips if not clip.known and not clip.related]
-    right = [clip for clip in known if clip.accepted and clip.right]
-    errors = [clip.error for clip in right]
-    return {
-        "clips": len(known),
-        "top1": share(clip.right for clip in known),
-        "accepted": share(clip.accepted and clip.right for clip in known),
-        "wrong": sum(clip.accepted and not clip.right for clip in known),
-        "median": 1000 * quantile(errors, 0.5),
-        "p95": 1000 * quantile(errors, 0.95),
-        "near": share(error <= NEAR for error in errors),
-        "strangers": len(strangers),
-        "false": sum(clip.accepted for clip in strangers),
-        "highest": max((clip.score for clip in strangers), default=math.nan),
-    }
 
 
 HEADINGS = ("kind", "clips", "top-1", "accepted and right", "wrong", "place: median, 95 % (ms)",
