@@ -32,6 +32,12 @@ constexpr int kLongestValue = 1 << 28; ///< bytes; no hostile length leads to mo
     throw StoreError(kind, path + ": " + text);
 }
 
+[[noreturn]] void refuse_damaged(const std::string& path, const std::string& why)
+{
+    refuse(Kind::damaged, path,
+           "it is damaged (" + why + "); restore it from a copy, or make it again from the sound");
+}
+
 /// Size and time of change: what tells that a file was written.
 struct FileState {
     uintmax_t bytes = 0;
@@ -235,15 +241,17 @@ void check_format(Connection& connection)
                    "; update this program");
     }
     if (const auto faults = schema_faults(connection); !faults.empty() || format != kFormat) {
-        refuse(Kind::damaged, path,
-               "it is damaged (" + (faults.empty() ? "there is no such format" : faults.front()) +
-                   "); restore it from a copy, or make it again from the sound");
+        refuse_damaged(path, faults.empty() ? "there is no such format" : faults.front());
     }
 }
 
 Profile check_profile(Connection& connection)
 {
-    const int64_t profile = integer_of(connection, "SELECT profile FROM catalogue");
+    Statement row(connection, "SELECT profile FROM catalogue");
+    if (!row.step()) {
+        refuse_damaged(connection.path(), "it does not say what it is");
+    }
+    const int64_t profile = row.integer(0);
     const auto usable = static_cast<int64_t>(Profile::standard);
     if (profile != usable) {
         refuse(Kind::other_profile, connection.path(),

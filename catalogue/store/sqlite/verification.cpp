@@ -30,20 +30,20 @@ public:
     void run()
     {
         const ReadTransaction moment(connection_);
-        attempt([this] { check_schema(); });
-        attempt([this] { check_structure(); });
-        attempt([this] { check_references(); });
-        attempt([this] { check_catalogue(); });
-        attempt([this] { check_settings(); });
-        attempt([this] { check_changes(); });
-        attempt([this] { check_sequences(); });
-        attempt([this] { check_tracks(); });
+        attempt(0, [this] { check_schema(); });
+        attempt(0, [this] { check_structure(); });
+        attempt(0, [this] { check_references(); });
+        attempt(0, [this] { check_catalogue(); });
+        attempt(0, [this] { check_settings(); });
+        attempt(0, [this] { check_changes(); });
+        attempt(0, [this] { check_sequences(); });
+        attempt(0, [this] { check_tracks(); });
     }
 
 private:
     /// What cannot be read is a fault too, and the other checks go on.
     template <class Check>
-    void attempt(Check check)
+    void attempt(int64_t track, Check check)
     {
         try {
             check();
@@ -51,7 +51,7 @@ private:
             if (error.kind() != Kind::damaged && error.kind() != Kind::failed) {
                 throw;
             }
-            report_({.track = 0, .text = error.what()});
+            report_({.track = track, .text = error.what()});
         }
     }
 
@@ -169,7 +169,7 @@ private:
         Statement row(connection_,
                       "SELECT id, key, samples, codes, added, crc FROM track ORDER BY id");
         for (uint64_t done = 1; row.step(); ++done) {
-            attempt([&] { check_track(row); });
+            attempt(row.integer(0), [&] { check_track(row); });
             if (!progress_(done, all)) {
                 return;
             }
@@ -183,10 +183,10 @@ private:
             row.integer(5)) {
             fault(id, "its row has changed");
         }
-        attempt([&] { check_codes(id, row.blob(1)); });
-        attempt([&] { check_bands(id); });
-        attempt([&] { check_tags(id); });
-        attempt([&] { check_sources(id); });
+        attempt(id, [&] { check_codes(id, row.blob(1)); });
+        attempt(id, [&] { check_bands(id); });
+        attempt(id, [&] { check_tags(id); });
+        attempt(id, [&] { check_sources(id); });
     }
 
     void check_codes(int64_t id, std::span<const std::byte> key)
