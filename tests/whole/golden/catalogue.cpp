@@ -1,6 +1,6 @@
-// Prints one line for each piece of sound, rate and format: what it is, and digests of its trail and
-// of its bands as a query; then one for each clip: what it was recognised as, to the last bit. Given
-// a file of such lines, prints the lines that differ instead, and fails if there are any.
+// Prints one line for each piece of sound, rate and format: what it is, and digests of its trail
+// and of its bands as a query; then one for each clip: what it was recognised as, to the last bit.
+// Given a file of such lines, prints the lines that differ instead, and fails if there are any.
 //
 // The sound is made with integers only, so a difference comes from the catalogue or the library.
 
