@@ -28,10 +28,10 @@ struct IndexFacts {
 };
 
 struct IndexOptions {
-    std::string path;         ///< of the side file; empty: none is read or written
-    bool write = true;        ///< write the side file when it is worth it
-    bool fall_back = true;    ///< offer a scan when the parts find nothing
-    std::optional<Plan> plan; ///< use this plan whatever was measured; parts need a side file
+    std::string path = {};         ///< of the side file; empty: none is read or written
+    bool write = true;             ///< write the side file when it is worth it
+    bool fall_back = true;         ///< offer a scan when the parts find nothing
+    std::optional<Plan> plan = {}; ///< use this plan whatever was measured; parts need a side file
     uint64_t write_from = 4'000'000; ///< codes from which on a side file is worth it; 3 000 tracks
     /// Lists of parts that a look-up may read, counted in lists of average length: twice as many
     /// take twice as long, and find more that is buried in noise. 0 takes the usual number.

@@ -7,6 +7,7 @@
 #include "catalogue/index/corpora.hpp"
 #include "catalogue/index/index_file.hpp"
 #include "catalogue/index/scratch_folder.hpp"
+#include "catalogue/index/sealing.hpp"
 #include "catalogue/model/crc32c.hpp"
 
 namespace kzcat {
@@ -47,13 +48,6 @@ bool same(const IndexContents& left, const IndexContents& right)
                 std::ranges::equal((*left.tables)[part].words, (*right.tables)[part].words);
     }
     return equal;
-}
-
-/// Sets the header's checksum to what its bytes have.
-void seal(Bytes& bytes)
-{
-    put_little_endian(crc32c(std::span(bytes).first(kIndexHeaderBytes - 4)),
-                      bytes.data() + kIndexHeaderBytes - 4);
 }
 
 TEST(IndexFile, IsReadAsItWasWritten)
@@ -142,7 +136,7 @@ TEST(IndexFile, IsRefusedWhenItsNumbersMakeNoSense)
     for (size_t at = 0; at < kFields; ++at) {
         Bytes bytes = whole;
         bytes[at] ^= static_cast<std::byte>(1 + random() % 255);
-        seal(bytes);
+        test::seal_header(bytes);
         try {
             read_index_file(bytes);
         } catch (const IndexFileError&) {
@@ -161,7 +155,7 @@ TEST(IndexFile, IsRefusedWithTracksOutOfOrder)
         put_little_endian(id, bytes.data() + tracks + 16 * 4);
         put_little_endian(crc32c(std::span(bytes).subspan(tracks, size_t{16} * 30)),
                           bytes.data() + 128 + 16);
-        seal(bytes);
+        test::seal_header(bytes);
         EXPECT_THROW(read_index_file(bytes), IndexFileError) << id;
     }
 }
@@ -174,7 +168,7 @@ TEST(IndexFile, IsRefusedWithMoreCodesThanItHas)
         put_little_endian(count, bytes.data() + tracks + 16 * 4 + 8);
         put_little_endian(crc32c(std::span(bytes).subspan(tracks, size_t{16} * 30)),
                           bytes.data() + 128 + 16);
-        seal(bytes);
+        test::seal_header(bytes);
         EXPECT_THROW(read_index_file(bytes), IndexFileError) << count;
     }
 }

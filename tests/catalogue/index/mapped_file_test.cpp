@@ -7,7 +7,6 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/file.h>
-#include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -137,36 +136,12 @@ TEST(FileReplacement, ReportsAFolderThatIsMissing)
     EXPECT_THROW(FileReplacement{folder.file("missing/a")}, std::system_error);
 }
 
-/// Lets files grow to some size only, as a full disk does.
-class FileLimit {
-public:
-    explicit FileLimit(rlim_t bytes)
-    {
-        getrlimit(RLIMIT_FSIZE, &before_);
-        handler_ = std::signal(SIGXFSZ, SIG_IGN);
-        rlimit limit = before_;
-        limit.rlim_cur = bytes;
-        setrlimit(RLIMIT_FSIZE, &limit);
-    }
-    FileLimit(const FileLimit&) = delete;
-    FileLimit& operator=(const FileLimit&) = delete;
-    ~FileLimit()
-    {
-        setrlimit(RLIMIT_FSIZE, &before_);
-        std::signal(SIGXFSZ, handler_);
-    }
-
-private:
-    rlimit before_{};
-    void (*handler_)(int) = nullptr;
-};
-
 TEST(FileReplacement, LeavesTheEarlierFileOnAFullDisk)
 {
     const ScratchFolder folder;
     test::write_file(folder.file("a"), bytes_of("earlier"));
     {
-        const FileLimit limit(10);
+        const test::FileLimit limit(10);
         FileReplacement file(folder.file("a"));
         file.write(bytes_of("12345678"));
         EXPECT_THROW(file.write(bytes_of("12345678")), std::system_error);

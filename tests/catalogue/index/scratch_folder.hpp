@@ -1,6 +1,7 @@
-// A folder for a test's files, deleted with everything in it.
+// A folder for a test's files, deleted with everything in it, and what can go wrong with files.
 #pragma once
 
+#include <csignal>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
@@ -9,6 +10,8 @@
 #include <stdexcept>
 #include <string>
 #include <vector>
+
+#include <sys/resource.h>
 
 namespace kzcat::test {
 
@@ -60,5 +63,29 @@ inline void write_file(const std::string& path, std::span<const std::byte> bytes
     out.write(reinterpret_cast<const char*>(bytes.data()),
               static_cast<std::streamsize>(bytes.size()));
 }
+
+/// Lets files grow to some size only, as a full disk does.
+class FileLimit {
+public:
+    explicit FileLimit(rlim_t bytes)
+    {
+        getrlimit(RLIMIT_FSIZE, &before_);
+        handler_ = std::signal(SIGXFSZ, SIG_IGN);
+        rlimit limit = before_;
+        limit.rlim_cur = bytes;
+        setrlimit(RLIMIT_FSIZE, &limit);
+    }
+    FileLimit(const FileLimit&) = delete;
+    FileLimit& operator=(const FileLimit&) = delete;
+    ~FileLimit()
+    {
+        setrlimit(RLIMIT_FSIZE, &before_);
+        std::signal(SIGXFSZ, handler_);
+    }
+
+private:
+    rlimit before_{};
+    void (*handler_)(int) = nullptr;
+};
 
 } // namespace kzcat::test
