@@ -3,45 +3,18 @@
 
 #include <cstddef>
 #include <cstdint>
-#include <string>
 #include <type_traits>
-#include <vector>
 
 #include <gtest/gtest.h>
 
 #include "kzsdk/kzsdk.h"
+#include "whole/abi/record_layout.hpp"
 
 namespace {
 
-struct Field {
-    std::string name;
-    size_t offset;
-    size_t size;
-    size_t alignment;
-};
-
-constexpr size_t rounded_up(size_t offset, size_t alignment)
-{
-    return (offset + alignment - 1) / alignment * alignment;
-}
-
-/// Field by field in the order given, then the end of the record.
-template <class Record>
-void expect_layout(const std::vector<Field>& fields)
-{
-    static_assert(std::is_standard_layout_v<Record> && std::is_trivial_v<Record>);
-    size_t end = 0;
-    for (const auto& field : fields) {
-        EXPECT_EQ(rounded_up(end, field.alignment), field.offset) << field.name;
-        end = field.offset + field.size;
-    }
-    EXPECT_EQ(rounded_up(end, alignof(Record)), sizeof(Record))
-        << "fields that are not listed here";
-}
-
-// A field's offset is only to be had from its name.
-#define FIELD(record, name)                                                                        \
-    Field { #name, offsetof(record, name), sizeof(record::name), alignof(decltype(record::name)) }
+using kz::test::expect_layout;
+using kz::test::Field;
+using kz::test::rounded_up;
 
 TEST(RecordLayout, OfTheStartUpConfiguration)
 {
