@@ -11,7 +11,7 @@ import sys
 
 TARGETS = (
     "extraction stream tags paths render exchange resampler_fixed resampler_float converters dyn_buf "
-    "disc_names disc_files documents kzfp_options kzfp_files"
+    "disc_names disc_files documents trail_file trails kzfp_options kzfp_files"
 ).split()
 
 
@@ -91,6 +91,26 @@ def documents():
             + block + b">\n0 32768 &#32;" + numbers[10:] + b"<!-- 31 --></FP_BLOCK></FP_BLOCKS>"
             b"</KZFPX_FP_QUERY>"):
         yield text + bytes(reversed((0).to_bytes(2, "big")))
+
+
+def trail_file():
+    """Files of no, one and many codes; their checksums are made right by the target."""
+    for samples in (0, 4096, 100000):
+        count = 0 if samples < 4096 else (samples - 4096) // 2048 + 1
+        header = b"\x89KZT\r\n\x1a\n" + b"".join(
+            number.to_bytes(size, "little")
+            for number, size in ((1, 4), (1, 4), (samples, 8), (count, 8), (0, 32)))
+        codes = random.Random(samples).randbytes(8 * count)
+        yield header + codes + Seed().flag(True).flag(True).all()
+
+
+def trails():
+    """Sound of every encoding, at stored, doubled and odd rates."""
+    for form in range(1, 10):
+        for rate in (0, 2, 7, 10, 12):
+            seed = Seed().number(form, 1, 9).number(rate, 0, 13).number(1 + form % 3, 1, 4)
+            seed.number(0, 0, 7).number(0, 0, 31).number(0, 0, 63).number(1001, 1, 10000)
+            yield seed.number(200000, 0, 200000).number(form, 0, 65535).flag(True).all()
 
 
 def kzfp_files():
