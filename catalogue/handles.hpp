@@ -1,0 +1,108 @@
+/// @file
+/// What the opaque handles of the C interface hold, and how they are created and freed.
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <variant>
+#include <vector>
+
+#include "catalogue/catalogue.hpp"
+#include "catalogue/failure.hpp"
+#include "catalogue/model/extractor.hpp"
+#include "kzcat.h"
+
+struct kzcat_catalogue {
+    kzcat::Catalogue whole;
+};
+
+struct kzcat_builder {
+    kzcat::TrailExtractor extractor;
+    enum { taking, broken, finished } state = taking;
+};
+
+struct kzcat_trail {
+    kzcat::Trail trail;
+    kzcat::DocumentBands document_bands;
+};
+
+struct kzcat_track {
+    kzcat::TrackInfo info;
+};
+
+struct kzcat_query {
+    using Content =
+        std::variant<std::monostate, kzcat::QueryBands, kzcat::Trail, kzcat::DocumentValues>;
+
+    std::optional<kzcat::QueryExtractor> extractor; ///< until it is finished
+    Content content;                                ///< from then on
+    bool broken = false;                            ///< sound may have been lost
+};
+
+/// A match with the texts that its record points to.
+struct kzcat_found {
+    kzcat_match record{};
+    std::string source;
+    std::optional<std::string> title;
+    std::optional<std::string> artist;
+};
+
+struct kzcat_result {
+    kzcat_summary summary{};
+    std::vector<kzcat_found> matches;
+    std::vector<kzcat_found> candidates;
+};
+
+namespace kzcat {
+
+/// Checks the place for a handle and clears it, so that it is null whatever fails later.
+template <class Handle>
+void clear_place(Handle** place)
+{
+    require(place != nullptr, "the place for the new handle is null; pass one");
+    *place = nullptr;
+}
+
+/// Frees what a caller's pointer refers to and sets it to null.
+template <class Handle>
+kzcat_status free_handle(Handle** reference) noexcept
+{
+    return guarded([reference] {
+        require(reference != nullptr,
+                "the reference to the handle is null; pass the address of the "
+                "pointer that holds it");
+        delete *reference;
+        *reference = nullptr;
+    });
+}
+
+/// The bytes that a caller passed.
+inline std::span<const std::byte> bytes_of(const void* bytes, uint64_t count)
+{
+    require(bytes != nullptr || count == 0, "the bytes are null; pass some, or a count of 0");
+    require(count <= SIZE_MAX, "there are more bytes than memory has addresses for");
+    return {static_cast<const std::byte*>(bytes), static_cast<size_t>(count)};
+}
+
+template <class Number, size_t count>
+bool all_zero(const Number (&reserved)[count])
+{
+    return std::all_of(reserved, reserved + count, [](Number number) { return number == 0; });
+}
+
+/// Checks a caller's format; the extractors then refuse what they cannot use.
+SoundFormat to_sound_format(const kzcat_format* format);
+
+/// Reports on a format that an extractor refuses, by the status for that.
+template <class Make>
+auto with_format_checked(Make make)
+{
+    try {
+        return make();
+    } catch (const std::invalid_argument& refusal) {
+        throw Failure(KZCAT_ERROR_FORMAT, refusal.what());
+    }
+}
+
+} // namespace kzcat
