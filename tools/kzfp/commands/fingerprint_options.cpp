@@ -3,11 +3,11 @@
 #include "kzfp/commands/fingerprint_options.hpp"
 
 #include <charconv>
-#include <cmath>
 #include <optional>
 #include <string_view>
 #include <utility>
 
+#include "kzfp/command_line/section.hpp"
 #include "kzfp/commands/table.hpp"
 #include "kzfp/fingerprinter.hpp"
 
@@ -93,16 +93,6 @@ audio::StreamFormat to_raw_format(const std::string& text, Algorithm algorithm)
     return {*rate, *channels, *encoding};
 }
 
-std::string check_seconds(const std::string& text)
-{
-    double seconds = 0;
-    if (CLI::detail::lexical_cast(text, seconds) && std::isfinite(seconds) && seconds >= 0 &&
-        seconds <= audio::kLongestSeconds) {
-        return {};
-    }
-    return "'" + text + "' is not a number of seconds from 0 to 1000000000";
-}
-
 void add_input_options(CLI::App& parser, audio::Request& request, std::optional<std::string>& raw)
 {
     parser
@@ -112,12 +102,7 @@ void add_input_options(CLI::App& parser, audio::Request& request, std::optional<
             "encoding, for example 44100,2,s16\n" +
                 explanations_in(kEncodings))
         ->type_name("RATE,CHANNELS,ENCODING");
-    parser.add_option("--start", request.section.start, "Start at this time")
-        ->type_name("SECONDS")
-        ->check(check_seconds);
-    parser.add_option("--length", request.section.length, "Use no more than this much sound")
-        ->type_name("SECONDS")
-        ->check(check_seconds);
+    add_section_options(parser, request.section);
 }
 
 /// The help of the program as a whole also lists its commands.

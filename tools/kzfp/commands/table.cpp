@@ -7,6 +7,13 @@
 namespace kzfp {
 
 ExitStatus run_fingerprint(const Arguments& arguments);
+ExitStatus run_add(const Arguments& arguments);
+ExitStatus run_match(const Arguments& arguments);
+ExitStatus run_compare(const Arguments& arguments);
+ExitStatus run_list(const Arguments& arguments);
+ExitStatus run_remove(const Arguments& arguments);
+ExitStatus run_verify(const Arguments& arguments);
+ExitStatus run_merge(const Arguments& arguments);
 ExitStatus run_disc(const Arguments& arguments);
 ExitStatus run_help(const Arguments& arguments);
 
@@ -15,6 +22,13 @@ namespace {
 constexpr Command kCommands[] = {
     {"fingerprint", "Prints the fingerprints of sound files; the command when none is named",
      run_fingerprint},
+    {"add", "Adds sound files to a catalogue", run_add},
+    {"match", "Names the track of a catalogue that a clip is from", run_match},
+    {"compare", "Finds out whether one sound file is from another", run_compare},
+    {"list", "Lists the tracks of a catalogue", run_list},
+    {"remove", "Removes tracks from a catalogue", run_remove},
+    {"verify", "Finds out whether a catalogue is whole", run_verify},
+    {"merge", "Adds the tracks of other catalogues to one", run_merge},
     {"disc", "Reports what is on a Blu-ray disc or a DVD", run_disc},
     {"help", "Prints the help of a command", run_help},
 };

@@ -1,0 +1,67 @@
+/// @file
+/// What was recognised of a file, as it is printed.
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "kzfp/catalogue/handles.hpp"
+
+namespace kzfp {
+
+/// A track in which a clip was found.
+struct FoundTrack {
+    int64_t track = 0;
+    std::string source;
+    std::optional<std::string> title;
+    double score = 0;
+    double threshold = 0;
+    double offset = 0; ///< seconds of the track at which the clip begins
+    double speed = 1;
+    double tempo = 1;
+    double pitch = 1;
+    double clip_begin = 0;
+    double clip_end = 0;
+    bool by_document = false;
+    bool weak = false;
+};
+
+struct Answer {
+    std::string file;
+    uint32_t verdict = 0; ///< KZCAT_VERDICT_...; 0 when there is an error instead
+    std::string error;
+    std::string warning; ///< what was wrong with the file although it could be looked up
+    std::vector<FoundTrack> matches;
+    std::vector<FoundTrack> candidates;
+    double runner_up = 0;
+};
+
+/// How clips are looked up and which of it is shown.
+struct Lookup {
+    bool speeds = true;
+    bool passages = false;
+    std::optional<uint32_t> candidates; ///< shown only when a number of them is given
+};
+
+/// Looks a query up. Throws CatalogueError.
+Answer look_up(kzcat_catalogue& catalogue, const kzcat_query& query, const std::string& file,
+               const Lookup& lookup);
+
+/// One object on one line.
+std::string to_json(const Answer& answer, const Lookup& lookup);
+
+/// A line for people, or several when there are several matches or candidates.
+std::string to_text(const Answer& answer, const Lookup& lookup);
+
+/// "1:02:03.4", "2:03.4" or "0:03.4"; with a minus sign when negative.
+std::string clock_text(double seconds);
+
+/// "Title (path)".
+std::string name_text(const FoundTrack& track);
+
+/// ", 3.9 % faster", ", 2.0 % higher", or nothing when nothing is changed.
+std::string change_text(const FoundTrack& track);
+
+} // namespace kzfp

@@ -1,0 +1,54 @@
+/// @file
+/// The files that are put into a catalogue.
+#pragma once
+
+#include <array>
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "kzcat.h"
+
+namespace kzfp {
+
+/// A file to be added, or why something that was named cannot be.
+struct ListedFile {
+    std::string path;
+    std::string trouble; ///< empty when there is none
+};
+
+struct FileList {
+    std::vector<ListedFile> files;
+    uint64_t passed_over = 0; ///< files in folders whose names are not those of sound
+};
+
+/// What was named, in this order; folders are replaced by the sound files below them, sorted by
+/// their names. Sound files are told by the ends of their names.
+FileList list_files(const std::vector<std::string>& named);
+
+/// What tells whether a file has changed.
+struct FileState {
+    int64_t size = -1;
+    int64_t mtime_ns = -1;
+};
+
+/// Throws audio::FileError.
+FileState state_of(const std::string& path);
+
+bool file_exists(const std::string& path);
+
+/// Whether two paths lead to one file.
+bool is_same_file(const std::string& first, const std::string& second);
+
+using FileHash = std::array<uint8_t, KZCAT_HASH_SIZE>;
+
+/// The SHA-256 of a file. Throws audio::FileError.
+FileHash hash_of(const std::string& path);
+
+/// The first bytes of a regular file, at most `most`; empty for anything else.
+std::string beginning_of(const std::string& path, size_t most);
+
+/// All bytes of a file, which has at most `most`. Throws audio::FileError.
+std::string contents_of(const std::string& path, size_t most);
+
+} // namespace kzfp

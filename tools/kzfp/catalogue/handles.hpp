@@ -1,0 +1,77 @@
+/// @file
+/// The handles of libkzcat with owners, and its failures as exceptions.
+#pragma once
+
+#include <memory>
+#include <new>
+#include <stdexcept>
+#include <string>
+
+#include "kzcat.h"
+
+namespace kzfp {
+
+/// What a catalogue could not do, in the library's sentence.
+struct CatalogueError : std::runtime_error {
+    CatalogueError(kzcat_status reason, const std::string& text)
+        : std::runtime_error(text), status(reason)
+    {
+    }
+    kzcat_status status;
+};
+
+/// Throws CatalogueError, or std::bad_alloc, unless a call has succeeded.
+inline void check(kzcat_status status)
+{
+    if (status == KZCAT_ERROR_MEMORY) {
+        throw std::bad_alloc();
+    }
+    if (status != KZCAT_OK) {
+        throw CatalogueError(status, kzcat_get_error_text());
+    }
+}
+
+template <auto free>
+struct FreeHandle {
+    template <class Handle>
+    void operator()(Handle* handle) const
+    {
+        free(&handle);
+    }
+};
+
+using Catalogue = std::unique_ptr<kzcat_catalogue, FreeHandle<kzcat_close>>;
+using Builder = std::unique_ptr<kzcat_builder, FreeHandle<kzcat_builder_free>>;
+using Trail = std::unique_ptr<kzcat_trail, FreeHandle<kzcat_trail_free>>;
+using Track = std::unique_ptr<kzcat_track, FreeHandle<kzcat_track_free>>;
+using Query = std::unique_ptr<kzcat_query, FreeHandle<kzcat_query_free>>;
+using Result = std::unique_ptr<kzcat_result, FreeHandle<kzcat_result_free>>;
+
+/// Makes a handle by a call whose last argument is the place for it: made<Trail>(read, a, b).
+template <class Owner, class Make, class... Arguments>
+Owner made(Make make, Arguments... arguments)
+{
+    typename Owner::pointer handle = nullptr;
+    check(make(arguments..., &handle));
+    return Owner(handle);
+}
+
+/// The same for calls that look something up: empty when there is no such thing.
+template <class Owner, class Find, class... Arguments>
+Owner found(Find find, Arguments... arguments)
+{
+    typename Owner::pointer handle = nullptr;
+    const kzcat_status status = find(arguments..., &handle);
+    if (status != KZCAT_ERROR_NOT_FOUND) {
+        check(status);
+    }
+    return Owner(handle);
+}
+
+inline Catalogue open_catalogue(const std::string& path, uint32_t access)
+{
+    return made<Catalogue>(kzcat_open, path.c_str(), access,
+                           static_cast<const kzcat_settings*>(nullptr));
+}
+
+} // namespace kzfp

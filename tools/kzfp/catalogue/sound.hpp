@@ -1,0 +1,38 @@
+/// @file
+/// From files to what is kept and looked up: trails and queries.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "audio/input.hpp"
+#include "kzfp/catalogue/handles.hpp"
+
+namespace kzfp {
+
+/// What a file holds, by its first bytes.
+enum class Content { sound, trail, document };
+
+Content content_of_file(const std::string& path);
+
+/// A recording as it is added.
+struct Recording {
+    Trail trail;
+    std::vector<audio::Tag> tags; ///< the title at least
+    std::string warning;          ///< what was wrong with the file; empty when nothing was
+};
+
+/// Reads a sound file, or a trail file (.kzt), to its end or that of the section. `documents`: it
+/// is to answer query documents too. Throws audio::FileError and CatalogueError.
+Recording read_recording(const std::string& path, const audio::Section& section, bool documents);
+
+/// A clip as it is looked up.
+struct Clip {
+    Query query;
+    std::string warning;
+};
+
+/// Reads a sound file, a trail file or a query document. Throws as read_recording() does.
+Clip read_clip(const std::string& path, const audio::Section& section);
+
+} // namespace kzfp

@@ -1,0 +1,44 @@
+/// @file
+/// Options that the commands for catalogues have in common.
+#pragma once
+
+#include <cstddef>
+#include <string>
+#include <thread>
+
+#include "kzfp/command_line/choice.hpp"
+#include "kzfp/command_line/command_line.hpp"
+
+namespace kzfp {
+
+enum class TextOrJson { text, json };
+
+inline constexpr Choice<TextOrJson> kTextOrJson[] = {
+    {"text", TextOrJson::text, "lines for people"},
+    {"json", TextOrJson::json, "one object on each line (JSON Lines)"},
+};
+
+inline void add_format_option(CLI::App& parser, TextOrJson& format)
+{
+    add_choice(parser, "-f,--format", "FORMAT", "a format", kTextOrJson, format);
+}
+
+/// The catalogue that a command is about. `path` outlives the parsing.
+inline void add_catalogue_option(CLI::App& parser, std::string& path)
+{
+    parser.add_option("CATALOGUE", path, "The catalogue's file, such as music.kzc")
+        ->required()
+        ->type_name("");
+}
+
+/// How many files are worked on at once: as many as there are processors unless stated.
+inline void add_jobs_option(CLI::App& parser, size_t& jobs)
+{
+    jobs = std::max(1U, std::thread::hardware_concurrency());
+    parser
+        .add_option("-j,--jobs", jobs, "Files to work on at once (default: one for each processor)")
+        ->type_name("NUMBER")
+        ->check(CLI::Range(1, 256));
+}
+
+} // namespace kzfp
