@@ -5,8 +5,8 @@
 
 Writes <cache>/clips/<half>/<kind>/<number>.<suffix> and, beside the clips of a kind, truth.jsonl:
 one object a clip with its file, kind, role ("known" or "stranger"), track, the place of its first
-sample in the track (`position` in frames, `seconds`), and speed, tempo and pitch. A kind that has
-its truth.jsonl already is left as it is. The same seeds, clips and bytes come out every time, with
+sample in the track (`position` in frames, `seconds`), and speed, tempo and pitch. Clips that
+truth.jsonl has already are left as they are. The same seeds, clips and bytes come out every time, with
 the same versions of sox, FFmpeg, espeak-ng and numpy.
 
 A kind has 150 clips of known tracks in `report`, 100 in `tune`, and 60 of strangers. A place is drawn again, up to 30 times,
@@ -26,7 +26,7 @@ import corpus
 import degrade
 import voices
 
-COUNTS = {"tune": {"known": 100, "stranger": 60}, "report": {"known": 150, "stranger": 60}}
+COUNTS = {"tune": {"known": 104, "stranger": 60}, "report": {"known": 156, "stranger": 60}}
 QUIETEST = 10 ** (-50 / 20)
 SILENT = 10 ** (-60 / 20)
 
@@ -107,20 +107,34 @@ def work(arguments):
     return make_clip(*arguments)
 
 
+def jobs_of(half, name, tracks):
+    """Which clips a kind has: role and number of each, and the track."""
+    return {(role, number): track for role, count in COUNTS[half].items()
+            for number, track in enumerate(chosen(tracks, half, name, role, count))
+            if track["music"] or role == "stranger"}
+
+
+def place_of(line):
+    """Role and number, which the file's name holds."""
+    return line["role"], int(pathlib.Path(line["file"]).stem[1:])
+
+
 def make_kind(pool, half, name, tracks):
     folder = corpus.CACHE / "clips" / half / name
-    truth = folder / "truth.jsonl"
-    if truth.exists():
-        return
     folder.mkdir(parents=True, exist_ok=True)
-    jobs = [(half, name, role, number, track)
-            for role, count in COUNTS[half].items()
-            for number, track in enumerate(chosen(tracks, half, name, role, count))]
-    lines = [json.dumps(line, sort_keys=True) + "\n" for line in pool.map(work, jobs, chunksize=5)
-             if line is not None]
-    truth.with_suffix(".part").write_text("".join(lines), encoding="utf-8")
+    truth = folder / "truth.jsonl"
+    lines = truth.read_text(encoding="utf-8").splitlines() if truth.exists() else []
+    made = {place_of(line): line for line in map(json.loads, lines)}
+    wanted = jobs_of(half, name, tracks)
+    if truth.exists() and made.keys() == wanted.keys():
+        return
+    missing = [(half, name, *place, track) for place, track in wanted.items() if place not in made]
+    new = [line for line in pool.map(work, missing, chunksize=5) if line is not None]
+    made |= {place_of(line): line for line in new}
+    text = "".join(json.dumps(made[place], sort_keys=True) + "\n" for place in wanted if place in made)
+    truth.with_suffix(".part").write_text(text, encoding="utf-8")
     truth.with_suffix(".part").rename(truth)
-    print(f"{half} {name}: {len(lines)} clips", file=sys.stderr, flush=True)
+    print(f"{half} {name}: {len(made)} clips", file=sys.stderr, flush=True)
 
 
 def main():

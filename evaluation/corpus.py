@@ -18,7 +18,7 @@ track contains as well (see weed.py), and divides the rest: groups of packages, 
 lie in both halves, into `tune`, on which thresholds are chosen, and `report`, which is only
 measured; and in each half three tracks in five are `known` (in the catalogue), the others are
 `strangers`. What decides is a hash of the track's name, so that the same packages give the same
-manifest.
+manifest. Recordings of nature (not_music.txt) are never in a catalogue.
 """
 
 import argparse
@@ -42,6 +42,7 @@ import weed
 HERE = pathlib.Path(__file__).resolve().parent
 MANIFEST = HERE / "manifest.jsonl"
 PACKAGES = HERE / "packages.txt"
+NOT_MUSIC = HERE / "not_music.txt"
 CACHE = pathlib.Path(os.environ.get("KZ_MEDIA", HERE.parent / "build/media")) / "evaluation"
 AUDIO = re.compile(r"\.(ogg|oga|opus|mp3|wav|flac|mod|xm|it|s3m|m4a|aac)$", re.IGNORECASE)
 ARCHIVE = re.compile(r"\.(pk3|pk4|zip|love|data)$", re.IGNORECASE)
@@ -220,8 +221,10 @@ def survey():
 
 def divide(tracks):
     left_out = weed.repeated(tracks, CACHE)
+    nature = set(NOT_MUSIC.read_text(encoding="utf-8").splitlines())
     for track in tracks:
         track["left_out"] = left_out.get(track["id"], "")
+        track["music"] = track["id"] not in nature
     kept = [track for track in tracks if not track["left_out"]]
     halve(kept)
     cast(kept)
@@ -233,6 +236,11 @@ def divide(tracks):
         for name in sorted(left_out):
             file.write(f"{name}\t{left_out[name]}\n")
     print(f"{len(kept)} tracks, {len(left_out)} left out", file=sys.stderr)
+
+
+def known(half):
+    """The tracks of a half that are in the catalogue."""
+    return [track for track in manifest(half) if track["role"] == "known" and track["music"]]
 
 
 def manifest(half=None):

@@ -10,9 +10,7 @@ bit_alignment.cpp, which is compiled for this machine. Other peers (Olaf, audfpr
 are not packaged in Debian 12 and are not run.
 """
 
-import concurrent.futures
 import json
-import os
 import pathlib
 import subprocess
 import sys
@@ -35,9 +33,8 @@ def aligner():
 
 
 def write_prints(path, names, files):
-    with concurrent.futures.ThreadPoolExecutor(corpus.JOBS) as pool:
-        prints = pool.map(weed.fingerprint, files)
-        lines = [f"{name} {','.join(map(str, values))}\n" for name, values in zip(names, prints)]
+    lines = [f"{name} {','.join(map(str, values))}\n"
+             for name, values in zip(names, weed.fingerprints(files))]
     path.with_suffix(".part").write_text("".join(lines))
     path.with_suffix(".part").rename(path)
 
@@ -46,7 +43,7 @@ def known_prints(half):
     path = corpus.CACHE / "results" / half / "chromaprint" / "known.txt"
     if not path.exists():
         path.parent.mkdir(parents=True, exist_ok=True)
-        names = [track["id"] for track in corpus.manifest(half) if track["role"] == "known"]
+        names = [track["id"] for track in corpus.known(half)]
         write_prints(path, names, [corpus.CACHE / "tracks" / f"{name}.wav" for name in names])
     return path
 
@@ -60,10 +57,10 @@ def candidates(fields):
 def look_up(half, kind):
     clips = corpus.CACHE / "clips" / half
     results = corpus.CACHE / "results" / half / "chromaprint" / f"{kind}.jsonl"
-    if results.exists():
+    truth = clips / kind / "truth.jsonl"
+    if results.exists() and results.stat().st_mtime > truth.stat().st_mtime:
         return
-    truth = (clips / kind / "truth.jsonl").read_text(encoding="utf-8").splitlines()
-    names = [json.loads(line)["file"] for line in truth]
+    names = [json.loads(line)["file"] for line in truth.read_text(encoding="utf-8").splitlines()]
     tracks = known_prints(half)
     prints = results.with_suffix(".txt")
     write_prints(prints, names, [clips / name for name in names])
@@ -79,7 +76,6 @@ def look_up(half, kind):
 def main():
     half = sys.argv[1]
     made = sorted(path.parent.name for path in (corpus.CACHE / "clips" / half).glob("*/truth.jsonl"))
-    os.nice(10)
     for kind in sys.argv[2:] or made:
         look_up(half, kind)
 

@@ -37,8 +37,8 @@ def catalogue_of(half):
 
 
 def known_files(half):
-    tracks = corpus.manifest("report" if half == "loops" else half)
-    files = [corpus.CACHE / "tracks" / f"{track['id']}.wav" for track in tracks if track["role"] == "known"]
+    tracks = corpus.known("report" if half == "loops" else half)
+    files = [corpus.CACHE / "tracks" / f"{track['id']}.wav" for track in tracks]
     if half == "loops":
         files += sorted((corpus.CACHE / "loops" / "known").glob("*.wav"))
     return files

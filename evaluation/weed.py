@@ -20,17 +20,27 @@ STRETCH = int(10 * PER_SECOND)  # values that are compared at a time: ten second
 SAME = 0.12  # share of differing bits below which two stretches are one recording
 
 
-def fingerprint(file):
-    done = subprocess.run(["fpcalc", "-raw", "-json", "-length", "240", str(file)],
+def fpcalc(files):
+    """What fpcalc prints of some files; it reports an error at the end of every FLAC file."""
+    done = subprocess.run(["fpcalc", "-ignore-errors", "-raw", "-json", "-length", "240", *files],
                           capture_output=True, text=True, check=False)
-    if done.returncode not in (0, 3) or not done.stdout:
-        return numpy.zeros(0, numpy.uint32)
-    return numpy.array(json.loads(done.stdout)["fingerprint"], dtype=numpy.uint32)
+    return [numpy.array(json.loads(line)["fingerprint"], dtype=numpy.uint32)
+            for line in done.stdout.splitlines() if line.startswith("{")]
+
+
+def fingerprint_batch(files):
+    """The values of each file; none of those in which fpcalc finds no sound."""
+    prints = fpcalc(files)
+    if len(prints) == len(files):
+        return prints
+    return [(fpcalc([file]) or [numpy.zeros(0, numpy.uint32)])[0] for file in files]
 
 
 def fingerprints(files):
+    names = [str(file) for file in files]
+    batches = [names[place:place + 30] for place in range(0, len(names), 30)]
     with concurrent.futures.ThreadPoolExecutor(JOBS) as pool:
-        return list(pool.map(fingerprint, files))
+        return [one for batch in pool.map(fingerprint_batch, batches) for one in batch]
 
 
 def diagonals(prints):
