@@ -82,6 +82,7 @@ TEST(DocumentBandScale, WhatIsNoEnergyIsZeroOrTheMost)
     EXPECT_EQ(64 * 256, encode_band_energy(kInfinite));
     EXPECT_EQ(64 * 256, encode_band_energy(0x1p+70F));
     EXPECT_EQ(64 * 256, encode_band_energy(0x1p+64F));
+    EXPECT_EQ(64 * 256, encode_band_energy(0x1.8p+64F));
     EXPECT_EQ(0x1p+64F, decode_band_energy(65535));
     EXPECT_EQ(0, decode_band_energy(0));
 }

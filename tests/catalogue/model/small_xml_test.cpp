@@ -63,6 +63,31 @@ TEST(SmallXml, WhiteSpaceInAttributesBecomesSpaces)
     EXPECT_EQ("1 2 3", *read_small_xml("<a x='1\n2\t3'/>").attribute("x"));
 }
 
+TEST(SmallXml, NamesHaveLettersDigitsAndThreeSigns)
+{
+    const std::string name = "_azAZ09-._";
+    EXPECT_EQ(name, read_small_xml("<" + name + " " + name + "='1'></" + name + "\n>").name);
+    for (const char* wrong : {"<0/>", "<-/>", "<./>", "<a:b/>", "<a 9='1'/>"}) {
+        EXPECT_NE("", fault_of(wrong)) << wrong;
+    }
+}
+
+TEST(SmallXml, FaultsAreNamed)
+{
+    EXPECT_TRUE(holds(fault_of("<a><!-- </a>"), "a comment without an end"));
+    EXPECT_TRUE(holds(fault_of("<a><!-- -- --></a>"), "two hyphens inside a comment"));
+    EXPECT_TRUE(holds(fault_of("<a>&b;</a>"), "&b;"));
+    EXPECT_TRUE(holds(fault_of("<a x/>"), "the attribute x without a value"));
+    EXPECT_TRUE(holds(fault_of("<a x='1' x='2'/>"), "the attribute x twice"));
+    EXPECT_TRUE(holds(fault_of("<a></b>"), "close the element a"));
+    EXPECT_TRUE(holds(fault_of("<a"), "start tag of a"));
+    EXPECT_TRUE(holds(fault_of("<a>"), "ends too early"));
+    EXPECT_TRUE(holds(fault_of("a"), "no root element"));
+    EXPECT_TRUE(holds(fault_of("<a/><b/>"), "goes on behind"));
+    EXPECT_TRUE(holds(fault_of("<?xml version='1.0' encoding='UTF-16'?><a/>"), "encoding"));
+    EXPECT_TRUE(holds(fault_of("<!DOCTYPE a><a/>"), "document types"));
+}
+
 TEST(SmallXml, LinesEndWithALineFeed)
 {
     EXPECT_EQ("1\n2\n3\n\n4\n\r", read_small_xml("<a>1\r\n2\r3\r\r\n4\n&#13;</a>").text);
