@@ -183,7 +183,8 @@ double unless_unchanged(double ratio) { return std::fabs(ratio - 1) < kUnchanged
 Alignment coarse_alignment(const Reading& reading, const TrackScore& score)
 {
     const Sequence& sequence = reading.sequences[score.phase];
-    return {.offset = static_cast<double>(score.position) * kCodeSeconds - sequence.start,
+    return {.hypothesis = reading.hypothesis,
+            .offset = static_cast<double>(score.position) * kCodeSeconds - sequence.start,
             .stretch = reading.hypothesis.stretch,
             .pitch = pitch_ratio(reading.hypothesis.pitch_steps),
             .agreement = 0};
@@ -215,7 +216,8 @@ Alignment refined_alignment(QueryReader& reader, std::span<const Code> track,
         }
     }
     const double between = moved == 0 ? peak_of(by_pitch[0], by_pitch[1], by_pitch[2]) : 0.0;
-    Alignment result{.offset = 0,
+    Alignment result{.hypothesis = {},
+                     .offset = 0,
                      .stretch = unless_unchanged(stretched.interpolated),
                      .pitch = unless_unchanged(pitch_ratio(best.pitch_steps + moved + between)),
                      .agreement = fit.agreement};
@@ -229,6 +231,9 @@ Alignment refined_alignment(QueryReader& reader, std::span<const Code> track,
         fit = same_pitch;
         result.pitch = 1;
     }
+    result.hypothesis = {.pitch_steps = result.pitch == 1 ? 0 : best.pitch_steps + moved,
+                         .stretch = result.stretch};
+    result.agreement = fit.agreement;
     result.offset = fit.middle - refiner.half() * result.stretch;
     return result;
 }

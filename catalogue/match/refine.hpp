@@ -11,10 +11,11 @@ namespace kzcat {
 
 /// Where a clip lies in a track and how it was changed.
 struct Alignment {
-    double offset = 0;    ///< seconds of the track at which the clip begins
-    double stretch = 1;   ///< the clip runs this much faster
-    double pitch = 1;     ///< the clip's frequencies are this many times the track's
-    double agreement = 0; ///< of the best reading, in deviations of independent bits
+    Hypothesis hypothesis; ///< of the reading that fits best
+    double offset = 0;     ///< seconds of the track at which the clip begins
+    double stretch = 1;    ///< the clip runs this much faster
+    double pitch = 1;      ///< the clip's frequencies are this many times the track's
+    double agreement = 0;  ///< of the best reading, in deviations of independent bits
 };
 
 /// What a score says of the place: to the nearest phase and hypothesis.

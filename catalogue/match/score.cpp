@@ -79,14 +79,25 @@ public:
         size_t best = first_whole() < end_whole() ? whole : 0;
         double most = agreement_at(best);
         for (size_t place = 0; place < size(); ++place) {
-            if (place == first_whole()) {
-                place = std::max(end_whole(), first_whole());
+            if (place == first_whole() && first_whole() < end_whole()) {
+                place = end_whole() - 1; // those between were compared above
+                continue;
             }
-            const double here = place < size() ? agreement_at(place) : most;
+            const double here = agreement_at(place);
             if (here > most || (here == most && place < best)) {
                 most = here;
                 best = place;
             }
+        }
+        return best;
+    }
+
+    /// The best one of those from `first` to `last`, of which there has to be one.
+    size_t best(size_t first, size_t last) const
+    {
+        size_t best = first;
+        for (size_t place = first; place <= last; ++place) {
+            best = agreement_at(place) > agreement_at(best) ? place : best;
         }
         return best;
     }
@@ -99,6 +110,9 @@ private:
     size_t margin_ = 0;
     std::vector<uint16_t> distances_;
 };
+
+/// More codes than any track has.
+constexpr int64_t kAnywhere = int64_t{1} << 40;
 
 /// The median of distances and half the width of the middle 68 %.
 struct OwnSpread {
@@ -219,18 +233,28 @@ ReadingScorer::ReadingScorer(const Reading& reading, const Corpus& population)
     for (const Sequence& sequence : reading.sequences) {
         ScanSequence ready(sequence);
         const Spread spread = population_spread(ready, population);
-        phases_.push_back({.sequence = std::move(ready), .spread = spread});
+        phases_.push_back(
+            {.sequence = std::move(ready), .spread = spread, .start = sequence.start});
     }
 }
 
-TrackScore ReadingScorer::score_phase(const Phase& phase, std::span<const Code> track) const
+TrackScore ReadingScorer::score_phase(const Phase& phase, std::span<const Code> track, Range range)
 {
     const Places places(phase.sequence, track);
     TrackScore result;
-    if (places.size() == 0) {
+    if (places.size() == 0 || range.last < places.position(0) ||
+        range.first > places.position(places.size() - 1)) {
         return result;
     }
-    const size_t place = places.best();
+    const auto place_of = [&](int64_t position) {
+        const int64_t place = position - places.position(0);
+        return static_cast<size_t>(
+            std::clamp<int64_t>(place, 0, static_cast<int64_t>(places.size()) - 1));
+    };
+    const size_t first = place_of(range.first);
+    const size_t last = place_of(range.last);
+    const bool all = first == 0 && last + 1 == places.size();
+    const size_t place = all ? places.best() : places.best(first, last);
     const double best = places.agreement_at(place);
     result.found = true;
     result.position = places.position(place);
@@ -242,17 +266,32 @@ TrackScore ReadingScorer::score_phase(const Phase& phase, std::span<const Code> 
     return result;
 }
 
-TrackScore ReadingScorer::score(std::span<const Code> track) const
+TrackScore ReadingScorer::best_of(std::span<const Code> track, double beginning,
+                                  int64_t around) const
 {
     TrackScore best;
     for (uint32_t phase = 0; phase < phases_.size(); ++phase) {
-        TrackScore here = score_phase(phases_[phase], track);
+        const auto expected = static_cast<int64_t>(
+            std::floor((beginning + phases_[phase].start) / kCodeSeconds + 0.5));
+        TrackScore here = score_phase(phases_[phase], track,
+                                      {.first = expected - around, .last = expected + around});
         here.phase = phase;
         if (here.found && (!best.found || here.score > best.score)) {
             best = here;
         }
     }
     return best;
+}
+
+TrackScore ReadingScorer::score(std::span<const Code> track) const
+{
+    return best_of(track, 0, kAnywhere);
+}
+
+TrackScore ReadingScorer::score_near(std::span<const Code> track, double beginning,
+                                     int64_t codes) const
+{
+    return best_of(track, beginning, codes);
 }
 
 } // namespace kzcat

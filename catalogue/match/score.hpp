@@ -73,12 +73,23 @@ public:
     /// bit whatever led to the track.
     TrackScore score(std::span<const Code> track) const;
 
+    /// The same of the best place near one, no more than so many codes away; not found when there
+    /// is none.
+    TrackScore score_near(std::span<const Code> track, double beginning, int64_t codes) const;
+
 private:
     struct Phase {
         ScanSequence sequence;
         Spread spread;
+        double start; ///< of the sequence, as in Sequence
     };
-    TrackScore score_phase(const Phase& phase, std::span<const Code> track) const;
+    /// Positions from which the best one is taken.
+    struct Range {
+        int64_t first;
+        int64_t last;
+    };
+    TrackScore best_of(std::span<const Code> track, double beginning, int64_t around) const;
+    static TrackScore score_phase(const Phase& phase, std::span<const Code> track, Range range);
 
     std::vector<Phase> phases_;
 };

@@ -45,6 +45,10 @@ constexpr double kLeastOwnSpread = 0.3;
 /// What of the score against the catalogue is kept however much a track resembles itself.
 constexpr double kLoopShare = 0.6;
 
+/// The longest window that is searched at once, in codes, 16.7 s: over longer ones a small error of
+/// the tempo adds up. Longer clips are cut.
+constexpr size_t kLongestWindow = 90;
+
 /// The threshold of a catalogue for a clip of some windows that are searched one by one.
 double threshold_for(uint64_t codes, size_t windows);
 
