@@ -216,6 +216,24 @@ TEST(Sound, MayHoldWhatIsNoNumber)
     EXPECT_EQ(trail_of(format, bytes_of(mended)), trail_of(format, bytes_of(sound)));
 }
 
+// What the level of a query shows of single samples: NaN is 0, and 16 times full scale the loudest.
+TEST(Sound, IsClippedFarBeyondFullScale)
+{
+    const auto level_of = [](float one, float other) {
+        std::vector<float> sound(kzcat::kFrameLength);
+        for (size_t i = 0; i < sound.size(); ++i) {
+            sound[i] = i % 2 == 0 ? one : other;
+        }
+        kzcat::QueryExtractor extractor({KZ_STREAM_FORMAT_FLOAT32, 11025, 1});
+        extractor.feed(bytes_of(sound));
+        return extractor.finish().levels.at(0);
+    };
+    EXPECT_EQ(12 + 2 * 15, level_of(1, -1));
+    EXPECT_EQ(12 + 2 * 19, level_of(16, -16));
+    EXPECT_EQ(12 + 2 * 19, level_of(17, -1e30F));
+    EXPECT_EQ(level_of(1e-4F, 0), level_of(1e-4F, std::numeric_limits<float>::quiet_NaN()));
+}
+
 std::string refusal(const SoundFormat& format)
 {
     try {
