@@ -17,7 +17,8 @@ namespace kzcat {
 struct DocumentMatch {
     int64_t track = 0;
     double score = 0;     ///< the distance with a minus sign: 0 at best
-    double threshold = 0; ///< that this score had to reach
+    double threshold = 0; ///< that this score had to reach: the catalogue's or the track's own,
+                          ///< whichever is higher
     double offset = 0;    ///< seconds of the track at which the document's signal begins: where the
                           ///< leading silence of the clip ends, which documents leave out
     bool weak = true; ///< take it as a hint: only scores of kSureDocument and above are not weak
@@ -35,6 +36,10 @@ struct DocumentAnswer {
 
 /// The score that a document has to reach among so many rows. The more there are, the nearer comes
 /// the nearest one by chance.
+///
+/// A track has a threshold of its own besides: its nearest stretch must be less than half as far from
+/// the document as most of the others. Tones, noise and drum loops sound the same all the time, and
+/// like any other of their kind.
 double document_threshold(uint64_t rows);
 
 /// A search for one document. Offer it all tracks, each once, in any order.
@@ -56,8 +61,11 @@ private:
         int64_t track;
         uint32_t distance;
         size_t row;
+        uint32_t
+            usual; ///< distance of the track's middle row; without limit where it cannot matter
     };
 
+    uint32_t usual_distance(std::span<const DocumentRow> rows) const;
     DocumentMatch match_of(const Best& best) const;
 
     DocumentRow row_;
