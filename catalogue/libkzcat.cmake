@@ -21,6 +21,8 @@ endforeach()
 set_target_properties(
   kzcat_shared PROPERTIES LINKER_LANGUAGE CXX EXPORT_NAME kzcat VERSION ${KZCAT_VERSION}
                           SOVERSION ${soversion})
+# It finds the other library beside itself, wherever both are installed.
+set_target_properties(kzcat_shared PROPERTIES BUILD_RPATH_USE_ORIGIN ON INSTALL_RPATH "$ORIGIN")
 foreach(library IN LISTS libraries)
   target_link_libraries(kzcat_shared PRIVATE $<BUILD_INTERFACE:${library}>)
 endforeach()

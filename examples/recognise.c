@@ -12,12 +12,19 @@
 
 enum { RATE = 22050, TUNES = 3, TUNE_SECONDS = 40, CLIP_START = 17, CLIP_SECONDS = 8 };
 
-/* One note every fifth of a second, taken from a scale; a sawtooth, so that it has overtones. */
-static int16_t tune_sample(uint32_t tune, uint32_t frame)
+/* A note of the scale, scattered so that no tune repeats itself: a clip then has one place only. */
+static uint32_t pitch_of(uint32_t tune, uint32_t note)
 {
     static const uint32_t hertz[] = {262, 330, 392, 523, 440, 349, 294, 392, 330, 247, 494, 587};
-    const uint32_t note = frame / (RATE / 5);
-    const uint32_t pitch = hertz[(note * note + note / 3 * (tune + 2) + 5 * tune) % 12];
+    uint32_t scattered = (note + 1000 * tune + 1) * 2654435761U;
+    scattered = (scattered ^ scattered >> 15) * 2246822519U;
+    return hertz[(scattered ^ scattered >> 13) % 12];
+}
+
+/* One note every fifth of a second; a sawtooth, so that it has overtones. */
+static int16_t tune_sample(uint32_t tune, uint32_t frame)
+{
+    const uint32_t pitch = pitch_of(tune, frame / (RATE / 5));
     const uint32_t position = frame * pitch % RATE;
     const uint32_t fading = RATE / 5 - frame % (RATE / 5);
     const int32_t saw = (int32_t)(position * 16384 / RATE) - 8192;
@@ -36,7 +43,7 @@ static int16_t noise_sample(void)
 static int16_t* play(uint32_t tune, uint32_t start_seconds, uint32_t seconds, int noisy)
 {
     const uint32_t count = seconds * RATE;
-    int16_t* samples = malloc(count * sizeof *samples);
+    int16_t* samples = (int16_t*)malloc(count * sizeof *samples); /* C++ needs the cast */
     uint32_t i = 0;
     for (i = 0; samples != NULL && i < count; ++i) {
         const int16_t noise = noisy ? noise_sample() : 0;

@@ -11,8 +11,9 @@ set -eu
 cd "$(dirname "$0")/.."
 
 jobs=${JOBS:-$(getconf _NPROCESSORS_ONLN)}
-files="kzsdk/libkzsdk.so.1.0.0 kzsdk/libkzsdk.a tools/kzfp/kzfp bindings/java/kzsdk.jar"
-targets="kzsdk_shared kzsdk_static kzfp kzsdk_jar"
+files="kzsdk/libkzsdk.so.1.0.0 kzsdk/libkzsdk.a catalogue/libkzcat.so.1.0.0 catalogue/libkzcat.a
+    tools/kzfp/kzfp bindings/java/kzsdk.jar"
+targets="kzsdk_shared kzsdk_static kzcat_shared kzcat_static kzfp kzsdk_jar"
 
 folder=$(mktemp -d)
 trap 'rm -rf "$folder"' EXIT

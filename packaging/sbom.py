@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Lists what the built library and kzfp are linked with, as CycloneDX 1.5 (JSON).
+"""Lists what the built libraries and kzfp are linked with, as CycloneDX 1.5 (JSON).
 
 packaging/sbom.py [BUILD_DIRECTORY]     build/release if not given; prints to standard output
 
@@ -17,16 +17,20 @@ import subprocess
 import sys
 from urllib.parse import quote
 
+ROOT = pathlib.Path(__file__).resolve().parent.parent
 # What we link or include ourselves. Another one has to be entered here, with its licence.
 LICENCES = {
     "libc6": "LGPL-2.1-or-later",
     "libgcc-s1": "GPL-3.0-or-later WITH GCC-exception-3.1",
     "libstdc++6": "GPL-3.0-or-later WITH GCC-exception-3.1",
+    "libnettle8": "LGPL-3.0-or-later OR GPL-2.0-or-later",
     "libsndfile1": "LGPL-2.1-or-later",
+    "libsqlite3-0": "blessing",
     "libsoxr0": "LGPL-2.1-or-later",
     "libcli11-dev": "BSD-3-Clause",
     "nlohmann-json3-dev": "MIT",
 }
+OUR_FILES = {"libkzsdk.so.1": "libkzsdk"}
 INCLUDED = {"kzfp": ["libcli11-dev", "nlohmann-json3-dev"]}
 
 
@@ -102,9 +106,12 @@ class List:
         for soname in needed(file):
             if soname not in places:  # the loader itself
                 continue
+            if soname in OUR_FILES:
+                refs.add(OUR_FILES[soname])
+                continue
             package = package_of(places[soname])
             below = self.add(package)
-            if ref in ("libkzsdk", "kzfp"):
+            if ref in ("libkzsdk", "libkzcat", "kzfp"):
                 self.expect_licence(ref, package)
             refs.add(below)
             if places[soname] not in self.seen:
@@ -124,24 +131,27 @@ class List:
 
 def main():
     build = pathlib.Path(sys.argv[1] if len(sys.argv) > 1 else "build/release")
-    library, program = build / "kzsdk/libkzsdk.so", build / "tools/kzfp/kzfp"
-    for file in (library, program):
+    library, catalogue = build / "kzsdk/libkzsdk.so", build / "catalogue/libkzcat.so"
+    program = build / "tools/kzfp/kzfp"
+    for file in (library, catalogue, program):
         if not file.exists():
             sys.exit(f"sbom: {file} is not there; ./run build makes it")
     version = re.search(r"^CMAKE_PROJECT_VERSION:STATIC=(.*)$", (build / "CMakeCache.txt").read_text(),
                         re.MULTILINE).group(1)
+    catalogue_version = re.search(r'define KZCAT_VERSION "(.*)"', (ROOT / "catalogue/kzcat.h").read_text()).group(1)
 
     found = List()
-    for ref, file in (("libkzsdk", library), ("kzfp", program)):
+    for ref, file in (("libkzsdk", library), ("libkzcat", catalogue), ("kzfp", program)):
         found.add_linked(file, ref, places_of(file))
         found.add_included(ref)
-    found.links["kzfp"].add("libkzsdk")  # its static form
+    found.links["kzfp"] |= {"libkzsdk", "libkzcat"}  # their static forms
     document = {
         "bomFormat": "CycloneDX",
         "specVersion": "1.5",
         "version": 1,
         "metadata": {"component": our_own("library", "libkzsdk", version, library)},
-        "components": [our_own("application", "kzfp", version, program)]
+        "components": [our_own("application", "kzfp", version, program),
+                       our_own("library", "libkzcat", catalogue_version, catalogue)]
                       + [found.packages[name] for name in sorted(found.packages)],
         "dependencies": [{"ref": ref, "dependsOn": sorted(found.links[ref] - {ref})}
                          for ref in sorted(found.links)],

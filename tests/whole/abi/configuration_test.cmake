@@ -1,5 +1,5 @@
-# What the libraries export depends on the options, never on what the machine has: without a jni.h, a
-# JDK or SQLite the configuration stops and names its cures.
+# What the libraries export depends on the options, never on what the machine has: without a jni.h,
+# a JDK or SQLite the configuration stops and names its cures.
 #
 #   cmake -D ROOT= -D WORK_DIR= -D C_COMPILER= -D CXX_COMPILER= -D GENERATOR=
 #         -P configuration_test.cmake

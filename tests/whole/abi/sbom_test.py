@@ -30,11 +30,17 @@ class Sbom(unittest.TestCase):
         self.assertEqual(needed(BUILD / "kzsdk/libkzsdk.so"), {"libc.so.6", "libm.so.6"})
         self.assertEqual(self.depends["libkzsdk"], ["deb:libc6"])
 
-    def test_the_program_needs_the_library_and_its_packages(self):
+    def test_the_catalogue_needs_the_library_and_its_packages(self):
+        self.assertEqual(
+            self.depends["libkzcat"],
+            ["deb:libc6", "deb:libgcc-s1", "deb:libnettle8", "deb:libsqlite3-0", "deb:libstdc++6", "libkzsdk"])
+
+    def test_the_program_needs_the_libraries_and_its_packages(self):
         self.assertEqual(
             self.depends["kzfp"],
-            ["deb:libc6", "deb:libcli11-dev", "deb:libgcc-s1", "deb:libsndfile1", "deb:libsoxr0",
-             "deb:libstdc++6", "deb:nlohmann-json3-dev", "libkzsdk"])
+            ["deb:libc6", "deb:libcli11-dev", "deb:libgcc-s1", "deb:libnettle8", "deb:libsndfile1",
+             "deb:libsoxr0", "deb:libsqlite3-0", "deb:libstdc++6", "deb:nlohmann-json3-dev", "libkzcat",
+             "libkzsdk"])
 
     def test_names_nothing_that_is_not_described(self):
         described = {c["bom-ref"] for c in self.list["components"]} | {"libkzsdk"}
@@ -43,7 +49,7 @@ class Sbom(unittest.TestCase):
             self.assertLessEqual(set(below), described)
 
     def test_tells_version_and_origin_of_all_and_the_licence_of_what_we_use(self):
-        ours = set(self.depends["kzfp"] + self.depends["libkzsdk"])
+        ours = set(self.depends["kzfp"] + self.depends["libkzsdk"] + self.depends["libkzcat"])
         for component in self.list["components"]:
             self.assertTrue(component["version"], component)
             self.assertTrue(component["purl"].startswith("pkg:"), component)
@@ -55,7 +61,7 @@ class Sbom(unittest.TestCase):
     def test_stops_at_a_library_without_a_licence_on_record(self):
         with tempfile.TemporaryDirectory() as place:
             build = pathlib.Path(place)
-            for file in ("kzsdk/libkzsdk.so", "tools/kzfp/kzfp"):
+            for file in ("kzsdk/libkzsdk.so", "catalogue/libkzcat.so", "tools/kzfp/kzfp"):
                 (build / file).parent.mkdir(parents=True)
                 (build / file).symlink_to("/bin/bash")  # needs libtinfo
             (build / "CMakeCache.txt").write_text("CMAKE_PROJECT_VERSION:STATIC=1\n")
