@@ -59,7 +59,7 @@ OpenedInput Input::open() { return request_.raw ? open_raw(*request_.raw) : open
 OpenedInput Input::open_sound_file()
 {
     const int file = spool_ ? spool_->number() : file_.number();
-    auto sound_file = std::make_unique<SoundFile>(file, request_.accepts_rate);
+    auto sound_file = std::make_unique<SoundFile>(file, request_.accepts_rate, request_.floats);
     recognised_ = true;
     sound_file->select(request_.section);
     InputFacts facts = {.rate = sound_file->file_rate(),

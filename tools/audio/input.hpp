@@ -18,6 +18,7 @@ struct Request {
     std::optional<StreamFormat> raw; ///< it is headerless and looks like this
     Section section;
     AcceptsRate accepts_rate; ///< of sound files; headerless ones are never converted
+    bool floats = false;      ///< what sound files decode to floats is wanted as floats
 };
 
 /// What can be said about an input before anything is read from it.

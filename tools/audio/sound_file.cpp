@@ -32,7 +32,7 @@ int16_t to_16_bits(float sample)
 
 } // namespace
 
-SoundFile::SoundFile(int file, const AcceptsRate& accepts_rate)
+SoundFile::SoundFile(int file, const AcceptsRate& accepts_rate, bool floats)
 {
     // The object gets a descriptor of its own, which libsndfile closes, also when it cannot open
     // it.
@@ -54,6 +54,8 @@ SoundFile::SoundFile(int file, const AcceptsRate& accepts_rate)
     if (is_companded() && info_.channels <= 2 && accepts_rate(file_rate())) {
         const bool alaw = (info_.format & SF_FORMAT_SUBMASK) == SF_FORMAT_ALAW;
         encoding_ = alaw ? Encoding::alaw : Encoding::ulaw;
+    } else if (floats && is_decoded_to_float() && accepts_rate(file_rate())) {
+        encoding_ = Encoding::f32;
     }
 }
 
@@ -102,7 +104,8 @@ std::vector<Tag> SoundFile::tags() const
 
 StreamFormat SoundFile::format() const
 {
-    return {file_rate(), info_.channels > 2 ? 1 : file_channels(), encoding_};
+    const bool mixed = encoding_ == Encoding::s16 && info_.channels > 2;
+    return {file_rate(), mixed ? 1 : file_channels(), encoding_};
 }
 
 /// True for containers in which companded samples are one byte each, in one piece.
@@ -171,6 +174,8 @@ size_t SoundFile::read(std::span<std::byte> bytes)
     size_t done = 0;
     if (encoding_ == Encoding::s16) {
         done = read_pcm16(wanted);
+    } else if (encoding_ == Encoding::f32) {
+        done = read_floats(wanted);
     } else {
         const auto size = static_cast<sf_count_t>(wanted.size());
         const sf_count_t got = sf_read_raw(file_.get(), wanted.data(), size);
@@ -211,6 +216,24 @@ size_t SoundFile::read_pcm16(std::span<std::byte> bytes)
         if (got == 0) {
             break;
         }
+    }
+    return done;
+}
+
+size_t SoundFile::read_floats(std::span<std::byte> bytes)
+{
+    const size_t frame_bytes = format().frame_bytes();
+    floats_.resize(kBlock * file_channels());
+    size_t done = 0;
+    for (const size_t frames = bytes.size() / frame_bytes; done < frames;) {
+        const auto wanted = static_cast<sf_count_t>(std::min(kBlock, frames - done));
+        const sf_count_t got = sf_readf_float(file_.get(), floats_.data(), wanted);
+        if (got <= 0) {
+            break;
+        }
+        const size_t count = static_cast<size_t>(got);
+        std::memcpy(bytes.data() + done * frame_bytes, floats_.data(), count * frame_bytes);
+        done += count;
     }
     return done;
 }

@@ -15,12 +15,14 @@ namespace audio {
 /// Gives the samples of a sound file in one of these forms:
 /// - A-law and mu-law with one or two channels, at a rate that is accepted: as they are in the
 ///   file;
+/// - what is decoded to floats, where these are wanted and the rate is accepted: floats of all
+///   channels;
 /// - everything else: 16-bit PCM, in which more than two channels are mixed down to one.
 class SoundFile : public Source {
 public:
     /// `file` is a regular file that outlives the object; `accepts_rate` decides whether companded
-    /// samples are given as they are. Throws FileError.
-    SoundFile(int file, const AcceptsRate& accepts_rate);
+    /// samples, and floats, are given as they are. Throws FileError.
+    SoundFile(int file, const AcceptsRate& accepts_rate, bool floats);
 
     /// Goes to the start of a section, beyond whose end read() gives nothing. Before the first
     /// read(). Throws FileError.
@@ -47,6 +49,7 @@ private:
     bool is_decoded_to_float() const;
     void go_to(sf_count_t start);
     size_t read_pcm16(std::span<std::byte> bytes);
+    size_t read_floats(std::span<std::byte> bytes);
     sf_count_t read_samples(sf_count_t frames);
     void mix_down(size_t frames);
 

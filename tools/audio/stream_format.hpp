@@ -9,8 +9,23 @@
 
 namespace audio {
 
-/// How one sample is written.
-enum class Encoding { u8, s16, alaw, ulaw };
+/// How one sample is written; floats have their full scale at 1.
+enum class Encoding { u8, s16, alaw, ulaw, f32 };
+
+constexpr size_t sample_bytes(Encoding encoding)
+{
+    switch (encoding) {
+    case Encoding::f32:
+        return 4;
+    case Encoding::s16:
+        return 2;
+    case Encoding::u8:
+    case Encoding::alaw:
+    case Encoding::ulaw:
+        break;
+    }
+    return 1;
+}
 
 /// How a stream of interleaved samples is to be read.
 struct StreamFormat {
@@ -19,7 +34,7 @@ struct StreamFormat {
     Encoding encoding = Encoding::s16;
 
     /// Bytes of one sample of every channel.
-    size_t frame_bytes() const { return size_t{channels} * (encoding == Encoding::s16 ? 2 : 1); }
+    size_t frame_bytes() const { return size_t{channels} * sample_bytes(encoding); }
 };
 
 /// What a sound file may have at all, hertz.

@@ -51,6 +51,8 @@ uint32_t to_stream_format(audio::Encoding encoding)
         return KZ_STREAM_FORMAT_ALAW;
     case audio::Encoding::ulaw:
         return KZ_STREAM_FORMAT_ULAW;
+    case audio::Encoding::f32:
+        return KZ_STREAM_FORMAT_FLOAT32;
     case audio::Encoding::s16:
         break;
     }

@@ -1,4 +1,4 @@
-// Sound goes to the library at its own rate, in one channel or two.
+// Sound goes to the library at its own rate; floats, which most decoders make, stay floats.
 
 #include "kzfp/catalogue/sound.hpp"
 
@@ -31,6 +31,8 @@ uint32_t to_stream_format(audio::Encoding encoding)
         return KZ_STREAM_FORMAT_ALAW;
     case audio::Encoding::ulaw:
         return KZ_STREAM_FORMAT_ULAW;
+    case audio::Encoding::f32:
+        return KZ_STREAM_FORMAT_FLOAT32;
     case audio::Encoding::s16:
         break;
     }
@@ -70,9 +72,10 @@ std::string damage_text(double seconds, const std::string& trouble)
 /// Feeds a sound file. A pipe is copied to its end first, or as far as the section reaches.
 Fed feed_file(const std::string& path, const audio::Section& section, const Begin& begin)
 {
-    const audio::Request request = {.raw = {}, .section = section, .accepts_rate = [](uint32_t) {
-                                        return true; // the library takes every rate
-                                    }};
+    const audio::Request request = {.raw = {},
+                                    .section = section,
+                                    .accepts_rate = [](uint32_t) { return true; },
+                                    .floats = true};
     audio::Input input(path, request);
     for (;;) {
         try {
