@@ -85,10 +85,10 @@ Snapshot::Snapshot(MappedIndex mapped)
 
 int64_t Snapshot::last_id() const
 {
-    for (auto chunk = chunks_.rbegin(); chunk != chunks_.rend(); ++chunk) {
-        if (!chunk->tracks.empty()) {
-            return chunk->tracks.back().id;
-        }
+    const auto last = std::find_if(chunks_.rbegin(), chunks_.rend(),
+                                   [](const auto& chunk) { return !chunk.tracks.empty(); });
+    if (last != chunks_.rend()) {
+        return last->tracks.back().id;
     }
     return mapped_tracks_.empty() ? 0 : mapped_tracks_.back().id;
 }
