@@ -16,12 +16,20 @@
 namespace kzcat {
 namespace {
 
-constexpr double kCoarseDeviations = 2.0;
-
-/// Codes of the coarse pass at each phase: of the clip as it is, which most clips are, and of other
+/// Codes of the coarse pass at each phase, and what a place has to reach to be looked at, in
+/// deviations above the catalogue's mean: of the clip as it is, which most clips are, and of other
 /// readings, of which there are 18 times as many.
-constexpr size_t kCoarseCodes = 24;
-constexpr size_t kCoarseCodesOfOthers = 10;
+struct Coarseness {
+    size_t codes;
+    double deviations;
+};
+constexpr Coarseness kAsItIs{.codes = 24, .deviations = 2.0};
+constexpr Coarseness kOthers{.codes = 8, .deviations = 2.6};
+
+constexpr Coarseness coarseness_of(const Hypothesis& hypothesis)
+{
+    return hypothesis == Hypothesis{} ? kAsItIs : kOthers;
+}
 
 /// Positions that are scanned at a time, at all phases: their codes stay in the first cache.
 constexpr size_t kBlock = 2048;
@@ -59,13 +67,13 @@ struct CoarsePhase {
 
     CoarsePhase(const Reading& reading, uint32_t number, const Corpus& population)
         : phase(number), sequence(&reading.sequences[number]),
-          coarse(thinned(*sequence,
-                         reading.hypothesis == Hypothesis{} ? kCoarseCodes : kCoarseCodesOfOthers)),
-          whole(*sequence), spread(population_spread(whole, population))
+          coarse(thinned(*sequence, coarseness_of(reading.hypothesis).codes)), whole(*sequence),
+          spread(population_spread(whole, population))
     {
         const Spread thin = population_spread(coarse, population);
         const double bits = coarse.weight();
-        const double least = thin.mean + kCoarseDeviations * thin.deviation;
+        const double least =
+            thin.mean + coarseness_of(reading.hypothesis).deviations * thin.deviation;
         const double most = std::floor((bits - std::sqrt(bits) * least) / 2);
         if (most >= 0 && bits > 0) {
             limit = static_cast<uint32_t>(most);
@@ -149,35 +157,52 @@ private:
             const auto probes = phase.coarse.probes();
             const size_t found = scan_kernels().near(codes, positions, probes.data(), probes.size(),
                                                      *phase.limit, near_.data());
-            for (size_t i = 0; i < found; ++i) {
-                look_at(phase, first + near_[i]);
-            }
+            look_at(phase, first, std::span(near_).first(found));
         }
     }
 
-    /// Scores the whole sequence at a position of the segment, on the tracks that it lies on.
-    void look_at(const CoarsePhase& phase, int64_t at)
+    /// Scores the whole sequence at positions of the segment, which rise, on the tracks that they
+    /// lie on.
+    void look_at(const CoarsePhase& phase, int64_t first, std::span<const uint32_t> positions)
     {
-        const auto end = at + static_cast<int64_t>(phase.whole.length());
         const auto tracks = segment_.tracks;
         const auto ends_before = [](const TrackSpan& track, int64_t place) {
             return static_cast<int64_t>(track.first + track.count) <= place;
         };
-        auto track = std::lower_bound(tracks.begin(), tracks.end(), at, ends_before);
-        for (; track != tracks.end() && static_cast<int64_t>(track->first) < end; ++track) {
-            take(phase, static_cast<size_t>(track - tracks.begin()),
-                 at - static_cast<int64_t>(track->first));
+        auto begin = std::lower_bound(tracks.begin(), tracks.end(), first, ends_before);
+        for (const uint32_t position : positions) {
+            const int64_t at = first + position;
+            const int64_t end = at + static_cast<int64_t>(phase.whole.length());
+            while (begin != tracks.end() && ends_before(*begin, at)) {
+                ++begin;
+            }
+            for (auto track = begin;
+                 track != tracks.end() && static_cast<int64_t>(track->first) < end; ++track) {
+                take(phase, static_cast<size_t>(track - tracks.begin()),
+                     at - static_cast<int64_t>(track->first));
+            }
         }
     }
 
     void take(const CoarsePhase& phase, size_t number, int64_t position)
     {
         const auto codes = segment_.of(segment_.tracks[number]);
-        const auto agreed = agreement_at(phase.whole, *phase.sequence, codes, position);
-        if (!agreed) {
-            return;
+        const size_t length = phase.whole.length();
+        double deviations = 0;
+        if (position >= 0 && static_cast<size_t>(position) + length <= codes.size() &&
+            length >= kFewestCodes) {
+            const uint32_t distance =
+                scan_kernels().distance(codes.data() + position, phase.sequence->codes.data(),
+                                        phase.sequence->masks.data(), length);
+            deviations = (agreement(phase.whole.weight(), distance) - phase.spread.mean) /
+                         phase.spread.deviation;
+        } else {
+            const auto agreed = agreement_at(phase.whole, *phase.sequence, codes, position);
+            if (!agreed) {
+                return;
+            }
+            deviations = (*agreed - phase.spread.mean) / phase.spread.deviation;
         }
-        const double deviations = (*agreed - phase.spread.mean) / phase.spread.deviation;
         BestPlace& best = best_[number];
         if (!best.found || deviations > best.deviations) {
             best = {.deviations = deviations,

@@ -55,8 +55,9 @@ size_t near(const Code* codes, size_t positions, const Probe* probes, size_t cou
             sum = Avx512::none();
         }
         for (size_t i = 0; i < count; ++i) {
-            const __m512i code = Avx512::set(probes[i].code);
-            const __m512i mask = Avx512::set(probes[i].mask);
+            __m512i code = Avx512::set(probes[i].code);
+            __m512i mask = Avx512::set(probes[i].mask);
+            __asm__("" : "+v"(code), "+v"(mask)); // or the mask is loaded anew for each vector
             const Code* at = codes + p + probes[i].offset;
             for (size_t v = 0; v < 8; ++v) {
                 Avx512::count(sums[v], Avx512::load(at + v * Avx512::kLanes), code, mask);
