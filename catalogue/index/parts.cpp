@@ -15,10 +15,10 @@ template <class Visit>
 void for_each_value(std::span<const Code> codes, uint32_t part, Visit visit)
 {
     std::array<uint32_t, kUnitCodes> seen{};
-    auto end = seen.begin();
+    auto* end = seen.data();
     for (const Code code : codes) {
         const uint32_t value = part_of(code, part);
-        if (code != 0 && std::find(seen.begin(), end, value) == end) {
+        if (code != 0 && std::find(seen.data(), end, value) == end) {
             *end++ = value;
             visit(value);
         }
@@ -89,7 +89,9 @@ const char* fault_of(const PartTable& table)
 
 BuiltTable build_table(const Corpus& corpus, uint32_t part)
 {
-    auto [last, next] = count_words(corpus, part);
+    ListEnds ends = count_words(corpus, part);
+    auto& last = ends.last;
+    auto& next = ends.words;
     BuiltTable table;
     table.starts.resize(size_t{4} * (kPartValues + 1));
     for (size_t value = 0; value <= kPartValues; ++value) {

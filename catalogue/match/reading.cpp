@@ -24,6 +24,19 @@ constexpr size_t kLongestLag = 3 * kStepsPerTrailHop;
 
 using Row = std::array<float, kPairs>;
 
+/// The energies of a frame, each with a small share of the whole added to it. Bands that hold less
+/// than that, such as those beside a sine, then do not change, and their bits are masked.
+void lift(std::span<const float> frame, std::span<float, kFineBands> lifted)
+{
+    float sum = 0;
+    for (const float energy : frame) {
+        sum += energy;
+    }
+    for (size_t i = 0; i < kFineBands; ++i) {
+        lifted[i] = frame[i] + sum * kBandFloor;
+    }
+}
+
 /// The differences at every point of the grid.
 std::vector<Row> on_grid(std::span<const float> differences, double stretch)
 {
@@ -148,8 +161,10 @@ const QueryReader::Differences& QueryReader::differences(int pitch_steps)
     Differences& made = by_pitch_[static_cast<size_t>(kMaxPitchSteps + pitch_steps)];
     if (made.empty()) {
         made.resize(window_.count * kPairs);
+        std::array<float, kFineBands> lifted;
         for (size_t i = 0; i < window_.count; ++i) {
-            pair_differences(bands_.frame(window_.first + i), pitch_steps,
+            lift(bands_.frame(window_.first + i), lifted);
+            pair_differences(lifted, pitch_steps,
                              std::span<float, kPairs>(made.data() + i * kPairs, kPairs));
         }
     }

@@ -262,7 +262,8 @@ TrackScore ReadingScorer::score_phase(const Phase& phase, std::span<const Code> 
     result.in_track =
         in_track(places, phase.sequence.weight(), best, phase.spread, result.in_catalogue);
     result.score =
-        std::max(std::min(result.in_catalogue, result.in_track), kLoopShare * result.in_catalogue);
+        std::max(std::min(result.in_catalogue, result.in_track),
+                 std::min(kLoopShare * result.in_catalogue, kMostOverOwn * result.in_track));
     return result;
 }
 

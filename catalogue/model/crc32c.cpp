@@ -27,13 +27,16 @@ constexpr uint32_t remainder(uint32_t byte)
     return byte;
 }
 
-constexpr auto kRemainders = [] {
+constexpr std::array<uint32_t, 256> remainders()
+{
     std::array<uint32_t, 256> table{};
     for (uint32_t byte = 0; byte < table.size(); ++byte) {
         table[byte] = remainder(byte);
     }
     return table;
-}();
+}
+
+constexpr auto kRemainders = remainders();
 
 uint32_t add_bytes(uint32_t sum, std::span<const std::byte> bytes)
 {

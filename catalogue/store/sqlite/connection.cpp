@@ -119,6 +119,7 @@ Connection::Connection(const std::string& path, const OpenOptions& options)
     : path_(path), patience_(options.patience)
 {
     sqlite3* database = nullptr;
+    errno = 0;
     const int flags = options.flags | SQLITE_OPEN_URI | SQLITE_OPEN_NOMUTEX | SQLITE_OPEN_EXRESCODE;
     const int code =
         sqlite3_open_v2(to_uri(path, options.immutable).c_str(), &database, flags, options.vfs);
@@ -144,15 +145,18 @@ void Connection::roll_back() noexcept
 
 void Connection::execute(const char* sql)
 {
+    errno = 0;
     check(sqlite3_exec(handle(), sql, nullptr, nullptr, nullptr));
 }
 
+// SQLite does not note why the system refused what a COMMIT asked for, but leaves errno alone.
 void Connection::fail(int code) const
 {
+    const int system_error = errno != 0 ? errno : sqlite3_system_errno(handle());
     if (code == SQLITE_NOMEM || code == SQLITE_IOERR_NOMEM) {
         throw std::bad_alloc();
     }
-    throw describe(code, sqlite3_system_errno(handle()), path_, patience_, sqlite3_errstr(code));
+    throw describe(code, system_error, path_, patience_, sqlite3_errstr(code));
 }
 
 Statement::Statement(Connection& connection, const char* sql, Prepare) : connection_(connection)
@@ -160,6 +164,7 @@ Statement::Statement(Connection& connection, const char* sql, Prepare) : connect
     Connection::Compiled& compiled = connection.compiled_[sql];
     const bool is_first = compiled.statement == nullptr;
     if (is_first || compiled.in_use) {
+        errno = 0;
         sqlite3_stmt* statement = nullptr;
         connection.check(sqlite3_prepare_v3(connection.handle(), sql, -1,
                                             is_first ? SQLITE_PREPARE_PERSISTENT : 0, &statement,
@@ -184,6 +189,7 @@ Statement::~Statement()
 
 bool Statement::step()
 {
+    errno = 0;
     const int code = sqlite3_step(statement_);
     if (connection_.guard_) {
         connection_.guard_();

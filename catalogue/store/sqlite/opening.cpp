@@ -193,6 +193,7 @@ void switch_to_log(Connection& connection)
 {
     const auto end = std::chrono::steady_clock::now() + connection.patience();
     while (true) {
+        errno = 0;
         const int code = sqlite3_exec(connection.handle(), "PRAGMA journal_mode = WAL", nullptr,
                                       nullptr, nullptr);
         if ((code & 0xff) != SQLITE_BUSY || std::chrono::steady_clock::now() > end) {
