@@ -16,5 +16,6 @@ std::vector<Case> converter_cases();
 std::vector<Case> detector_cases();
 std::vector<Case> document_cases();
 std::vector<Case> trail_cases();
+std::vector<Case> lookup_document_cases();
 
 } // namespace kz::bench

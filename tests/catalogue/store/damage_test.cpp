@@ -54,7 +54,7 @@ protected:
 
 enum class Outcome { refused, reported, meaningless };
 
-/// What becomes of a file with one byte changed: `meaningless` when nothing of what is read differs.
+/// What becomes of a file with one byte changed; `meaningless`: what is read does not differ.
 Outcome examine(const std::string& path, const std::string& wanted, const std::string& where)
 {
     try {
