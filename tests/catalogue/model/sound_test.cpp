@@ -1,9 +1,11 @@
 // Sound of every encoding, rate and number of channels.
 
+#include <algorithm>
 #include <array>
 #include <cmath>
 #include <cstring>
 #include <limits>
+#include <span>
 #include <stdexcept>
 #include <string>
 #include <vector>
@@ -11,6 +13,7 @@
 #include <gtest/gtest.h>
 
 #include "catalogue/model/extractor.hpp"
+#include "catalogue/model/sound_reader.hpp"
 #include "extracted.hpp"
 #include "kzsdk/dsp/convert.h"
 #include "kzsdk/stream/stream.h"
@@ -242,6 +245,56 @@ std::string refusal(const SoundFormat& format)
         return error.what();
     }
     return "";
+}
+
+double clipped(double sample)
+{
+    constexpr double kLimit = 16.0 * 32768;
+    return std::isnan(sample) ? 0 : std::clamp(sample * 32768, -kLimit, kLimit);
+}
+
+std::vector<float> odd_floats(size_t count)
+{
+    const float infinity = std::numeric_limits<float>::infinity();
+    const std::array odd = {std::numeric_limits<float>::quiet_NaN(),
+                            infinity,
+                            -infinity,
+                            std::numeric_limits<float>::denorm_min(),
+                            std::numeric_limits<float>::max(),
+                            -0.0F,
+                            15.999999F,
+                            -16.000002F};
+    kz::test::Random random(5);
+    std::vector<float> samples(count);
+    for (float& sample : samples) {
+        sample = random.below(4) == 0
+                     ? odd.at(random.below(odd.size()))
+                     : static_cast<float>(std::ldexp(random.unit(), -int(random.below(40))));
+    }
+    return samples;
+}
+
+// Single precision serves one channel and two to the bit.
+TEST(Sound, OfFloatsIsSummedInDoublesAndRoundedOnce)
+{
+    constexpr size_t kFrames = 5000;
+    for (const uint32_t channels : {1U, 2U, 3U}) {
+        const std::vector<float> samples = odd_floats(channels * kFrames);
+        kzcat::SoundReader reader({KZ_STREAM_FORMAT_FLOAT32, 44100, channels});
+        auto bytes = std::as_bytes(std::span(samples));
+        size_t frame = 0;
+        while (!bytes.empty()) {
+            for (const float sum : reader.read(bytes)) {
+                double expected = 0;
+                for (uint32_t c = 0; c < channels; ++c) {
+                    expected += clipped(samples[frame * channels + c]);
+                }
+                ASSERT_EQ(static_cast<float>(expected), sum) << channels << ' ' << frame;
+                ++frame;
+            }
+        }
+        EXPECT_EQ(kFrames, frame);
+    }
 }
 
 TEST(Sound, OfAnUnknownFormatIsRefused)
