@@ -110,7 +110,9 @@ def trails():
         for rate in (0, 2, 7, 10, 12):
             seed = Seed().number(form, 1, 9).number(rate, 0, 13).number(1 + form % 3, 1, 4)
             seed.number(0, 0, 7).number(0, 0, 31).number(0, 0, 63).number(1001, 1, 10000)
-            yield seed.number(200000, 0, 200000).number(form, 0, 65535).flag(True).all()
+            size = 30000 if rate else 160000
+            seed.number(0 if rate else 15, 0, 15).number(size, 0, size)
+            yield seed.number(form, 0, 65535).flag(True).all()
 
 
 def kzfp_files():

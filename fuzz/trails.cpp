@@ -19,7 +19,9 @@ using Bytes = std::vector<std::byte>;
 
 constexpr uint32_t kRates[] = {8000,  11025, 12000, 16000, 22050, 24000,  32000,
                                44056, 44100, 48000, 96000, 99999, 176400, 192000};
-constexpr size_t kSeconds = 20; ///< at a rate of 1 Hz a few KB would last for hours
+constexpr size_t kLongest = 200000; ///< bytes of sound
+constexpr size_t kUsual = 30000;    ///< so that most runs are short
+constexpr size_t kSeconds = 20;     ///< at a rate of 1 Hz a few KB would last for hours
 
 SoundFormat choose_format(Choices& choices)
 {
@@ -41,7 +43,8 @@ SoundFormat choose_format(Choices& choices)
 /// Noise, and bytes of the fuzzer's over and over.
 Bytes choose_sound(Choices& choices, const SoundFormat& format)
 {
-    const uint64_t longest = std::min<uint64_t>(200000, uint64_t{format.rate} * kSeconds);
+    const size_t most = one_in(choices, 16) ? kLongest : kUsual;
+    const uint64_t longest = std::min<uint64_t>(most, uint64_t{format.rate} * kSeconds);
     Bytes sound(choices.ConsumeIntegralInRange<size_t>(0, static_cast<size_t>(longest)));
     test::Random random(choices.ConsumeIntegral<uint16_t>());
     const bool noisy = choices.ConsumeBool();

@@ -30,7 +30,7 @@ using kzcat::kFineBands;
 using kzcat::kFrameLength;
 using kzcat::kPairs;
 
-constexpr size_t kWidth = 8;
+inline constexpr size_t kWidth = 8;
 
 template <class V>
 kzcat::Extremes vector_extremes(const float* frame)

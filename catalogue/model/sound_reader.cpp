@@ -166,8 +166,6 @@ void require(bool holds, const std::string& sentence)
     }
 }
 
-} // namespace
-
 void require_usable(const SoundFormat& format)
 {
     require(bytes_per_sample(format.encoding) != 0,
@@ -182,8 +180,16 @@ void require_usable(const SoundFormat& format)
                 std::to_string(KZ_STREAM_MAX_CHANNELS) + ".");
 }
 
+const SoundFormat& usable(const SoundFormat& format)
+{
+    require_usable(format);
+    return format;
+}
+
+} // namespace
+
 SoundReader::SoundReader(const SoundFormat& format)
-    : format_(format), frame_bytes_(bytes_per_sample(format.encoding) * format.channels),
+    : format_(usable(format)), frame_bytes_(bytes_per_sample(format.encoding) * format.channels),
       block_frames_(std::clamp<size_t>(kBlockBytes / frame_bytes_, 1, format.rate)),
       sums_(block_frames_)
 {

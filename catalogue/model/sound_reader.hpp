@@ -11,15 +11,12 @@
 
 namespace kzcat {
 
-/// Throws std::invalid_argument with a sentence when sound of this format cannot be read.
-void require_usable(const SoundFormat& format);
-
 /// Adds up the channels of a stream of bytes that may be cut anywhere. Full scale of one channel is
 /// 32768. Floats beyond 16 times full scale are clipped there, and those that are no numbers are
 /// silence. Both 8-bit encodings are read as samples that are silent at 128.
 class SoundReader {
 public:
-    /// `format` is usable.
+    /// Throws std::invalid_argument with a sentence when the format cannot be used.
     explicit SoundReader(const SoundFormat& format);
 
     /// Reads whole frames from the front of `bytes`, up to a block of them and no more than

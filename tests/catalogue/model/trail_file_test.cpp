@@ -118,6 +118,13 @@ TEST(TrailFile, IsRefusedWithASentence)
     damaged[13] ^= std::byte{1};
     EXPECT_EQ("The header of the trail file is damaged; make the file again.", refusal(damaged));
     damaged = whole;
+    damaged[8] ^= std::byte{2};
+    EXPECT_EQ("The header of the trail file is damaged; make the file again.", refusal(damaged));
+    Bytes longer = whole;
+    longer.resize(whole.size() + 3);
+    EXPECT_EQ("The trail file has 27 bytes of codes instead of 8 times 3; make it again.",
+              refusal(longer));
+    damaged = whole;
     damaged[64] ^= std::byte{1};
     EXPECT_EQ("The codes of the trail file are damaged; make the file again.", refusal(damaged));
     EXPECT_EQ("The trail file is of version 2, which takes a newer program; this one reads "
