@@ -321,7 +321,7 @@ Opened open_stand_in(const std::string& path, const SqliteOptions& options)
 // Tables of others may lie in the file too; only what acts on ours must be ours.
 std::vector<std::string> schema_faults(Connection& connection)
 {
-    const std::set<Object> wanted = read_schema(*make_in_memory(connection.path(), {}));
+    static const std::set<Object> wanted = read_schema(*make_in_memory("the schema", {}));
     const std::set<Object> found = read_schema(connection);
     std::set<std::string> tables;
     std::vector<std::string> faults;

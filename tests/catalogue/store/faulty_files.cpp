@@ -111,6 +111,13 @@ void remember(sqlite3_file* file, int64_t offset, int64_t count)
     state.undo[own(file)->path].push_back(undo);
 }
 
+void forget(const char* path)
+{
+    if (state.fault == FileFault::power_cut && path != nullptr) {
+        state.undo.erase(path);
+    }
+}
+
 int write(sqlite3_file* file, const void* bytes, int count, sqlite3_int64 offset)
 {
     const auto pass_on = [&](int some) {
@@ -151,9 +158,7 @@ int sync(sqlite3_file* file, int)
         }
         return SQLITE_IOERR_FSYNC;
     }
-    if (own(file)->path != nullptr) {
-        state.undo.erase(own(file)->path);
-    }
+    forget(own(file)->path);
     return SQLITE_OK;
 }
 
@@ -165,7 +170,7 @@ int remove(sqlite3_vfs*, const char* path, int sync_folder)
         }
         return SQLITE_IOERR_DELETE;
     }
-    state.undo.erase(path);
+    forget(path);
     return usual()->xDelete(usual(), path, sync_folder);
 }
 
