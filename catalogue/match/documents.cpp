@@ -23,8 +23,10 @@ double power_of_growth(double x)
     return power;
 }
 
-// Measured with 201 tracks: of 25,452 documents of other music 10 came nearer than this.
-constexpr double kLargestDistance = 60;
+// Measured with 201 tracks: of 25,452 documents of other music 27 came nearer than this, most of them
+// to a track of the same maker. 60 would leave 10 of these, and lose a tenth of the clips that went
+// through a telephone codec or a room.
+constexpr double kLargestDistance = 65;
 constexpr double kMeasuredRows = 60000;
 
 // How near the nearest row of a track must be, as a share of the distance of its middle row, and the

@@ -77,8 +77,10 @@ TEST(Document, TheAlgorithmMayBeMissing)
 
 TEST(Document, AnotherAlgorithmIsRefused)
 {
-    EXPECT_TRUE(holds(fault_of(replaced(example(), ">Quenvar<", ">Other<")), "another algorithm"));
-    EXPECT_TRUE(holds(fault_of(replaced(example(), ">1.1<", ">1.2<")), "another algorithm"));
+    EXPECT_TRUE(holds(fault_of(replaced(example(), ">Quenvar<", ">Other<")),
+                      "another algorithm than Quenvar 1.1"));
+    EXPECT_TRUE(holds(fault_of(replaced(example(), ">1.1<", ">1.2<")),
+                      "another algorithm than Quenvar 1.1"));
 }
 
 TEST(Document, AnyOtherFormIsRefused)
@@ -129,7 +131,12 @@ TEST(Document, ValuesFromElsewhereAreChecked)
     values[3] = -32768;
     EXPECT_EQ(-32768, kzcat::checked_values(values)[3]);
     values[3] = -1;
-    EXPECT_THROW(kzcat::checked_values(values), DocumentError);
+    try {
+        kzcat::checked_values(values);
+        ADD_FAILURE() << "-1 is no share";
+    } catch (const DocumentError& error) {
+        EXPECT_STREQ("the value -1 is no share: 0 to 32767, or -32768 for the whole", error.what());
+    }
     values[3] = 0;
     values.push_back(0);
     EXPECT_THROW(kzcat::checked_values(values), DocumentError);
