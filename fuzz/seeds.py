@@ -11,7 +11,7 @@ import sys
 
 TARGETS = (
     "extraction stream tags paths render exchange resampler_fixed resampler_float converters dyn_buf "
-    "disc_names disc_files documents trail_file trails kzfp_options kzfp_files"
+    "disc_names disc_files documents trail_file trails index_file kzfp_options kzfp_files"
 ).split()
 
 
@@ -113,6 +113,17 @@ def trails():
             size = 30000 if rate else 160000
             seed.number(0 if rate else 15, 0, 15).number(size, 0, size)
             yield seed.number(form, 0, 65535).flag(True).all()
+
+
+def index_file():
+    """A file as it is, and with a field of each section changed."""
+    for larger in (True, False):
+        yield Seed().flag(larger).number(0, 0, 8).number(0, 0, 7).number(0, 0, 7).flag(False).all()
+        for section in range(10):
+            for at_end in (True, False):
+                seed = Seed().flag(larger).number(1, 0, 8).flag(False).number(section, 0, 9)
+                seed.number(16 if at_end else 8, 0, 1 << 20).flag(at_end).text(b"\x01\xff\xff\xff")
+                yield seed.number(0, 0, 7).number(0, 0, 7).flag(True).all()
 
 
 def kzfp_files():

@@ -206,14 +206,13 @@ public:
 
     void begin()
     {
-        ++current_;
         pad(aligned(end_));
-        sections_[current_].offset = end_;
+        sections_[begun_++].offset = end_;
     }
 
     void put(std::span<const std::byte> bytes)
     {
-        auto& section = sections_[current_];
+        auto& section = sections_[begun_ - 1];
         section.checksum = crc32c(bytes, section.checksum);
         section.bytes += bytes.size();
         end_ += bytes.size();
@@ -233,7 +232,7 @@ private:
 
     FileReplacement& file_;
     Sections sections_;
-    size_t current_ = SIZE_MAX; ///< before the first
+    size_t begun_ = 0;
     uint64_t end_ = 0;
 };
 

@@ -15,10 +15,10 @@ template <class Visit>
 void for_each_value(std::span<const Code> codes, uint32_t part, Visit visit)
 {
     std::array<uint32_t, kUnitCodes> seen{};
-    auto* end = seen.data();
+    auto end = seen.begin();
     for (const Code code : codes) {
         const uint32_t value = part_of(code, part);
-        if (code != 0 && std::find(seen.data(), end, value) == end) {
+        if (code != 0 && std::find(seen.begin(), end, value) == end) {
             *end++ = value;
             visit(value);
         }
@@ -90,8 +90,7 @@ const char* fault_of(const PartTable& table)
 BuiltTable build_table(const Corpus& corpus, uint32_t part)
 {
     ListEnds ends = count_words(corpus, part);
-    auto& last = ends.last;
-    auto& next = ends.words;
+    std::vector<uint32_t>& next = ends.words; // where the next word of each list goes
     BuiltTable table;
     table.starts.resize(size_t{4} * (kPartValues + 1));
     for (size_t value = 0; value <= kPartValues; ++value) {
@@ -99,14 +98,14 @@ BuiltTable build_table(const Corpus& corpus, uint32_t part)
         put_little_endian(next[value], table.starts.data() + 4 * value);
     }
     table.words.resize(size_t{2} * next[kPartValues]);
-    std::fill(last.begin(), last.end(), 0U);
+    std::fill(ends.last.begin(), ends.last.end(), 0U);
     for_each_occurrence(corpus, part, [&](uint32_t unit, uint32_t value) {
-        uint32_t distance = unit - last[value];
+        uint32_t distance = unit - ends.last[value];
         for (; distance >= kFarther; distance -= kFarther) {
             put_word(table.words, next[value]++, kFarther);
         }
         put_word(table.words, next[value]++, static_cast<uint16_t>(distance));
-        last[value] = unit;
+        ends.last[value] = unit;
     });
     return table;
 }

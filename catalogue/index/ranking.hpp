@@ -18,10 +18,11 @@ struct RankedPlace {
     double agreement = 0;
 };
 
-/// A reading made ready for looking at single places.
+/// A reading made ready for looking at single places. The reading has to outlive it.
 class Ranking {
 public:
     explicit Ranking(const Reading& reading);
+    explicit Ranking(Reading&& reading) = delete;
 
     /// Codes of the longest sequence.
     size_t length() const { return length_; }
