@@ -182,7 +182,7 @@ kzcat_status kzcat_merge(kzcat_catalogue* catalogue, kzcat_catalogue* other,
                          kzcat_progress progress, void* context, kzcat_merged* out_merged) noexcept
 {
     return guarded([=] {
-        kzcat_merged ignored;
+        kzcat_merged ignored = {};
         kzcat_merged& record = out_merged != nullptr ? *out_merged : ignored;
         record = {};
         require(catalogue != nullptr && other != nullptr,
