@@ -1,5 +1,5 @@
-// Trail files: any bytes, and files whose fields are changed under checksums that are right. What is
-// read is written as the very same bytes; everything else is refused with a sentence.
+// Trail files: any bytes, and files whose fields are changed under checksums that are right. What
+// is read is written as the very same bytes; everything else is refused with a sentence.
 
 #include <algorithm>
 

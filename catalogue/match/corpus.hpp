@@ -2,6 +2,7 @@
 /// The codes that a query is compared with, wherever they lie.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <span>
 #include <vector>
@@ -25,7 +26,7 @@ struct Segment {
 
     std::span<const Code> of(const TrackSpan& track) const
     {
-        return codes.subspan(track.first, track.count);
+        return codes.subspan(static_cast<size_t>(track.first), static_cast<size_t>(track.count));
     }
 };
 

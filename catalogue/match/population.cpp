@@ -49,7 +49,8 @@ struct TrackList {
         const auto track = static_cast<size_t>(next - before.begin()) - 1;
         const uint64_t count = tracks[track].size();
         const uint64_t length = std::min(count, kRunLength);
-        return tracks[track].subspan(std::min(code - before[track], count - length), length);
+        const uint64_t begin = std::min(code - before[track], count - length);
+        return tracks[track].subspan(static_cast<size_t>(begin), static_cast<size_t>(length));
     }
 };
 

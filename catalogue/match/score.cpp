@@ -207,7 +207,7 @@ Spread population_spread(const ScanSequence& sequence, const Corpus& population)
             if (run.count < sequence.length()) {
                 continue;
             }
-            distances.resize(run.count - sequence.length() + 1);
+            distances.resize(static_cast<size_t>(run.count - sequence.length() + 1));
             scan_kernels().distances(segment.of(run).data(), distances.size(),
                                      sequence.probes().data(), sequence.probes().size(),
                                      distances.data());
