@@ -325,7 +325,7 @@ KZ_API kzcat_status kzcat_builder_free(kzcat_builder** builder_ref) KZ_NOEXCEPT;
 
 /** What is known of a trail. */
 typedef struct kzcat_trail_facts {
-    uint64_t samples;           /**< of the recording, at sample_rate */
+    uint64_t samples;           /**< of the recording, at sample_rate, to within 2 ms */
     uint64_t code_count;        /**< one code for every 2048 samples */
     uint32_t sample_rate;       /**< 11025 */
     uint32_t profile;           /**< names the features; only equal profiles can be compared */

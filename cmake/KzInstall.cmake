@@ -71,6 +71,8 @@ if(KZ_BUILD_KZCAT)
   kz_install_package(kzcat ${KZCAT_VERSION} kzcatTargets kzcatStaticTargets)
   configure_file("${PROJECT_SOURCE_DIR}/packaging/kzcat.pc.in" "${PROJECT_BINARY_DIR}/kzcat.pc" @ONLY)
   install(FILES "${PROJECT_BINARY_DIR}/kzcat.pc" DESTINATION "${pkgconfig_dir}")
+  install(FILES "${PROJECT_SOURCE_DIR}/examples/recognise.c"
+          DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples")
   install(FILES "${PROJECT_SOURCE_DIR}/examples/recognise.c" DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples")
 endif()
 
