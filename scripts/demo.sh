@@ -1,7 +1,7 @@
 #!/bin/sh
 # Shows what a fingerprint is good for: prints the query document of half a minute of music, then
-# how far other encodings of that tune lie from it, and another tune. The music is downloaded on
-# first use.
+# how far other encodings of that tune lie from it, and another tune; and recognises a clip out of
+# its middle. The music is downloaded on first use.
 #
 #   scripts/demo.sh KZFP    where KZFP is the program, for example build/release/tools/kzfp/kzfp
 #
@@ -47,6 +47,7 @@ provide_sound() {
     make tune.mp3 -C 64 part-tune.mp3
     make quiet.wav part-quiet.wav gain -20
     make telephone.wav -r 8000 -c 1 -e a-law part-telephone.wav
+    make clip.wav -r 8000 -c 1 -e u-law part-clip.wav trim 11 10 speed 1.03
 }
 
 # row FILE TEXT: one line of the table.
@@ -71,3 +72,8 @@ row "$made/tune.mp3" "the same tune as MP3, 64 kbit/s"
 row "$made/quiet.wav" "the same tune, 20 dB quieter"
 row "$made/telephone.wav" "the same tune at 8000 Hz in A-law"
 row "$title" "another tune, the title of Holotz's Castle"
+echo
+echo "Which tune, and where in it, are 10 seconds from 0:11 on, over a telephone and 3 % faster?"
+echo
+"$kzfp" add "$made/music.kzc" "$music" "$title" >&2
+"$kzfp" match "$made/music.kzc" "$made/clip.wav"
