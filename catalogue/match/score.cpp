@@ -139,17 +139,53 @@ OwnSpread own_spread(const Places& places, uint32_t weight)
     return {.median = quantile(50), .half_width = (quantile(84) - quantile(16)) / 2};
 }
 
-double in_track(const Places& places, uint32_t weight, double best, const Spread& spread,
-                double in_catalogue)
+/// The agreement of a part of a track with the sequence turned in a circle, at every turn but none:
+/// what stands in for other places of a track that has too few.
+std::vector<double> turned_agreements(const Sequence& sequence, std::span<const Code> track,
+                                      int64_t position)
 {
-    if (places.end_whole() - places.first_whole() <= kOwnPlaces) {
-        return in_catalogue;
+    const auto length = static_cast<int64_t>(sequence.codes.size());
+    const int64_t begin = std::max<int64_t>(-position, 0);
+    const int64_t end = std::min(static_cast<int64_t>(track.size()) - position, length);
+    std::vector<double> agreements;
+    for (int64_t turn = 1; turn < length; ++turn) {
+        uint32_t weight = 0;
+        uint32_t distance = 0;
+        for (int64_t j = begin; j < end; ++j) {
+            const auto turned = static_cast<size_t>((j + turn) % length);
+            const Code mask = sequence.masks[turned];
+            const Code differing =
+                sequence.codes[turned] ^ track[static_cast<size_t>(position + j)];
+            weight += static_cast<uint32_t>(std::popcount(mask));
+            distance += static_cast<uint32_t>(std::popcount(differing & mask));
+        }
+        agreements.push_back(agreement(weight, distance));
     }
+    std::sort(agreements.begin(), agreements.end());
+    return agreements;
+}
+
+/// The median and half the width of the middle 68 %, as agreement.
+struct Own {
+    double median;
+    double half_width;
+};
+
+Own own_of_places(const Places& places, uint32_t weight)
+{
     const OwnSpread own = own_spread(places, weight);
     const double root = std::sqrt(static_cast<double>(weight));
-    const double median = (static_cast<double>(weight) - 2 * own.median) / root;
-    const double width = std::max(2 * own.half_width / root, kLeastOwnSpread * spread.deviation);
-    return (best - median) / width;
+    return {.median = (static_cast<double>(weight) - 2 * own.median) / root,
+            .half_width = 2 * own.half_width / root};
+}
+
+Own own_of_turns(const Sequence& sequence, std::span<const Code> track, int64_t position)
+{
+    const std::vector<double> turns = turned_agreements(sequence, track, position);
+    const auto quantile = [&turns](size_t percent) {
+        return turns[(turns.size() - 1) * percent / 100];
+    };
+    return {.median = quantile(50), .half_width = (quantile(84) - quantile(16)) / 2};
 }
 
 } // namespace
@@ -233,14 +269,13 @@ ReadingScorer::ReadingScorer(const Reading& reading, const Corpus& population)
     for (const Sequence& sequence : reading.sequences) {
         ScanSequence ready(sequence);
         const Spread spread = population_spread(ready, population);
-        phases_.push_back(
-            {.sequence = std::move(ready), .spread = spread, .start = sequence.start});
+        phases_.push_back({.sequence = &sequence, .ready = std::move(ready), .spread = spread});
     }
 }
 
 TrackScore ReadingScorer::score_phase(const Phase& phase, std::span<const Code> track, Range range)
 {
-    const Places places(phase.sequence, track);
+    const Places places(phase.ready, track);
     TrackScore result;
     if (places.size() == 0 || range.last < places.position(0) ||
         range.first > places.position(places.size() - 1)) {
@@ -259,8 +294,11 @@ TrackScore ReadingScorer::score_phase(const Phase& phase, std::span<const Code> 
     result.found = true;
     result.position = places.position(place);
     result.in_catalogue = (best - phase.spread.mean) / phase.spread.deviation;
+    const bool many = places.end_whole() - places.first_whole() > kOwnPlaces;
+    const Own own = many ? own_of_places(places, phase.ready.weight())
+                         : own_of_turns(*phase.sequence, track, result.position);
     result.in_track =
-        in_track(places, phase.sequence.weight(), best, phase.spread, result.in_catalogue);
+        (best - own.median) / std::max(own.half_width, kLeastOwnSpread * phase.spread.deviation);
     result.score =
         std::max(std::min(result.in_catalogue, result.in_track),
                  std::min(kLoopShare * result.in_catalogue, kMostOverOwn * result.in_track));
@@ -273,7 +311,7 @@ TrackScore ReadingScorer::best_of(std::span<const Code> track, double beginning,
     TrackScore best;
     for (uint32_t phase = 0; phase < phases_.size(); ++phase) {
         const auto expected = static_cast<int64_t>(
-            std::floor((beginning + phases_[phase].start) / kCodeSeconds + 0.5));
+            std::floor((beginning + phases_[phase].sequence->start) / kCodeSeconds + 0.5));
         TrackScore here = score_phase(phases_[phase], track,
                                       {.first = expected - around, .last = expected + around});
         here.phase = phase;

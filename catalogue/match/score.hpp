@@ -67,6 +67,7 @@ struct TrackScore {
 /// A reading with what is needed to score it on any track of a catalogue.
 class ReadingScorer {
 public:
+    /// The reading has to outlive the scorer.
     ReadingScorer(const Reading& reading, const Corpus& population);
 
     /// Depends on nothing but the reading, the population and the track's codes: the same to the
@@ -79,9 +80,9 @@ public:
 
 private:
     struct Phase {
-        ScanSequence sequence;
+        const Sequence* sequence;
+        ScanSequence ready;
         Spread spread;
-        double start; ///< of the sequence, as in Sequence
     };
     /// Positions from which the best one is taken.
     struct Range {

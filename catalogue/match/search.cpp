@@ -115,12 +115,9 @@ const Attempt* WindowSearch::attempt(size_t window, const Hypothesis& hypothesis
     if (!says_enough(reading)) {
         return nullptr;
     }
-    ReadingScorer scorer(reading, searcher_.population());
     const double margin = hypothesis == Hypothesis{} ? 0 : kFurtherMargin;
-    attempts_.push_back(std::make_unique<Attempt>(Attempt{.window = window,
-                                                          .reading = std::move(reading),
-                                                          .scorer = std::move(scorer),
-                                                          .threshold = threshold_ + margin}));
+    attempts_.push_back(std::make_unique<Attempt>(window, std::move(reading),
+                                                  searcher_.population(), threshold_ + margin));
     return attempts_.back().get();
 }
 

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <memory>
+#include <utility>
 #include <vector>
 
 #include "catalogue/match/match.hpp"
@@ -17,6 +18,16 @@ struct Attempt {
     Reading reading;
     ReadingScorer scorer;
     double threshold; ///< that a score of this reading has to reach
+
+    Attempt(size_t number, Reading read, const Corpus& population, double least)
+        : window(number), reading(std::move(read)), scorer(reading, population), threshold(least)
+    {
+    }
+    Attempt(const Attempt&) = delete; // the scorer points into the reading
+    Attempt& operator=(const Attempt&) = delete;
+    Attempt(Attempt&&) = delete;
+    Attempt& operator=(Attempt&&) = delete;
+    ~Attempt() = default;
 };
 
 /// A track that a window may lie in.

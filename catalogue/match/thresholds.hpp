@@ -40,7 +40,8 @@ constexpr size_t kFewestCodes = 12;
 /// The share of a clip, or of a track that is shorter, that must lie within the other.
 constexpr double kFewestOverlap = 0.8;
 
-/// A track is compared with its own other places when it has more of them than this.
+/// A track is compared with its own other places when it has more of them than this; a shorter one
+/// with the clip turned in a circle.
 constexpr size_t kOwnPlaces = 50;
 
 /// The spread of a track's own places counts at least as this share of the catalogue's.

@@ -106,6 +106,21 @@ TEST(Rhythm, OfOneTempoMatchesNoOther)
     }
 }
 
+// A track of 20 seconds has few other places that it could be compared with.
+TEST(Rhythm, OfAShortTrackMatchesNoOther)
+{
+    MusicalCorpus corpus = pieces();
+    for (const double tempo : {90.0, 120.0, 140.0}) {
+        corpus.add(trail_of(part_of(beat(tempo, 0b00010001, 0b01000100), 3, 20)));
+    }
+    ScanSearcher searcher(corpus.corpus());
+    for (const double tempo : {90.0, 120.0, 140.0}) {
+        const Samples other = part_of(beat(tempo, 0b01010001, 0b01000100), 7.77, 14.3);
+        const auto answer = recognise(query_of(other), searcher, {});
+        EXPECT_TRUE(answer.matches.empty()) << tempo << ": " << answer.candidates[0].score;
+    }
+}
+
 TEST(Rhythm, OfAMetronomeMatchesNothing)
 {
     for (const double tempo : {60.0, 120.0}) {
