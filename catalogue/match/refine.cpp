@@ -20,16 +20,21 @@ constexpr int kWideSteps = 7;
 constexpr double kNarrowStep = 0.005;
 constexpr int kPlaces = 3; ///< codes looked at before and after the one that was found
 
-/// Changes smaller than this are none: the interpolation is not more exact.
+/// Changes of tempo smaller than this are none, and pitches closer than this to each other are the
+/// same: the interpolation is not more exact.
 constexpr double kUnchanged = 0.0025;
+constexpr double kSamePitch = 0.0075;
 
-/// Most clips have the track's tempo and pitch, so that is what they are taken to have as long as
-/// another reading does not agree better by this many deviations of independent bits: in noise the
-/// best one is often a little off.
+/// Most clips have the track's tempo, so that is what they are taken to have as long as another
+/// reading does not agree better by this many deviations of independent bits: in noise the best one
+/// is often a little off.
 constexpr double kUnchangedMargin = 2.0;
 
 /// The fine bands' ratio and its square root, 2^(1 / 36) and 2^(1 / 72).
 constexpr double kBandRatio = 1.0194406437021448;
+
+/// The agreement at places that do not exist.
+constexpr double kNowhere = -1e9;
 
 /// Where the highest value of a parabola through three points lies, -1/2 .. 1/2 from the middle
 /// one, which is not below the others.
@@ -41,7 +46,7 @@ double peak_of(double before, double middle, double after)
 
 /// How well a reading agrees with the track at its best place near an expected one.
 struct Fit {
-    double agreement = -1e9;
+    double agreement = kNowhere;
     double middle = 0; ///< seconds of the track at which the clip's middle lies
 };
 
@@ -62,7 +67,7 @@ public:
         const Reading reading = reader_.read(hypothesis);
         constexpr int kSteps = (2 * kPlaces + 1) * static_cast<int>(kPhases);
         std::array<double, kSteps> agreements;
-        agreements.fill(-1e9);
+        agreements.fill(kNowhere);
         const double beginning = middle - half_ * hypothesis.stretch;
         int best = 0;
         const int64_t around = place_near(reading, beginning);
@@ -92,11 +97,11 @@ private:
     double at_step(const Reading& reading, int64_t around, int step) const
     {
         if (phase_of(step) >= reading.sequences.size()) {
-            return -1e9;
+            return kNowhere;
         }
         const Sequence& sequence = reading.sequences[phase_of(step)];
         return agreement_at(ScanSequence(sequence), sequence, track_, place_of(around, step))
-            .value_or(-1e9);
+            .value_or(kNowhere);
     }
 
     template <class Agreements>
@@ -107,12 +112,12 @@ private:
         const Sequence* sequence = phase_of(best) < reading.sequences.size()
                                        ? &reading.sequences[phase_of(best)]
                                        : nullptr;
-        if (sequence == nullptr || agreements[at] <= -1e9) {
+        if (sequence == nullptr || agreements[at] <= kNowhere) {
             return {};
         }
         double part = 0;
-        if (at > 0 && at + 1 < agreements.size() && agreements[at - 1] > -1e9 &&
-            agreements[at + 1] > -1e9) {
+        if (at > 0 && at + 1 < agreements.size() && agreements[at - 1] > kNowhere &&
+            agreements[at + 1] > kNowhere) {
             part = peak_of(agreements[at - 1], agreements[at], agreements[at + 1]);
         }
         const double beginning = static_cast<double>(place_of(around, best)) * kCodeSeconds -
@@ -176,7 +181,44 @@ double pitch_ratio(double steps)
     return ratio;
 }
 
-double unless_unchanged(double ratio) { return std::fabs(ratio - 1) < kUnchanged ? 1.0 : ratio; }
+/// The best pitch among a few fine bands, and where between it and its neighbours the peak lies.
+struct Pitched {
+    Fit fit;
+    int steps = 0;
+    double interpolated = 0; ///< steps
+};
+
+Pitched best_pitch(Refiner& refiner, const Hypothesis& around, double middle)
+{
+    const auto fit_at = [&](int steps) {
+        return std::abs(steps) > kMaxPitchSteps
+                   ? Fit{}
+                   : refiner.fit({.pitch_steps = steps, .stretch = around.stretch}, middle);
+    };
+    int steps = around.pitch_steps;
+    std::array<Fit, 3> fits = {fit_at(steps - 1), fit_at(steps), fit_at(steps + 1)};
+    if (fits[0].agreement > fits[1].agreement) {
+        fits = {fit_at(--steps - 1), fits[0], fits[1]};
+    } else if (fits[2].agreement > fits[1].agreement) {
+        fits = {fits[1], fits[2], fit_at(++steps + 1)};
+    }
+    const double peak = fits[0].agreement > kNowhere && fits[2].agreement > kNowhere
+                            ? peak_of(fits[0].agreement, fits[1].agreement, fits[2].agreement)
+                            : 0;
+    return {.fit = fits[1], .steps = steps, .interpolated = steps + peak};
+}
+
+/// The pitch that is reported: that of a change of speed, or none, when it is as close as the
+/// interpolation between fine bands can say.
+double reported_pitch(double pitch, double stretch)
+{
+    const double from_speed = std::fabs(pitch - stretch);
+    const double from_none = std::fabs(pitch - 1);
+    if (std::min(from_speed, from_none) > kSamePitch) {
+        return pitch;
+    }
+    return from_speed < from_none ? stretch : 1.0;
+}
 
 } // namespace
 
@@ -200,39 +242,19 @@ Alignment refined_alignment(QueryReader& reader, std::span<const Code> track,
         best_stretch(refiner, best, coarse.offset + refiner.half() * coarse.stretch);
     best.stretch = stretched.stretch;
 
-    std::array<double, 3> by_pitch{};
-    Fit fit = stretched.fit;
-    const double middle = fit.middle;
-    int moved = 0;
-    for (int step = -1; step <= 1; ++step) {
-        const int pitch = best.pitch_steps + step;
-        const Fit here = std::abs(pitch) > kMaxPitchSteps
-                             ? Fit{}
-                             : refiner.fit({.pitch_steps = pitch, .stretch = best.stretch}, middle);
-        by_pitch[static_cast<size_t>(step + 1)] = here.agreement;
-        if (here.agreement > fit.agreement) {
-            fit = here;
-            moved = step;
-        }
-    }
-    const double between = moved == 0 ? peak_of(by_pitch[0], by_pitch[1], by_pitch[2]) : 0.0;
-    Alignment result{.hypothesis = {},
-                     .offset = 0,
-                     .stretch = unless_unchanged(stretched.interpolated),
-                     .pitch = unless_unchanged(pitch_ratio(best.pitch_steps + moved + between)),
-                     .agreement = fit.agreement};
-    const Fit same_tempo = refiner.fit({.pitch_steps = best.pitch_steps + moved}, middle);
-    if (same_tempo.agreement > fit.agreement - kUnchangedMargin) {
+    const double middle = stretched.fit.middle;
+    const Pitched pitched = best_pitch(refiner, best, middle);
+    best.pitch_steps = pitched.steps;
+    Alignment result{.hypothesis = best, .offset = 0, .stretch = stretched.interpolated};
+    Fit fit = pitched.fit;
+    const Fit same_tempo = refiner.fit({.pitch_steps = best.pitch_steps}, middle);
+    if (std::fabs(result.stretch - 1) < kUnchanged ||
+        same_tempo.agreement > fit.agreement - kUnchangedMargin) {
         fit = same_tempo;
         result.stretch = 1;
     }
-    const Fit same_pitch = refiner.fit({.stretch = result.stretch == 1 ? 1 : best.stretch}, middle);
-    if (same_pitch.agreement > fit.agreement - kUnchangedMargin) {
-        fit = same_pitch;
-        result.pitch = 1;
-    }
-    result.hypothesis = {.pitch_steps = result.pitch == 1 ? 0 : best.pitch_steps + moved,
-                         .stretch = result.stretch};
+    result.hypothesis.stretch = result.stretch;
+    result.pitch = reported_pitch(pitch_ratio(pitched.interpolated), result.stretch);
     result.agreement = fit.agreement;
     result.offset = fit.middle - refiner.half() * result.stretch;
     return result;

@@ -16,9 +16,6 @@ namespace {
 constexpr size_t kScoredTracks = 16;
 constexpr size_t kScoredTracksOfOthers = 4;
 
-/// A pitch that is this close to the tempo, half a fine band, is that of a change of speed.
-constexpr double kSameChange = 0.01;
-
 bool comes_first(const Hit& a, const Hit& b)
 {
     return a.margin() != b.margin() ? a.margin() > b.margin() : a.track < b.track;
@@ -173,9 +170,8 @@ TrackMatch WindowSearch::describe(const Hit& hit, const Alignment& alignment) co
                      .pitch = alignment.pitch,
                      .clip_begin = source_.begin(hit.attempt->window),
                      .clip_end = source_.end(hit.attempt->window)};
-    if (std::fabs(alignment.stretch - alignment.pitch) < kSameChange) {
+    if (alignment.stretch == alignment.pitch) {
         match.speed = alignment.stretch;
-        match.pitch = alignment.stretch;
     }
     return match;
 }

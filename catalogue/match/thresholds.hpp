@@ -32,7 +32,7 @@ constexpr float kNoChange = 0.02F;
 
 /// The energy of a fine band, as a share of its frame's, below which it is taken for noise: a sine
 /// and hum are nothing else in most bands.
-constexpr float kBandFloor = 1e-5F;
+constexpr float kBandFloor = 3e-5F;
 
 /// Codes with bits that count which a window must have; fewer are "too quiet". 2.2 s.
 constexpr size_t kFewestCodes = 12;
@@ -50,9 +50,9 @@ constexpr double kLeastOwnSpread = 0.3;
 /// Music of loops resembles itself in many places, so that no place stands out among its own: this
 /// share of how it stands out in the catalogue is kept, up to so many times how it stands out in
 /// the track. Rhythm without melody stands out in the catalogue only: drum loops, metronomes and hum
-/// reach 20 to 50 there and no more than 4.3 among their own places.
+/// reach 20 to 50 there and hardly more than 4.3 among their own places.
 constexpr double kLoopShare = 0.6;
-constexpr double kMostOverOwn = 1.5;
+constexpr double kMostOverOwn = 1.6;
 
 /// The longest window that is searched at once, in codes, 16.7 s: over longer ones a small error of
 /// the tempo adds up. Longer clips are cut.

@@ -40,7 +40,8 @@ TEST(Recognise, FindsEveryClipAtItsPlace)
 
 TEST(Recognise, FindsClipsOfAnotherSpeed)
 {
-    for (const uint32_t rate : {10474U, 10805U, 11212U, 11576U}) { // -5, -2, +1.7 and +5 %
+    for (const uint32_t rate :
+         {10474U, 10805U, 10915U, 11135U, 11212U, 11350U, 11576U}) { // -5 to +5 %
         const auto answer = look_up(query_of(part_of(piece(2), 11.1, 15.5), rate));
         expect_track(2, 11.1, answer);
         const double speed = static_cast<double>(rate) / kWorkingRate;

@@ -156,7 +156,8 @@ TEST(Score, IsThatOfTheFormula)
         EXPECT_NEAR(expected.in_catalogue, actual.in_catalogue, 1e-9);
         EXPECT_NEAR(expected.in_track, actual.in_track, 1e-9);
         EXPECT_NEAR(std::max(std::min(expected.in_catalogue, expected.in_track),
-                             std::min(0.6 * expected.in_catalogue, 1.5 * expected.in_track)),
+                             std::min(kLoopShare * expected.in_catalogue,
+                                      kMostOverOwn * expected.in_track)),
                     actual.score, 1e-9);
     }
 }
