@@ -25,7 +25,7 @@ struct Merged {
     uint64_t tracks_known = 0;
 };
 
-/// Called with tracks done and in all; stops the work by giving false.
+/// Called with tracks done and in all; stops the work by returning false.
 using Progress = std::function<bool(uint64_t, uint64_t)>;
 
 /// Calls from several threads are allowed. Recognising runs in parallel; whatever uses the store
@@ -66,7 +66,7 @@ public:
     bool index_is_open();
 
     /// Adds all tracks of another catalogue, in batches, each of which is kept or not as a whole.
-    /// `merged` is up to date whenever a batch ends, also when the call throws. Gives false when
+    /// `merged` is up to date whenever a batch ends, also when the call throws. Returns false when
     /// `progress` stopped it.
     bool merge(Catalogue& other, const Progress& progress, Merged& merged);
 

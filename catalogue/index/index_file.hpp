@@ -22,7 +22,7 @@ struct IndexFileError : std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
-/// What the first bytes of a side file say beside where its sections lie.
+/// What the header of a side file states, besides where its sections lie.
 struct IndexHeader {
     std::string catalogue; ///< its id, at most kMaxCatalogueId bytes
     Profile profile = Profile::standard;

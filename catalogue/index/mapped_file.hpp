@@ -42,7 +42,7 @@ public:
     /// Where it lies until commit().
     const std::string& temporary() const { return temporary_; }
 
-    /// Writes behind what was written before.
+    /// Appends to what was written before.
     void write(std::span<const std::byte> bytes);
 
     /// Overwrites the beginning.

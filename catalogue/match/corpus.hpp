@@ -18,8 +18,8 @@ struct TrackSpan {
     uint64_t count = 0;
 };
 
-/// Tracks whose codes lie one behind the other: a mapped file, or memory. Codes of removed tracks may
-/// lie between them, and count for nothing. Owns nothing.
+/// Tracks whose codes lie one after the other: a mapped file, or memory. Codes of removed tracks
+/// may lie between them, and count for nothing. Owns nothing.
 struct Segment {
     std::span<const Code> codes;
     std::span<const TrackSpan> tracks; ///< ids rise
@@ -30,7 +30,7 @@ struct Segment {
     }
 };
 
-/// All tracks of a catalogue. Ids rise from segment to segment too; where one segment ends makes no
+/// All tracks of a catalogue. Ids rise from segment to segment too; where segments end makes no
 /// difference to any answer.
 struct Corpus {
     std::vector<Segment> segments;

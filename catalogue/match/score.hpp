@@ -15,7 +15,7 @@
 
 namespace kzcat {
 
-/// A sequence made ready for scanning: its codes of which any bit counts.
+/// A sequence prepared for scanning: those of its codes that have bits that count.
 class ScanSequence {
 public:
     explicit ScanSequence(const Sequence& sequence);

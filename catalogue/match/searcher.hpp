@@ -1,5 +1,5 @@
 /// @file
-/// What recognising asks of a place where codes are kept.
+/// What recognition needs from a place that holds codes.
 #pragma once
 
 #include <cstddef>
@@ -29,17 +29,17 @@ public:
     /// The best places, the most likely first, at most `limit` tracks.
     virtual std::vector<Candidate> find(const Reading& reading, size_t limit) = 0;
 
-    /// Looks everywhere, for when nothing that find() gave reaches its threshold; nullptr when find()
-    /// does so itself, or nothing more is wanted.
+    /// Looks everywhere, for when nothing that find() gave reaches its threshold; nullptr when
+    /// find() does so itself, or nothing more is wanted.
     virtual Searcher* thorough() { return nullptr; }
 
     /// The codes of a track; empty when it is no longer there.
     virtual std::span<const Code> codes(int64_t track) = 0;
 
-    /// Codes of fixed places of the whole catalogue, as runs: what any other place looks like.
+    /// Runs of codes from fixed places all over the catalogue: what an arbitrary place looks like.
     virtual const Corpus& population() = 0;
 
-    /// Codes stored, by which the threshold grows.
+    /// The number of codes stored; the threshold grows with it.
     virtual uint64_t code_count() = 0;
 };
 

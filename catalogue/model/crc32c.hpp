@@ -13,7 +13,7 @@ namespace kzcat {
 /// The checksum of bytes, `earlier` being that of what comes before them.
 uint32_t crc32c(std::span<const std::byte> bytes, uint32_t earlier = 0);
 
-/// The same with what one instruction set has for it; all give the same.
+/// The same by the instructions of one set; every set gives the same result.
 uint32_t crc32c(std::span<const std::byte> bytes, uint32_t earlier, Instructions instructions);
 
 } // namespace kzcat

@@ -1,6 +1,6 @@
 /// @file
-/// The inner loops over samples and frames. Every variant gives the same bits: sums run in eight lanes in each
-/// of them (lanes.hpp), and no product is contracted with a sum.
+/// The inner loops over samples and frames. Every variant gives the same bits: sums run in eight
+/// lanes in each of them (lanes.hpp), and no product is contracted with a sum.
 #pragma once
 
 #include <cstddef>
@@ -15,7 +15,7 @@ struct Extremes {
     float high;
 };
 
-/// What the loops take and make has the sizes of profile.hpp and fine_bands.hpp.
+/// Inputs and outputs have the sizes that profile.hpp and fine_bands.hpp state.
 struct FrameKernels {
     const char* name;
 

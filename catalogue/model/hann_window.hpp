@@ -15,8 +15,8 @@ struct WindowTable {
     float values[kFrameLength];
 };
 
-/// The window times 2^-10, which makes of ranks in units of 2^-24 values of up to 2^14: value i is
-/// (1/2 - cos(2 pi (i + 1/2) / kFrameLength) / 2) / 1024, rounded once.
+/// The window times 2^-10, which turns ranks in units of 2^-24 into values of up to 2^14: value i
+/// is (1/2 - cos(2 pi (i + 1/2) / kFrameLength) / 2) / 1024, rounded once.
 constexpr WindowTable make_rank_window()
 {
     constexpr size_t kQuarter = kFrameLength / 4;

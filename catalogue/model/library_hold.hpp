@@ -1,5 +1,5 @@
 /// @file
-/// kzsdk switched on for as long as something of ours needs it.
+/// Keeps kzsdk started for as long as an object needs it.
 #pragma once
 
 #include <stdexcept>

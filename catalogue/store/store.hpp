@@ -143,7 +143,7 @@ public:
     virtual std::optional<SourceInfo> find_hash(const FileHash& hash) = 0;
     virtual std::optional<TrackInfo> find_track(int64_t track) = 0;
 
-    /// Tracks in the order of their ids, from the one after `after`; stops when `visit` gives
+    /// Tracks in the order of their ids, from the one after `after`; stops when `visit` returns
     /// false.
     virtual void visit_tracks(int64_t after,
                               const std::function<bool(const TrackInfo&)>& visit) = 0;
@@ -176,7 +176,7 @@ public:
     virtual void set_setting(std::string_view name, std::string_view value) = 0;
 
     /// Reads everything and reports what is wrong; `progress` is called with tracks done and in all
-    /// and stops the work by giving false.
+    /// and stops the work by returning false.
     virtual void verify(const std::function<void(const Fault&)>& report,
                         const std::function<bool(uint64_t, uint64_t)>& progress) = 0;
 };
