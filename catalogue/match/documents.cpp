@@ -9,8 +9,8 @@ namespace kzcat {
 
 namespace {
 
-// x^0.11 from square roots alone, which are the same on every processor: 0.11 is 0.00011100001010 in
-// binary.
+// x^0.11 from square roots alone, which are the same on every processor: 0.11 is 0.00011100001010
+// in binary.
 double power_of_growth(double x)
 {
     constexpr unsigned kExponent = 0b00011100001010; // of 2^14
@@ -23,14 +23,15 @@ double power_of_growth(double x)
     return power;
 }
 
-// Measured with 201 tracks: of 25,452 documents of other music 27 came nearer than this, most of them
-// to a track of the same maker. 60 would leave 10 of these, and lose a tenth of the clips that went
-// through a telephone codec or a room.
+// Measured with 201 tracks: of 25,452 documents of other music 27 came nearer than this, most of
+// them to a track of the same maker. 60 would leave 10 of these, and lose a tenth of the clips that
+// went through a telephone codec or a room.
 constexpr double kLargestDistance = 65;
 constexpr double kMeasuredRows = 60000;
 
-// How near the nearest row of a track must be, as a share of the distance of its middle row, and the
-// fewest rows of which that can be said: in a shorter track most of them overlap the nearest one.
+// How near the nearest row of a track must be, as a share of the distance of its middle row, and
+// the fewest rows of which that can be said: in a shorter track most of them overlap the nearest
+// one.
 constexpr double kShareOfUsual = 0.45;
 constexpr size_t kFewestRows = 40;
 

@@ -37,9 +37,9 @@ struct DocumentAnswer {
 /// The score that a document has to reach among so many rows. The more there are, the nearer comes
 /// the nearest one by chance.
 ///
-/// A track has a threshold of its own besides: its nearest stretch must be less than half as far from
-/// the document as most of the others. Tones, noise and drum loops sound the same all the time, and
-/// like any other of their kind.
+/// A track has a threshold of its own besides: its nearest stretch must be less than half as far
+/// from the document as most of the others. Tones, noise and drum loops sound the same all the
+/// time, and like any other of their kind.
 double document_threshold(uint64_t rows);
 
 /// A search for one document. Offer it all tracks, each once, in any order.

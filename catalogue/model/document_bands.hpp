@@ -28,8 +28,8 @@ constexpr double kDocumentHopSeconds = double{kDocumentHop} / kWorkingRate;
 /// band first, 58.7 bytes a second. A number n stands for an energy of 2^(n / 256) - 1.
 using DocumentBands = std::vector<uint16_t>;
 
-/// Bins of each band, both edges counted, by which the energy is divided for the mean square; then a
-/// 1, so that bands can be computed with in groups of 16.
+/// Bins of each band, both edges counted, by which the energy is divided for the mean square; then
+/// a 1, so that bands can be computed with in groups of 16.
 constexpr std::array<float, kDocumentBandCount + 1> kDocumentBandBins = {
     594, 596, 595, 596, 655, 714, 833, 893, 952, 1130, 1250, 1427, 1666, 1903, 2260, 1};
 
@@ -53,8 +53,8 @@ public:
     /// Throws std::bad_alloc; the extractor is of no use afterwards.
     void feed(std::span<const float> samples);
 
-    /// The numbers of all frames that are complete and were not taken yet. A signal of n samples has
-    /// (n - kDocumentFrame) / kDocumentHop + 1 frames, or none when it is shorter than one.
+    /// The numbers of all frames that are complete and were not taken yet. A signal of n samples
+    /// has (n - kDocumentFrame) / kDocumentHop + 1 frames, or none when it is shorter than one.
     DocumentBands take();
 
 private:

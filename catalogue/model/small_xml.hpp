@@ -26,10 +26,10 @@ struct XmlElement {
 /// Elements may be nested this deep.
 constexpr int kDeepestElement = 16;
 
-/// Reads a text and returns its root. Takes a subset of XML 1.0 and nothing that is not well-formed:
-/// elements, attributes, the five named entities, references to ASCII characters, comments, and a
-/// declaration at the start. What is beyond that is refused: document types (and so entities of
-/// one's own), processing instructions, CDATA sections, and characters beyond ASCII.
+/// Reads a text and returns its root. Takes a subset of XML 1.0 and nothing that is not
+/// well-formed: elements, attributes, the five named entities, references to ASCII characters,
+/// comments, and a declaration at the start. What is beyond that is refused: document types (and so
+/// entities of one's own), processing instructions, CDATA sections, and characters beyond ASCII.
 ///
 /// Throws DocumentError.
 XmlElement read_small_xml(std::string_view text);

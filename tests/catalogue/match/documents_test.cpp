@@ -248,8 +248,8 @@ DocumentBands monotonous_bands(size_t frames, uint64_t seed)
     return bands;
 }
 
-// A track that sounds the same all the time is like any other of its kind: it is found only when one
-// place is much nearer than the others, which a short track cannot show.
+// A track that sounds the same all the time is like any other of its kind: it is found only when
+// one place is much nearer than the others, which a short track cannot show.
 TEST(Documents, MonotonousTracksAreNotFound)
 {
     const DocumentBands clip = monotonous_bands(kzcat::kDocumentSpan, 1);

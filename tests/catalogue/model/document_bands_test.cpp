@@ -1,4 +1,5 @@
-// Band energies: how they are stored, that they are the library's, and that they give its documents.
+// Band energies: how they are stored, that they are the library's, and that they give its
+// documents.
 
 #include <bit>
 #include <cmath>
