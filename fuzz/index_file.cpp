@@ -1,6 +1,6 @@
-// Side files of catalogues: a whole one that is changed, cut, and given right checksums again. Either
-// it is refused with a sentence's end, or it can be searched, by parts and by scan, and names no
-// track but its own.
+// Side files of catalogues: a whole one that is changed, cut, and given right checksums again.
+// Either it is refused with a sentence's end, or it can be searched, by parts and by scan, and
+// names no track but its own.
 
 #include <algorithm>
 
@@ -30,7 +30,8 @@ Bytes whole_file(size_t tracks)
     return kzcat::test::read_file(folder.file("a"));
 }
 
-/// Where a change is worth most: in a header's field, anywhere in a section, or at a section's ends.
+/// Where a change is worth most: in a header's field, anywhere in a section, or at a section's
+/// ends.
 size_t chosen_place(Choices& choices, const Bytes& bytes)
 {
     constexpr size_t kFields =

@@ -138,7 +138,8 @@ public:
     {
     }
 
-    /// Looks a clip up as it is when its kind does not change speed, else at the nearest hypothesis.
+    /// Looks a clip up as it is when its kind does not change speed, else at the nearest
+    /// hypothesis.
     void look_up(const Clip& clip)
     {
         constexpr size_t kLimit = 16;

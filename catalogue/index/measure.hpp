@@ -10,8 +10,8 @@
 
 namespace kzcat {
 
-/// A reading of 14.3 s as a clip with some noise gives it, from the middle of the corpus: a sixth of
-/// its bits are the other way round, most of them weak ones. Always the same for equal codes.
+/// A reading of 14.3 s as a clip with some noise gives it, from the middle of the corpus: a sixth
+/// of its bits are the other way round, most of them weak ones. Always the same for equal codes.
 Reading sample_reading(const Corpus& corpus);
 
 /// Microseconds that `look_up` takes, the least of `times`.

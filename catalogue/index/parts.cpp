@@ -1,5 +1,6 @@
 /// @file
-/// Where each part of a code occurs: tables from the 16 bits of a part to the places that have them.
+/// Where each part of a code occurs: tables from the 16 bits of a part to the places that have
+/// them.
 
 #include "catalogue/index/parts.hpp"
 

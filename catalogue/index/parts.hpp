@@ -1,10 +1,11 @@
 /// @file
-/// Where each part of a code occurs: tables from the 16 bits of a part to the places that have them.
+/// Where each part of a code occurs: tables from the 16 bits of a part to the places that have
+/// them.
 ///
-/// Places are counted in units of eight codes, which keeps all tables together about as small as the
-/// codes themselves; each track begins a unit. A list of places is a run of 16-bit words, each the
-/// distance from the place before it: kFarther goes that far without a place there. Codes without a
-/// bit, which are those of silence, are in no list.
+/// Places are counted in units of eight codes, which keeps all tables together about as small as
+/// the codes themselves; each track begins a unit. A list of places is a run of 16-bit words, each
+/// the distance from the place before it: kFarther goes that far without a place there. Codes
+/// without a bit, which are those of silence, are in no list.
 #pragma once
 
 #include <array>
@@ -65,8 +66,8 @@ using PartTables = std::array<PartTable, kParts>;
 /// when all its lists lie in it.
 const char* fault_of(const PartTable& table);
 
-/// Calls `visit` with each unit of a list, as long as they lie below `units`: the words of a damaged
-/// list may lead anywhere.
+/// Calls `visit` with each unit of a list, as long as they lie below `units`: the words of a
+/// damaged list may lead anywhere.
 template <class Visit>
 void for_each_unit(std::span<const std::byte> list, uint32_t units, Visit visit)
 {

@@ -17,9 +17,9 @@ struct PartProbe {
     uint32_t code = 0; ///< its number in the sequence
 };
 
-/// The lists that are most likely to hold the right place, by the words that have to be read for it:
-/// for every part its value, and those with some of its weakest bits the other way round. Lists are
-/// taken until they have `budget` words together.
+/// The lists that are most likely to hold the right place, by the words that have to be read for
+/// it: for every part its value, and those with some of its weakest bits the other way round. Lists
+/// are taken until they have `budget` words together.
 ///
 /// A bit of strength s is taken to be wrong with odds of 1 to 2^(3 s / 32), about what noise does
 /// that is 10 dB below the music; only the order of the lists follows from it.

@@ -45,8 +45,8 @@ bool has_track(std::span<const TrackSpan> tracks, int64_t id)
     return std::ranges::binary_search(tracks, id, {}, &TrackSpan::id);
 }
 
-/// What is added while the tracks are visited may be among them or not; update() takes the rest from
-/// the log.
+/// What is added while the tracks are visited may be among them or not; update() takes the rest
+/// from the log.
 Snapshot::Snapshot(Store& store) : cursor_(store.last_change())
 {
     std::vector<Code> codes;
@@ -93,7 +93,8 @@ int64_t Snapshot::last_id() const
     return mapped_tracks_.empty() ? 0 : mapped_tracks_.back().id;
 }
 
-/// Ids rise and are never given twice, so what has no higher id than the last track was read before.
+/// Ids rise and are never given twice, so what has no higher id than the last track was read
+/// before.
 Snapshot::Changes Snapshot::read_changes(Store& store) const
 {
     Changes changes{.codes = {}, .tracks = {}, .removed = {}, .cursor = cursor_};
@@ -168,8 +169,8 @@ bool Snapshot::agrees_with(Store& store) const
 }
 
 /// Whether the file was made from this very store: one that was restored from an older copy has the
-/// same id, and may have given the same numbers to other tracks since. The last track that both have
-/// is then another.
+/// same id, and may have given the same numbers to other tracks since. The last track that both
+/// have is then another.
 bool Snapshot::is_of(Store& store) const
 {
     if (mapped_tracks_.empty()) {

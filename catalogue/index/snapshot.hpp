@@ -41,8 +41,8 @@ public:
     explicit Snapshot(MappedIndex mapped);
 
     /// Takes in what has changed. False: the log does not lead from here to what the store has, and
-    /// everything must be read again. After an exception the snapshot is as it was, or has a part of
-    /// the changes and takes the rest the next time.
+    /// everything must be read again. After an exception the snapshot is as it was, or has a part
+    /// of the changes and takes the rest the next time.
     bool update(Store& store);
 
     int64_t cursor() const { return cursor_; }

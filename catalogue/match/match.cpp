@@ -15,8 +15,8 @@ namespace {
 /// Tracks of which all windows are asked when none of them matches by itself.
 constexpr size_t kPooledTracks = 4;
 
-/// A clip of which no window matches is read at other speeds in the first one, the one in the middle
-/// and the last one only: if it is faster or slower, it is so everywhere.
+/// A clip of which no window matches is read at other speeds in the first one, the one in the
+/// middle and the last one only: if it is faster or slower, it is so everywhere.
 bool is_read_at_other_speeds(size_t window, size_t windows)
 {
     return window == 0 || window == windows / 2 || window + 1 == windows;

@@ -1,6 +1,6 @@
 /// @file
-/// Passages. A track that was found in one window is expected to go on in the next, where one look at
-/// the expected place replaces the search.
+/// Passages. A track that was found in one window is expected to go on in the next, where one look
+/// at the expected place replaces the search.
 
 #include "catalogue/match/passages.hpp"
 

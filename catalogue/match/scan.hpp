@@ -10,8 +10,9 @@ namespace kzcat {
 /// Searches codes in memory. Several threads may search at once.
 ///
 /// The coarse pass takes every second phase and a few codes of the sequence, spread evenly over it:
-/// 24 of the clip as it is, 8 of other readings. Places whose agreement is not 2.0 or 2.6 deviations
-/// above the catalogue's mean are passed over; the whole sequence is compared at the others.
+/// 24 of the clip as it is, 8 of other readings. Places whose agreement is not 2.0 or 2.6
+/// deviations above the catalogue's mean are passed over; the whole sequence is compared at the
+/// others.
 class ScanSearcher final : public Searcher {
 public:
     /// The codes have to outlive the searcher.

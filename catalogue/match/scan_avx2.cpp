@@ -1,6 +1,6 @@
 /// @file
-/// The inner loops for x86 processors with AVX2. Compiled for them; nothing of it may be visible but
-/// its table, or the linker could take an inline function from here for other processors.
+/// The inner loops for x86 processors with AVX2. Compiled for them; nothing of it may be visible
+/// but its table, or the linker could take an inline function from here for other processors.
 
 #include "catalogue/match/scan_variants.hpp"
 

@@ -1,5 +1,6 @@
 /// @file
-/// The inner loops of matching: how many bits of codes differ. Every variant gives the same numbers.
+/// The inner loops of matching: how many bits of codes differ. Every variant gives the same
+/// numbers.
 #pragma once
 
 #include <cstddef>

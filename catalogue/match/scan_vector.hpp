@@ -1,6 +1,6 @@
 /// @file
-/// The inner loops over vectors of codes, as templates. A lane is a position, so that a probe is one
-/// value for all lanes; sums are of integers and may be taken in any order.
+/// The inner loops over vectors of codes, as templates. A lane is a position, so that a probe is
+/// one value for all lanes; sums are of integers and may be taken in any order.
 ///
 /// A vector kind brings: kLanes; Words, a vector of 64-bit codes; Counts, a vector of sums;
 ///   Words load(const Code*), Words load(const Code*, lanes) with 0 beyond, Words set(Code),

@@ -1,6 +1,6 @@
 /// @file
-/// What is recognised: the bands of a clip, which can be read at other speeds, or a trail. Either is
-/// cut into windows that are searched one by one.
+/// What is recognised: the bands of a clip, which can be read at other speeds, or a trail. Either
+/// is cut into windows that are searched one by one.
 #pragma once
 
 #include <cstddef>

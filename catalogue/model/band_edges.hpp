@@ -11,8 +11,8 @@
 
 namespace kzcat {
 
-/// The bins of one fine band. Bin k covers k - 1/2 to k + 1/2 bins of frequency, and a band takes of
-/// its outermost bins the share that lies inside it.
+/// The bins of one fine band. Bin k covers k - 1/2 to k + 1/2 bins of frequency, and a band takes
+/// of its outermost bins the share that lies inside it.
 struct BandBins {
     uint32_t first;       ///< the lowest bin of which the band has any part
     uint32_t whole_begin; ///< bins that lie inside as a whole

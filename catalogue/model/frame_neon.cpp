@@ -1,5 +1,6 @@
 /// @file
-/// The inner loops for 64-bit ARM, whose vectors have four lanes: two of them stand for one of eight.
+/// The inner loops for 64-bit ARM, whose vectors have four lanes: two of them stand for one of
+/// eight.
 
 #include "catalogue/model/frame_variants.hpp"
 

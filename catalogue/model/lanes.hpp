@@ -1,5 +1,6 @@
 /// @file
-/// The order in which sums are taken: in eight lanes, whatever the width of the processor's vectors.
+/// The order in which sums are taken: in eight lanes, whatever the width of the processor's
+/// vectors.
 #pragma once
 
 #include <array>

@@ -10,8 +10,8 @@
 
 namespace kzcat {
 
-/// The levels of frames that follow each other by kQueryHop. Each sample is looked at once, though it
-/// lies in several frames.
+/// The levels of frames that follow each other by kQueryHop. Each sample is looked at once, though
+/// it lies in several frames.
 class LevelMeter {
 public:
     /// The level of the next frame: log2 of its energy about its mean, the sum of the squares of

@@ -1,6 +1,6 @@
 /// @file
-/// Logarithms whose bits do not depend on the processor: no function of the C library is called, and
-/// every product and sum is rounded on its own, in the order written here.
+/// Logarithms whose bits do not depend on the processor: no function of the C library is called,
+/// and every product and sum is rounded on its own, in the order written here.
 #pragma once
 
 #include <bit>

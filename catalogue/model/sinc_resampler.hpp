@@ -9,13 +9,13 @@
 
 namespace kzcat {
 
-/// For the rates of which the library has no filter stored: one that it designs takes its sines from
-/// the C library, whose last bits differ from system to system.
+/// For the rates of which the library has no filter stored: one that it designs takes its sines
+/// from the C library, whose last bits differ from system to system.
 ///
-/// An output is the sum of the samples around its place, each times a sinc under a Hamming window of
-/// ten crossings on either side, which cuts off at the lower of the two Nyquist frequencies. Taps
-/// are kept for 512 places between two samples, and an output between two of those is interpolated:
-/// the error is below -100 dB. The gain at 0 Hz is 1 at every place.
+/// An output is the sum of the samples around its place, each times a sinc under a Hamming window
+/// of ten crossings on either side, which cuts off at the lower of the two Nyquist frequencies.
+/// Taps are kept for 512 places between two samples, and an output between two of those is
+/// interpolated: the error is below -100 dB. The gain at 0 Hz is 1 at every place.
 class SincResampler {
 public:
     /// The highest rate of the output, in whatever unit.

@@ -393,7 +393,8 @@ private:
     }
 };
 
-/// False for an order that fingerprints do not use. Only frames of floats are ever as short as 2^12.
+/// False for an order that fingerprints do not use. Only frames of floats are ever as short as
+/// 2^12.
 template <class Simd, template <class> class Butterflies, class Word>
 bool transform(Word* x, const Word* factors, int32_t order) noexcept
 {

@@ -143,7 +143,8 @@ TEST(IndexFile, IsRefusedWhenItsNumbersMakeNoSense)
             ++refused;
         }
     }
-    // All but the profile, the cursor, the plan's times, the id and what pads the sections' entries.
+    // All but the profile, the cursor, the plan's times, the id and what pads the sections'
+    // entries.
     EXPECT_LT(200, refused);
 }
 

@@ -1,5 +1,5 @@
-// The steps of a search by parts: which lists are read, how places are put in order, and that a clip
-// is found wherever it lies.
+// The steps of a search by parts: which lists are read, how places are put in order, and that a
+// clip is found wherever it lies.
 
 #include <algorithm>
 #include <array>

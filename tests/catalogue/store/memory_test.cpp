@@ -1,5 +1,5 @@
-// Every allocation of every call fails in turn, those of SQLite too: the call throws std::bad_alloc,
-// has changed nothing, leaves nothing allocated, and can be repeated.
+// Every allocation of every call fails in turn, those of SQLite too: the call throws
+// std::bad_alloc, has changed nothing, leaves nothing allocated, and can be repeated.
 
 #include <cstdlib>
 #include <functional>

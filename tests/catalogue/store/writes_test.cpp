@@ -1,5 +1,5 @@
-// Every write that can go wrong goes wrong once: with an error, on a full disk, or as the last thing
-// that the process does.
+// Every write that can go wrong goes wrong once: with an error, on a full disk, or as the last
+// thing that the process does.
 
 #include <csignal>
 #include <filesystem>
