@@ -11,7 +11,7 @@ enum class FileFault {
     error,     ///< the call does nothing and reports an error of the device
     full,      ///< the call writes half and reports that the disk is full
     kill,      ///< half of it is written when the process is killed
-    power_cut, ///< as kill, and of what was not synchronised only some is left, in order for each file
+    power_cut, ///< as kill, and of what was not synchronised only the first writes of each file
 };
 
 /// The name of a VFS in which the calls that change files are counted, for this process.
