@@ -151,14 +151,17 @@ private:
     /// Ids must go on from where they were, or one would be given twice.
     void check_sequences()
     {
-        Statement row(connection_, "SELECT name, seq FROM sqlite_sequence");
-        while (row.step()) {
-            const int64_t wanted = row.text(0) == "track"    ? last_track_
-                                   : row.text(0) == "change" ? last_change_
-                                                             : row.integer(1);
-            if (row.integer(1) != wanted) {
-                fault(0, "the next id of the table " + std::string(row.text(0)) + " has changed");
-            }
+        check_sequence("track", last_track_);
+        check_sequence("change", last_change_);
+    }
+
+    /// A table that never had a row has no sequence.
+    void check_sequence(std::string_view table, int64_t wanted)
+    {
+        Statement row(connection_, "SELECT seq FROM sqlite_sequence WHERE name = ?", table);
+        const int64_t last = row.step() ? row.integer(0) : 0;
+        if (last != wanted || row.step()) {
+            fault(0, "the next id of the table " + std::string(table) + " has changed");
         }
     }
 

@@ -222,6 +222,9 @@ const char* const kChangesOfValues[] = {
     "WHERE name = 'change'",
     "UPDATE sqlite_sequence SET seq = 30 WHERE name = 'track'",
     "UPDATE sqlite_sequence SET seq = 30 WHERE name = 'change'",
+    "UPDATE sqlite_sequence SET name = 'trbck' WHERE name = 'track'",
+    "DELETE FROM sqlite_sequence WHERE name = 'change'",
+    "INSERT INTO sqlite_sequence VALUES ('track', 30)",
     "INSERT INTO track VALUES (1000, randomblob(16), 0, 0, 0, 0)"};
 
 TEST_F(DamagedCatalogue, NoChangedValueGoesUnnoticed)

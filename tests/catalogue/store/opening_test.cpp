@@ -154,7 +154,9 @@ TEST_F(OpeningACatalogue, RefusesTablesThatAreNotItsOwn)
          {"DROP INDEX source_hash", "DROP TRIGGER track_added", "DROP TABLE document_bands",
           "ALTER TABLE track ADD COLUMN more INTEGER",
           "CREATE TRIGGER harm AFTER INSERT ON source BEGIN DELETE FROM track; END",
-          "CREATE INDEX more ON tag (value)", "PRAGMA user_version = 0"}) {
+          "CREATE TRIGGER harm AFTER INSERT ON TRACK BEGIN DELETE FROM tag; END",
+          "CREATE INDEX more ON tag (value)", "CREATE INDEX more ON TAG (value)",
+          "PRAGMA user_version = 0"}) {
         fs::remove(path());
         make_catalogue(path(), 1);
         Database(path()).execute(change);
