@@ -11,7 +11,8 @@ import sys
 
 TARGETS = (
     "extraction stream tags paths render exchange resampler_fixed resampler_float converters dyn_buf "
-    "disc_names disc_files documents trail_file trails index_file kzfp_options kzfp_files"
+    "disc_names disc_files documents trail_file trails index_file catalogue_file kzfp_options "
+    "kzfp_files"
 ).split()
 
 

@@ -207,6 +207,8 @@ bool Statement::is_null(int column) const
 
 int64_t Statement::integer(int column) const { return sqlite3_column_int64(statement_, column); }
 
+double Statement::real(int column) const { return sqlite3_column_double(statement_, column); }
+
 std::string_view Statement::text(int column) const
 {
     const auto* bytes = reinterpret_cast<const char*>(sqlite3_column_text(statement_, column));

@@ -111,6 +111,7 @@ public:
 
     bool is_null(int column) const;
     int64_t integer(int column) const;
+    double real(int column) const;
 
     /// Both stay valid until the next step.
     std::string_view text(int column) const;

@@ -13,10 +13,9 @@ namespace {
 
 [[noreturn]] void refuse(const std::string& path, int64_t track, const std::string& what)
 {
-    throw StoreError(StoreError::Kind::damaged, path + ": the " + what + " of track " +
-                                                    std::to_string(track) +
-                                                    " are damaged; remove the track, and add its "
-                                                    "file again");
+    throw StoreError(StoreError::Kind::damaged,
+                     path + ": the " + what + " of track " + std::to_string(track) +
+                         " are damaged; remove the track, and add its file again");
 }
 
 template <size_t Count>
@@ -58,6 +57,17 @@ std::vector<Source> read_sources(Connection& connection, int64_t track)
 
 } // namespace
 
+void Rising::check(int64_t id, const std::string& path)
+{
+    if (last_ && id <= *last_) {
+        throw StoreError(StoreError::Kind::damaged,
+                         path + ": it is damaged (row " + std::to_string(id) +
+                             " is out of order); find out what with verify, and take what is "
+                             "whole into a new catalogue with merge");
+    }
+    last_ = id;
+}
+
 std::optional<int64_t> to_column(int64_t number)
 {
     return number == -1 ? std::nullopt : std::optional(number);
@@ -97,6 +107,9 @@ TrackInfo read_track(Connection& connection, const Statement& row, Profile profi
     info.id = row.integer(0);
     copy_blob(row.blob(1), info.key);
     info.profile = profile;
+    if (row.integer(2) < 0 || row.integer(3) < 0) {
+        refuse(connection.path(), info.id, "numbers");
+    }
     info.samples = static_cast<uint64_t>(row.integer(2));
     info.codes = static_cast<uint64_t>(row.integer(3));
     info.added = row.integer(4);
@@ -104,6 +117,24 @@ TrackInfo read_track(Connection& connection, const Statement& row, Profile profi
     info.tags = read_tags(connection, info.id);
     info.sources = read_sources(connection, info.id);
     return info;
+}
+
+// A double adds whole numbers exactly up to 2^53, and does not overflow.
+uint64_t read_code_count(Connection& connection)
+{
+    const ReadTransaction moment(connection);
+    Statement pages(connection, "SELECT page_count * page_size FROM pragma_page_count, "
+                                "pragma_page_size");
+    Statement row(connection, "SELECT total(codes), min(codes) FROM track");
+    const int64_t bytes = pages.step() ? pages.integer(0) : 0;
+    const double total = row.step() ? row.real(0) : 0;
+    if (row.integer(1) < 0 || total > static_cast<double>(bytes) / sizeof(Code)) {
+        throw StoreError(StoreError::Kind::damaged,
+                         connection.path() +
+                             ": it is damaged (tracks claim more codes than the file can hold); "
+                             "find out which with verify, remove them, and add their files again");
+    }
+    return static_cast<uint64_t>(total);
 }
 
 std::optional<SourceInfo> read_one_source(Statement& row)
@@ -119,7 +150,7 @@ void read_trail(const Statement& row, const std::string& path, Trail& trail)
     const auto bytes = row.blob(4);
     if (row.is_null(4) || int64_t{crc32c(bytes)} != row.integer(3) ||
         bytes.size() % sizeof(Code) != 0 ||
-        static_cast<int64_t>(bytes.size() / sizeof(Code)) != row.integer(2)) {
+        static_cast<int64_t>(bytes.size() / sizeof(Code)) != row.integer(2) || row.integer(1) < 0) {
         refuse(path, row.integer(0), "codes");
     }
     trail.samples = static_cast<uint64_t>(row.integer(1));

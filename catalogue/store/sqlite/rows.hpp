@@ -26,6 +26,16 @@ std::span<const std::byte> bytes_of(const std::array<uint8_t, Count>& array)
     return std::as_bytes(std::span(array));
 }
 
+/// Ids as they come from a table, of which a damaged one may not be in order: callers rely on that.
+class Rising {
+public:
+    /// Throws StoreError::Kind::damaged when the id is not above the last one.
+    void check(int64_t id, const std::string& path);
+
+private:
+    std::optional<int64_t> last_;
+};
+
 /// -1 is NULL in the file.
 std::optional<int64_t> to_column(int64_t number);
 std::optional<std::span<const std::byte>> to_column(const std::optional<FileHash>& hash);
@@ -37,6 +47,9 @@ std::vector<Tag> read_tags(Connection& connection, int64_t track);
 
 /// With tags and sources, from a row of KZCAT_TRACK_COLUMNS.
 TrackInfo read_track(Connection& connection, const Statement& row, Profile profile);
+
+/// Codes of all tracks. Callers make room for them: a number that the file cannot hold is refused.
+uint64_t read_code_count(Connection& connection);
 
 /// From a row of track, uri, size, mtime_ns, hash; none when there is no row.
 std::optional<SourceInfo> read_one_source(Statement& row);

@@ -293,8 +293,13 @@ public:
         const ReadTransaction moment(current());
         Statement row(*opened_.connection,
                       "SELECT " KZCAT_TRACK_COLUMNS " FROM track WHERE id > ? ORDER BY id", after);
-        while (row.step() && visit(read_track(*opened_.connection, row, opened_.profile))) {
-        }
+        Rising ids;
+        do {
+            if (!row.step()) {
+                return;
+            }
+            ids.check(row.integer(0), path_);
+        } while (visit(read_track(*opened_.connection, row, opened_.profile)));
     }
 
     void visit_trails(int64_t after,
@@ -308,10 +313,12 @@ public:
                       after);
         Trail trail;
         trail.profile = opened_.profile;
+        Rising ids;
         do {
             if (!row.step()) {
                 return;
             }
+            ids.check(row.integer(0), path_);
             read_trail(row, path_, trail);
         } while (visit(row.integer(0), trail));
     }
@@ -346,7 +353,9 @@ public:
                       "SELECT id, track, kind, mark FROM change WHERE id > ? ORDER BY id LIMIT ?",
                       after, most);
         std::vector<Change> changes;
+        Rising cursors;
         while (row.step()) {
+            cursors.check(row.integer(0), path_);
             changes.push_back(
                 {.cursor = row.integer(0),
                  .track = row.integer(1),
@@ -365,7 +374,7 @@ public:
     }
 
     uint64_t track_count() override { return count("SELECT count(*) FROM track"); }
-    uint64_t code_count() override { return count("SELECT sum(codes) FROM track"); }
+    uint64_t code_count() override { return read_code_count(current()); }
 
     std::optional<std::string> setting(std::string_view name) override
     {

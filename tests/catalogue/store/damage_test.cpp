@@ -261,6 +261,20 @@ TEST_F(DamagedCatalogue, NamesTheTrackThatIsDamaged)
     EXPECT_TRUE(faults(*store).empty()) << "as the message says";
 }
 
+/// Callers make room for as many codes as the store reports.
+TEST_F(DamagedCatalogue, BelievesNoNumberThatCannotBe)
+{
+    for (const char* number : {"-1", "1000000000", "9223372036854775807"}) {
+        make_catalogue(path(), 3);
+        Database(path()).execute(std::string("UPDATE track SET codes = ") + number);
+        const auto store = open_sqlite_store(path(), Access::read);
+        EXPECT_EQ(StoreError::Kind::damaged, failure_of([&] { store->code_count(); }).kind);
+        EXPECT_EQ(StoreError::Kind::damaged, failure_of([&] { store->trail(1); }).kind);
+        EXPECT_FALSE(faults(*store).empty());
+        fs::remove(path());
+    }
+}
+
 TEST_F(DamagedCatalogue, ReportsEveryDamagedTrack)
 {
     make_mixed_catalogue(path());
