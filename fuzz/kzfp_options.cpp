@@ -1,5 +1,13 @@
 // The command line of kzfp: any words, on files that are missing, empty or not sound. It ends with
-// one of its statuses, and with "wrong usage" without having opened a file.
+// one of its statuses, and with "wrong usage" without having opened a file. Catalogues that it
+// makes lie in a folder of their own, out of which no word leads.
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <system_error>
 
 #include "fuzz.hpp"
 #include "kzfp_program.hpp"
@@ -32,27 +40,89 @@ constexpr const char* kWords[] = {"--format",
                                   "disc",
                                   "fingerprint",
                                   "help",
+                                  "add",
+                                  "match",
+                                  "compare",
+                                  "list",
+                                  "remove",
+                                  "verify",
+                                  "merge",
+                                  "text",
+                                  "--candidates",
+                                  "--passages",
+                                  "--no-speeds",
+                                  "--documents",
+                                  "--summary",
+                                  "--paths",
+                                  "-j",
+                                  "2",
+                                  "a.kzc",
+                                  "b.kzc",
+                                  "sub",
                                   "--",
                                   "-",
-                                  "/dev/null",
-                                  "/nonexistent",
-                                  "/",
+                                  "empty",
+                                  "missing/file",
+                                  ".",
                                   "--raw=",
                                   "--format=json",
                                   "12,1,u8"};
+
+namespace fs = std::filesystem;
+
+/// While it lives, the working folder is an empty one, which is removed with what lies in it.
+class OwnFolder {
+public:
+    OwnFolder() : before_(fs::current_path())
+    {
+        std::string name = (fs::temp_directory_path() / "kz-fuzz-XXXXXX").string();
+        if (::mkdtemp(name.data()) == nullptr) {
+            throw std::system_error(errno, std::generic_category(), name);
+        }
+        folder_ = name;
+        fs::create_directory(folder_ / "sub");
+        std::ofstream(folder_ / "empty").flush();
+        fs::current_path(folder_);
+    }
+    ~OwnFolder()
+    {
+        std::error_code ignored;
+        fs::current_path(before_, ignored);
+        fs::remove_all(folder_, ignored);
+    }
+    OwnFolder(const OwnFolder&) = delete;
+    OwnFolder& operator=(const OwnFolder&) = delete;
+
+private:
+    fs::path before_;
+    fs::path folder_;
+};
+
+std::string random_word(Choices& choices)
+{
+    std::string word = choices.ConsumeRandomLengthString(16).c_str();
+    std::ranges::replace(word, '/', '_');
+    return word;
+}
+
+/// One word, sometimes two joined; none that leads to a folder above.
+std::string some_word(Choices& choices)
+{
+    std::string word = one_in(choices, 4) ? random_word(choices) : choices.PickValueInArray(kWords);
+    if (one_in(choices, 16)) {
+        word += choices.PickValueInArray(kWords);
+    }
+    return word.starts_with("..") ? "__" : word;
+}
 
 } // namespace
 
 void run(Choices& choices)
 {
+    const OwnFolder folder;
     std::vector<std::string> arguments;
     for (auto words = choices.ConsumeIntegralInRange<int>(0, 8); words > 0; --words) {
-        std::string word = one_in(choices, 4) ? choices.ConsumeRandomLengthString(16).c_str()
-                                              : choices.PickValueInArray(kWords);
-        if (one_in(choices, 16)) {
-            word += choices.PickValueInArray(kWords);
-        }
-        arguments.push_back(word);
+        arguments.push_back(some_word(choices));
     }
     const int status = kzfp(arguments);
     ASSERT_GE(status, 0);
