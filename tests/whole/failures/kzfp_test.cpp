@@ -147,6 +147,38 @@ TEST_F(FailingSystem, AnyAllocationMayFailInTheDiscCommand)
                       });
 }
 
+// A database takes thousands: each of the first, then one of every so many.
+TEST_F(FailingSystem, AllocationsMayFailWhileMusicIsAdded)
+{
+    const std::string samples = bytes_of(tune(kRate, 1, 8));
+    const std::string file =
+        scratch_.write("music.wav", wav_header(static_cast<uint32_t>(samples.size())) + samples);
+    const std::string catalogue = scratch_.path("c.kzc");
+    const std::vector<std::string> add = {"add", "-j", "1", catalogue, file};
+    const std::vector<std::string> match = {"match", "-j", "1", "--no-speeds", catalogue, file};
+    for (const auto& arguments : {add, match}) {
+        const ProcessResult whole = run_without_failure(arguments);
+        ASSERT_EQ(0, whole.status) << whole.err;
+        for (int nth = 1;; nth += nth < 40 ? 3 : 211) {
+            if (arguments == add) {
+                std::filesystem::remove(catalogue);
+            }
+            const std::string setting = "KZ_FAIL_ALLOCATION=" + std::to_string(nth);
+            const auto result = run_with_failure(arguments, setting, nth % 2 == 0);
+            if (!result) {
+                EXPECT_GT(nth, 200);
+                break;
+            }
+            if (result->status == 0) {
+                EXPECT_EQ(whole.out, result->out) << setting;
+            } else {
+                EXPECT_EQ(1, result->status) << setting;
+                EXPECT_NE("", result->err) << setting;
+            }
+        }
+    }
+}
+
 TEST_F(FailingSystem, AnyReadMayFail)
 {
     const std::string samples = bytes_of(tune(kRate, 1, 15));
