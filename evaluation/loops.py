@@ -36,6 +36,7 @@ RHYTHMS = {
 KITS = {"deep": (48, 0.18, 0.16, 0.03), "tight": (62, 0.09, 0.09, 0.02), "room": (55, 0.3, 0.28, 0.07)}
 KNOWN = (("rock", "deep"), ("house", "tight"), ("break", "room"))
 STRANGERS = (("rock", "tight"), ("house", "deep"), ("half", "deep"), ("plain", "tight"), ("plain", "room"))
+NOISES = ("dither", "white", "pink")
 KINDS = ("clean", "mp3_32", "white_10", "mic")
 
 
@@ -146,7 +147,9 @@ def main():
         for name, samples in sounds(role).items():
             write(corpus.CACHE / "loops" / role / f"{role}-{name}.wav", samples)
     lines = [cut(samples, name, kind) for name, samples in sounds("strangers").items() for kind in KINDS]
-    lines += [cut(samples, f"same-{name}", "clean") for name, samples in signals("known").items()]
+    # Tones and clicks do not even match themselves; a recording of noise does, as it should.
+    lines += [cut(samples, f"same-{name}", "clean") for name, samples in signals("known").items()
+              if name not in NOISES]
     truth = corpus.CACHE / "clips" / "loops" / "truth.jsonl"
     truth.write_text("".join(json.dumps(line, sort_keys=True) + "\n" for line in lines if line))
 

@@ -85,6 +85,9 @@ def run(kzfp, half, kinds):
     by_kind = collections.defaultdict(list)
     for truth in truths(half):
         by_kind[truth["kind"]].append(truth["file"])
+    missing = [kind for kind in kinds if kind not in by_kind]
+    if missing or not by_kind:
+        sys.exit(f"score.py: no clips of {half} {' '.join(missing)}; evaluation/clips.py makes them")
     for kind in kinds or by_kind:
         names = by_kind[kind]
         lines = [json.dumps(answer) + "\n" for place in range(0, len(names), BATCH)
@@ -121,12 +124,12 @@ def clips_of(half, method):
 
 HEADINGS = ("kind", "clips", "top-1", "accepted and right", "at the threshold of 15,000", "wrong",
             "place: median, 95 % (ms)", "within 30 ms", "strangers", "false", "highest stranger",
-            "Chromaprint: top-1", "accepted and right")
+            "Chromaprint: top-1", "accepted and right", "with 1 % of strangers")
 
 
 def cells(kind, row, peer):
     places = f"{row['median']:.0f}, {row['p95']:.0f}"
-    beside = [f"{peer['top1']:.3f}", f"{peer['accepted']:.3f}"] if peer else ["", ""]
+    beside = [f"{peer[part]:.3f}" for part in ("top1", "accepted", "lenient")] if peer else [""] * 3
     return [kind, row["clips"], f"{row['top1']:.3f}", f"{row['accepted']:.3f}", f"{row['raised']:.3f}",
             row["wrong"], places, f"{row['near']:.3f}", row["strangers"], row["false"],
             f"{row['highest']:.2f}", *beside]
@@ -169,7 +172,8 @@ def looped():
     by_file = {truth["file"]: truth for truth in truths("loops")}
     lines = [line for file in sorted(folder.glob("*.jsonl"))
              for line in file.read_text(encoding="utf-8").splitlines()]
-    return [Clip(by_file[answer["file"]], answer, set()) for answer in map(json.loads, lines)]
+    answers = [json.loads(line) for line in lines]
+    return [Clip(by_file[answer["file"]], answer, set()) for answer in answers if answer["file"] in by_file]
 
 
 def strangers(half):
