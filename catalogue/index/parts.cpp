@@ -16,10 +16,10 @@ template <class Visit>
 void for_each_value(std::span<const Code> codes, uint32_t part, Visit visit)
 {
     std::array<uint32_t, kUnitCodes> seen{};
-    auto end = seen.begin();
+    auto* end = seen.data();
     for (const Code code : codes) {
         const uint32_t value = part_of(code, part);
-        if (code != 0 && std::find(seen.begin(), end, value) == end) {
+        if (code != 0 && std::find(seen.data(), end, value) == end) {
             *end++ = value;
             visit(value);
         }
