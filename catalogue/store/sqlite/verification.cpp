@@ -4,6 +4,7 @@
 #include "catalogue/store/sqlite/verification.hpp"
 
 #include <algorithm>
+#include <limits>
 #include <set>
 #include <string>
 
@@ -110,11 +111,13 @@ private:
         std::set<int64_t> there;
         Statement row(connection_, "SELECT id, track, kind, mark, total FROM change ORDER BY id");
         while (row.step()) {
-            if (row.integer(0) != ++last_change_ || !is_consistent(row)) {
+            const bool follows = last_change_ < std::numeric_limits<int64_t>::max() &&
+                                 row.integer(0) == last_change_ + 1;
+            if (!follows || !is_consistent(row)) {
                 fault(row.integer(1), "change " + std::to_string(row.integer(0)) +
                                           " of the log has changed or is missing");
-                last_change_ = row.integer(0);
             }
+            last_change_ = row.integer(0);
             take_in(row, there);
         }
         Statement track(connection_, "SELECT id FROM track");
@@ -128,11 +131,17 @@ private:
         }
     }
 
-    /// Numbers of a damaged row may be of any size: no sum of them may overflow.
+    /// Numbers of a damaged row may be of any size: they are added only when they are as they
+    /// should be, so that no sum overflows.
     static bool is_consistent(const Statement& row)
     {
-        const auto part = [&](int column) { return static_cast<uint64_t>(row.integer(column)); };
-        return part(1) + part(2) + part(3) == part(4);
+        constexpr int64_t kMostTracks = int64_t{1} << 62U;
+        constexpr int64_t kMostMark = 0xffffffff;
+        const int64_t track = row.integer(1);
+        const int64_t kind = row.integer(2);
+        const int64_t mark = row.integer(3);
+        return track > 0 && track < kMostTracks && (kind == kAddedCode || kind == kRemovedCode) &&
+               mark >= 0 && mark <= kMostMark && track + kind + mark == row.integer(4);
     }
 
     void take_in(const Statement& row, std::set<int64_t>& there)
