@@ -42,6 +42,7 @@ struct Options {
     uint32_t lists = 0;
     std::vector<std::string> kinds;
     size_t strangers = 0;
+    bool by_scan = true;
 };
 
 double seconds()
@@ -133,8 +134,8 @@ bool has(const std::vector<kzcat::Candidate>& places, int64_t track)
 
 class Study {
 public:
-    Study(kzcat::Searches& searches, std::map<std::string, int64_t> ids)
-        : searches_(searches), ids_(std::move(ids))
+    Study(kzcat::Searches& searches, std::map<std::string, int64_t> ids, bool by_scan)
+        : searches_(searches), ids_(std::move(ids)), by_scan_(by_scan)
     {
     }
 
@@ -153,11 +154,13 @@ public:
         Tally& tally = tallies_[clip.known ? clip.kind : "strangers, " + clip.kind];
         tally.clips += 1;
         tally.parts_seconds += timed([&] { by_parts = searches_.by_parts(reading, kLimit); });
-        tally.scan_seconds += timed([&] { by_scan = scan.find(reading, kLimit); });
+        if (by_scan_) {
+            tally.scan_seconds += timed([&] { by_scan = scan.find(reading, kLimit); });
+        }
         const kzcat::ReadingScorer scorer(reading, scan.population());
         if (!clip.known) {
             add_stranger(tally, scorer, by_scan);
-        } else if (const auto id = ids_.at(clip.track); has(by_scan, id)) {
+        } else if (const auto id = ids_.at(clip.track); !by_scan_ || has(by_scan, id)) {
             const bool base = hypothesis == kzcat::Hypothesis{};
             const double threshold =
                 kzcat::threshold_for(scan.code_count(), 1) + (base ? 0 : kzcat::kFurtherMargin);
@@ -198,6 +201,7 @@ private:
 
     kzcat::Searches& searches_;
     std::map<std::string, int64_t> ids_;
+    bool by_scan_;
     std::map<std::string, Tally> tallies_;
 };
 
@@ -253,6 +257,7 @@ Options parsed(CLI::App& app, int count, char** arguments)
     app.add_option("--clips", options.clips, "known ones and strangers of each kind, at most");
     app.add_option("--lists", options.lists, "that a look-up reads; 0: the usual number");
     app.add_option("--strangers", options.strangers, "to recognise at all hypotheses");
+    app.add_flag("!--no-scan", options.by_scan, "take every true track for found by scan");
     app.add_option("kinds", options.kinds, "of clips; folders of MEDIA/clips/HALF");
     app.parse(count, arguments);
     return options;
@@ -269,7 +274,7 @@ void study(const Options& options)
     auto mapped = written_index(catalogue->corpus());
     catalogue.reset();
     kzcat::Searches searches(kzcat::Snapshot(std::move(mapped)), options.lists);
-    Study study(searches, std::move(ids));
+    Study study(searches, std::move(ids), options.by_scan);
     std::vector<Clip> all;
     for (const auto& kind : options.kinds) {
         for (const auto& clip :

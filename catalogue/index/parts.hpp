@@ -28,19 +28,14 @@ constexpr uint16_t kFarther = 0xFFFF;
 /// Most codes that tables are made of: their words are counted in 32 bits.
 constexpr uint64_t kMaxIndexedCodes = uint64_t{1} << 31;
 
-/// Four of the sixteen low bands, which fall together under noise, and twelve neighbours of the
-/// others. Bit b of the part is bit part_bit(part, b) of the code.
+/// Sixteen neighbours: the low bands, and a third of the others each. What spoils some bands, as a
+/// small loudspeaker or noise of some colour, leaves the other parts whole.
 constexpr uint32_t part_of(Code code, uint32_t part)
 {
-    const auto low = static_cast<uint32_t>(code >> (4 * part)) & 0xFU;
-    const auto high = static_cast<uint32_t>(code >> (16 + 12 * part)) & 0xFFFU;
-    return low | high << 4;
+    return static_cast<uint32_t>(code >> (kPartBits * part)) & (kPartValues - 1);
 }
 
-constexpr uint32_t part_bit(uint32_t part, uint32_t bit)
-{
-    return bit < 4 ? 4 * part + bit : 12 + 12 * part + bit;
-}
+constexpr uint32_t part_bit(uint32_t part, uint32_t bit) { return kPartBits * part + bit; }
 
 /// Units that a track takes.
 constexpr uint64_t units_of(uint64_t codes) { return (codes + kUnitCodes - 1) / kUnitCodes; }

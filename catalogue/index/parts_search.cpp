@@ -23,7 +23,7 @@ namespace {
 constexpr uint8_t kMostHits = 127; ///< so that two neighbours' sum fits a byte
 constexpr size_t kBlock = 64;
 /// Diagonals that are looked at code by code.
-constexpr size_t kLooks = 768;
+constexpr size_t kLooks = 3000;
 /// Positions on both sides of a diagonal's eight that are looked at too: phases and a slightly
 /// other tempo put some of the hits there.
 constexpr int64_t kMargin = 2;

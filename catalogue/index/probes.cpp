@@ -18,7 +18,7 @@ constexpr uint32_t kFlippedBits = 5;
 constexpr uint32_t kFlips = 1U << kFlippedBits;
 
 /// The cost of a bit of this strength being wrong rather than right.
-constexpr uint32_t flip_cost(uint32_t strength) { return 3 * strength / 2; }
+constexpr uint32_t flip_cost(uint32_t strength) { return 3 * strength / 4; }
 
 /// The cost of a bit being right: log2(1 + 2^-x) where it is wrong with odds of 1 to 2^x, read
 /// between whole x.

@@ -21,8 +21,8 @@ struct PartProbe {
 /// it: for every part its value, and those with some of its weakest bits the other way round. Lists
 /// are taken until they have `budget` words together.
 ///
-/// A bit of strength s is taken to be wrong with odds of 1 to 2^(3 s / 32), about what noise does
-/// that is 10 dB below the music; only the order of the lists follows from it.
+/// A bit of strength s is taken to be wrong with odds of 1 to 2^(3 s / 64): of the steps that were
+/// tried, the one that found most clips under noise. Only the order of the lists follows from it.
 std::vector<PartProbe> choose_probes(const Reading& reading, const PartTables& tables,
                                      uint64_t budget);
 

@@ -97,9 +97,9 @@ TEST(PartTables, ReachPlacesThatAreFarApart)
 TEST(PartTables, DoNotListSilence)
 {
     OwnedCorpus corpus;
-    corpus.add(1, std::vector<Code>{0, 0, 0xF0, 0});
+    corpus.add(1, std::vector<Code>{0, 0, 0xF00000, 0});
     const BuiltTable built = build_table(corpus.corpus(), 1);
-    EXPECT_EQ((Occurrences{{0xF, {0}}}), listed_without_empty(view(built)));
+    EXPECT_EQ((Occurrences{{0xF0, {0}}}), listed_without_empty(view(built)));
 }
 
 TEST(PartTables, LeadToNoPlaceBeyondTheLast)

@@ -84,9 +84,9 @@ TEST(Probes, TurnTheWeakestBits)
     Reading reading = reading_of(std::array<Code, 1>{0x5555555555555555});
     reading.sequences[0].strengths[0][21] = 3;
     const Values values = values_of(choose_probes(reading, built.tables, 1000));
-    EXPECT_TRUE(values.contains({0, part_of(near[1], 0)}));
-    EXPECT_FALSE(values.contains({0, part_of(near[0], 0)}));
-    EXPECT_FALSE(values.contains({0, part_of(near[2], 0)}));
+    EXPECT_TRUE(values.contains({1, part_of(near[1], 1)}));
+    EXPECT_FALSE(values.contains({1, part_of(near[0], 1)}));
+    EXPECT_FALSE(values.contains({1, part_of(near[2], 1)}));
 }
 
 TEST(Probes, StayWithinTheirBudget)
