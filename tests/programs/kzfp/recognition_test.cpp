@@ -263,10 +263,19 @@ TEST_F(Recognition, MissingCataloguesAreNamed)
         EXPECT_EQ("", result.out) << command;
         EXPECT_TRUE(contains(result.err, "/nonexistent/music.kzc")) << result.err;
         EXPECT_EQ(1, std::count(result.err.begin(), result.err.end(), '\n')) << result.err;
+        EXPECT_EQ(result.err.find("/nonexistent"), result.err.rfind("/nonexistent")) << result.err;
     }
 }
 
 // ---- Comparing
+
+TEST_F(Recognition, CompareRefusesWhatCannotBeReadTwice)
+{
+    const ProcessResult result = kzfp({"compare", music(), "-"}, fed_with(contents(music())));
+    EXPECT_EQ(1, result.status);
+    EXPECT_EQ("", result.out);
+    EXPECT_EQ("-: is read twice, so it must be a file; write the sound to one first\n", result.err);
+}
 
 TEST_F(Recognition, CompareFindsWhereOneFileBeginsInTheOther)
 {
@@ -338,6 +347,43 @@ TEST(KzfpAdd, FilesThatMovedKeepTheirTracks)
     ASSERT_EQ(1u, tracks.size());
     EXPECT_EQ(1, tracks[0]["track"]);
     EXPECT_EQ(json::array({after}), tracks[0]["sources"]);
+}
+
+TEST(KzfpAdd, FilesThatTookOthersNamesAreAllThere)
+{
+    const ScratchDirectory scratch;
+    const std::string catalogue = scratch.path("c.kzc");
+    const std::string first = scratch.write("a.wav", wav(piece(1, 5)));
+    const std::string second = scratch.write("b.wav", wav(piece(2, 6)));
+    output_of({"add", catalogue, first, second});
+    fs::rename(first, scratch.path("x"));
+    fs::rename(second, first);
+    fs::rename(scratch.path("x"), second);
+    EXPECT_EQ("moved " + first + "\nadded " + second + "\n1 added, 1 moved\n",
+              output_of({"add", catalogue, first, second}));
+    const std::vector<json> tracks = lines_of(output_of({"list", "-f", "json", catalogue}));
+    ASSERT_EQ(2u, tracks.size());
+    EXPECT_EQ(json::array({first}), tracks[0]["sources"]);
+    EXPECT_EQ(json::array({second}), tracks[1]["sources"]);
+    EXPECT_NEAR(6, tracks[0]["seconds"].get<double>(), 0.01);
+    EXPECT_NEAR(5, tracks[1]["seconds"].get<double>(), 0.01);
+}
+
+TEST(KzfpAdd, AMovedFileKeepsItsTrackFromItsSuccessor)
+{
+    const ScratchDirectory scratch;
+    const std::string catalogue = scratch.path("c.kzc");
+    const std::string name = scratch.write("a.wav", wav(piece(1, 5)));
+    const std::string after = scratch.path("b.wav");
+    output_of({"add", catalogue, name});
+    fs::rename(name, after);
+    scratch.write("a.wav", wav(piece(2, 6)));
+    EXPECT_EQ("added " + name + "\nmoved " + after + "\n1 added, 1 moved\n",
+              output_of({"add", catalogue, name, after}));
+    const std::vector<json> tracks = lines_of(output_of({"list", "-f", "json", catalogue}));
+    ASSERT_EQ(2u, tracks.size());
+    EXPECT_EQ(json::array({after}), tracks[0]["sources"]);
+    EXPECT_EQ(json::array({name}), tracks[1]["sources"]);
 }
 
 TEST(KzfpAdd, CopiesAreSourcesOfOneTrack)

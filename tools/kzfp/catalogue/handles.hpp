@@ -31,6 +31,24 @@ inline void check(kzcat_status status)
     }
 }
 
+/// Whether what a call was to work on was there. Throws as check() does for other failures.
+inline bool was_found(kzcat_status status)
+{
+    if (status != KZCAT_ERROR_NOT_FOUND) {
+        check(status);
+    }
+    return status != KZCAT_ERROR_NOT_FOUND;
+}
+
+/// A failure with the path of the catalogue before it, which many of the library's sentences begin
+/// with already.
+inline std::string message_about(const std::string& path, const CatalogueError& error)
+{
+    const std::string begin = path.empty() ? "" : path + ": ";
+    const std::string text = error.what();
+    return text.starts_with(begin) ? text : begin + text;
+}
+
 template <auto free>
 struct FreeHandle {
     template <class Handle>
@@ -61,10 +79,7 @@ template <class Owner, class Find, class... Arguments>
 Owner found(Find find, Arguments... arguments)
 {
     typename Owner::pointer handle = nullptr;
-    const kzcat_status status = find(arguments..., &handle);
-    if (status != KZCAT_ERROR_NOT_FOUND) {
-        check(status);
-    }
+    was_found(find(arguments..., &handle));
     return Owner(handle);
 }
 

@@ -193,8 +193,9 @@ std::string to_json(const Arrival& arrival)
 /// Puts what was read into the catalogue and reports each file once it is on disk.
 class Writer {
 public:
-    Writer(kzcat_catalogue& catalogue, const AddSettings& settings, size_t files)
-        : catalogue_(catalogue), settings_(settings), progress_(files)
+    Writer(kzcat_catalogue& catalogue, const AddSettings& settings, const Reader& reader,
+           size_t files)
+        : catalogue_(catalogue), settings_(settings), reader_(reader), progress_(files)
     {
     }
 
@@ -210,11 +211,9 @@ public:
 
     void write()
     {
+        move_sources(); // before other sound takes their places, and their tracks with the last one
         add_tracks();
-        for (Arrival& arrival : waiting_) {
-            if (arrival.outcome == Outcome::moved) {
-                move_source(arrival);
-            }
+        for (const Arrival& arrival : waiting_) {
             report(arrival);
         }
         waiting_.clear();
@@ -272,21 +271,36 @@ private:
         }
     }
 
-    /// The same bytes at another path. Where they were before is forgotten when nothing is there
-    /// any more.
-    void move_source(const Arrival& arrival)
+    /// A track can have gone since its file was read, for example when two files have taken each
+    /// other's names. That file is then read again.
+    void move_sources()
+    {
+        for (Arrival& arrival : waiting_) {
+            while (arrival.outcome == Outcome::moved && !move_source(arrival)) {
+                arrival = reader_.read({.path = arrival.path, .trouble = {}});
+            }
+        }
+    }
+
+    /// The same bytes at another path; false when their track is gone. Where they were before is
+    /// forgotten when nothing is there any more.
+    bool move_source(const Arrival& arrival)
     {
         const kzcat_source source = source_of(arrival);
-        check(kzcat_add_source(&catalogue_, arrival.track, &source));
-        const auto track = made<Track>(kzcat_get_track, &catalogue_, arrival.track);
-        for (const kzcat_source& other : sources_of(track)) {
+        if (!was_found(kzcat_add_source(&catalogue_, arrival.track, &source))) {
+            return false;
+        }
+        const auto track = found<Track>(kzcat_get_track, &catalogue_, arrival.track);
+        const auto sources = track ? sources_of(track) : std::vector<kzcat_source>();
+        for (const kzcat_source& other : sources) {
             const bool same_bytes =
                 other.hash != nullptr &&
                 std::equal(arrival.hash->begin(), arrival.hash->end(), other.hash);
             if (other.uri != arrival.path && same_bytes && !file_exists(other.uri)) {
-                check(kzcat_remove_source(&catalogue_, other.uri));
+                was_found(kzcat_remove_source(&catalogue_, other.uri));
             }
         }
+        return true;
     }
 
     void report(const Arrival& arrival)
@@ -309,6 +323,7 @@ private:
 
     kzcat_catalogue& catalogue_;
     const AddSettings& settings_;
+    const Reader& reader_;
     Progress progress_;
     size_t taken_ = 0;
     std::vector<Arrival> waiting_;
@@ -322,7 +337,7 @@ ExitStatus add_all(const AddSettings& settings)
     const Catalogue catalogue = open_catalogue(settings.catalogue, KZCAT_ACCESS_CREATE);
     const FileList list = list_files(settings.files);
     const Reader reader(*catalogue, settings);
-    Writer writer(*catalogue, settings, list.files.size());
+    Writer writer(*catalogue, settings, reader, list.files.size());
     in_order(
         list.files.size(), settings.jobs, [&](size_t i) { return reader.read(list.files[i]); },
         [&](size_t, Arrival arrival) { writer.take(std::move(arrival)); });
@@ -355,7 +370,7 @@ ExitStatus run_add(const Arguments& arguments)
     try {
         return add_all(settings);
     } catch (const CatalogueError& error) {
-        write_message(settings.catalogue + ": " + error.what());
+        write_message(message_about(settings.catalogue, error));
         return some_file_failed;
     }
 }

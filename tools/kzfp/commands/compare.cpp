@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "kzfp/catalogue/answer.hpp"
+#include "kzfp/catalogue/files.hpp"
 #include "kzfp/catalogue/sound.hpp"
 #include "kzfp/command_line/common_options.hpp"
 #include "kzfp/output/write.hpp"
@@ -49,6 +50,10 @@ auto naming(const std::string& path, Work work)
 Compared read(const std::string& path)
 {
     return naming(path, [&path] {
+        if (path == "-" || state_of(path).size < 0) {
+            throw audio::FileError(
+                "is read twice, so it must be a file; write the sound to one first");
+        }
         Compared compared = {.path = path, .recording = read_recording(path, {}, false)};
         kzcat_trail_facts facts;
         check(kzcat_trail_get_facts(compared.recording.trail.get(), &facts));

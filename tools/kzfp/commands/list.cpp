@@ -161,7 +161,7 @@ ExitStatus run_list(const Arguments& arguments)
         list(settings);
         return all_done;
     } catch (const CatalogueError& error) {
-        write_message(settings.catalogue + ": " + error.what());
+        write_message(message_about(settings.catalogue, error));
         return some_file_failed;
     }
 }

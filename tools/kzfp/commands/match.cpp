@@ -129,7 +129,7 @@ ExitStatus run_match(const Arguments& arguments)
     try {
         return match_all(settings);
     } catch (const CatalogueError& error) {
-        write_message(settings.catalogue + ": " + error.what());
+        write_message(message_about(settings.catalogue, error));
         return some_file_failed;
     }
 }

@@ -30,7 +30,7 @@ bool merge_one(kzcat_catalogue& catalogue, const std::string& path)
                      " added, " + std::to_string(merged.tracks_known) + " known\n");
         return true;
     } catch (const CatalogueError& error) {
-        write_message(path + ": " + error.what());
+        write_message(message_about(path, error));
         return false;
     }
 }
@@ -64,7 +64,7 @@ ExitStatus run_merge(const Arguments& arguments)
     try {
         return merge_all(settings);
     } catch (const CatalogueError& error) {
-        write_message(settings.catalogue + ": " + error.what());
+        write_message(message_about(settings.catalogue, error));
         return some_file_failed;
     }
 }

@@ -78,7 +78,7 @@ ExitStatus run_remove(const Arguments& arguments)
     try {
         return remove_all(settings);
     } catch (const CatalogueError& error) {
-        write_message(settings.catalogue + ": " + error.what());
+        write_message(message_about(settings.catalogue, error));
         return some_file_failed;
     }
 }

@@ -49,7 +49,7 @@ ExitStatus run_verify(const Arguments& arguments)
     try {
         return verify(path);
     } catch (const CatalogueError& error) {
-        write_message(path + ": " + error.what());
+        write_message(message_about(path, error));
         return some_file_failed;
     }
 }
