@@ -65,6 +65,7 @@ int main(int argc, char** argv)
         return some_file_failed;
     }
     std::signal(SIGPIPE, SIG_IGN); // a closed pipe shows as an error of write()
+    std::signal(SIGXFSZ, SIG_IGN); // so does a limit on the size of files
     try {
         return run_command(argc, argv);
     } catch (const OutputError& error) {

@@ -11,6 +11,7 @@
 
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
+#include <sys/resource.h>
 
 #include "kzcat.h"
 #include "support/signals.hpp"
@@ -384,6 +385,22 @@ TEST(KzfpAdd, AMovedFileKeepsItsTrackFromItsSuccessor)
     ASSERT_EQ(2u, tracks.size());
     EXPECT_EQ(json::array({after}), tracks[0]["sources"]);
     EXPECT_EQ(json::array({name}), tracks[1]["sources"]);
+}
+
+TEST(KzfpAdd, ALimitOnTheSizeOfFilesIsAnError)
+{
+    const ScratchDirectory scratch;
+    const std::string catalogue = scratch.path("c.kzc");
+    const std::string file = scratch.write("a.wav", wav(piece(1, 5)));
+    rlimit usual = {};
+    ASSERT_EQ(0, getrlimit(RLIMIT_FSIZE, &usual));
+    const rlimit low = {.rlim_cur = 40'000, .rlim_max = usual.rlim_max};
+    ASSERT_EQ(0, setrlimit(RLIMIT_FSIZE, &low));
+    const ProcessResult result = kzfp({"add", catalogue, file});
+    ASSERT_EQ(0, setrlimit(RLIMIT_FSIZE, &usual));
+    EXPECT_EQ(1, result.status);
+    EXPECT_TRUE(contains(result.err, "make room")) << result.err;
+    EXPECT_EQ("added " + file + "\n1 added\n", output_of({"add", catalogue, file}));
 }
 
 TEST(KzfpAdd, CopiesAreSourcesOfOneTrack)
