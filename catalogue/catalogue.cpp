@@ -20,20 +20,45 @@ struct WholeTrack {
     DocumentBands bands;
 };
 
-/// The next tracks after `after`, which moves on to the last of them; none at the end.
-std::vector<WholeTrack> read_batch(Store& store, int64_t& after)
+struct Batch {
+    std::vector<WholeTrack> tracks;
+    uint64_t passed = 0; ///< tracks that were looked at
+    uint64_t damaged = 0;
+};
+
+/// Reads what belongs to a track; false when that is damaged.
+bool complete(Store& store, WholeTrack& track)
 {
-    std::vector<WholeTrack> batch;
-    store.visit_tracks(after, [&](const TrackInfo& info) {
-        batch.push_back({.info = info, .trail = {}, .bands = {}});
-        return batch.size() < kBatch;
-    });
-    if (!batch.empty()) {
-        after = batch.back().info.id;
-    }
-    for (WholeTrack& track : batch) {
+    try {
         track.trail = store.trail(track.info.id).value_or(Trail{});
         track.bands = store.document_bands(track.info.id).value_or(DocumentBands{});
+        return true;
+    } catch (const StoreError& error) {
+        if (error.kind() != StoreError::Kind::damaged) {
+            throw;
+        }
+        return false;
+    }
+}
+
+/// The next tracks after `after`, which moves on to the last of them; none are passed at the end.
+Batch read_batch(Store& store, int64_t& after)
+{
+    std::vector<TrackInfo> found;
+    store.visit_tracks(after, [&](const TrackInfo& info) {
+        found.push_back(info);
+        return found.size() < kBatch;
+    });
+    Batch batch;
+    for (TrackInfo& info : found) {
+        after = info.id;
+        ++batch.passed;
+        WholeTrack track = {.info = std::move(info), .trail = {}, .bands = {}};
+        if (!complete(store, track)) {
+            ++batch.damaged;
+        } else if (!track.trail.codes.empty()) { // else another process has removed it meanwhile
+            batch.tracks.push_back(std::move(track));
+        }
     }
     return batch;
 }
@@ -60,9 +85,7 @@ std::vector<NewTrack> to_new_tracks(const std::vector<WholeTrack>& batch)
 {
     std::vector<NewTrack> tracks;
     for (const WholeTrack& track : batch) {
-        if (!track.trail.codes.empty()) { // else another process has removed it meanwhile
-            append_to(tracks, track);
-        }
+        append_to(tracks, track);
     }
     return tracks;
 }
@@ -195,17 +218,17 @@ bool Catalogue::merge(Catalogue& other, const Progress& progress, Merged& merged
     const uint64_t total = other.with_store([](Store& store) { return store.track_count(); });
     uint64_t done = 0;
     for (int64_t after = 0;;) {
-        const auto batch =
+        const Batch batch =
             other.with_store([&after](Store& store) { return read_batch(store, after); });
-        if (batch.empty()) {
+        if (batch.passed == 0) {
             return true;
         }
-        const auto tracks = to_new_tracks(batch);
-        const auto added = add(tracks);
+        const auto added = add(to_new_tracks(batch.tracks));
         const auto fresh = std::ranges::count_if(added, &Added::is_new);
         merged.tracks_new += static_cast<uint64_t>(fresh);
-        merged.tracks_known += batch.size() - static_cast<uint64_t>(fresh);
-        done += batch.size();
+        merged.tracks_known += batch.tracks.size() - static_cast<uint64_t>(fresh);
+        merged.tracks_damaged += batch.damaged;
+        done += batch.passed;
         if (!progress(done, total)) {
             return false;
         }

@@ -23,6 +23,7 @@ namespace kzcat {
 struct Merged {
     uint64_t tracks_new = 0;
     uint64_t tracks_known = 0;
+    uint64_t tracks_damaged = 0; ///< left out
 };
 
 /// Called with tracks done and in all; stops the work by returning false.
@@ -65,7 +66,7 @@ public:
     IndexFacts index_facts(bool open);
     bool index_is_open();
 
-    /// Adds all tracks of another catalogue, in batches, each of which is kept or not as a whole.
+    /// Adds all whole tracks of another catalogue, in batches, each of which is kept or not as a whole.
     /// `merged` is up to date whenever a batch ends, also when the call throws. Returns false when
     /// `progress` stopped it.
     bool merge(Catalogue& other, const Progress& progress, Merged& merged);

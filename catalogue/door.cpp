@@ -193,6 +193,7 @@ kzcat_status kzcat_merge(kzcat_catalogue* catalogue, kzcat_catalogue* other,
         const auto report = [&](uint64_t done, uint64_t total) {
             record.tracks_new = merged.tracks_new;
             record.tracks_known = merged.tracks_known;
+            record.tracks_damaged = merged.tracks_damaged;
             return watched(done, total);
         };
         static_cast<void>(catalogue->whole.merge(other->whole, report, merged));

@@ -763,15 +763,16 @@ KZ_API kzcat_status kzcat_verify(kzcat_catalogue* catalogue, kzcat_fault report,
 
 /** What kzcat_merge() did. */
 typedef struct kzcat_merged {
-    uint64_t tracks_new;   /**< tracks that were added */
-    uint64_t tracks_known; /**< tracks that were there: they have the other's sources as well now */
-    uint32_t reserved[4];  /**< 0 */
+    uint64_t tracks_new;     /**< tracks that were added */
+    uint64_t tracks_known;   /**< tracks that were there: they have the other's sources too now */
+    uint64_t tracks_damaged; /**< tracks that were left out: kzcat_verify() says which and why */
+    uint32_t reserved[2];    /**< 0 */
 } kzcat_merged;
 
 /**
- * Adds all tracks of another catalogue, with their tags and sources. It may be repeated: what is
- * there already stays as it is. After a failure or when it was stopped, what was merged so far is
- * kept.
+ * Adds all tracks of another catalogue, with their tags and sources. Tracks that are damaged are
+ * left out and counted. It may be repeated: what is there already stays as it is. After a failure
+ * or when it was stopped, what was merged so far is kept.
  *
  * @param catalogue  Open for writing.
  * @param other      Another handle; it is only read.

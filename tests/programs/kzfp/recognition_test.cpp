@@ -597,6 +597,29 @@ TEST(KzfpMerge, BringsTracksWithTheirTags)
     EXPECT_EQ(true, tracks[1]["documents"]);
 }
 
+TEST(KzfpMerge, TakesWhatIsWholeOfADamagedCatalogue)
+{
+    const ScratchDirectory scratch;
+    const std::string other = scratch.path("other.kzc");
+    const std::string into = scratch.path("into.kzc");
+    for (uint64_t seed = 1; seed <= 3; ++seed) {
+        output_of(
+            {"add", other, scratch.write(std::to_string(seed) + ".wav", wav(piece(seed, 9)))});
+    }
+    const std::string trail = trail_file(piece(2, 9));
+    std::string bytes = contents(other);
+    const size_t codes = bytes.find(trail.substr(trail.size() - 100));
+    ASSERT_NE(std::string::npos, codes);
+    bytes[codes] = static_cast<char>(bytes[codes] ^ 1);
+    scratch.write("other.kzc", bytes);
+    const ProcessResult result = kzfp({"merge", into, other});
+    EXPECT_EQ(1, result.status);
+    EXPECT_EQ(other + ": 2 added, 0 known\n", result.out);
+    EXPECT_EQ(other + ": 1 track is damaged and left out; verify names what to add again\n",
+              result.err);
+    EXPECT_EQ(2u, lines_of(output_of({"list", "-f", "json", into})).size());
+}
+
 TEST(KzfpVerify, NoticesDamage)
 {
     const ScratchDirectory scratch;

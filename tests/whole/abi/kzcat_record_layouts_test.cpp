@@ -190,6 +190,7 @@ TEST(CatalogueRecordLayout, OfMergeCounts)
     expect_layout<Record>({
         FIELD(Record, tracks_new),
         FIELD(Record, tracks_known),
+        FIELD(Record, tracks_damaged),
         FIELD(Record, reserved),
     });
     EXPECT_EQ(32U, sizeof(Record));

@@ -28,7 +28,12 @@ bool merge_one(kzcat_catalogue& catalogue, const std::string& path)
         check(kzcat_merge(&catalogue, other.get(), nullptr, nullptr, &merged));
         write_output(without_control_characters(path) + ": " + std::to_string(merged.tracks_new) +
                      " added, " + std::to_string(merged.tracks_known) + " known\n");
-        return true;
+        if (merged.tracks_damaged != 0) {
+            write_message(path + ": " + std::to_string(merged.tracks_damaged) +
+                          (merged.tracks_damaged == 1 ? " track is" : " tracks are") +
+                          " damaged and left out; verify names what to add again");
+        }
+        return merged.tracks_damaged == 0;
     } catch (const CatalogueError& error) {
         write_message(message_about(path, error));
         return false;
@@ -52,7 +57,7 @@ ExitStatus merge_all(const MergeSettings& settings)
 ExitStatus run_merge(const Arguments& arguments)
 {
     CLI::App parser(kDescription, program_name(arguments));
-    parser.footer("Exit: 0 all are merged; 1 one could not be; 2 wrong usage.");
+    parser.footer("Exit: 0 all are merged; 1 one could not be, or not as a whole; 2 wrong usage.");
     MergeSettings settings;
     add_catalogue_option(parser, settings.catalogue);
     parser.add_option("OTHER", settings.others, "Catalogues, which are only read")
