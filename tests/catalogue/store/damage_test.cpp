@@ -218,8 +218,8 @@ const char* const kChangesOfValues[] = {
     "UPDATE change SET mark = mark + 1 WHERE id = 3",
     "DELETE FROM change WHERE id = 3",
     "UPDATE change SET id = 1000 WHERE id = 68",
-    "DELETE FROM change WHERE id = 68; UPDATE sqlite_sequence SET seq = 67 "
-    "WHERE name = 'change'",
+    ("DELETE FROM change WHERE id = 68;"
+     "UPDATE sqlite_sequence SET seq = 67 WHERE name = 'change'"),
     "UPDATE sqlite_sequence SET seq = 30 WHERE name = 'track'",
     "UPDATE sqlite_sequence SET seq = 30 WHERE name = 'change'",
     "UPDATE sqlite_sequence SET name = 'trbck' WHERE name = 'track'",
