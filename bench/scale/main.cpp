@@ -163,7 +163,8 @@ public:
         } else if (const auto id = ids_.at(clip.track); !by_scan_ || has(by_scan, id)) {
             const bool base = hypothesis == kzcat::Hypothesis{};
             const double threshold =
-                kzcat::threshold_for(scan.code_count(), 1) + (base ? 0 : kzcat::kFurtherMargin);
+                kzcat::threshold_for(scan.code_count(), 1, kzcat::kFullWindow) +
+                (base ? 0 : kzcat::kFurtherMargin);
             if (scorer.score(scan.codes(id)).score >= threshold) {
                 tally.accepted += 1;
                 tally.accepted_by_parts += static_cast<size_t>(has(by_parts, id));

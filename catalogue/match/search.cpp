@@ -30,6 +30,12 @@ bool says_enough(const Reading& reading)
     });
 }
 
+/// Of the first window; the others are as long.
+double window_seconds(const Source& source)
+{
+    return source.windows() == 0 ? 0.0 : source.end(0) - source.begin(0);
+}
+
 Verdict verdict_of(const WindowHits& found)
 {
     if (!found.heard) {
@@ -66,7 +72,7 @@ void Hits::sort() { std::sort(hits_.begin(), hits_.end(), comes_first); }
 
 WindowSearch::WindowSearch(Source& source, Searcher& searcher, const MatchOptions& options)
     : source_(source), searcher_(searcher), speeds_(options.speeds && source.adjustable()),
-      threshold_(threshold_for(searcher.code_count(), source.windows()))
+      threshold_(threshold_for(searcher.code_count(), source.windows(), window_seconds(source)))
 {
 }
 

@@ -3,6 +3,8 @@
 
 #include "catalogue/match/thresholds.hpp"
 
+#include <algorithm>
+
 namespace kzcat {
 namespace {
 
@@ -24,14 +26,20 @@ double binary_logarithm(double x)
     return result;
 }
 
+double short_allowance(double seconds)
+{
+    const double missing = (kFullWindow - seconds) / (kFullWindow - kShortWindow);
+    return kShortAllowance * std::clamp(missing, 0.0, 1.0);
+}
+
 } // namespace
 
-double threshold_for(uint64_t codes, size_t windows)
+double threshold_for(uint64_t codes, size_t windows, double seconds)
 {
     double places = static_cast<double>(codes) / kReferenceCodes;
     places = places < 1 ? 1 : places;
     places *= windows < 1 ? 1.0 : static_cast<double>(windows);
-    return kBaseThreshold + kThresholdGrowth * binary_logarithm(places);
+    return kBaseThreshold - short_allowance(seconds) + kThresholdGrowth * binary_logarithm(places);
 }
 
 } // namespace kzcat

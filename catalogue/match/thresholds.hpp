@@ -10,13 +10,20 @@ namespace kzcat {
 /// What a clip's score has to reach in a catalogue of kReferenceCodes codes or fewer, when it is
 /// read as it is, and how much more when it had to be read at another speed, tempo or pitch: each
 /// of those readings is one more chance for a stranger.
-constexpr double kBaseThreshold = 7.6;
+constexpr double kBaseThreshold = 7.3;
 constexpr double kFurtherMargin = 1.0;
 
 /// The highest score of strangers grows by this much whenever the number of places that are
 /// compared doubles, and so does the threshold.
 constexpr double kThresholdGrowth = 0.12;
 constexpr double kReferenceCodes = 216000;
+
+/// A short clip resembles strangers less: what two recordings have in common by their style adds up
+/// over time, as what they have in common by chance does not. So windows shorter than kFullWindow
+/// need less, and those of kShortWindow or less need kShortAllowance less; in seconds.
+constexpr double kFullWindow = 14.2;
+constexpr double kShortWindow = 6.0;
+constexpr double kShortAllowance = 0.2;
 
 /// A score this far below its threshold is "not sure" rather than "no match".
 constexpr double kUnsureBelow = 0.5;
@@ -52,13 +59,14 @@ constexpr double kLeastOwnSpread = 0.3;
 /// the track. Rhythm without melody stands out in the catalogue only: drum loops, metronomes and
 /// hum reach 20 to 50 there and hardly more than 4.3 among their own places.
 constexpr double kLoopShare = 0.6;
-constexpr double kMostOverOwn = 1.6;
+constexpr double kMostOverOwn = 1.5;
 
 /// The longest window that is searched at once, in codes, 16.7 s: over longer ones a small error of
 /// the tempo adds up. Longer clips are cut.
 constexpr size_t kLongestWindow = 90;
 
-/// The threshold of a catalogue for a clip of some windows that are searched one by one.
-double threshold_for(uint64_t codes, size_t windows);
+/// The threshold of a catalogue for a clip of some windows that are searched one by one, each of
+/// so many seconds.
+double threshold_for(uint64_t codes, size_t windows, double seconds);
 
 } // namespace kzcat

@@ -130,12 +130,23 @@ TEST(Hypotheses, AreSixSpeedsSixTempiAndSixPitches)
 TEST(Thresholds, GrowWithEveryDoubling)
 {
     const auto reference = static_cast<uint64_t>(kReferenceCodes);
-    EXPECT_DOUBLE_EQ(kBaseThreshold, threshold_for(0, 1));
-    EXPECT_DOUBLE_EQ(kBaseThreshold, threshold_for(reference, 1));
-    EXPECT_NEAR(kBaseThreshold + kThresholdGrowth, threshold_for(2 * reference, 1), 1e-9);
-    EXPECT_NEAR(kBaseThreshold + 2 * kThresholdGrowth, threshold_for(2 * reference, 2), 1e-9);
+    EXPECT_DOUBLE_EQ(kBaseThreshold, threshold_for(0, 1, kFullWindow));
+    EXPECT_DOUBLE_EQ(kBaseThreshold, threshold_for(reference, 1, kFullWindow));
+    EXPECT_NEAR(kBaseThreshold + kThresholdGrowth, threshold_for(2 * reference, 1, kFullWindow),
+                1e-9);
+    EXPECT_NEAR(kBaseThreshold + 2 * kThresholdGrowth, threshold_for(2 * reference, 2, kFullWindow),
+                1e-9);
     EXPECT_NEAR(kBaseThreshold + kThresholdGrowth * std::log2(59.0),
-                threshold_for(59 * reference, 1), 1e-8);
+                threshold_for(59 * reference, 1, kFullWindow), 1e-8);
+}
+
+TEST(Thresholds, AreLowerForShortClips)
+{
+    EXPECT_DOUBLE_EQ(kBaseThreshold - kShortAllowance, threshold_for(0, 1, kShortWindow));
+    EXPECT_DOUBLE_EQ(kBaseThreshold - kShortAllowance, threshold_for(0, 1, 2.5));
+    EXPECT_NEAR(kBaseThreshold - kShortAllowance / 2,
+                threshold_for(0, 1, (kShortWindow + kFullWindow) / 2), 1e-9);
+    EXPECT_DOUBLE_EQ(kBaseThreshold, threshold_for(0, 1, 16.7));
 }
 
 } // namespace
