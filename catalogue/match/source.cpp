@@ -4,6 +4,7 @@
 #include "catalogue/match/source.hpp"
 
 #include <algorithm>
+#include <cstdint>
 
 #include "catalogue/match/thresholds.hpp"
 
@@ -17,11 +18,12 @@ std::vector<Window> windows_of(size_t count, size_t longest, size_t shared)
         return {{.first = 0, .count = count}};
     }
     const size_t fresh = longest - shared;
-    const size_t needed = (count - shared + fresh - 1) / fresh;
+    const uint64_t own = count - shared;
+    const uint64_t needed = (own + fresh - 1) / fresh;
     std::vector<Window> windows;
-    for (size_t i = 0; i < needed; ++i) {
-        const size_t first = i * (count - shared) / needed;
-        const size_t end = (i + 1) * (count - shared) / needed + shared;
+    for (uint64_t i = 0; i < needed; ++i) { // a day times its windows does not fit 32 bits
+        const auto first = static_cast<size_t>(i * own / needed);
+        const auto end = static_cast<size_t>((i + 1) * own / needed) + shared;
         windows.push_back({.first = first, .count = end - first});
     }
     return windows;

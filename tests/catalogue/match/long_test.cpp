@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include "catalogue/match/source.hpp"
 #include "musical_corpus.hpp"
 #include "support/signals.hpp"
 
@@ -56,6 +57,21 @@ TEST(LongClips, AreFoundAtAnotherSpeed)
     ASSERT_EQ(Verdict::match, answer.verdict);
     EXPECT_NEAR(1.04, answer.matches[0].speed, 0.002);
     expect_passage(4, 0, 50 / 1.04, 5, answer.matches[0]);
+}
+
+TEST(LongClips, OfTwoDaysAreCutFromEndToEnd)
+{
+    Trail trail;
+    trail.codes.resize(1'000'000);
+    trail.samples = (trail.codes.size() - 1) * kCodeHop + kFrameLength;
+    const auto source = source_of(trail);
+    double end = 0;
+    for (size_t window = 0; window < source->windows(); ++window) {
+        ASSERT_DOUBLE_EQ(end, source->begin(window)) << window;
+        end = source->end(window);
+        ASSERT_LT(source->begin(window), end) << window;
+    }
+    EXPECT_DOUBLE_EQ(trail.seconds(), end);
 }
 
 TEST(LongClips, AddUpWhatTheirWindowsSay)
