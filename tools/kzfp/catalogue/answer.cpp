@@ -103,7 +103,7 @@ std::string percent_text(double factor, const char* more, const char* less)
     return ", " + printed("%.1f %% ", std::fabs(percent)) + (percent > 0 ? more : less);
 }
 
-/// "Title (path) at 1:02.3, score 23.1 (7.6 needed)".
+/// "Title (path) at 1:02.3, score 23.1 (7.3 needed)".
 std::string to_text(const FoundTrack& found, const Lookup& lookup)
 {
     std::string text = name_text(found) + " at " + clock_text(found.offset);

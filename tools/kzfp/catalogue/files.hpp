@@ -23,7 +23,7 @@ struct FileList {
 };
 
 /// What was named, in this order; folders are replaced by the sound files below them, sorted by
-/// their names. Sound files are told by the ends of their names.
+/// their names. Sound files are recognised by the endings of their names.
 FileList list_files(const std::vector<std::string>& named);
 
 /// What tells whether a file has changed.
