@@ -317,7 +317,7 @@ TEST(KzfpAdd, MakesTheCatalogueAndListsWhatItAdded)
     ASSERT_EQ(2u, tracks.size());
     EXPECT_EQ(1, tracks[0]["track"]);
     EXPECT_EQ(first, tracks[0]["sources"][0]);
-    EXPECT_EQ("a", tracks[0]["tags"]["title"]);
+    EXPECT_EQ(json::array({"a"}), tracks[0]["tags"]["title"]);
     EXPECT_NEAR(5, tracks[0]["seconds"].get<double>(), 0.01);
     EXPECT_EQ(2, tracks[1]["track"]);
 }
@@ -592,7 +592,7 @@ TEST(KzfpMerge, BringsTracksWithTheirTags)
     EXPECT_EQ(other + ": 0 added, 2 known\n", output_of({"merge", into, other}));
     const std::vector<json> tracks = lines_of(output_of({"list", "-f", "json", into}));
     ASSERT_EQ(2u, tracks.size());
-    EXPECT_EQ("2", tracks[1]["tags"]["title"]);
+    EXPECT_EQ(json::array({"2"}), tracks[1]["tags"]["title"]);
     EXPECT_EQ(true, tracks[0]["documents"]);
     EXPECT_EQ(true, tracks[1]["documents"]);
 }
@@ -652,6 +652,25 @@ TEST(KzfpList, SaysHowClipsAreLookedUp)
     EXPECT_EQ(catalogue, summary["catalogue"]);
     EXPECT_EQ(1, summary["tracks"]);
     EXPECT_EQ("scan", summary["plan"]);
+}
+
+TEST(KzfpList, ShowsEveryTagOfOneName)
+{
+    const ScratchDirectory scratch;
+    const std::string catalogue = scratch.path("c.kzc");
+    const std::string bytes = trail_file(piece(1, 5));
+    const kzcat_tag tags[] = {{"artist", "One"}, {"title", "Song"}, {"artist", "Two"}};
+    kzcat_trail* trail = nullptr;
+    kzcat_catalogue* opened = nullptr;
+    ASSERT_EQ(KZCAT_OK, kzcat_trail_read(bytes.data(), bytes.size(), &trail));
+    ASSERT_EQ(KZCAT_OK, kzcat_open(catalogue.c_str(), KZCAT_ACCESS_CREATE, nullptr, &opened));
+    const kzcat_new_track track = {
+        .trail = trail, .source = {"a", -1, -1, nullptr}, .tags = tags, .tag_count = 3};
+    EXPECT_EQ(KZCAT_OK, kzcat_add(opened, &track, 1, nullptr));
+    kzcat_close(&opened);
+    kzcat_trail_free(&trail);
+    const json listed = json::parse(output_of({"list", "-f", "json", catalogue}));
+    EXPECT_EQ((json{{"artist", {"One", "Two"}}, {"title", json::array({"Song"})}}), listed["tags"]);
 }
 
 } // namespace

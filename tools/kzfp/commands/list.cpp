@@ -51,7 +51,7 @@ std::string to_json(const Track& track, const kzcat_track_facts& facts)
     object["tags"] = Object::object();
     for (uint32_t i = 0; i < facts.tag_count; ++i) {
         const kzcat_tag tag = tag_at(track, i);
-        object["tags"][tag.name] = tag.value;
+        object["tags"][tag.name].push_back(tag.value); // there may be several of one name
     }
     object["sources"] = Object::array();
     for (uint32_t i = 0; i < facts.source_count; ++i) {
