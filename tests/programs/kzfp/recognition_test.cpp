@@ -77,6 +77,45 @@ std::string trail_file(const std::vector<int16_t>& samples)
     return bytes;
 }
 
+/// A FLAC file as it was, with no tags but this title.
+std::string with_title(const std::string& flac, const std::string& title)
+{
+    constexpr size_t kFirstBlock = 4 + 4 + 34; // marker, header and what is known of the sound
+    const auto lowest_first = [](size_t number) {
+        std::string bytes;
+        for (int i = 0; i < 4; ++i, number >>= 8U) {
+            bytes += static_cast<char>(number & 0xffU);
+        }
+        return bytes;
+    };
+    const auto byte = [&flac](size_t at) { return static_cast<uint8_t>(flac.at(at)); };
+    size_t frames = 4;
+    for (bool last = false; !last;) {
+        last = byte(frames) >= 0x80;
+        frames += 4 + (size_t{byte(frames + 1)} << 16U) + (size_t{byte(frames + 2)} << 8U) +
+                  byte(frames + 3);
+    }
+    const std::string tag = "TITLE=" + title;
+    const std::string tags = lowest_first(0) + lowest_first(1) + lowest_first(tag.size()) + tag;
+    std::string header = lowest_first(tags.size());
+    std::swap(header[0], header[2]);
+    std::string begin = flac.substr(0, kFirstBlock);
+    begin[4] = 0; // not the last block any more
+    return begin + '\x84' + header.substr(0, 3) + tags + flac.substr(frames);
+}
+
+/// Works in a folder meanwhile.
+class WorkingIn {
+public:
+    explicit WorkingIn(const std::string& folder) { fs::current_path(folder); }
+    ~WorkingIn() { fs::current_path(before_); }
+    WorkingIn(const WorkingIn&) = delete;
+    WorkingIn& operator=(const WorkingIn&) = delete;
+
+private:
+    fs::path before_ = fs::current_path();
+};
+
 /// A catalogue of a real piece and some others, made once; tests only read it.
 class Recognition : public ::testing::Test {
 protected:
@@ -350,6 +389,23 @@ TEST(KzfpAdd, FilesThatMovedKeepTheirTracks)
     EXPECT_EQ(json::array({after}), tracks[0]["sources"]);
 }
 
+TEST(KzfpAdd, RelativePathsAreKeptFromElsewhere)
+{
+    const ScratchDirectory scratch;
+    const std::string catalogue = scratch.path("c.kzc");
+    scratch.write("here/a.wav", wav(piece(1, 5)));
+    scratch.write("there/b.wav", wav(piece(1, 5)));
+    {
+        const WorkingIn here(scratch.path("here"));
+        output_of({"add", catalogue, "a.wav"});
+    }
+    const WorkingIn there(scratch.path("there"));
+    EXPECT_EQ("moved b.wav\n1 moved\n", output_of({"add", catalogue, "b.wav"}));
+    const std::vector<json> tracks = lines_of(output_of({"list", "-f", "json", catalogue}));
+    ASSERT_EQ(1u, tracks.size());
+    EXPECT_EQ((json{"a.wav", "b.wav"}), tracks[0]["sources"]);
+}
+
 TEST(KzfpAdd, FilesThatTookOthersNamesAreAllThere)
 {
     const ScratchDirectory scratch;
@@ -445,6 +501,24 @@ TEST(KzfpAdd, BadFilesDoNotStopTheOthers)
     EXPECT_EQ(4, std::count(result.err.begin(), result.err.end(), '\n')) << result.err;
 }
 
+TEST(KzfpAdd, ARefusedTrackDoesNotStopTheOthers)
+{
+    const ScratchDirectory scratch;
+    const std::string catalogue = scratch.path("c.kzc");
+    const std::string first = scratch.write("a.wav", wav(piece(1, 5)));
+    const std::string second = scratch.write("c.wav", wav(piece(2, 5)));
+    const std::string refused =
+        scratch.write("b.flac", with_title(contents(clip("music.flac")),
+                                           std::string((size_t{1} << 20) + 1, 'x')));
+    const ProcessResult result = kzfp({"add", catalogue, first, refused, second});
+    EXPECT_EQ(1, result.status);
+    EXPECT_EQ("added " + first + "\nadded " + second + "\n2 added, 1 failed\n", result.out);
+    EXPECT_TRUE(contains(result.err, refused + ": the value of a tag")) << result.err;
+    EXPECT_TRUE(contains(result.err, "is too long")) << result.err;
+    EXPECT_EQ(1, std::count(result.err.begin(), result.err.end(), '\n')) << result.err;
+    EXPECT_EQ("2 unchanged\n", output_of({"add", catalogue, first, second}));
+}
+
 TEST(KzfpAdd, FoldersAreWalkedInTheOrderOfNames)
 {
     const ScratchDirectory scratch;
@@ -480,15 +554,26 @@ TEST(KzfpAdd, IdsDoNotDependOnTheNumberOfThreads)
     EXPECT_EQ(tracks("1"), tracks("6"));
 }
 
-TEST(KzfpAdd, TheCatalogueItselfIsNotTakenForSound)
+TEST(KzfpAdd, TheCataloguesOwnFilesAreNotRead)
 {
     const ScratchDirectory scratch;
     const std::string catalogue = scratch.path("c.kzc");
     const std::string file = scratch.write("a.wav", wav(piece(1, 4)));
     output_of({"add", catalogue, file});
-    const ProcessResult result = kzfp({"add", catalogue, catalogue});
-    EXPECT_EQ(1, result.status);
-    EXPECT_EQ(catalogue + ": is the catalogue itself\n", result.err);
+    const std::string link = scratch.path("link.kzc");
+    fs::create_symlink(catalogue, link);
+    fs::create_hard_link(catalogue, scratch.path("hard.wav"));
+    // Closing one of them would give up the locks that the program holds on it.
+    for (const std::string& name : {catalogue, catalogue + "-wal", catalogue + "-shm",
+                                    catalogue + "-journal", link, scratch.path("hard.wav")}) {
+        for (const std::string& opened : {catalogue, link}) {
+            for (const char* command : {"add", "match"}) {
+                const ProcessResult result = kzfp({command, opened, name});
+                EXPECT_EQ(1, result.status);
+                EXPECT_EQ(name + ": belongs to the catalogue itself\n", result.err) << command;
+            }
+        }
+    }
     EXPECT_EQ(catalogue + ": 1 track, whole\n", output_of({"verify", catalogue}));
 }
 

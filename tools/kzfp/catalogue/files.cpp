@@ -124,16 +124,25 @@ FileState state_of(const std::string& path)
                 int64_t{facts.st_mtim.tv_sec} * 1'000'000'000 + int64_t{facts.st_mtim.tv_nsec}};
 }
 
-bool file_exists(const std::string& path)
+bool is_gone(const std::string& path)
 {
     std::error_code error;
-    return fs::exists(path, error);
+    return fs::path(path).is_absolute() &&
+           fs::status(path, error).type() == fs::file_type::not_found;
 }
 
-bool is_same_file(const std::string& first, const std::string& second)
+void check_is_not_of(const std::string& catalogue, const std::string& path)
 {
     std::error_code error;
-    return fs::equivalent(first, second, error);
+    const std::string real = fs::canonical(catalogue, error).string();
+    const std::string named = fs::weakly_canonical(path, error).string();
+    for (const char* ending : {"", "-wal", "-shm", "-journal"}) {
+        const std::string own = real + ending;
+        // By name as well, since another program may make the file at any moment.
+        if (path != "-" && (named == own || fs::equivalent(path, own, error))) {
+            throw audio::FileError("belongs to the catalogue itself");
+        }
+    }
 }
 
 FileHash hash_of(const std::string& path)

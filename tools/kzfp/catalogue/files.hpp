@@ -35,10 +35,13 @@ struct FileState {
 /// Throws audio::FileError.
 FileState state_of(const std::string& path);
 
-bool file_exists(const std::string& path);
+/// Whether it is certain that nothing is at a path any more. It never is of a relative path, which
+/// may have been noted in another folder, nor of one that cannot be looked at.
+bool is_gone(const std::string& path);
 
-/// Whether two paths lead to one file.
-bool is_same_file(const std::string& first, const std::string& second);
+/// Throws audio::FileError when a path is a catalogue that is open, or a file that SQLite keeps
+/// beside it. A program that closes one of these gives up all locks that it holds on it.
+void check_is_not_of(const std::string& catalogue, const std::string& path);
 
 using FileHash = std::array<uint8_t, KZCAT_HASH_SIZE>;
 

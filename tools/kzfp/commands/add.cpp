@@ -6,6 +6,7 @@
 #include <cstdint>
 #include <new>
 #include <optional>
+#include <span>
 #include <string>
 #include <utility>
 #include <vector>
@@ -119,9 +120,7 @@ private:
             throw audio::FileError("has no name by which the track could be found again; write it "
                                    "to a file, and add that");
         }
-        if (is_same_file(arrival.path, settings_.catalogue)) {
-            throw audio::FileError("is the catalogue itself");
-        }
+        check_is_not_of(settings_.catalogue, arrival.path);
         arrival.state = state_of(arrival.path);
         if (arrival.state.size >= 0) {
             if (is_unchanged(arrival)) {
@@ -246,18 +245,46 @@ private:
     void add_tracks()
     {
         std::vector<Arrival*> arrivals;
-        std::vector<std::vector<kzcat_tag>> tags;
         for (Arrival& arrival : waiting_) {
             if (arrival.outcome == Outcome::added) {
                 arrivals.push_back(&arrival);
-                auto& list = tags.emplace_back();
-                for (const audio::Tag& tag : arrival.recording.tags) {
-                    list.push_back({.name = tag.name.c_str(), .value = tag.value.c_str()});
-                }
             }
         }
+        if (!add_together(arrivals)) {
+            for (Arrival* const arrival : arrivals) {
+                add_together(std::span(&arrival, 1));
+            }
+        }
+    }
+
+    /// All of them or none; false when none because of one that cannot be kept, which is then
+    /// reported as failed if it is the only one.
+    bool add_together(std::span<Arrival* const> arrivals)
+    {
+        try {
+            add(arrivals);
+            return true;
+        } catch (const CatalogueError& error) {
+            if (error.status != KZCAT_ERROR_INVALID_ARGUMENT &&
+                error.status != KZCAT_ERROR_OTHER_PROFILE) {
+                throw;
+            }
+            if (arrivals.size() == 1) {
+                arrivals.front()->outcome = Outcome::failed;
+                arrivals.front()->trouble = error.what();
+            }
+            return false;
+        }
+    }
+
+    void add(std::span<Arrival* const> arrivals)
+    {
+        std::vector<std::vector<kzcat_tag>> tags(arrivals.size());
         std::vector<kzcat_new_track> tracks;
         for (size_t i = 0; i < arrivals.size(); ++i) {
+            for (const audio::Tag& tag : arrivals[i]->recording.tags) {
+                tags[i].push_back({.name = tag.name.c_str(), .value = tag.value.c_str()});
+            }
             tracks.push_back({.trail = arrivals[i]->recording.trail.get(),
                               .source = source_of(*arrivals[i]),
                               .tags = tags[i].data(),
@@ -283,7 +310,7 @@ private:
     }
 
     /// The same bytes at another path; false when their track is gone. Where they were before is
-    /// forgotten when nothing is there any more.
+    /// forgotten when it is certain that nothing is there any more.
     bool move_source(const Arrival& arrival)
     {
         const kzcat_source source = source_of(arrival);
@@ -296,7 +323,7 @@ private:
             const bool same_bytes =
                 other.hash != nullptr &&
                 std::equal(arrival.hash->begin(), arrival.hash->end(), other.hash);
-            if (other.uri != arrival.path && same_bytes && !file_exists(other.uri)) {
+            if (other.uri != arrival.path && same_bytes && is_gone(other.uri)) {
                 was_found(kzcat_remove_source(&catalogue_, other.uri));
             }
         }

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "kzfp/catalogue/answer.hpp"
+#include "kzfp/catalogue/files.hpp"
 #include "kzfp/catalogue/in_order.hpp"
 #include "kzfp/catalogue/sound.hpp"
 #include "kzfp/command_line/common_options.hpp"
@@ -67,6 +68,7 @@ Answer failed(const std::string& file, const std::string& why)
 Answer answer_of(kzcat_catalogue& catalogue, const std::string& file, const MatchSettings& settings)
 {
     try {
+        check_is_not_of(settings.catalogue, file);
         const Clip clip = read_clip(file, settings.section);
         Answer answer = look_up(catalogue, *clip.query, file, settings.lookup);
         answer.warning = clip.warning;
