@@ -66,7 +66,8 @@ public:
     IndexFacts index_facts(bool open);
     bool index_is_open();
 
-    /// Adds all whole tracks of another catalogue, in batches, each of which is kept or not as a whole.
+    /// Adds all whole tracks of another catalogue, in batches, each of which is kept or not as a
+    /// whole.
     /// `merged` is up to date whenever a batch ends, also when the call throws. Returns false when
     /// `progress` stopped it.
     bool merge(Catalogue& other, const Progress& progress, Merged& merged);

@@ -135,9 +135,11 @@ Connection::Connection(const std::string& path, const OpenOptions& options)
     rollback_.reset(rollback);
 }
 
+// A step that finds memory short rolls nothing back, but the next one may.
 void Connection::roll_back() noexcept
 {
-    if (sqlite3_get_autocommit(handle()) == 0) {
+    constexpr int kAttempts = 2;
+    for (int i = 0; i < kAttempts && sqlite3_get_autocommit(handle()) == 0; ++i) {
         sqlite3_step(rollback_.get());
         sqlite3_reset(rollback_.get());
     }
@@ -271,6 +273,7 @@ void Statement::bind(int place, const std::optional<std::span<const std::byte>>&
 ReadTransaction::ReadTransaction(Connection& connection) : connection_(connection)
 {
     if (connection.open_reads_ == 0) {
+        connection.roll_back(); // what could not be rolled back for want of memory
         Statement(connection, "BEGIN").run();
     }
     ++connection.open_reads_;
@@ -290,6 +293,7 @@ WriteTransaction::WriteTransaction(Connection& connection) : connection_(connect
                                             ": a function that visits tracks must not change the "
                                             "catalogue; collect what to do, and do it afterwards");
     }
+    connection.roll_back(); // what could not be rolled back for want of memory
     Statement(connection, "BEGIN IMMEDIATE").run();
 }
 
