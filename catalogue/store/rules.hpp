@@ -12,7 +12,7 @@
 
 namespace kzcat {
 
-constexpr size_t kMaxCodes = size_t{1} << 25;                  ///< of a track: 72 days
+constexpr size_t kMaxCodes = (size_t{1} << 25) - 128;          ///< of a track: 72 days
 constexpr size_t kMaxDocumentBands = size_t{15} * (1U << 23U); ///< of a track: 49 days
 constexpr size_t kMaxText = size_t{1} << 20;                   ///< bytes of a tag, path or setting
 

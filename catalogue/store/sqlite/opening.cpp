@@ -26,6 +26,9 @@ namespace fs = std::filesystem;
 using Kind = StoreError::Kind;
 
 constexpr int kLongestValue = 1 << 28; ///< bytes; no hostile length leads to more memory than this
+static_assert(kMaxCodes * 8 + 1024 <= kLongestValue &&
+                  kMaxDocumentBands * 2 + 1024 <= kLongestValue,
+              "the limit is on whole rows: the rest of the row needs room too");
 
 [[noreturn]] void refuse(Kind kind, const std::string& path, const std::string& text)
 {
