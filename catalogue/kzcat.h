@@ -48,7 +48,9 @@
  * one thread at a time. No handle may be in use while it is freed. Any number of processes may have
  * a catalogue file open; one of them writes at a time, and the others go on reading. A second
  * writer waits up to 10 s before it fails with KZCAT_ERROR_BUSY. A handle sees what others have
- * added or removed from its next call on. Do not use a handle across fork().
+ * added or removed from its next call on. There is one exception: when another handle or process
+ * gives a track that is there what answers documents, this one sees it after it was opened again.
+ * Do not use a handle across fork().
  *
  * Failures. Every call that can fail returns a kzcat_status, and whatever fails has changed nothing
  * in the catalogue. kzcat_get_error_text() then has a sentence about this very failure, with what

@@ -520,6 +520,33 @@ TEST_F(DoorRecognition, TracksGivenBandsLaterAnswerDocuments)
     EXPECT_EQ(3u, summary_of(recognise(catalogue_.get(), query.handle, &options)).candidate_count);
 }
 
+TEST(DoorDocuments, BandsFromElsewhereNeedOpeningAgain)
+{
+    const ScratchDirectory scratch;
+    const std::string path = scratch.path("c.kzc");
+    int16_t values[30] = {};
+    std::fill_n(values, 30, int16_t{2184});
+    const auto query = make<Query>(kzcat_query_create_from_values,
+                                   static_cast<const int16_t*>(values), uint32_t{30});
+    kzcat_match_options options;
+    kzcat_initialize_match_options(&options);
+    options.candidates = 10;
+    const auto candidates = [&](const Catalogue& catalogue) {
+        return summary_of(recognise(catalogue.get(), query.handle, &options)).candidate_count;
+    };
+    const Catalogue open = open_file(path);
+    const Catalogue other = open_file(path);
+    add(open.get(), trail_of(piece(1, 30)).get(), "one");
+    EXPECT_EQ(0u, candidates(open));
+    add(other.get(), trail_of(piece(1, 30), true).get(), "one");
+    EXPECT_EQ(1u, candidates(other));
+    EXPECT_EQ(0u, candidates(open));
+    EXPECT_EQ(1u, candidates(open_file(path)));
+    // A track that is new is seen at once.
+    add(other.get(), trail_of(piece(2, 30), true).get(), "two");
+    EXPECT_EQ(1u, candidates(open));
+}
+
 // ---- Care
 
 TEST_F(DoorRecognition, MergesInBatchesAndRepeats)
