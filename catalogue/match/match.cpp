@@ -31,6 +31,7 @@ WindowHits search_windows(WindowSearch& search)
         const WindowHits here = search.search(window, is_read_at_other_speeds(window, windows));
         all.heard = all.heard || here.heard;
         all.hits.take(here.hits);
+        search.source().release(window);
     }
     return all;
 }

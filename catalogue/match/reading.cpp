@@ -171,6 +171,8 @@ const QueryReader::Differences& QueryReader::differences(int pitch_steps)
     return made;
 }
 
+void QueryReader::release() { by_pitch_ = std::vector<Differences>(by_pitch_.size()); }
+
 Reading QueryReader::read(const Hypothesis& hypothesis)
 {
     Reading reading{.hypothesis = hypothesis, .sequences = {}};

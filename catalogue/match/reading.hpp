@@ -31,6 +31,9 @@ public:
 
     const Window& window() const { return window_; }
 
+    /// Frees what was kept for further readings, which then compute it again.
+    void release();
+
 private:
     /// Differences of all pairs, frame after frame.
     using Differences = std::vector<float>;

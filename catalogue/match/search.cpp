@@ -166,6 +166,16 @@ Alignment WindowSearch::align(const Hit& hit)
     return alignment;
 }
 
+// An attempt may come to lie where another one was, so what was aligned with that one goes too.
+void WindowSearch::keep(std::span<const Attempt* const> used)
+{
+    const auto is_unused = [used](const Attempt* attempt) {
+        return std::find(used.begin(), used.end(), attempt) == used.end();
+    };
+    std::erase_if(aligned_, [&](const Aligned& one) { return is_unused(one.attempt); });
+    std::erase_if(attempts_, [&](const auto& one) { return is_unused(one.get()); });
+}
+
 TrackMatch WindowSearch::describe(const Hit& hit, const Alignment& alignment) const
 {
     TrackMatch match{.track = hit.track,

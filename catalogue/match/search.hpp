@@ -2,7 +2,9 @@
 /// Searching one window of a clip: readings, candidates, scores.
 #pragma once
 
+#include <algorithm>
 #include <memory>
+#include <span>
 #include <utility>
 #include <vector>
 
@@ -47,6 +49,8 @@ public:
 
     const std::vector<Hit>& all() const { return hits_; }
     std::vector<Hit>& all() { return hits_; }
+    /// Drops all but the best ones.
+    void keep(size_t count) { hits_.resize(std::min(count, hits_.size())); }
     double best_margin() const { return hits_.empty() ? -1e9 : hits_.front().margin(); }
     bool matched() const { return best_margin() >= 0; }
     void sort();
@@ -83,6 +87,9 @@ public:
 
     /// Where a hit lies: exact when it matches or nearly so.
     Alignment align(const Hit& hit);
+
+    /// Frees the attempts that are not among these; no hit may have them any more.
+    void keep(std::span<const Attempt* const> used);
 
     std::span<const Code> codes(int64_t track) { return searcher_.codes(track); }
     Source& source() { return source_; }

@@ -57,6 +57,7 @@ public:
         return QueryReader(bands_, joined(std::span(windows_).subspan(first, count)))
             .read(hypothesis);
     }
+    void release(size_t window) override { readers_[window].release(); }
     Alignment align(size_t window, std::span<const Code> track, const Reading& reading,
                     const TrackScore& score) override
     {
@@ -98,6 +99,7 @@ public:
     {
         return read_window(joined(std::span(windows_).subspan(first, count)), hypothesis);
     }
+    void release(size_t) override {}
     Alignment align(size_t, std::span<const Code>, const Reading& reading,
                     const TrackScore& score) override
     {

@@ -29,6 +29,9 @@ public:
     /// The same of `count` windows from `first` on, as one.
     virtual Reading read_windows(size_t first, size_t count, const Hypothesis& hypothesis) = 0;
 
+    /// Frees what was kept for further readings of a window.
+    virtual void release(size_t window) = 0;
+
     /// Where and how a window lies in a track in which it was found.
     virtual Alignment align(size_t window, std::span<const Code> track, const Reading& reading,
                             const TrackScore& score) = 0;
