@@ -100,7 +100,7 @@ private:
         std::unique_lock lock(mutex_);
         std::optional<Outcome>& place = outcomes_[i % ahead_];
         changed_.wait(lock, [&place] { return place.has_value(); });
-        Outcome outcome = *std::move(place);
+        Outcome outcome = std::move(*place);
         place.reset();
         delivered_ = i + 1;
         changed_.notify_all();
