@@ -57,7 +57,7 @@ constexpr double kLeastOwnSpread = 0.3;
 /// Music of loops resembles itself in many places, so that no place stands out among its own: this
 /// share of how it stands out in the catalogue is kept, up to so many times how it stands out in
 /// the track. Rhythm without melody stands out in the catalogue only: drum loops, metronomes and
-/// hum reach 20 to 50 there and hardly more than 4.3 among their own places.
+/// hum reach 20 to 50 there and hardly more than 4.6 among their own places.
 constexpr double kLoopShare = 0.6;
 constexpr double kMostOverOwn = 1.5;
 
