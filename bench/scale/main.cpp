@@ -292,15 +292,15 @@ void study(const Options& options)
 } // namespace
 
 int main(int count, char** arguments)
-{
+try {
     CLI::App app("What searching costs and finds in catalogues of any size.", "kzscale");
     try {
         study(parsed(app, count, arguments));
     } catch (const CLI::ParseError& error) {
         return app.exit(error);
-    } catch (const std::exception& error) {
-        std::fprintf(stderr, "kzscale: %s\n", error.what());
-        return 1;
     }
     return 0;
+} catch (const std::exception& error) {
+    std::fprintf(stderr, "kzscale: %s\n", error.what());
+    return 1;
 }

@@ -73,7 +73,7 @@ kzcat::Trail kept_trail(const fs::path& sound, const fs::path& kept)
     if (fs::exists(kept)) {
         return kzcat::read_trail(bytes_of(kept));
     }
-    const kzcat::Trail trail = extracted<kzcat::TrailExtractor>(sound);
+    kzcat::Trail trail = extracted<kzcat::TrailExtractor>(sound);
     const auto bytes = kzcat::write_trail(trail);
     std::ofstream out(kept, std::ios::binary);
     out.write(reinterpret_cast<const char*>(bytes.data()),

@@ -126,7 +126,8 @@ std::vector<Hypothesis> list_further()
             0.9438743126816935, 0.9622238368941451, 0.980930087668915,  1.0,
             1.0194406437021448, 1.0392592260318434, 1.0594630943592953,
         };
-        return kPowers[static_cast<size_t>(steps + 3)];
+        const int place = steps + 3;
+        return kPowers[static_cast<size_t>(place)];
     };
     std::vector<Hypothesis> all;
     for (const int steps : {-1, 1, -2, 2, -3, 3}) {
@@ -158,7 +159,8 @@ QueryReader::QueryReader(const QueryBands& bands, Window window)
 
 const QueryReader::Differences& QueryReader::differences(int pitch_steps)
 {
-    Differences& made = by_pitch_[static_cast<size_t>(kMaxPitchSteps + pitch_steps)];
+    const int place = kMaxPitchSteps + pitch_steps;
+    Differences& made = by_pitch_[static_cast<size_t>(place)];
     if (made.empty()) {
         made.resize(window_.count * kPairs);
         std::array<float, kFineBands> lifted;

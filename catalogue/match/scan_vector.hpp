@@ -51,13 +51,12 @@ inline void sums_of(const Code* codes, size_t lanes, const Probe* probes, size_t
     }
 }
 
-constexpr size_t kBlockVectors = 4;
-
 /// Calls take(position, sum) for every position.
 template <class V, class Take>
 inline void each_sum(const Code* codes, size_t positions, const Probe* probes, size_t count,
                      Take take)
 {
+    constexpr size_t kBlockVectors = 4;
     constexpr size_t kBlock = kBlockVectors * V::kLanes;
     uint64_t sums[kBlock];
     size_t p = 0;

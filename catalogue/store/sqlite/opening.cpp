@@ -12,6 +12,7 @@
 #include <set>
 #include <system_error>
 #include <thread>
+#include <tuple>
 #include <utility>
 
 #include "catalogue/store/rules.hpp"
@@ -218,7 +219,7 @@ void write_schema(Connection& connection)
     const std::string id = random_catalogue_id();
     const auto profile = static_cast<int64_t>(Profile::standard);
     Statement(connection, "INSERT INTO catalogue (only_row, id, profile, crc) VALUES (1, ?, ?, ?)",
-              std::string_view(id), profile, catalogue_sum(id, profile))
+              std::string_view{id}, profile, catalogue_sum(id, profile))
         .run();
     transaction.commit();
 }
@@ -285,7 +286,11 @@ struct Object {
     std::string table;
     std::string sql;
 
-    auto operator<=>(const Object&) const = default;
+    bool operator<(const Object& other) const
+    {
+        return std::tie(type, name, table, sql) <
+               std::tie(other.type, other.name, other.table, other.sql);
+    }
 };
 
 std::set<Object> read_schema(Connection& connection)

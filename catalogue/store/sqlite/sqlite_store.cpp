@@ -147,7 +147,7 @@ private:
         for (const Tag& tag : tags) {
             Statement(connection_,
                       "INSERT INTO tag (track, place, name, value, crc) VALUES (?, ?, ?, ?, ?)",
-                      track, place, std::string_view(tag.name), std::string_view(tag.value),
+                      track, place, std::string_view{tag.name}, std::string_view{tag.value},
                       tag_sum(track, place, tag))
                 .run();
             ++place;
@@ -174,7 +174,7 @@ private:
         Statement(connection_,
                   "INSERT INTO source (uri, track, size, mtime_ns, hash, crc) "
                   "VALUES (?, ?, ?, ?, ?, ?)",
-                  std::string_view(source.uri), track, to_column(source.size),
+                  std::string_view{source.uri}, track, to_column(source.size),
                   to_column(source.mtime_ns), to_column(source.hash), source_sum(track, source))
             .run();
     }
@@ -184,7 +184,7 @@ private:
         Statement(connection_,
                   "UPDATE source SET size = ?, mtime_ns = ?, hash = ?, crc = ? WHERE uri = ?",
                   to_column(source.size), to_column(source.mtime_ns), to_column(source.hash),
-                  source_sum(track, source), std::string_view(source.uri))
+                  source_sum(track, source), std::string_view{source.uri})
             .run();
     }
 
