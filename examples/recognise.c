@@ -12,12 +12,15 @@
 
 enum { RATE = 22050, TUNES = 3, TUNE_SECONDS = 40, CLIP_START = 17, CLIP_SECONDS = 8 };
 
+/* The low 32 bits of a product; in 64 bits, so that nothing overflows. */
+static uint32_t product(uint32_t a, uint32_t b) { return (uint32_t)((uint64_t)a * b & UINT32_MAX); }
+
 /* A note of the scale, scattered so that no tune repeats itself: a clip then has one place only. */
 static uint32_t pitch_of(uint32_t tune, uint32_t note)
 {
     static const uint32_t hertz[] = {262, 330, 392, 523, 440, 349, 294, 392, 330, 247, 494, 587};
-    uint32_t scattered = (note + 1000 * tune + 1) * 2654435761U;
-    scattered = (scattered ^ scattered >> 15) * 2246822519U;
+    uint32_t scattered = product(note + 1000 * tune + 1, 2654435761U);
+    scattered = product(scattered ^ scattered >> 15, 2246822519U);
     return hertz[(scattered ^ scattered >> 13) % 12];
 }
 
@@ -35,7 +38,7 @@ static int16_t tune_sample(uint32_t tune, uint32_t frame)
 static int16_t noise_sample(void)
 {
     static uint32_t state = 1;
-    state = state * 1664525u + 1013904223u;
+    state = (uint32_t)(((uint64_t)state * 1664525U + 1013904223U) & UINT32_MAX);
     return (int16_t)((int32_t)(state >> 20) - 2048);
 }
 
