@@ -142,7 +142,7 @@ Content content_of_file(const std::string& path)
     return text.starts_with("\x89KZT") ? Content::trail : Content::sound;
 }
 
-Recording read_recording(const std::string& path, const audio::Section& section, bool documents)
+Recording read_recording(const std::string& path, const SoundOptions& options, bool documents)
 {
     Recording recording;
     if (content_of_file(path) == Content::trail) {
@@ -158,7 +158,7 @@ Recording read_recording(const std::string& path, const audio::Section& section,
                 check(kzcat_builder_feed(builder.get(), bytes.data(), bytes.size()));
             };
         };
-        Fed fed = feed_file(path, section, begin);
+        Fed fed = feed_file(path, options.section, begin);
         recording.tags = std::move(fed.tags);
         recording.warning = std::move(fed.warning);
         recording.trail = made<Trail>(kzcat_builder_finish, builder.get());
@@ -168,7 +168,7 @@ Recording read_recording(const std::string& path, const audio::Section& section,
     return recording;
 }
 
-Clip read_clip(const std::string& path, const audio::Section& section)
+Clip read_clip(const std::string& path, const SoundOptions& options)
 {
     switch (content_of_file(path)) {
     case Content::trail:
@@ -190,7 +190,7 @@ Clip read_clip(const std::string& path, const audio::Section& section)
             check(kzcat_query_feed(clip.query.get(), bytes.data(), bytes.size()));
         };
     };
-    clip.warning = feed_file(path, section, begin).warning;
+    clip.warning = feed_file(path, options.section, begin).warning;
     check(kzcat_query_finish(clip.query.get()));
     return clip;
 }

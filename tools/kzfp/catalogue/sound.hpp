@@ -7,6 +7,7 @@
 
 #include "audio/input.hpp"
 #include "kzfp/catalogue/handles.hpp"
+#include "kzfp/command_line/sound_options.hpp"
 
 namespace kzfp {
 
@@ -24,7 +25,7 @@ struct Recording {
 
 /// Reads a sound file, or a trail file (.kzt), to its end or that of the section. `documents`: it
 /// is to answer query documents too. Throws audio::FileError and CatalogueError.
-Recording read_recording(const std::string& path, const audio::Section& section, bool documents);
+Recording read_recording(const std::string& path, const SoundOptions& options, bool documents);
 
 /// A clip as it is looked up.
 struct Clip {
@@ -33,6 +34,6 @@ struct Clip {
 };
 
 /// Reads a sound file, a trail file or a query document. Throws as read_recording() does.
-Clip read_clip(const std::string& path, const audio::Section& section);
+Clip read_clip(const std::string& path, const SoundOptions& options);
 
 } // namespace kzfp

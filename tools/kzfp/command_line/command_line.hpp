@@ -10,7 +10,12 @@
 
 namespace kzfp {
 
-enum ExitStatus : int { all_done = 0, some_file_failed = 1, wrong_usage = 2 };
+enum ExitStatus : int {
+    all_done = 0,
+    some_file_failed = 1,
+    wrong_usage = 2,
+    interrupted_by_user = 130 ///< as shells report SIGINT; what was done before is kept
+};
 
 /// The words that a command is run with.
 struct Arguments {

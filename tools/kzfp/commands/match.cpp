@@ -69,7 +69,7 @@ Answer answer_of(kzcat_catalogue& catalogue, const std::string& file, const Matc
 {
     try {
         check_is_not_of(settings.catalogue, file);
-        const Clip clip = read_clip(file, settings.section);
+        const Clip clip = read_clip(file, {.section = settings.section});
         Answer answer = look_up(catalogue, *clip.query, file, settings.lookup);
         answer.warning = clip.warning;
         return answer;

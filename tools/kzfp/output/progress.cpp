@@ -10,7 +10,9 @@
 
 namespace kzfp {
 
-Progress::Progress(size_t files) : files_(files), wanted_(files > 1 && ::isatty(STDERR_FILENO) == 1)
+Progress::Progress(size_t files, ProgressMode mode)
+    : files_(files),
+      wanted_(mode == ProgressMode::terminal && files > 1 && ::isatty(STDERR_FILENO) == 1)
 {
 }
 

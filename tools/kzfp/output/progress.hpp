@@ -5,12 +5,14 @@
 #include <cstddef>
 #include <string>
 
+#include "kzfp/command_line/output_options.hpp"
+
 namespace kzfp {
 
 /// A line on the terminal that shows how far the program is, when there are several files.
 class Progress {
 public:
-    explicit Progress(size_t files);
+    explicit Progress(size_t files, ProgressMode mode = ProgressMode::terminal);
     ~Progress() { clear(); }
     Progress(const Progress&) = delete;
     Progress& operator=(const Progress&) = delete;

@@ -1,0 +1,24 @@
+/// @file
+/// The files that a command works on: words of the command line, or lines of a list.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include <CLI/CLI.hpp>
+
+namespace kzfp {
+
+struct FileArguments {
+    std::vector<std::string> named; ///< words, in order
+    std::string from;               ///< path of a list, "-" for standard input; empty for none
+};
+
+/// Adds the positional FILE and --files-from. One of them is needed. `files` outlives the parsing.
+void add_file_options(CLI::App& parser, FileArguments& files, const std::string& help);
+
+/// What was named, then the lines of the list; a list that holds a NUL is divided at NULs. Empty
+/// lines are passed over. Throws audio::FileError.
+std::vector<std::string> all_files(const FileArguments& files);
+
+} // namespace kzfp
