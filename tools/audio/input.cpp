@@ -25,7 +25,8 @@ Descriptor open_input(const std::string& name)
     if (name == "-") {
         return {STDIN_FILENO, Descriptor::borrowed};
     }
-    const int number = ::open(name.c_str(), O_RDONLY | O_CLOEXEC);
+    // A FIFO into which nobody writes yet is waited for when it is read.
+    const int number = ::open(name.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
     if (number < 0) {
         throw system_error("cannot be opened", errno);
     }
@@ -47,7 +48,7 @@ Input::Input(const std::string& name, const Request& request)
     is_regular_ = S_ISREG(facts.st_mode);
     size_ = is_regular_ ? static_cast<uint64_t>(facts.st_size) : 0;
     if (!is_regular_ && !request.raw) {
-        spool_.emplace(file_.number());
+        spool_.emplace(file_.number(), request.patience);
     }
     if ((is_regular_ && size_ == 0) || (spool_ && spool_->size() == 0)) {
         throw FileError("is empty, a sound file is needed");
@@ -90,7 +91,8 @@ OpenedInput Input::open_raw(const StreamFormat& format) const
             throw start_beyond_end(*facts.duration, request_.section.start);
         }
     }
-    return {std::make_unique<RawSamples>(file_.number(), is_regular_, format, request_.section),
+    return {std::make_unique<RawSamples>(file_.number(), is_regular_, format, request_.section,
+                                         request_.patience),
             facts};
 }
 

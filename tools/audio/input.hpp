@@ -10,6 +10,7 @@
 #include "audio/descriptor.hpp"
 #include "audio/source.hpp"
 #include "audio/spool.hpp"
+#include "audio/waiting.hpp"
 
 namespace audio {
 
@@ -19,6 +20,7 @@ struct Request {
     Section section;
     AcceptsRate accepts_rate; ///< of sound files; headerless ones are never converted
     bool floats = false;      ///< what sound files decode to floats is wanted as floats
+    Patience patience = {};   ///< with a pipe
 };
 
 /// What can be said about an input before anything is read from it.

@@ -1,4 +1,4 @@
-// The bytes go on as they are; on a big-endian machine 16-bit samples are turned round.
+// The bytes go on as they are; on a big-endian machine those of each sample are turned round.
 
 #include "audio/raw_samples.hpp"
 
@@ -21,10 +21,11 @@ uint64_t to_frames(double seconds, uint32_t rate)
     return static_cast<uint64_t>(std::llround(seconds * rate));
 }
 
-void swap_pairs(std::span<std::byte> bytes)
+/// Turns the bytes of each sample round.
+void reverse_samples(std::span<std::byte> bytes, size_t size)
 {
-    for (size_t i = 0; i + 1 < bytes.size(); i += 2) {
-        std::swap(bytes[i], bytes[i + 1]);
+    for (; bytes.size() >= size; bytes = bytes.subspan(size)) {
+        std::ranges::reverse(bytes.first(size));
     }
 }
 
@@ -37,8 +38,9 @@ std::string odd_bytes_text(uint64_t odd_bytes, const StreamFormat& format)
            std::to_string(format.frame_bytes()) + " bytes are needed";
 }
 
-RawSamples::RawSamples(int file, bool seekable, const StreamFormat& format, const Section& section)
-    : file_(file), format_(format),
+RawSamples::RawSamples(int file, bool seekable, const StreamFormat& format, const Section& section,
+                       const Patience& patience)
+    : file_(file), patience_(patience), format_(format),
       frames_left_(section.length ? to_frames(*section.length, format.rate)
                                   : std::numeric_limits<uint64_t>::max())
 {
@@ -59,8 +61,8 @@ size_t RawSamples::read(std::span<std::byte> bytes)
     if (count % frame_bytes != 0) {
         throw FileError(odd_bytes_text(count % frame_bytes, format_));
     }
-    if (format_.encoding == Encoding::s16 && std::endian::native == std::endian::big) {
-        swap_pairs(wanted.first(count));
+    if constexpr (std::endian::native == std::endian::big) {
+        reverse_samples(wanted.first(count), sample_bytes(format_.encoding));
     }
     frames_left_ -= count / frame_bytes;
     return count / frame_bytes;
@@ -70,17 +72,11 @@ size_t RawSamples::read_bytes(std::span<std::byte> bytes)
 {
     size_t done = 0;
     while (done < bytes.size()) {
-        const ssize_t count = ::read(file_, bytes.data() + done, bytes.size() - done);
-        if (count < 0 && errno == EINTR) {
-            continue;
-        }
-        if (count < 0) {
-            throw system_error("cannot be read", errno);
-        }
+        const size_t count = read_some(file_, bytes.subspan(done), patience_);
         if (count == 0) {
             break;
         }
-        done += static_cast<size_t>(count);
+        done += count;
     }
     return done;
 }

@@ -3,6 +3,7 @@
 #pragma once
 
 #include "audio/source.hpp"
+#include "audio/waiting.hpp"
 
 namespace audio {
 
@@ -12,8 +13,9 @@ std::string odd_bytes_text(uint64_t odd_bytes, const StreamFormat& format);
 /// Reads a descriptor to its end, or to the end of the section, without looking ahead.
 class RawSamples : public Source {
 public:
-    /// Starts where the descriptor stands; it must outlive the object.
-    RawSamples(int file, bool seekable, const StreamFormat& format, const Section& section);
+    /// Starts where the descriptor stands; it and `patience` must outlive the object.
+    RawSamples(int file, bool seekable, const StreamFormat& format, const Section& section,
+               const Patience& patience);
 
     StreamFormat format() const override { return format_; }
     size_t read(std::span<std::byte> bytes) override;
@@ -23,6 +25,7 @@ private:
     void skip(uint64_t count);
 
     int file_;
+    const Patience& patience_;
     StreamFormat format_;
     uint64_t frames_left_;
 };

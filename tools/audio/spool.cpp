@@ -34,10 +34,10 @@ Descriptor open_unnamed_file()
     return {number, Descriptor::owned};
 }
 
-void write_all(int file, const char* bytes, size_t count, uint64_t at)
+void write_all(int file, std::span<const std::byte> bytes, uint64_t at)
 {
-    while (count > 0) {
-        const ssize_t written = ::pwrite(file, bytes, count, static_cast<off_t>(at));
+    while (!bytes.empty()) {
+        const ssize_t written = ::pwrite(file, bytes.data(), bytes.size(), static_cast<off_t>(at));
         if (written < 0 && errno == EINTR) {
             continue;
         }
@@ -46,44 +46,43 @@ void write_all(int file, const char* bytes, size_t count, uint64_t at)
                 "cannot be copied to a temporary file; set TMPDIR to a place with more room",
                 errno);
         }
-        bytes += written;
+        bytes = bytes.subspan(static_cast<size_t>(written));
         at += static_cast<uint64_t>(written);
-        count -= static_cast<size_t>(written);
     }
 }
 
 } // namespace
 
-Spool::Spool(int pipe) : pipe_(pipe), file_(open_unnamed_file()) { copy_until(kFirstFetch); }
+Spool::Spool(int pipe, const Patience& patience)
+    : pipe_(pipe), patience_(patience), file_(open_unnamed_file())
+{
+    copy_until(kFirstFetch);
+}
 
 bool Spool::extend()
 {
-    if (ended_) {
+    if (ended_ || failed_) {
         return false;
     }
     if (size_ >= kLongestSpool) {
         throw FileError("is not enough within 4 GiB of a pipe; give it as a file");
     }
     const uint64_t before = size_;
+    failed_ = true;
     copy_until(size_ * 2);
+    failed_ = false;
     return size_ > before;
 }
 
 void Spool::copy_until(uint64_t size)
 {
-    std::array<char, 65536> buffer;
+    std::array<std::byte, 65536> buffer;
     while (size_ < size && !ended_) {
         const size_t wanted = std::min<uint64_t>(buffer.size(), size - size_);
-        const ssize_t count = ::read(pipe_, buffer.data(), wanted);
-        if (count < 0 && errno == EINTR) {
-            continue;
-        }
-        if (count < 0) {
-            throw system_error("cannot be read", errno);
-        }
+        const size_t count = read_some(pipe_, std::span(buffer).first(wanted), patience_);
         ended_ = count == 0;
-        write_all(file_.number(), buffer.data(), static_cast<size_t>(count), size_);
-        size_ += static_cast<uint64_t>(count);
+        write_all(file_.number(), std::span(buffer).first(count), size_);
+        size_ += count;
     }
 }
 

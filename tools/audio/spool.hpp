@@ -5,6 +5,7 @@
 #include <cstdint>
 
 #include "audio/descriptor.hpp"
+#include "audio/waiting.hpp"
 
 namespace audio {
 
@@ -12,8 +13,9 @@ namespace audio {
 /// names, else in /var/tmp. It grows only on request.
 class Spool {
 public:
-    /// Copies the first bytes of `pipe`, which must outlive the object. Throws FileError.
-    explicit Spool(int pipe);
+    /// Copies the first bytes of `pipe`. It and `patience` must outlive the object. Throws
+    /// FileError.
+    Spool(int pipe, const Patience& patience);
 
     int number() const { return file_.number(); }
     uint64_t size() const { return size_; }
@@ -26,9 +28,11 @@ private:
     void copy_until(uint64_t size);
 
     int pipe_;
+    const Patience& patience_;
     Descriptor file_;
     uint64_t size_ = 0; ///< bytes in it
     bool ended_ = false;
+    bool failed_ = false; ///< what failed once is not waited for again
 };
 
 } // namespace audio

@@ -42,11 +42,12 @@ std::string hundredths(double seconds)
     return printed("%.2f s", std::floor(seconds * 100 + 1e-6) / 100);
 }
 
-uint32_t to_stream_format(audio::Encoding encoding)
+/// The folded 8-bit format is that of the extraction interface; it cannot be mixed down.
+uint32_t to_stream_format(const audio::StreamFormat& format)
 {
-    switch (encoding) {
+    switch (format.encoding) {
     case audio::Encoding::u8:
-        return KZ_STREAM_FORMAT_PCM8;
+        return format.channels <= 2 ? KZ_STREAM_FORMAT_PCM8 : KZ_STREAM_FORMAT_LINEAR8;
     case audio::Encoding::alaw:
         return KZ_STREAM_FORMAT_ALAW;
     case audio::Encoding::ulaw:
@@ -64,7 +65,7 @@ Stream create(const audio::StreamFormat& format, Algorithm algorithm)
     kz_stream_settings settings;
     kz_stream_initialize_settings(&settings);
     settings.algorithm = static_cast<uint32_t>(algorithm);
-    settings.format = to_stream_format(format.encoding);
+    settings.format = to_stream_format(format);
     settings.sample_rate = format.rate;
     settings.channels = format.channels;
     kz_stream* stream = nullptr;

@@ -8,6 +8,7 @@
 #include <string_view>
 
 #include "kzfp/catalogue/files.hpp"
+#include "kzfp/output/interruption.hpp"
 
 namespace kzfp {
 
@@ -62,20 +63,35 @@ struct Fed {
     std::string warning;
 };
 
-std::string damage_text(double seconds, const std::string& trouble)
+std::string damaged_after(double seconds, const std::string& trouble)
 {
     char text[64];
     std::snprintf(text, sizeof text, "is damaged after %.1f s", seconds);
-    return text + std::string(" (") + trouble + "); what comes before was used";
+    return text + std::string(" (") + trouble + ")";
+}
+
+/// What was fed, unless damage is a failure.
+Fed fed(const audio::OpenedInput& opened, double seconds, bool strict)
+{
+    const std::string trouble = opened.source->trouble();
+    if (strict && !trouble.empty()) {
+        throw audio::FileError(damaged_after(seconds, trouble));
+    }
+    return {.tags = opened.facts.tags,
+            .warning = trouble.empty()
+                           ? ""
+                           : damaged_after(seconds, trouble) + "; what comes before was used"};
 }
 
 /// Feeds a sound file. A pipe is copied to its end first, or as far as the section reaches.
-Fed feed_file(const std::string& path, const audio::Section& section, const Begin& begin)
+Fed feed_file(const std::string& path, const SoundOptions& options, const Begin& begin)
 {
-    const audio::Request request = {.raw = {},
+    const audio::Section& section = options.section;
+    const audio::Request request = {.raw = options.raw,
                                     .section = section,
                                     .accepts_rate = [](uint32_t) { return true; },
-                                    .floats = true};
+                                    .floats = true,
+                                    .patience = {.timeout = options.timeout, .stop = interrupted}};
     audio::Input input(path, request);
     for (;;) {
         try {
@@ -87,8 +103,7 @@ Fed feed_file(const std::string& path, const audio::Section& section, const Begi
             const std::string trouble = opened.source->trouble();
             const bool whole = section.length && seconds >= *section.length && trouble.empty();
             if (whole || !input.extend()) {
-                return {.tags = opened.facts.tags,
-                        .warning = trouble.empty() ? "" : damage_text(seconds, trouble)};
+                return fed(opened, seconds, options.strict);
             }
         } catch (const audio::FileError&) {
             if (!input.extend()) {
@@ -96,6 +111,12 @@ Fed feed_file(const std::string& path, const audio::Section& section, const Begi
             }
         }
     }
+}
+
+/// What is said to have no header is sound, whatever it begins with.
+Content content_of(const std::string& path, const SoundOptions& options)
+{
+    return options.raw ? Content::sound : content_of_file(path);
 }
 
 Trail read_trail_file(const std::string& path)
@@ -145,7 +166,7 @@ Content content_of_file(const std::string& path)
 Recording read_recording(const std::string& path, const SoundOptions& options, bool documents)
 {
     Recording recording;
-    if (content_of_file(path) == Content::trail) {
+    if (content_of(path, options) == Content::trail) {
         recording.trail = read_trail_file(path);
     } else {
         kzcat_builder_settings settings;
@@ -158,9 +179,9 @@ Recording read_recording(const std::string& path, const SoundOptions& options, b
                 check(kzcat_builder_feed(builder.get(), bytes.data(), bytes.size()));
             };
         };
-        Fed fed = feed_file(path, options.section, begin);
-        recording.tags = std::move(fed.tags);
-        recording.warning = std::move(fed.warning);
+        Fed result = feed_file(path, options, begin);
+        recording.tags = std::move(result.tags);
+        recording.warning = std::move(result.warning);
         recording.trail = made<Trail>(kzcat_builder_finish, builder.get());
     }
     check_length(recording.trail);
@@ -170,7 +191,7 @@ Recording read_recording(const std::string& path, const SoundOptions& options, b
 
 Clip read_clip(const std::string& path, const SoundOptions& options)
 {
-    switch (content_of_file(path)) {
+    switch (content_of(path, options)) {
     case Content::trail:
         return {.query = made<Query>(kzcat_query_create_from_trail,
                                      static_cast<const kzcat_trail*>(read_trail_file(path).get())),
@@ -190,7 +211,7 @@ Clip read_clip(const std::string& path, const SoundOptions& options)
             check(kzcat_query_feed(clip.query.get(), bytes.data(), bytes.size()));
         };
     };
-    clip.warning = feed_file(path, options.section, begin).warning;
+    clip.warning = feed_file(path, options, begin).warning;
     check(kzcat_query_finish(clip.query.get()));
     return clip;
 }

@@ -33,13 +33,6 @@ inline constexpr Choice<Algorithm> kAlgorithms[] = {
     {"float", Algorithm::floating, "floating point, which takes any rate as it is"},
 };
 
-inline constexpr Choice<audio::Encoding> kEncodings[] = {
-    {"u8", audio::Encoding::u8, "8 bits, silence at 128"},
-    {"s16", audio::Encoding::s16, "16 bits, signed, little endian"},
-    {"alaw", audio::Encoding::alaw, "G.711 A-law"},
-    {"ulaw", audio::Encoding::ulaw, "G.711 mu-law"},
-};
-
 /// Reads the command line; the status to end with when there is nothing to carry out.
 std::variant<FingerprintOptions, ExitStatus> parse_fingerprint_options(const Arguments& arguments);
 
