@@ -6,11 +6,126 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
+#include <filesystem>
+#include <system_error>
+#include <utility>
 
+#include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 namespace kzfp {
+
+namespace {
+
+struct Destination {
+    int file = STDOUT_FILENO;
+    std::string name = "standard output";
+};
+
+Destination& destination()
+{
+    static Destination only;
+    return only;
+}
+
+OutputError failure(const std::string& name, int error)
+{
+    return OutputError(name + " cannot be written (" + std::strerror(error) + ")", error == EPIPE);
+}
+
+/// What a path leads to; the path itself while nothing is there.
+std::string without_links(const std::string& path)
+{
+    std::error_code error;
+    const std::filesystem::path real = std::filesystem::canonical(path, error);
+    return error ? path : real.string();
+}
+
+void check_apart(const std::string& path, std::span<const std::string> inputs)
+{
+    for (const std::string& input : inputs) {
+        std::error_code error;
+        if (input != "-" && std::filesystem::equivalent(path, input, error) && !error &&
+            std::filesystem::is_regular_file(path, error)) {
+            throw OutputError(path + " is also read; --output needs another file");
+        }
+    }
+}
+
+/// The permissions of the file that is replaced; for a new file, the usual ones.
+void take_permissions(int file, const std::string& path)
+{
+    struct stat facts = {};
+    if (::stat(path.c_str(), &facts) == 0) {
+        static_cast<void>(::fchmod(file, facts.st_mode & 07777));
+    }
+}
+
+} // namespace
+
+OutputFile::OutputFile(const std::string& path, std::span<const std::string> inputs, Mode mode)
+    : path_(path == "-" ? "" : without_links(path))
+{
+    if (path_.empty()) {
+        return;
+    }
+    check_apart(path_, inputs);
+    open(mode);
+    destination() = {.file = file_, .name = path_};
+}
+
+void OutputFile::open(Mode mode)
+{
+    struct stat facts = {};
+    const bool replaced = ::stat(path_.c_str(), &facts) != 0 || S_ISREG(facts.st_mode);
+    if (mode == Mode::whole && replaced) {
+        temporary_ = path_ + ".part-" + std::to_string(::getpid());
+    }
+    const std::string& name = temporary_.empty() ? path_ : temporary_;
+    file_ = ::open(name.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0666);
+    if (file_ < 0) {
+        throw failure(path_, errno);
+    }
+    if (!temporary_.empty()) {
+        take_permissions(file_, path_);
+    }
+}
+
+OutputFile::~OutputFile()
+{
+    if (file_ >= 0) {
+        destination() = {};
+        ::close(file_);
+        remove_temporary();
+    }
+}
+
+void OutputFile::remove_temporary() const
+{
+    if (!temporary_.empty()) {
+        static_cast<void>(::unlink(temporary_.c_str()));
+    }
+}
+
+void OutputFile::finish()
+{
+    if (file_ < 0) {
+        return;
+    }
+    destination() = {};
+    // Some file systems report a full disk only when the file is closed.
+    const bool closed = ::close(std::exchange(file_, -1)) == 0;
+    const bool there =
+        closed && (temporary_.empty() || ::rename(temporary_.c_str(), path_.c_str()) == 0);
+    if (!there) {
+        const OutputError error = failure(path_, errno);
+        remove_temporary();
+        throw error;
+    }
+}
 
 std::string without_control_characters(std::string text)
 {
@@ -19,18 +134,19 @@ std::string without_control_characters(std::string text)
     return text;
 }
 
+int output_descriptor() { return destination().file; }
+
 void write_output(const std::string& text)
 {
+    const Destination& to = destination();
     size_t done = 0;
     while (done < text.size()) {
-        const ssize_t count = ::write(STDOUT_FILENO, text.data() + done, text.size() - done);
+        const ssize_t count = ::write(to.file, text.data() + done, text.size() - done);
         if (count < 0 && errno == EINTR) {
             continue;
         }
         if (count < 0) {
-            throw OutputError(std::string("standard output cannot be written (") +
-                                  std::strerror(errno) + ")",
-                              errno == EPIPE);
+            throw failure(to.name, errno);
         }
         done += static_cast<size_t>(count);
     }
