@@ -21,14 +21,6 @@ uint64_t to_frames(double seconds, uint32_t rate)
     return static_cast<uint64_t>(std::llround(seconds * rate));
 }
 
-/// Turns the bytes of each sample round.
-void reverse_samples(std::span<std::byte> bytes, size_t size)
-{
-    for (; bytes.size() >= size; bytes = bytes.subspan(size)) {
-        std::ranges::reverse(bytes.first(size));
-    }
-}
-
 } // namespace
 
 std::string odd_bytes_text(uint64_t odd_bytes, const StreamFormat& format)
@@ -36,6 +28,16 @@ std::string odd_bytes_text(uint64_t odd_bytes, const StreamFormat& format)
     return "ends with " + std::to_string(odd_bytes) +
            (odd_bytes == 1 ? " odd byte" : " odd bytes") + ", whole frames of " +
            std::to_string(format.frame_bytes()) + " bytes are needed";
+}
+
+void to_native_order(std::span<std::byte> samples, Encoding encoding)
+{
+    if constexpr (std::endian::native == std::endian::big) {
+        const size_t size = sample_bytes(encoding);
+        for (; samples.size() >= size; samples = samples.subspan(size)) {
+            std::ranges::reverse(samples.first(size));
+        }
+    }
 }
 
 RawSamples::RawSamples(int file, bool seekable, const StreamFormat& format, const Section& section,
@@ -61,9 +63,7 @@ size_t RawSamples::read(std::span<std::byte> bytes)
     if (count % frame_bytes != 0) {
         throw FileError(odd_bytes_text(count % frame_bytes, format_));
     }
-    if constexpr (std::endian::native == std::endian::big) {
-        reverse_samples(wanted.first(count), sample_bytes(format_.encoding));
-    }
+    to_native_order(wanted.first(count), format_.encoding);
     frames_left_ -= count / frame_bytes;
     return count / frame_bytes;
 }

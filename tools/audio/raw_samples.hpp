@@ -10,6 +10,9 @@ namespace audio {
 /// What is wrong with a stream whose last frame has only `odd_bytes` bytes.
 std::string odd_bytes_text(uint64_t odd_bytes, const StreamFormat& format);
 
+/// From little endian, as samples lie in a stream, to the order of the processor.
+void to_native_order(std::span<std::byte> samples, Encoding encoding);
+
 /// Reads a descriptor to its end, or to the end of the section, without looking ahead.
 class RawSamples : public Source {
 public:
