@@ -145,18 +145,35 @@ std::vector<Added> Catalogue::add(std::span<const NewTrack> tracks)
     return added;
 }
 
+/// Takes in what answers documents of one track, if it has that; false when it is damaged.
+bool Catalogue::take_in_document(Store& store, int64_t track)
+{
+    try {
+        if (const auto bands = store.document_bands(track); bands && !bands->empty()) {
+            documents_.set(track, *bands);
+        }
+        return true;
+    } catch (const StoreError& error) {
+        if (error.kind() != StoreError::Kind::damaged) {
+            throw;
+        }
+        return false;
+    }
+}
+
 /// The first time all tracks, from then on what has changed since.
 void Catalogue::take_in_documents()
 {
     constexpr size_t kChanges = 1024; // at a time
     const auto take = [this](Store& store, int64_t track) {
-        if (const auto bands = store.document_bands(track); bands && !bands->empty()) {
-            documents_.set(track, *bands);
+        if (!take_in_document(store, track)) {
+            ++damaged_documents_;
         }
     };
     with_store([&](Store& store) {
         if (documents_change_ < 0) {
             documents_ = {};
+            damaged_documents_ = 0;
             const int64_t change = store.last_change(); // what changes meanwhile comes again
             std::vector<int64_t> tracks;
             store.visit_tracks(0, [&tracks](const TrackInfo& info) {
@@ -203,6 +220,16 @@ bool Catalogue::index_is_open()
 {
     const std::shared_lock lock(index_mutex_);
     return index_ != nullptr;
+}
+
+uint64_t Catalogue::left_out(bool documents)
+{
+    if (documents) {
+        const std::shared_lock lock(documents_mutex_);
+        return damaged_documents_;
+    }
+    const std::shared_lock lock(index_mutex_);
+    return index_ == nullptr ? 0 : index_->facts().left_out;
 }
 
 IndexFacts Catalogue::index_facts(bool open)

@@ -66,6 +66,10 @@ public:
     IndexFacts index_facts(bool open);
     bool index_is_open();
 
+    /// Tracks that could not be looked through by the last call that recognised, because what is
+    /// stored of them is damaged.
+    uint64_t left_out(bool documents);
+
     /// Adds all whole tracks of another catalogue, in batches, each of which is kept or not as a
     /// whole.
     /// `merged` is up to date whenever a batch ends, also when the call throws. Returns false when
@@ -76,6 +80,7 @@ private:
     int64_t last_change();
     void bring_index_up_to_date();
     void bring_documents_up_to_date();
+    bool take_in_document(Store& store, int64_t track);
     void take_in_documents();
 
     std::mutex store_mutex_; ///< may be taken while another is held, never the other way round
@@ -86,7 +91,8 @@ private:
     int64_t index_change_ = -1; ///< the store's last change that the index has taken in
     std::shared_mutex documents_mutex_;
     DocumentTable documents_;
-    int64_t documents_change_ = -1; ///< the last change that it has taken in; -1: empty yet
+    uint64_t damaged_documents_ = 0; ///< tracks whose document bands are damaged
+    int64_t documents_change_ = -1;  ///< the last change that it has taken in; -1: empty yet
 };
 
 } // namespace kzcat

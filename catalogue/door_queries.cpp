@@ -132,6 +132,8 @@ void fill(kzcat_result& result, Catalogue& catalogue, const Answer& answer, size
     result.summary.match_count = result.matches.size();
     result.summary.candidate_count = result.candidates.size();
     result.summary.runner_up = answer.runner_up;
+    result.summary.left_out =
+        static_cast<uint32_t>(catalogue.left_out(result.summary.by == KZCAT_BY_DOCUMENT));
 }
 
 void look_up(Catalogue& catalogue, const kzcat_query& query, const MatchOptions& options,

@@ -663,7 +663,9 @@ typedef struct kzcat_summary {
         match_count; /**< tracks that reached their threshold; 0 unless the verdict is a match */
     uint64_t candidate_count; /**< best tracks whatever their score */
     double runner_up;         /**< score of the second best track; 0 when there is none */
-    uint32_t reserved[8];     /**< 0 */
+    uint32_t left_out;        /**< tracks that were not looked through because what is stored of
+                                   them is damaged: kzcat_verify() says which; 0 at best */
+    uint32_t reserved[7];     /**< 0 */
 } kzcat_summary;
 
 /** A track in which a clip was found. */
@@ -691,7 +693,8 @@ typedef struct kzcat_match {
 
 /**
  * Looks a query up. Several threads may do so at once with one catalogue. The first call opens the
- * index, or builds it in memory when there is none, which takes about 0.1 ms for a track.
+ * index, or builds it in memory when there is none, which takes about 0.1 ms for a track. Tracks
+ * that are damaged are left out and counted in the summary, as long as there are others.
  *
  * @param query    Finished.
  * @param options  Null for what is usual; read only during the call.

@@ -72,6 +72,7 @@ public:
         facts.codes = snapshot.corpus().code_count();
         facts.tracks = snapshot.corpus().track_count();
         facts.tail_tracks = snapshot.tail().track_count();
+        facts.left_out = snapshot.left_out();
         if (snapshot.mapped() != nullptr) {
             const IndexHeader& header = snapshot.mapped()->contents.header;
             facts.file_bytes = snapshot.mapped()->file.bytes().size();
@@ -122,12 +123,13 @@ private:
         return Snapshot(store);
     }
 
-    /// Writes the side file when it is worth it. When that fails all goes on from memory.
+    /// Writes the side file when it is worth it, and not while tracks are left out, of which a side
+    /// file says nothing. When that fails all goes on from memory.
     void keep_file(Store& store)
     {
         const Snapshot& snapshot = searches_->snapshot();
         if (options_.path.empty() || !options_.write || !snapshot.is_stale() ||
-            snapshot.corpus().code_count() < options_.write_from) {
+            snapshot.left_out() > 0 || snapshot.corpus().code_count() < options_.write_from) {
             return;
         }
         try {

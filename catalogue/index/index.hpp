@@ -20,6 +20,7 @@ struct IndexFacts {
     uint64_t codes = 0;
     uint64_t tracks = 0;
     uint64_t tail_tracks = 0; ///< not in the side file: kept in memory and scanned
+    uint64_t left_out = 0;    ///< tracks whose trails are damaged
     uint64_t file_bytes = 0;  ///< 0 when there is no side file
     double scan_ms =
         0; ///< of a look-up of 14.3 s, as measured when the file was written; 0 when not

@@ -22,6 +22,21 @@ void append(std::vector<Code>& codes, std::vector<TrackSpan>& tracks, int64_t id
     codes.insert(codes.end(), added.begin(), added.end());
 }
 
+/// Runs a reading of the store; false when what it reads is damaged.
+template <class Read>
+bool is_whole(Read read)
+{
+    try {
+        read();
+        return true;
+    } catch (const StoreError& error) {
+        if (error.kind() != StoreError::Kind::damaged) {
+            throw;
+        }
+        return false;
+    }
+}
+
 } // namespace
 
 /// What a log says, before any of it is taken in.
@@ -29,6 +44,7 @@ struct Snapshot::Changes {
     std::vector<Code> codes; ///< of the tracks that were added
     std::vector<TrackSpan> tracks;
     std::unordered_set<int64_t> removed;
+    std::unordered_set<int64_t> left_out; ///< damaged
     int64_t cursor = 0;
 };
 
@@ -52,12 +68,45 @@ Snapshot::Snapshot(Store& store) : cursor_(store.last_change())
     std::vector<Code> codes;
     std::vector<TrackSpan> tracks;
     codes.reserve(static_cast<size_t>(store.code_count()));
-    store.visit_trails(0, [&](int64_t id, const Trail& trail) {
-        append(codes, tracks, id, trail.codes);
+    try {
+        store.visit_trails(0, [&](int64_t id, const Trail& trail) {
+            append(codes, tracks, id, trail.codes);
+            return true;
+        });
+        add(std::move(codes), std::move(tracks));
+    } catch (const StoreError& error) {
+        if (error.kind() != StoreError::Kind::damaged) {
+            throw;
+        }
+        read_whole_tracks(store);
+        if (chunks_.empty()) {
+            throw;
+        }
+    }
+    update(store);
+}
+
+/// Track by track, which takes longer than all in one go but passes over those that are damaged.
+void Snapshot::read_whole_tracks(Store& store)
+{
+    std::vector<int64_t> ids;
+    store.visit_tracks(0, [&ids](const TrackInfo& info) {
+        ids.push_back(info.id);
         return true;
     });
+    std::vector<Code> codes;
+    std::vector<TrackSpan> tracks;
+    for (const int64_t id : ids) {
+        const auto read = [&] {
+            if (const auto trail = store.trail(id)) {
+                append(codes, tracks, id, trail->codes);
+            }
+        };
+        if (!is_whole(read)) {
+            left_out_.insert(id);
+        }
+    }
     add(std::move(codes), std::move(tracks));
-    update(store);
 }
 
 Snapshot::Snapshot(Store& store, MappedIndex mapped) : Snapshot(std::move(mapped))
@@ -97,17 +146,22 @@ int64_t Snapshot::last_id() const
 /// before.
 Snapshot::Changes Snapshot::read_changes(Store& store) const
 {
-    Changes changes{.codes = {}, .tracks = {}, .removed = {}, .cursor = cursor_};
+    Changes changes{.codes = {}, .tracks = {}, .removed = {}, .left_out = {}, .cursor = cursor_};
     int64_t last = last_id();
+    const auto take = [&](int64_t id) {
+        if (const auto trail = store.trail(id); trail && id > last) {
+            append(changes.codes, changes.tracks, id, trail->codes);
+            last = id;
+        }
+    };
     for (;;) {
         const auto batch = store.changes(changes.cursor, kChangesAtOnce);
         for (const auto& change : batch) {
             changes.cursor = change.cursor;
             if (change.kind == ChangeKind::removed) {
                 changes.removed.insert(change.track);
-            } else if (const auto trail = store.trail(change.track); trail && change.track > last) {
-                append(changes.codes, changes.tracks, change.track, trail->codes);
-                last = change.track;
+            } else if (!is_whole([&] { take(change.track); })) {
+                changes.left_out.insert(change.track);
             }
         }
         if (batch.empty()) {
@@ -140,6 +194,7 @@ void Snapshot::remove(const std::unordered_set<int64_t>& ids)
 {
     const auto is_removed = [&](const TrackSpan& track) { return ids.contains(track.id); };
     if (!ids.empty()) {
+        std::erase_if(left_out_, [&](int64_t id) { return ids.contains(id); });
         std::erase_if(mapped_tracks_, is_removed);
         for (auto& chunk : chunks_) {
             std::erase_if(chunk.tracks, is_removed);
@@ -153,6 +208,7 @@ bool Snapshot::update(Store& store)
     for (int attempt = 0; attempt < kAttempts; ++attempt) {
         Changes changes = read_changes(store);
         add(std::move(changes.codes), std::move(changes.tracks));
+        left_out_.merge(changes.left_out);
         remove(changes.removed);
         cursor_ = changes.cursor;
         if (agrees_with(store)) {
@@ -165,7 +221,8 @@ bool Snapshot::update(Store& store)
 bool Snapshot::agrees_with(Store& store) const
 {
     const Corpus all = corpus();
-    return all.track_count() == store.track_count() && all.code_count() == store.code_count();
+    const bool same_codes = all.code_count() == store.code_count() || !left_out_.empty();
+    return all.track_count() + left_out_.size() == store.track_count() && same_codes;
 }
 
 /// Whether the file was made from this very store: one that was restored from an older copy has the
@@ -177,9 +234,13 @@ bool Snapshot::is_of(Store& store) const
         return true;
     }
     const auto& last = mapped_tracks_.back();
-    const auto trail = store.trail(last.id);
     const Segment segment{mapped_->contents.codes, mapped_tracks_};
-    return trail && std::ranges::equal(trail->codes, segment.of(last));
+    bool same = false;
+    const bool whole = is_whole([&] {
+        const auto trail = store.trail(last.id);
+        same = trail && std::ranges::equal(trail->codes, segment.of(last));
+    });
+    return whole && same;
 }
 
 Corpus Snapshot::tail() const

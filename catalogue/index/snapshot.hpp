@@ -30,7 +30,8 @@ bool has_track(std::span<const TrackSpan> tracks, int64_t id);
 /// What a store has, kept up to date from its log of changes. Copies share the codes.
 class Snapshot {
 public:
-    /// Reads everything from the store.
+    /// Reads everything from the store. Tracks whose trails are damaged are left out; when that
+    /// leaves none, it throws as the store did.
     explicit Snapshot(Store& store);
 
     /// Begins with a side file, and reads from the store what has changed since it was written.
@@ -46,6 +47,7 @@ public:
     bool update(Store& store);
 
     int64_t cursor() const { return cursor_; }
+    size_t left_out() const { return left_out_.size(); } ///< tracks whose trails are damaged
     Corpus corpus() const;
     Corpus tail() const; ///< what the side file does not have
     const MappedIndex* mapped() const { return mapped_.get(); }
@@ -62,6 +64,7 @@ private:
     };
     struct Changes;
 
+    void read_whole_tracks(Store& store);
     int64_t last_id() const;
     Changes read_changes(Store& store) const;
     void add(std::vector<Code> codes, std::vector<TrackSpan> tracks);
@@ -72,6 +75,7 @@ private:
     std::shared_ptr<const MappedIndex> mapped_;
     std::vector<TrackSpan> mapped_tracks_;
     std::vector<Chunk> chunks_;
+    std::unordered_set<int64_t> left_out_;
     int64_t cursor_ = 0;
 };
 

@@ -1,6 +1,7 @@
 // Searching a store with a side file: whatever has become of the file, the answers are those of a
 // scan of what the store has.
 
+#include <algorithm>
 #include <memory>
 #include <optional>
 #include <random>
@@ -454,6 +455,74 @@ public:
 private:
     int good_;
 };
+
+/// A store in which the trails of some tracks are damaged.
+class Damaged : public test::ForwardingStore {
+public:
+    Damaged(Store& to, std::vector<int64_t> ids) : ForwardingStore(to), ids_(std::move(ids)) {}
+    void visit_trails(int64_t after,
+                      const std::function<bool(int64_t, const Trail&)>& visit) override
+    {
+        ForwardingStore::visit_trails(after, [&](int64_t id, const Trail& trail) {
+            check(id);
+            return visit(id, trail);
+        });
+    }
+    std::optional<Trail> trail(int64_t track) override
+    {
+        check(track);
+        return ForwardingStore::trail(track);
+    }
+
+private:
+    void check(int64_t id) const
+    {
+        if (std::ranges::find(ids_, id) != ids_.end()) {
+            throw StoreError(StoreError::Kind::damaged, "damaged");
+        }
+    }
+    std::vector<int64_t> ids_;
+};
+
+TEST_F(SideFile, IsNotWrittenWhileTracksAreLeftOut)
+{
+    Damaged damaged(*store_, {ids_[7], ids_[20]});
+    const auto index = open_index(damaged, options_for(path_));
+    EXPECT_EQ(2U, index->facts().left_out);
+    EXPECT_EQ(kTracks - 2, index->facts().tracks);
+    EXPECT_EQ(0U, index->facts().file_bytes);
+    EXPECT_EQ(ids_[8], found(*index, 9));
+    EXPECT_EQ(0, found(*index, 8));
+}
+
+TEST_F(SideFile, AnswersForTracksThatWereDamagedSince)
+{
+    open();
+    Damaged damaged(*store_, {ids_[7]});
+    const auto index = open_index(damaged, options_for(path_));
+    EXPECT_EQ(0U, index->facts().left_out);
+    EXPECT_EQ(ids_[7], found(*index, 8));
+}
+
+TEST_F(SideFile, WithNothingWholeLeftReportsTheDamage)
+{
+    Damaged damaged(*store_, ids_);
+    EXPECT_THROW(open_index(damaged, options_for(path_)), StoreError);
+}
+
+TEST_F(Refresh, PassesOverDamagedTracks)
+{
+    const auto index = open();
+    const auto more = add(*store_, kTracks + 1, 3);
+    Damaged damaged(*store_, {more[1]});
+    index->refresh(damaged);
+    EXPECT_EQ(1U, index->facts().left_out);
+    EXPECT_EQ(more[2], found(*index, kTracks + 3));
+    EXPECT_EQ(0, found(*index, kTracks + 2));
+    ASSERT_TRUE(store_->remove(more[1]));
+    index->refresh(damaged);
+    EXPECT_EQ(0U, index->facts().left_out);
+}
 
 TEST_F(Refresh, ThatFailsChangesNothing)
 {

@@ -157,6 +157,7 @@ TEST(CatalogueRecordLayout, OfSummaries)
         FIELD(Record, match_count),
         FIELD(Record, candidate_count),
         FIELD(Record, runner_up),
+        FIELD(Record, left_out),
         FIELD(Record, reserved),
     });
     EXPECT_EQ(64U, sizeof(Record));
