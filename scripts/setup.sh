@@ -13,7 +13,7 @@ packages_of() {
     # Also a jni.h, for the library's Java front.
     build) echo "g++ cmake ninja-build make android-libnativehelper-dev" ;;
     catalogue) echo "libsqlite3-dev nettle-dev pkg-config sqlite3" ;; # keeping and hashing; a second reader for tests
-    tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev" ;;
+    tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev libpng-dev" ;;
     test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso python3" ;;
     # The Java front and its tests; Android's log and threads as a desktop has them.
     java) echo "default-jdk-headless junit4 android-liblog-dev android-libutils-dev" ;;
