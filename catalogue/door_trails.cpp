@@ -10,22 +10,6 @@ namespace {
 
 using namespace kzcat;
 
-/// Copies what fits, and reports how much there is whatever the room.
-template <class Item>
-void copy_out(std::span<const Item> items, Item* room, uint64_t capacity, uint64_t* out_count)
-{
-    *out_count = items.size();
-    if (room == nullptr && capacity == 0) {
-        return;
-    }
-    if (capacity < items.size()) {
-        throw Failure(KZCAT_ERROR_ROOM, "room for " + std::to_string(items.size()) +
-                                            " is needed, there is room for " +
-                                            std::to_string(capacity));
-    }
-    std::ranges::copy(items, room);
-}
-
 bool wants_documents(const kzcat_builder_settings& settings)
 {
     require(settings.documents <= 1 && all_zero(settings.reserved),

@@ -2,8 +2,11 @@
 /// What the opaque handles of the C interface hold, and how they are created and freed.
 #pragma once
 
+#include <algorithm>
+#include <cstdint>
 #include <memory>
 #include <optional>
+#include <span>
 #include <string>
 #include <variant>
 #include <vector>
@@ -89,6 +92,22 @@ template <class Number, size_t count>
 bool all_zero(const Number (&reserved)[count])
 {
     return std::all_of(reserved, reserved + count, [](Number number) { return number == 0; });
+}
+
+/// Copies what fits, and reports how much there is whatever the room.
+template <class Item>
+void copy_out(std::span<const Item> items, Item* room, uint64_t capacity, uint64_t* out_count)
+{
+    *out_count = items.size();
+    if (room == nullptr && capacity == 0) {
+        return;
+    }
+    if (capacity < items.size()) {
+        throw Failure(KZCAT_ERROR_ROOM, "room for " + std::to_string(items.size()) +
+                                            " is needed, there is room for " +
+                                            std::to_string(capacity));
+    }
+    std::ranges::copy(items, room);
 }
 
 /// Checks a caller's format; the extractors then refuse what they cannot use.

@@ -77,6 +77,26 @@ TEST(CatalogueRecordLayout, OfTrailFacts)
     EXPECT_EQ(64U, sizeof(Record));
 }
 
+TEST(CatalogueRecordLayout, OfAlignments)
+{
+    using Record = kzcat_alignment;
+    expect_layout<Record>({
+        FIELD(Record, offset),
+        FIELD(Record, begin),
+        FIELD(Record, end),
+        FIELD(Record, compared),
+        FIELD(Record, agreeing),
+        FIELD(Record, error_rate),
+        FIELD(Record, agreeing_rate),
+        FIELD(Record, first_sounding),
+        FIELD(Record, second_sounding),
+        FIELD(Record, lag),
+        FIELD(Record, found),
+        FIELD(Record, reserved),
+    });
+    EXPECT_EQ(128U, sizeof(Record));
+}
+
 TEST(CatalogueRecordLayout, OfTags)
 {
     using Record = kzcat_tag;
