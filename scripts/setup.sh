@@ -13,11 +13,12 @@ packages_of() {
     # Also a jni.h, for the library's Java front.
     build) echo "g++ cmake ninja-build make android-libnativehelper-dev" ;;
     catalogue) echo "libsqlite3-dev nettle-dev pkg-config sqlite3" ;; # keeping and hashing; a second reader for tests
-    tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev libpng-dev" ;;
+    # FFmpeg's libraries read what libsndfile does not, PortAudio listens to microphones.
+    tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev libavformat-dev libavcodec-dev portaudio19-dev libpng-dev" ;;
     test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso python3" ;;
     # The Java front and its tests; Android's log and threads as a desktop has them.
     java) echo "default-jdk-headless junit4 android-liblog-dev android-libutils-dev" ;;
-    clips) echo "sox libsox-fmt-all espeak-ng" ;; # the demo's music, and the tests' clips
+    clips) echo "sox libsox-fmt-all espeak-ng ffmpeg" ;; # the demo's music, and the tests' clips
     # Tools that count instructions and print tables, and the peers, each of which may be missing.
     bench) echo "valgrind python3 pkg-config libcli11-dev nlohmann-json3-dev libchromaprint-dev libfftw3-dev libswresample-dev libavutil-dev libsoxr-dev libspeexdsp-dev libpugixml-dev libtinyxml2-dev libxml2-dev" ;;
     fuzz) echo "libexpat1-dev python3" ;; # a parser to read what is rendered, and the seeds

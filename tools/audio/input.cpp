@@ -8,9 +8,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "audio/file_source.hpp"
 #include "audio/rate_converter.hpp"
 #include "audio/raw_samples.hpp"
-#include "audio/sound_file.hpp"
 
 namespace audio {
 
@@ -60,7 +60,7 @@ OpenedInput Input::open() { return request_.raw ? open_raw(*request_.raw) : open
 OpenedInput Input::open_sound_file()
 {
     const int file = spool_ ? spool_->number() : file_.number();
-    auto sound_file = std::make_unique<SoundFile>(file, request_.accepts_rate, request_.floats);
+    auto sound_file = open_file_source(file, request_.accepts_rate, request_.floats);
     recognised_ = true;
     sound_file->select(request_.section);
     InputFacts facts = {.rate = sound_file->file_rate(),

@@ -20,6 +20,7 @@ public:
     StreamFormat format() const override;
     size_t read(std::span<std::byte> bytes) override;
     std::string trouble() const override { return source_->trouble(); }
+    bool went_on() const override { return source_->went_on(); }
 
 private:
     struct Delete {

@@ -4,7 +4,6 @@
 #include "audio/sound_file.hpp"
 
 #include <algorithm>
-#include <bit>
 #include <cerrno>
 #include <cmath>
 #include <cstring>
@@ -13,22 +12,13 @@
 
 #include <unistd.h>
 
+#include "audio/samples.hpp"
+
 namespace audio {
 
 namespace {
 
 constexpr size_t kBlock = 4096; ///< frames read at a time
-
-/// Full scale is 32768, so that 16-bit samples come back unchanged from a file of floats. Rounded
-/// to the nearest, clipped at full scale; what is not a number is silence.
-int16_t to_16_bits(float sample)
-{
-    const float scaled = sample * 32768.0f;
-    if (std::isnan(scaled)) {
-        return 0;
-    }
-    return static_cast<int16_t>(std::lrint(std::clamp(scaled, -32768.0f, 32767.0f)));
-}
 
 } // namespace
 
@@ -42,8 +32,7 @@ SoundFile::SoundFile(int file, const AcceptsRate& accepts_rate, bool floats)
     }
     file_.reset(sf_open_fd(own, SFM_READ, &info_, SF_TRUE));
     if (!file_) {
-        throw FileError("is not a sound file that can be read (WAV, FLAC, OGG, MP3, ...); "
-                        "headerless audio needs --raw");
+        throw NotRecognised(not_recognised_text());
     }
     // A header that could only be read in part is taken for another one; the next call clears that
     // error.
@@ -209,7 +198,7 @@ size_t SoundFile::read_pcm16(std::span<std::byte> bytes)
         const auto wanted = static_cast<sf_count_t>(std::min(kBlock, frames - done));
         const auto got = static_cast<size_t>(std::max<sf_count_t>(read_samples(wanted), 0));
         if (info_.channels > 2) {
-            mix_down(got);
+            mix_down(std::span(samples_).first(got * file_channels()), file_channels());
         }
         std::memcpy(bytes.data() + done * frame_bytes, samples_.data(), got * frame_bytes);
         done += got;
@@ -252,22 +241,6 @@ sf_count_t SoundFile::read_samples(sf_count_t frames)
     std::transform(floats_.begin(), floats_.begin() + static_cast<std::ptrdiff_t>(filled),
                    samples_.begin(), to_16_bits);
     return got;
-}
-
-/// The library's rule for many channels: the sum divided by the smallest power of two that is not
-/// below their number, here rounded to the nearest 16-bit word.
-void SoundFile::mix_down(size_t frames)
-{
-    const size_t channels = file_channels();
-    const auto shift = static_cast<int>(std::bit_width(channels - 1));
-    const int32_t half = int32_t{1} << (shift - 1);
-    for (size_t i = 0; i < frames; ++i) {
-        int32_t sum = 0;
-        for (size_t c = 0; c < channels; ++c) {
-            sum += samples_[i * channels + c];
-        }
-        samples_[i] = static_cast<int16_t>((sum + half) >> shift);
-    }
 }
 
 } // namespace audio

@@ -8,7 +8,7 @@
 
 #include <sndfile.h>
 
-#include "audio/source.hpp"
+#include "audio/file_source.hpp"
 
 namespace audio {
 
@@ -18,23 +18,18 @@ namespace audio {
 /// - what is decoded to floats, where these are wanted and the rate is accepted: floats of all
 ///   channels;
 /// - everything else: 16-bit PCM, in which more than two channels are mixed down to one.
-class SoundFile : public Source {
+class SoundFile : public FileSource {
 public:
     /// `file` is a regular file that outlives the object; `accepts_rate` decides whether companded
-    /// samples, and floats, are given as they are. Throws FileError.
+    /// samples, and floats, are given as they are. Throws FileError; NotRecognised when it is of
+    /// no kind that libsndfile reads.
     SoundFile(int file, const AcceptsRate& accepts_rate, bool floats);
 
-    /// Goes to the start of a section, beyond whose end read() gives nothing. Before the first
-    /// read(). Throws FileError.
-    void select(const Section& section);
-
-    uint32_t file_rate() const { return static_cast<uint32_t>(info_.samplerate); }
-    uint32_t file_channels() const { return static_cast<uint32_t>(info_.channels); }
-    std::optional<double> duration() const;
-
-    /// Title, artist and the like, as far as the file has them.
-    std::vector<Tag> tags() const;
-
+    void select(const Section& section) override;
+    uint32_t file_rate() const override { return static_cast<uint32_t>(info_.samplerate); }
+    uint32_t file_channels() const override { return static_cast<uint32_t>(info_.channels); }
+    std::optional<double> duration() const override;
+    std::vector<Tag> tags() const override;
     StreamFormat format() const override;
     size_t read(std::span<std::byte> bytes) override;
     std::string trouble() const override;
@@ -51,7 +46,6 @@ private:
     size_t read_pcm16(std::span<std::byte> bytes);
     size_t read_floats(std::span<std::byte> bytes);
     sf_count_t read_samples(sf_count_t frames);
-    void mix_down(size_t frames);
 
     std::unique_ptr<SNDFILE, Close> file_;
     SF_INFO info_ = {};

@@ -46,6 +46,9 @@ public:
 
     /// Why the stream ended early; empty when there is no reason to doubt it.
     virtual std::string trouble() const { return {}; }
+
+    /// Whether, with trouble(), what follows the damage was read all the same.
+    virtual bool went_on() const { return false; }
 };
 
 } // namespace audio

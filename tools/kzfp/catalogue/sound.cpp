@@ -77,9 +77,12 @@ Fed fed(const audio::OpenedInput& opened, double seconds, bool strict)
     if (strict && !trouble.empty()) {
         throw audio::FileError(damaged_after(seconds, trouble));
     }
+    if (trouble.empty()) {
+        return {.tags = opened.facts.tags, .warning = {}};
+    }
     return {.tags = opened.facts.tags,
-            .warning = trouble.empty()
-                           ? ""
+            .warning = opened.source->went_on()
+                           ? "is damaged (" + trouble + "); the rest was used"
                            : damaged_after(seconds, trouble) + "; what comes before was used"};
 }
 

@@ -1,0 +1,36 @@
+// libsndfile comes first: it is the faster reader of what both read.
+
+#include "audio/file_source.hpp"
+
+#include <sndfile.h>
+
+#include "audio/sound_file.hpp"
+
+namespace audio {
+
+std::unique_ptr<FileSource> open_file_source(int file, const AcceptsRate& accepts_rate, bool floats)
+{
+    try {
+        return std::make_unique<SoundFile>(file, accepts_rate, floats);
+    } catch (const NotRecognised&) {
+        return open_with_ffmpeg(file, accepts_rate, floats);
+    }
+}
+
+std::string not_recognised_text()
+{
+    return "is not a sound file that can be read (WAV, FLAC, OGG, MP3, ...); headerless audio "
+           "needs --raw";
+}
+
+std::string readers()
+{
+    std::string text = sf_version_string();
+    if (const size_t dash = text.find('-'); dash != std::string::npos) {
+        text[dash] = ' ';
+    }
+    const std::string ffmpeg = ffmpeg_version();
+    return ffmpeg.empty() ? text : text + ", " + ffmpeg;
+}
+
+} // namespace audio

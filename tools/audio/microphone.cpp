@@ -1,0 +1,158 @@
+// PortAudio keeps what was recorded until it is fetched; what is not fetched in time is lost, and
+// counted as a hiccup.
+
+#include "audio/microphone.hpp"
+
+#include <algorithm>
+#include <chrono>
+#include <thread>
+#include <utility>
+
+#include <portaudio.h>
+
+namespace audio {
+
+namespace {
+
+constexpr double kBuffered = 2; ///< seconds that PortAudio keeps
+constexpr auto kStep = std::chrono::milliseconds(10);
+
+/// PortAudio as long as it is used.
+class Library {
+public:
+    Library()
+    {
+        if (const PaError error = Pa_Initialize(); error != paNoError) {
+            throw FileError(std::string("cannot be listened to (") + Pa_GetErrorText(error) + ")");
+        }
+    }
+    ~Library() { Pa_Terminate(); }
+    Library(const Library&) = delete;
+    Library& operator=(const Library&) = delete;
+};
+
+/// The names of all inputs, as a sentence.
+std::string inputs_text()
+{
+    std::string text;
+    for (PaDeviceIndex i = 0; i < Pa_GetDeviceCount(); ++i) {
+        const PaDeviceInfo* const device = Pa_GetDeviceInfo(i);
+        if (device != nullptr && device->maxInputChannels > 0) {
+            text.append(text.empty() ? "'" : ", '").append(device->name).append("'");
+        }
+    }
+    return text.empty() ? "there are no inputs on this machine" : "the inputs are " + text;
+}
+
+PaDeviceIndex find_input(const std::string& name)
+{
+    if (name.empty()) {
+        const PaDeviceIndex usual = Pa_GetDefaultInputDevice();
+        if (usual == paNoDevice) {
+            throw FileError("cannot be listened to: " + inputs_text());
+        }
+        return usual;
+    }
+    for (PaDeviceIndex i = 0; i < Pa_GetDeviceCount(); ++i) {
+        const PaDeviceInfo* const device = Pa_GetDeviceInfo(i);
+        if (device != nullptr && device->maxInputChannels > 0 &&
+            std::string(device->name).find(name) != std::string::npos) {
+            return i;
+        }
+    }
+    throw FileError("is not an input of this machine; " + inputs_text());
+}
+
+class Microphone : public LiveSource {
+public:
+    explicit Microphone(const std::string& name);
+    ~Microphone() override { Pa_CloseStream(stream_); }
+    Microphone(const Microphone&) = delete;
+    Microphone& operator=(const Microphone&) = delete;
+
+    StreamFormat format() const override { return format_; }
+    HeardFrames read(std::span<std::byte> bytes, int milliseconds) override;
+    std::string trouble() const override { return trouble_; }
+    uint64_t hiccups() const override { return hiccups_; }
+
+private:
+    HeardFrames end(PaError error);
+
+    Library library_;
+    PaStream* stream_ = nullptr;
+    StreamFormat format_;
+    uint64_t hiccups_ = 0;
+    std::string trouble_;
+    bool ended_ = false;
+};
+
+Microphone::Microphone(const std::string& name)
+{
+    const PaDeviceIndex index = find_input(name);
+    const PaDeviceInfo& device = *Pa_GetDeviceInfo(index);
+    const int channels = std::min(device.maxInputChannels, 2);
+    const PaStreamParameters input = {.device = index,
+                                      .channelCount = channels,
+                                      .sampleFormat = paInt16,
+                                      .suggestedLatency = kBuffered,
+                                      .hostApiSpecificStreamInfo = nullptr};
+    const double rate = device.defaultSampleRate;
+    PaError error = Pa_OpenStream(&stream_, &input, nullptr, rate, paFramesPerBufferUnspecified,
+                                  paNoFlag, nullptr, nullptr);
+    if (error == paNoError) {
+        error = Pa_StartStream(stream_);
+        if (error != paNoError) {
+            Pa_CloseStream(stream_);
+        }
+    }
+    if (error != paNoError) {
+        throw FileError(std::string("cannot be listened to (") + Pa_GetErrorText(error) + "); " +
+                        inputs_text());
+    }
+    format_ = {.rate = static_cast<uint32_t>(rate),
+               .channels = static_cast<uint32_t>(channels),
+               .encoding = Encoding::s16};
+}
+
+HeardFrames Microphone::read(std::span<std::byte> bytes, int milliseconds)
+{
+    using Clock = std::chrono::steady_clock;
+    const auto until = Clock::now() + std::chrono::milliseconds(milliseconds);
+    while (!ended_) {
+        const signed long there = Pa_GetStreamReadAvailable(stream_);
+        if (there < 0) {
+            return end(static_cast<PaError>(there));
+        }
+        if (there > 0) {
+            const auto frames =
+                std::min(static_cast<size_t>(there), bytes.size() / format_.frame_bytes());
+            const PaError error = Pa_ReadStream(stream_, bytes.data(), frames);
+            if (error != paNoError && error != paInputOverflowed) {
+                return end(error);
+            }
+            hiccups_ += error == paInputOverflowed ? 1U : 0U;
+            return {Heard::samples, frames};
+        }
+        if (Clock::now() >= until) {
+            return {};
+        }
+        std::this_thread::sleep_for(kStep);
+    }
+    return {Heard::end, 0};
+}
+
+HeardFrames Microphone::end(PaError error)
+{
+    ended_ = true;
+    trouble_ = std::string("the microphone has failed (") + Pa_GetErrorText(error) + ")";
+    return {Heard::end, 0};
+}
+
+} // namespace
+
+std::unique_ptr<LiveSource> open_microphone(const std::string& name)
+{
+    return std::make_unique<Microphone>(name);
+}
+
+} // namespace audio
