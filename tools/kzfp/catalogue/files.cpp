@@ -38,6 +38,26 @@ bool sounds(const fs::path& path)
     return std::ranges::find(kEndings, ending) != std::end(kEndings);
 }
 
+void list_folder(const fs::path& folder, FileList& list);
+
+void list_entry(const fs::path& entry, FileList& list)
+{
+    std::error_code error;
+    const fs::file_type type = fs::status(entry, error).type();
+    if (type == fs::file_type::none) {
+        list.files.push_back(
+            {.path = entry.string(), .trouble = "cannot be looked at (" + error.message() + ")"});
+    } else if (type == fs::file_type::directory && fs::is_symlink(entry, error)) {
+        ++list.links; // it may lead round in circles
+    } else if (type == fs::file_type::directory) {
+        list_folder(entry, list);
+    } else if (sounds(entry)) {
+        list.files.push_back({.path = entry.string(), .trouble = {}});
+    } else {
+        ++list.passed_over;
+    }
+}
+
 void list_folder(const fs::path& folder, FileList& list)
 {
     std::error_code error;
@@ -52,16 +72,7 @@ void list_folder(const fs::path& folder, FileList& list)
     }
     std::ranges::sort(entries);
     for (const fs::path& entry : entries) {
-        const bool is_link = fs::is_symlink(entry, error);
-        if (fs::is_directory(entry, error)) {
-            if (!is_link) { // a link may lead round in circles
-                list_folder(entry, list);
-            }
-        } else if (sounds(entry)) {
-            list.files.push_back({.path = entry.string(), .trouble = {}});
-        } else {
-            ++list.passed_over;
-        }
+        list_entry(entry, list);
     }
 }
 

@@ -20,6 +20,7 @@ struct ListedFile {
 struct FileList {
     std::vector<ListedFile> files;
     uint64_t passed_over = 0; ///< files in folders whose names are not those of sound
+    uint64_t links = 0;       ///< to folders, in folders: they are not followed
 };
 
 /// What was named, in this order; folders are replaced by the sound files below them, sorted by

@@ -1,90 +1,31 @@
-// `kzfp list`: what a catalogue holds.
+// `kzfp list`: what a catalogue holds. Tracks are printed as they are read, so that memory does not
+// grow with the catalogue.
 
+#include <array>
 #include <cstdio>
 #include <string>
 
-#include <nlohmann/json.hpp>
-
-#include "kzfp/catalogue/answer.hpp"
+#include "kzfp/catalogue/guarded.hpp"
+#include "kzfp/catalogue/track_lines.hpp"
+#include "kzfp/catalogue/tracks.hpp"
 #include "kzfp/command_line/common_options.hpp"
+#include "kzfp/command_line/output_options.hpp"
+#include "kzfp/output/csv.hpp"
+#include "kzfp/output/interruption.hpp"
+#include "kzfp/output/json_object.hpp"
 #include "kzfp/output/write.hpp"
 
 namespace kzfp {
 
 namespace {
 
-using Object = nlohmann::ordered_json;
+constexpr FormatChoice kFormats[] = {kHumanFormat, kJsonFormat, kCsvFormat};
 
 struct ListSettings {
     std::string catalogue;
-    TextOrJson format = TextOrJson::text;
+    OutputOptions output;
     bool summary = false;
 };
-
-std::string line_of(const Object& object)
-{
-    return object.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace) + '\n';
-}
-
-kzcat_source source_at(const Track& track, uint32_t place)
-{
-    kzcat_source source;
-    check(kzcat_track_get_source(track.get(), place, &source));
-    return source;
-}
-
-kzcat_tag tag_at(const Track& track, uint32_t place)
-{
-    kzcat_tag tag;
-    check(kzcat_track_get_tag(track.get(), place, &tag));
-    return tag;
-}
-
-std::string to_json(const Track& track, const kzcat_track_facts& facts)
-{
-    Object object = Object::object_t();
-    object["track"] = facts.track;
-    object["seconds"] = static_cast<double>(facts.samples) / facts.sample_rate;
-    object["codes"] = facts.code_count;
-    object["documents"] = facts.answers_documents != 0;
-    object["added"] = facts.added;
-    object["tags"] = Object::object();
-    for (uint32_t i = 0; i < facts.tag_count; ++i) {
-        const kzcat_tag tag = tag_at(track, i);
-        object["tags"][tag.name].push_back(tag.value); // there may be several of one name
-    }
-    object["sources"] = Object::array();
-    for (uint32_t i = 0; i < facts.source_count; ++i) {
-        object["sources"].push_back(source_at(track, i).uri);
-    }
-    return line_of(object);
-}
-
-/// "12  3:45.0  Music/song.flac", and a line for each further source.
-std::string to_text(const Track& track, const kzcat_track_facts& facts)
-{
-    const std::string length = clock_text(static_cast<double>(facts.samples) / facts.sample_rate);
-    char begin[64];
-    std::snprintf(begin, sizeof begin, "%6lld %9s  ", static_cast<long long>(facts.track),
-                  length.c_str());
-    std::string text;
-    for (uint32_t i = 0; i < facts.source_count; ++i) {
-        text += (i == 0 ? std::string(begin) : std::string(18, ' ')) +
-                without_control_characters(source_at(track, i).uri) + '\n';
-    }
-    return text.empty() ? begin + std::string("(no source)\n") : text;
-}
-
-void write_tracks(kzcat_catalogue& catalogue, TextOrJson format)
-{
-    int64_t last = 0;
-    while (const auto track = found<Track>(kzcat_get_next_track, &catalogue, last)) {
-        kzcat_track_facts facts;
-        check(kzcat_track_get_facts(track.get(), &facts));
-        write_output(format == TextOrJson::json ? to_json(track, facts) : to_text(track, facts));
-        last = facts.track;
-    }
-}
 
 const char* plan_text(const kzcat_facts& facts)
 {
@@ -93,8 +34,8 @@ const char* plan_text(const kzcat_facts& facts)
 
 std::string summary_json(const std::string& path, const kzcat_facts& facts)
 {
-    Object object = Object::object_t();
-    object["catalogue"] = path;
+    JsonObject object = make_object();
+    set_path(object, "catalogue", path);
     object["tracks"] = facts.tracks;
     object["codes"] = facts.codes;
     object["plan"] = plan_text(facts);
@@ -107,10 +48,18 @@ std::string summary_json(const std::string& path, const kzcat_facts& facts)
         object["parts_ms"] = facts.parts_ms;
     }
     object["index_bytes"] = facts.index_bytes;
-    return line_of(object);
+    return to_line(object);
 }
 
-/// "239 tracks, 11.1 hours; looked up by scan (3.1 ms a clip, 1.2 ms by parts)".
+std::string summary_csv(const std::string& path, const kzcat_facts& facts)
+{
+    return "catalogue,tracks,codes,plan,index_bytes\n" +
+           csv_line(std::array<std::string, 5>{path, std::to_string(facts.tracks),
+                                               std::to_string(facts.codes), plan_text(facts),
+                                               std::to_string(facts.index_bytes)});
+}
+
+/// "239 tracks, 11.1 hours; looked up by scan (a clip takes 3.1 ms by scan, 1.2 ms by parts)".
 std::string summary_text(const kzcat_facts& facts)
 {
     constexpr double kCodeSeconds = 2048 / 11025.0;
@@ -128,42 +77,62 @@ std::string summary_text(const kzcat_facts& facts)
     return line + '\n';
 }
 
-void list(const ListSettings& settings)
+std::string summary(const ListSettings& settings, const kzcat_facts& facts)
+{
+    switch (settings.output.format) {
+    case Format::json:
+        return summary_json(settings.catalogue, facts);
+    case Format::csv:
+        return summary_csv(settings.catalogue, facts);
+    default:
+        return summary_text(facts);
+    }
+}
+
+void write_tracks(kzcat_catalogue& catalogue, Format format)
+{
+    write_output(first_line_of_tracks(format));
+    visit_tracks(catalogue, 0, [format](const Track& track) {
+        write_output(lines_of(track, format));
+        return !interrupted();
+    });
+}
+
+ExitStatus list(const ListSettings& settings)
 {
     const Catalogue catalogue = open_catalogue(settings.catalogue, KZCAT_ACCESS_READ);
     if (!settings.summary) {
-        write_tracks(*catalogue, settings.format);
+        write_tracks(*catalogue, settings.output.format);
     }
-    if (settings.summary || settings.format == TextOrJson::text) {
+    if (interrupted()) {
+        write_message("interrupted; the list is not complete");
+        return interrupted_by_user;
+    }
+    if (settings.summary || settings.output.format == Format::human) {
         kzcat_facts facts;
         check(kzcat_get_facts(catalogue.get(), 1, &facts));
-        write_output(settings.format == TextOrJson::json ? summary_json(settings.catalogue, facts)
-                                                         : summary_text(facts));
+        write_output(summary(settings, facts));
     }
+    return all_done;
 }
 
 } // namespace
 
 ExitStatus run_list(const Arguments& arguments)
 {
-    CLI::App parser("Lists the tracks of CATALOGUE with their ids, lengths and sources, and how it "
-                    "is looked up.",
+    CLI::App parser("Lists the tracks of CATALOGUE with their ids, lengths, sources and tags, and "
+                    "how it\nis looked up.",
                     program_name(arguments));
     ListSettings settings;
     add_catalogue_option(parser, settings.catalogue);
-    add_format_option(parser, settings.format);
+    add_output_options(parser, kFormats, settings.output);
     parser.add_flag("--summary", settings.summary,
                     "Only how much there is, and how it is looked up");
     if (const auto status = parse(parser, arguments)) {
         return *status;
     }
-    try {
-        list(settings);
-        return all_done;
-    } catch (const CatalogueError& error) {
-        write_message(message_about(settings.catalogue, error));
-        return some_file_failed;
-    }
+    watch_for_interruption();
+    return guarded(settings.catalogue, [&settings] { return list(settings); });
 }
 
 } // namespace kzfp
