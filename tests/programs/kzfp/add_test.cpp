@@ -244,7 +244,8 @@ TEST(KzfpAdd, FoldersAreWalkedInTheOrderOfNames)
     fs::create_directory_symlink(scratch.path("m"), scratch.path("m/loop"));
     const std::string folder = scratch.path("m");
     EXPECT_EQ("added " + folder + "/a.wav\nadded " + folder + "/b/1.WAV\nadded " + folder +
-                  "/b/2.wav\n3 added; 1 file that is no sound passed over\n",
+                  "/b/2.wav\n3 added; 1 file that is no sound passed over; 1 link to a folder not "
+                  "followed (name the folder to add what is below it)\n",
               output_of({"add", "-j", "3", catalogue, folder}));
 }
 
@@ -314,7 +315,7 @@ TEST(KzfpAdd, JsonTellsWhatBecameOfEachFile)
     const ProcessResult result = kzfp({"add", "-f", "json", catalogue, good, "/nonexistent"});
     const std::vector<json> lines = lines_of(result.out);
     ASSERT_EQ(2u, lines.size());
-    EXPECT_EQ((json{{"file", good}, {"outcome", "added"}, {"track", 1}}), lines[0]);
+    EXPECT_EQ((json{{"schema", 1}, {"file", good}, {"outcome", "added"}, {"track", 1}}), lines[0]);
     EXPECT_EQ("error", lines[1]["outcome"]);
     EXPECT_TRUE(contains(lines[1]["error"], "cannot be opened")) << lines[1];
 }

@@ -6,20 +6,40 @@
 #include <vector>
 
 #include "audio/source.hpp"
+#include "kzfp/catalogue/files.hpp"
 #include "kzfp/catalogue/handles.hpp"
 #include "kzfp/command_line/command_line.hpp"
+#include "kzfp/command_line/output_options.hpp"
 #include "kzfp/output/interruption.hpp"
 #include "kzfp/output/write.hpp"
 
 namespace kzfp {
 
-/// Runs `work()`, which gives the status to end with. When the catalogue at `path` fails, or a file
-/// does, the reason is reported, and the status says so.
-template <class Work>
-ExitStatus guarded(const std::string& path, Work work)
+/// Throws audio::FileError when the results would replace the catalogue or a file beside it.
+inline void check_output(const std::string& catalogue, const std::string& output)
 {
     try {
-        return work();
+        if (!output.empty()) {
+            check_is_not_of(catalogue, output);
+        }
+    } catch (const audio::FileError& error) {
+        throw audio::FileError(output + ": " + error.what() + "; --output needs another file");
+    }
+}
+
+/// Runs `work()`, which gives the status to end with, its results going where `output` wants them.
+/// When the catalogue at `path` fails, or a file does, the reason is reported, and the status says
+/// so. The output may be neither of the catalogue's files nor one of `inputs`.
+template <class Work>
+ExitStatus guarded(const std::string& path, const OutputOptions& output,
+                   const std::vector<std::string>& inputs, OutputFile::Mode mode, Work work)
+{
+    try {
+        check_output(path, output.output);
+        OutputFile file(output.output, inputs, mode);
+        const ExitStatus status = work();
+        file.finish();
+        return status;
     } catch (const CatalogueError& error) {
         if (error.status == KZCAT_ERROR_CANCELLED && interrupted()) {
             write_message("interrupted");

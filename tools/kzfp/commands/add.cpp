@@ -115,10 +115,9 @@ ExitStatus run_add(const Arguments& arguments)
     add_catalogue_option(parser, settings.catalogue);
     add_file_options(parser, settings.files, "Sound files, trails (.kzt) and folders");
     add_output_options(parser, kFormats, settings.output);
-    add_sound_options(parser, settings.sound);
-    for (const char* name : {"--start", "--length"}) { // a track is a whole recording
-        parser.remove_option(parser.get_option(name));
-    }
+    add_raw_option(parser, settings.sound.raw); // no section: a track is a whole recording
+    add_strict_option(parser, settings.sound.strict);
+    add_timeout_option(parser, settings.sound.timeout);
     parser.add_flag("--documents", settings.documents,
                     "Also keep what answers query documents: 59 bytes more for\n"
                     "each second of sound, beside 43");
@@ -127,7 +126,8 @@ ExitStatus run_add(const Arguments& arguments)
         return *status;
     }
     watch_for_interruption();
-    return guarded(settings.catalogue, [&settings] { return add_all(settings); });
+    return guarded(settings.catalogue, settings.output, settings.files.named,
+                   OutputFile::Mode::live, [&settings] { return add_all(settings); });
 }
 
 } // namespace kzfp

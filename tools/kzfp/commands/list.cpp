@@ -132,7 +132,8 @@ ExitStatus run_list(const Arguments& arguments)
         return *status;
     }
     watch_for_interruption();
-    return guarded(settings.catalogue, [&settings] { return list(settings); });
+    return guarded(settings.catalogue, settings.output, {}, OutputFile::Mode::whole,
+                   [&settings] { return list(settings); });
 }
 
 } // namespace kzfp

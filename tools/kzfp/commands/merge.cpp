@@ -117,7 +117,8 @@ ExitStatus run_merge(const Arguments& arguments)
         return *status;
     }
     watch_for_interruption();
-    return guarded(settings.catalogue, [&settings] { return merge_all(settings); });
+    return guarded(settings.catalogue, settings.output, settings.others, OutputFile::Mode::live,
+                   [&settings] { return merge_all(settings); });
 }
 
 } // namespace kzfp

@@ -189,7 +189,8 @@ ExitStatus run_remove(const Arguments& arguments)
         return *status;
     }
     watch_for_interruption();
-    return guarded(settings.catalogue, [&settings] { return remove_all(settings); });
+    return guarded(settings.catalogue, settings.output, {}, OutputFile::Mode::live,
+                   [&settings] { return remove_all(settings); });
 }
 
 } // namespace kzfp

@@ -109,7 +109,8 @@ ExitStatus run_verify(const Arguments& arguments)
         return *status;
     }
     watch_for_interruption();
-    return guarded(settings.catalogue, [&settings] { return verify(settings); });
+    return guarded(settings.catalogue, settings.output, {}, OutputFile::Mode::whole,
+                   [&settings] { return verify(settings); });
 }
 
 } // namespace kzfp
