@@ -146,6 +146,9 @@ void look_up(Catalogue& catalogue, const kzcat_query& query, const MatchOptions&
     }
     result.summary.by = KZCAT_BY_TRAIL;
     const auto* bands = std::get_if<QueryBands>(&query.content);
+    result.summary.clip_seconds = bands != nullptr
+                                      ? static_cast<double>(bands->samples) / kWorkingRate
+                                      : std::get<Trail>(query.content).seconds();
     fill(result, catalogue,
          bands != nullptr ? catalogue.recognise(*bands, options)
                           : catalogue.recognise(std::get<Trail>(query.content), options),

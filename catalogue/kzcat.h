@@ -723,9 +723,10 @@ typedef struct kzcat_summary {
         match_count; /**< tracks that reached their threshold; 0 unless the verdict is a match */
     uint64_t candidate_count; /**< best tracks whatever their score */
     double runner_up;         /**< score of the second best track; 0 when there is none */
+    double clip_seconds;      /**< of the clip; 0 for a document, which does not say */
     uint32_t left_out;        /**< tracks that were not looked through because what is stored of
                                    them is damaged: kzcat_verify() says which; 0 at best */
-    uint32_t reserved[7];     /**< 0 */
+    uint32_t reserved[5];     /**< 0 */
 } kzcat_summary;
 
 /** A track in which a clip was found. */

@@ -186,6 +186,11 @@ TrackMatch WindowSearch::describe(const Hit& hit, const Alignment& alignment) co
                      .pitch = alignment.pitch,
                      .clip_begin = source_.begin(hit.attempt->window),
                      .clip_end = source_.end(hit.attempt->window)};
+    // A clip may begin before the track does, or go on behind its end.
+    const double track = static_cast<double>(searcher_.codes(hit.track).size()) * kCodeSeconds;
+    match.clip_begin = std::max(match.clip_begin, -match.offset / match.tempo);
+    match.clip_end = std::min(match.clip_end, (track - match.offset) / match.tempo);
+    match.clip_end = std::max(match.clip_end, match.clip_begin);
     if (alignment.stretch == alignment.pitch) {
         match.speed = alignment.stretch;
     }

@@ -77,13 +77,15 @@ TEST_F(Recognition, JsonHasTheMembersThatAreDocumented)
     for (const auto& member : answer.items()) {
         names.push_back(member.key());
     }
-    EXPECT_EQ((std::vector<std::string>{"file", "matches", "runner_up", "verdict"}), names);
+    EXPECT_EQ((std::vector<std::string>{"file", "matches", "runner_up", "schema", "verdict"}),
+              names);
     names.clear();
     for (const auto& member : answer["matches"][0].items()) {
         names.push_back(member.key());
     }
-    EXPECT_EQ((std::vector<std::string>{"by", "offset", "pitch", "score", "source", "speed",
-                                        "tempo", "threshold", "title", "track"}),
+    EXPECT_EQ((std::vector<std::string>{"artist", "by", "clip_begin", "clip_end", "offset", "pitch",
+                                        "score", "source", "speed", "sure", "tempo", "threshold",
+                                        "title", "track"}),
               names);
 }
 

@@ -177,6 +177,7 @@ TEST(CatalogueRecordLayout, OfSummaries)
         FIELD(Record, match_count),
         FIELD(Record, candidate_count),
         FIELD(Record, runner_up),
+        FIELD(Record, clip_seconds),
         FIELD(Record, left_out),
         FIELD(Record, reserved),
     });

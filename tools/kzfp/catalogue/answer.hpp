@@ -16,6 +16,7 @@ struct FoundTrack {
     int64_t track = 0;
     std::string source;
     std::optional<std::string> title;
+    std::optional<std::string> artist;
     double score = 0;
     double threshold = 0;
     double offset = 0; ///< seconds of the track at which the clip begins
@@ -36,12 +37,15 @@ struct Answer {
     std::vector<FoundTrack> matches;
     std::vector<FoundTrack> candidates;
     double runner_up = 0;
+    double seconds = 0;    ///< of the clip; 0 when that is not known
+    uint32_t left_out = 0; ///< tracks that are damaged and were not looked through
+    size_t line = 0;       ///< of the file, which holds a clip on each line; otherwise 0
 };
 
 /// How clips are looked up and which of it is shown.
 struct Lookup {
     bool speeds = true;
-    bool passages = false;
+    bool passages = false; ///< everything that is recognised in the clip, in the order of time
     std::optional<uint32_t> candidates; ///< shown only when a number of them is given
 };
 
@@ -52,8 +56,29 @@ Answer look_up(kzcat_catalogue& catalogue, const kzcat_query& query, const std::
 /// One object on one line.
 std::string to_json(const Answer& answer, const Lookup& lookup);
 
+/// The names of the columns of to_csv(), with a line break.
+std::string csv_header();
+
+/// A line for the best match, or for each candidate, or for each part of a clip of passages.
+std::string to_csv(const Answer& answer, const Lookup& lookup);
+
 /// A line for people, or several when there are several matches or candidates.
 std::string to_text(const Answer& answer, const Lookup& lookup);
+
+/// How sure it is that a clip is from a track: "certain", "very likely" or "likely" when the score
+/// is at least 3 above what is needed, at least 1, or reaches it; "perhaps" within half a unit below
+/// it; "unlikely". By document: "likely", or "perhaps" when it is weak.
+const char* sure_text(const FoundTrack& track);
+
+/// A part of a clip: a track, or nothing that was recognised.
+struct ClipPart {
+    double begin;
+    double end;
+    const FoundTrack* found; ///< null for a gap
+};
+
+/// The passages of an answer in the order of time, with gaps of two seconds or more between them.
+std::vector<ClipPart> parts_of(const Answer& answer);
 
 /// "1:02:03.4", "2:03.4" or "0:03.4"; with a minus sign when negative.
 std::string clock_text(double seconds);

@@ -1,15 +1,19 @@
 // `kzfp match`: which track of a catalogue each file is from, and where in it.
 
 #include <new>
+#include <optional>
 #include <string>
 #include <vector>
 
 #include "kzfp/catalogue/answer.hpp"
+#include "kzfp/catalogue/clip_inputs.hpp"
 #include "kzfp/catalogue/files.hpp"
 #include "kzfp/catalogue/in_order.hpp"
-#include "kzfp/catalogue/sound.hpp"
 #include "kzfp/command_line/common_options.hpp"
-#include "kzfp/command_line/section.hpp"
+#include "kzfp/command_line/file_options.hpp"
+#include "kzfp/command_line/output_options.hpp"
+#include "kzfp/command_line/sound_options.hpp"
+#include "kzfp/output/interruption.hpp"
 #include "kzfp/output/progress.hpp"
 #include "kzfp/output/write.hpp"
 
@@ -20,100 +24,208 @@ namespace {
 constexpr const char* kDescription =
     "Names the track of CATALOGUE that each FILE is from, and the place in it: of a clip of 6\n"
     "seconds or more from anywhere in the track, also one that is noisy, over a telephone, or\n"
-    "played up to 6 % faster or slower. A FILE is a sound file, a trail (.kzt) or a query "
-    "document\n"
-    "(.xml, as kzfp prints it); - is sound on standard input.";
+    "played up to 6 % faster or slower. A FILE is a sound file, a trail (.kzt), a query document\n"
+    "(.xml) or lines of 30 values, as kzfp prints them; - is sound on standard input.";
 
 constexpr const char* kFooter =
-    "Exit: 0 every file was looked up, whatever came of it; 1 a file could not be; 2 wrong usage.";
+    "Exit: 0 every file was looked up, whatever came of it; 1 a file could not be, or tracks of\n"
+    "the catalogue are damaged and were left out; 2 wrong usage; 130 interrupted.";
+
+constexpr FormatChoice kFormats[] = {kHumanFormat, kJsonFormat, kCsvFormat};
+
+constexpr Choice<uint32_t> kPlans[] = {
+    {"measured", KZCAT_PLAN_MEASURED, "whichever was measured to be faster"},
+    {"scan", KZCAT_PLAN_SCAN, "compare every place of every track"},
+    {"parts", KZCAT_PLAN_PARTS, "use the index"},
+};
 
 struct MatchSettings {
     std::string catalogue;
-    std::vector<std::string> files;
-    TextOrJson format = TextOrJson::text;
-    audio::Section section;
+    FileArguments files;
+    OutputOptions output;
+    SoundOptions sound;
+    ClipKind kind = ClipKind::by_content;
     Lookup lookup;
     bool no_speeds = false;
+    uint32_t plan = KZCAT_PLAN_MEASURED;
     size_t jobs = 1;
 };
+
+void add_lookup_options(CLI::App& parser, MatchSettings& settings)
+{
+    parser
+        .add_option("--top,--candidates", settings.lookup.candidates,
+                    "Also show the best tracks whatever their score, this many")
+        ->type_name("NUMBER")
+        ->check(CLI::Range(1, 1000));
+    parser.add_flag("--all,--passages", settings.lookup.passages,
+                    "Everything that is recognised in a long file, from when to when, with the\n"
+                    "gaps: a set list");
+    parser.add_flag("--no-speeds", settings.no_speeds,
+                    "Look for the clip only at its own speed, tempo and pitch");
+    add_choice(parser, "--input", "KIND", "a kind of input", kClipKinds, settings.kind);
+    add_choice(parser, "--plan", "PLAN", "a plan", kPlans, settings.plan);
+}
 
 void add_options(CLI::App& parser, MatchSettings& settings)
 {
     add_catalogue_option(parser, settings.catalogue);
-    parser.add_option("FILE", settings.files, "Clips; - is standard input")
-        ->required()
-        ->type_name("");
-    add_format_option(parser, settings.format);
-    parser
-        .add_option("--candidates", settings.lookup.candidates,
-                    "Also show the best tracks whatever their score, this many")
-        ->type_name("NUMBER")
-        ->check(CLI::Range(1, 1000));
-    parser.add_flag("--passages", settings.lookup.passages,
-                    "The clip may hold several tracks one after the other");
-    parser.add_flag("--no-speeds", settings.no_speeds,
-                    "Look for the clip only at its own speed, tempo and pitch");
-    add_section_options(parser, settings.section);
+    add_file_options(parser, settings.files, "Clips; - is standard input");
+    add_lookup_options(parser, settings);
+    add_output_options(parser, kFormats, settings.output);
+    add_sound_options(parser, settings.sound);
     add_jobs_option(parser, settings.jobs);
 }
 
-Answer failed(const std::string& file, const std::string& why)
+Answer failed(const std::string& why)
 {
     Answer answer;
-    answer.file = file;
     answer.error = why;
     return answer;
 }
 
-Answer answer_of(kzcat_catalogue& catalogue, const std::string& file, const MatchSettings& settings)
+Answer answer_of(kzcat_catalogue& catalogue, const ClipInput& input, const MatchSettings& settings)
 {
     try {
-        check_is_not_of(settings.catalogue, file);
-        const Clip clip = read_clip(file, {.section = settings.section});
-        Answer answer = look_up(catalogue, *clip.query, file, settings.lookup);
+        check_is_not_of(settings.catalogue, input.path);
+        const Clip clip = read_clip(input, settings.sound);
+        Answer answer = look_up(catalogue, *clip.query, input.path, settings.lookup);
         answer.warning = clip.warning;
         return answer;
     } catch (const audio::FileError& error) {
-        return failed(file, error.what());
+        return failed(error.what());
     } catch (const CatalogueError& error) {
-        return failed(file, error.what());
+        return failed(error.what());
     } catch (const std::bad_alloc&) {
-        return failed(file, "not enough memory");
+        return failed("not enough memory");
     }
 }
 
-/// Writes an answer; false when there is none.
-bool write(const Answer& answer, const MatchSettings& settings)
+Catalogue open(const MatchSettings& settings)
 {
-    for (const std::string& complaint : {answer.error, answer.warning}) {
-        if (!complaint.empty()) {
-            write_message(answer.file + ": " + complaint);
+    kzcat_settings wanted;
+    check(kzcat_initialize_settings(&wanted));
+    wanted.plan = settings.plan;
+    return made<Catalogue>(kzcat_open, settings.catalogue.c_str(), uint32_t{KZCAT_ACCESS_READ},
+                           static_cast<const kzcat_settings*>(&wanted));
+}
+
+/// Writes the answers in turn, and what is wrong with them as messages.
+class Answers {
+public:
+    Answers(const MatchSettings& settings, size_t count)
+        : settings_(settings), count_(count), progress_(count, settings.output.progress)
+    {
+        if (settings.output.format == Format::csv) {
+            write_output(csv_header());
         }
     }
-    if (settings.format == TextOrJson::json) {
-        write_output(to_json(answer, settings.lookup));
-    } else if (answer.error.empty()) {
-        write_output(to_text(answer, settings.lookup));
+
+    void write(const Answer& answer, const std::string& name)
+    {
+        progress_.clear();
+        complain(answer, name);
+        if (!answer.error.empty()) {
+            status_ = some_file_failed;
+        }
+        write_output(formatted(answer));
+        progress_.show(++done_, answer.file, answer.seconds);
     }
-    return answer.error.empty();
+
+    void stop()
+    {
+        progress_.clear();
+        write_message("interrupted: " + std::to_string(count_ - done_) + " of " +
+                      std::to_string(count_) + " were not looked up");
+        status_ = interrupted_by_user;
+    }
+
+    ExitStatus status() const { return status_; }
+
+private:
+    void complain(const Answer& answer, const std::string& name)
+    {
+        for (const std::string& complaint : {answer.error, answer.warning}) {
+            if (!complaint.empty()) {
+                write_message(name + ": " + complaint);
+            }
+        }
+        if (answer.left_out > 0 && !complained_) {
+            complained_ = true;
+            status_ = some_file_failed;
+            write_message(settings_.catalogue + ": " + std::to_string(answer.left_out) +
+                          (answer.left_out == 1 ? " track is damaged and was"
+                                                : " tracks are damaged and were") +
+                          " left out; 'kzfp verify' names what to add again");
+        }
+    }
+
+    std::string formatted(const Answer& answer) const
+    {
+        switch (settings_.output.format) {
+        case Format::json:
+            return to_json(answer, settings_.lookup);
+        case Format::csv:
+            return to_csv(answer, settings_.lookup);
+        default:
+            return answer.error.empty() ? to_text(answer, settings_.lookup) : std::string();
+        }
+    }
+
+    const MatchSettings& settings_;
+    size_t count_;
+    Progress progress_;
+    size_t done_ = 0;
+    bool complained_ = false;
+    ExitStatus status_ = all_done;
+};
+
+/// Thrown to end the work between two files.
+struct Interrupted {};
+
+ExitStatus match_all(const MatchSettings& settings, const std::vector<std::string>& files)
+{
+    const Catalogue catalogue = open(settings);
+    const std::vector<ClipInput> inputs = clip_inputs(files, settings.kind);
+    watch_for_interruption();
+    Answers answers(settings, inputs.size());
+    const auto work = [&](size_t i) -> std::optional<Answer> {
+        if (interrupted()) {
+            return {};
+        }
+        Answer answer = answer_of(*catalogue, inputs[i], settings);
+        answer.file = inputs[i].path;
+        answer.line = inputs[i].line;
+        return answer;
+    };
+    const auto deliver = [&](size_t i, const std::optional<Answer>& answer) {
+        if (!answer) {
+            throw Interrupted();
+        }
+        answers.write(*answer, name_of(inputs[i]));
+    };
+    try {
+        in_order(inputs.size(), settings.jobs, work, deliver);
+    } catch (const Interrupted&) {
+        answers.stop();
+    }
+    return answers.status();
 }
 
-ExitStatus match_all(const MatchSettings& settings)
+ExitStatus match(const MatchSettings& settings)
 {
-    const Catalogue catalogue = open_catalogue(settings.catalogue, KZCAT_ACCESS_READ);
-    Progress progress(settings.files.size());
-    ExitStatus status = all_done;
-    in_order(
-        settings.files.size(), settings.jobs,
-        [&](size_t i) { return answer_of(*catalogue, settings.files[i], settings); },
-        [&](size_t i, const Answer& answer) {
-            progress.clear();
-            if (!write(answer, settings)) {
-                status = some_file_failed;
-            }
-            progress.show(i + 1, settings.files[i]);
-        });
-    return status;
+    try {
+        const std::vector<std::string> files = all_files(settings.files);
+        OutputFile output(settings.output.output, files);
+        const ExitStatus status = match_all(settings, files);
+        output.finish();
+        return status;
+    } catch (const CatalogueError& error) {
+        write_message(message_about(settings.catalogue, error));
+    } catch (const audio::FileError& error) {
+        write_message(error.what());
+    }
+    return some_file_failed;
 }
 
 } // namespace
@@ -128,12 +240,7 @@ ExitStatus run_match(const Arguments& arguments)
         return *status;
     }
     settings.lookup.speeds = !settings.no_speeds;
-    try {
-        return match_all(settings);
-    } catch (const CatalogueError& error) {
-        write_message(message_about(settings.catalogue, error));
-        return some_file_failed;
-    }
+    return match(settings);
 }
 
 } // namespace kzfp
