@@ -1,5 +1,5 @@
 #!/bin/sh
-# Checks the tree: format, clang-tidy, cppcheck, man page, scripts, documents. Every check runs; any
+# Checks the tree: format, clang-tidy, cppcheck, man pages, scripts, documents. Every check runs; any
 # complaint makes the whole fail.
 #
 #   scripts/lint.sh [build-directory]     with compile_commands.json; default build/lint, made here
@@ -52,7 +52,7 @@ other_analyser() {
         --template='{file}:{line}: {severity}: {message} [{id}]' kzsdk catalogue tables tools examples
 }
 
-man_page() {
+man_pages() {
     find tools docs -name '*.[1-8]' -print0 | xargs -0 -r mandoc -T lint -W warning
 }
 
@@ -70,7 +70,7 @@ python_scripts() {
 check clang-format format
 check "shell scripts" shell_scripts
 check "Python scripts" python_scripts
-check "man page" man_page
+check "man pages" man_pages
 check documents scripts/check_documents.py
 check cppcheck other_analyser
 check clang-tidy tidy

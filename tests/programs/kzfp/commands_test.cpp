@@ -9,6 +9,7 @@
 
 #include <gtest/gtest.h>
 
+#include "kzfp/command_line/sound_options.hpp"
 #include "kzfp/commands/fingerprint_options.hpp"
 #include "kzfp/commands/table.hpp"
 
@@ -42,40 +43,72 @@ TEST(KzfpCommands, AreListedInTheHelpWithWhatTheyDo)
     }
 }
 
-TEST(KzfpCommands, StandInTheSynopsisOfTheManPage)
+std::string man_page(const std::string& name) { return contents(KZFP_MAN_PAGES "/" + name + ".1"); }
+
+/// From the heading to the next one.
+std::string section_of(const std::string& page, const std::string& heading)
 {
-    const std::string page = contents(KZFP_MAN_PAGE);
-    const size_t begin = page.find("\n.SH SYNOPSIS\n");
-    ASSERT_NE(std::string::npos, begin);
-    const std::string synopsis = page.substr(begin, page.find("\n.SH ", begin + 1) - begin);
-    for (const std::string& name : command_names()) {
-        EXPECT_TRUE(contains(synopsis, "\n.B kzfp " + name + "\n")) << name;
+    const size_t begin = page.find("\n.SH " + heading + "\n");
+    return begin == std::string::npos
+               ? ""
+               : page.substr(begin + 1, page.find("\n.SH ", begin + 1) - begin);
+}
+
+TEST(KzfpManPages, OverviewNamesEveryCommand)
+{
+    const std::string page = man_page("kzfp");
+    for (const char* heading : {"COMMANDS", "SEE ALSO"}) {
+        for (const std::string& name : command_names()) {
+            EXPECT_TRUE(contains(section_of(page, heading), "\n.BR kzfp\\-" + name + " (1)"))
+                << heading << ' ' << name;
+        }
     }
 }
 
-/// The long options that a help names.
-std::set<std::string> options_in(const std::string& help)
+TEST(KzfpManPages, ShowExamplesFirst)
 {
-    static const std::regex kOption("--[a-z][a-z-]*");
-    return {std::sregex_token_iterator(help.begin(), help.end(), kOption), {}};
+    for (const std::string& name : command_names()) {
+        const std::string page = man_page("kzfp-" + name);
+        EXPECT_FALSE(section_of(page, "EXAMPLES").empty()) << name;
+        EXPECT_LT(page.find("\n.SH EXAMPLES\n"), page.find("\n.SH DESCRIPTION\n")) << name;
+        EXPECT_TRUE(contains(section_of(page, "SYNOPSIS"), "\n.B kzfp " + name + "\n")) << name;
+    }
 }
 
-// As troff writes them, with escaped hyphens.
-TEST(KzfpCommands, HaveTheirOptionsInTheManPage)
+/// The options of the OPTIONS section, where troff has hyphens escaped.
+std::set<std::string> documented_options(const std::string& page)
 {
-    const std::string page = contents(KZFP_MAN_PAGE);
-    for (const std::string& name : command_names()) {
-        for (const std::string& option : options_in(output_of({name, "--help"}))) {
-            const std::string word = std::regex_replace(option, std::regex("-"), "\\-");
-            EXPECT_TRUE(contains(page, word)) << name << ' ' << option;
+    const std::string text =
+        std::regex_replace(section_of(page, "OPTIONS"), std::regex("\\\\-"), "-");
+    static const std::regex kOption("--[a-z][a-z-]*");
+    return {std::sregex_token_iterator(text.begin(), text.end(), kOption), {}};
+}
+
+std::set<std::string> options_of(const ::kzfp::Command& command)
+{
+    std::set<std::string> names;
+    ::kzfp::describe_command(command, [&names](const CLI::App& parser) {
+        for (const CLI::Option* option : parser.get_options()) {
+            for (const std::string& name : option->get_lnames()) {
+                names.insert("--" + name);
+            }
         }
+    });
+    return names;
+}
+
+TEST(KzfpManPages, NameEveryOptionAndNoOther)
+{
+    for (const ::kzfp::Command& command : ::kzfp::commands()) {
+        const std::string name(command.name);
+        EXPECT_EQ(options_of(command), documented_options(man_page("kzfp-" + name))) << name;
     }
 }
 
 template <class Value, size_t count>
 void expect_in_man_page_and_help(const ::kzfp::Choice<Value> (&choices)[count])
 {
-    const std::string page = contents(KZFP_MAN_PAGE);
+    const std::string page = man_page("kzfp-fingerprint");
     const std::string help = output_of({"--help"});
     for (const auto& choice : choices) {
         const std::string name(choice.name);
@@ -134,6 +167,55 @@ TEST(KzfpCommands, WithoutOneFilesAreFingerprinted)
     const ProcessResult result = kz::test::kzfp({"fingerprint"});
     EXPECT_EQ(2, result.status);
     EXPECT_TRUE(contains(result.err, "FILE is required")) << result.err;
+    EXPECT_TRUE(contains(result.err, "See 'kzfp fingerprint --help'")) << result.err;
+}
+
+/// The program refuses the words and says so.
+void expect_complaint(const std::vector<std::string>& arguments, const std::string& part)
+{
+    const ProcessResult result = kz::test::kzfp(arguments);
+    EXPECT_EQ(2, result.status);
+    EXPECT_EQ("", result.out);
+    EXPECT_TRUE(contains(result.err, part)) << result.err;
+}
+
+TEST(KzfpMistakes, SuggestTheOptionThatWasMeant)
+{
+    expect_complaint({"--fromat", "json", "a.wav"},
+                     "there is no option --fromat; did you mean --format?");
+    expect_complaint({"match", "--candidate=3", "a.kzc", "a.wav"}, "did you mean --candidates?");
+    expect_complaint({"--zzzzzz", "a.wav"}, "there is no option --zzzzzz\n");
+}
+
+TEST(KzfpMistakes, SuggestTheCommandThatWasMeant)
+{
+    expect_complaint({"mtach", "a.kzc", "a.wav"},
+                     "'mtach' is neither a file nor a command; did you mean 'match'?");
+    expect_complaint({"help", "lists"}, "did you mean 'list'?");
+    const ProcessResult other = kz::test::kzfp({"symphony"});
+    EXPECT_EQ(1, other.status);
+    EXPECT_TRUE(contains(other.err, "cannot be opened")) << other.err;
+}
+
+TEST(KzfpMistakes, FilesThatBeginWithADashGetTheCure)
+{
+    const ScratchDirectory directory;
+    const std::filesystem::path before = std::filesystem::current_path();
+    std::filesystem::current_path(directory.path());
+    for (const std::string name : {"-version.wav", "-x.wav", "--song.wav", "-f.wav"}) {
+        directory.write(name, contents(clip("tone.wav")));
+        expect_complaint({name}, "as a file it is given as ./" + name + " or after --");
+        EXPECT_EQ(output_of({"./" + name}), output_of({"--", name}));
+    }
+    expect_complaint({"-y.wav"}, "a file of that name is given as ./-y.wav or after --");
+    std::filesystem::current_path(before);
+}
+
+TEST(KzfpMistakes, SmallAndLargeVAskForTheVersion)
+{
+    const std::string version = output_of({"--version"});
+    EXPECT_EQ(version, output_of({"-V"}));
+    EXPECT_EQ(version, output_of({"-v"}));
 }
 
 TEST(KzfpCommands, LeaveFilesOfTheirNamesReachable)

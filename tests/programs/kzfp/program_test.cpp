@@ -442,7 +442,10 @@ TEST(KzfpStatus, HelpAndVersionAreNoFailures)
                              "mixed down", "8-bit", "JSON Lines"}) {
         EXPECT_TRUE(contains(help, word)) << word;
     }
-    EXPECT_EQ("kzfp " KZFP_VERSION " (libkzsdk " KZSDK_VERSION ")\n", output_of({"--version"}));
+    const std::string version = output_of({"--version"});
+    EXPECT_TRUE(version.starts_with("kzfp " KZFP_VERSION " (libkzsdk " KZSDK_VERSION ", libkzcat "))
+        << version;
+    EXPECT_TRUE(contains(version, "\nreads sound with libsndfile")) << version;
 }
 
 TEST(KzfpStatus, WrongUsageIsTwo)

@@ -2,6 +2,7 @@
 /// What the command lines of all commands have in common.
 #pragma once
 
+#include <functional>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -17,11 +18,15 @@ enum ExitStatus : int {
     interrupted_by_user = 130 ///< as shells report SIGINT; what was done before is kept
 };
 
+/// Takes a command's parser, once it has all its options.
+using Describe = std::function<void(CLI::App& parser)>;
+
 /// The words that a command is run with.
 struct Arguments {
     std::string_view command; ///< the word that named it; empty in the form without one
     int count;
     char** words; ///< as main() has them; the first is the program or the command's name
+    const Describe* describe = nullptr; ///< the command is not to run, but to describe its options
 };
 
 /// What the help calls the program: "kzfp", or "kzfp disc".

@@ -72,8 +72,7 @@ void check_raw_rate(const FingerprintOptions& options)
 /// The help of the program as a whole also lists its commands.
 std::string notes(const Arguments& arguments)
 {
-    const std::string listing =
-        arguments.command.empty() ? "Commands:\n" + commands_text() + kAboutCommands : "";
+    const std::string listing = arguments.command.empty() ? commands_text() + kAboutCommands : "";
     return listing + about_rates() + kMoreNotes;
 }
 

@@ -15,7 +15,10 @@ std::string check_command(const std::string& name)
     if (find_command(name) != nullptr) {
         return {};
     }
-    return "'" + name + "' is not a command; these are:\n" + commands_text();
+    const std::string meant = similar_command(name);
+    return "'" + name + "' is not a command; " +
+           (meant.empty() ? "" : "did you mean '" + meant + "'? ") + "These are:\n" +
+           commands_text();
 }
 
 /// The help of one command, or of the program when no command is named.

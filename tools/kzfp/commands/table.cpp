@@ -3,6 +3,13 @@
 #include "kzfp/commands/table.hpp"
 
 #include <algorithm>
+#include <array>
+#include <filesystem>
+#include <system_error>
+#include <vector>
+
+#include "kzfp/command_line/similar.hpp"
+#include "kzfp/output/write.hpp"
 
 namespace kzfp {
 
@@ -22,16 +29,42 @@ namespace {
 constexpr Command kCommands[] = {
     {"fingerprint", "Prints the fingerprints of sound files; the command when none is named",
      run_fingerprint},
-    {"add", "Adds sound files to a catalogue", run_add},
-    {"match", "Names the track of a catalogue that a clip is from", run_match},
     {"compare", "Finds out whether one sound file is from another", run_compare},
-    {"list", "Lists the tracks of a catalogue", run_list},
-    {"remove", "Removes tracks from a catalogue", run_remove},
-    {"verify", "Finds out whether a catalogue is whole", run_verify},
-    {"merge", "Adds the tracks of other catalogues to one", run_merge},
-    {"disc", "Reports what is on a Blu-ray disc or a DVD", run_disc},
-    {"help", "Prints the help of a command", run_help},
+    {"match", "Names the track of a catalogue that a clip is from", run_match},
+    {"add", "Adds sound files to a catalogue", run_add, Group::catalogues},
+    {"list", "Lists the tracks of a catalogue", run_list, Group::catalogues},
+    {"remove", "Removes tracks from a catalogue", run_remove, Group::catalogues},
+    {"verify", "Finds out whether a catalogue is whole", run_verify, Group::catalogues},
+    {"merge", "Adds the tracks of other catalogues to one", run_merge, Group::catalogues},
+    {"disc", "Reports what is on a Blu-ray disc or a DVD", run_disc, Group::program},
+    {"help", "Prints the help of a command", run_help, Group::program},
 };
+
+struct Heading {
+    Group group;
+    std::string_view text;
+};
+
+constexpr Heading kHeadings[] = {
+    {Group::recognition, "Recognising sound:"},
+    {Group::catalogues, "Keeping a catalogue:"},
+    {Group::program, "And also:"},
+};
+
+/// A first word that looks like a mistyped command rather than the name of a file. Empty, or what
+/// to say.
+std::string complaint_about(const std::string& word)
+{
+    std::error_code error;
+    if (word.starts_with('-') || word.find('/') != std::string::npos ||
+        std::filesystem::exists(word, error)) {
+        return {};
+    }
+    const std::string meant = similar_command(word);
+    return meant.empty()
+               ? std::string()
+               : "'" + word + "' is neither a file nor a command; did you mean '" + meant + "'?";
+}
 
 } // namespace
 
@@ -43,13 +76,35 @@ const Command* find_command(std::string_view name)
     return found == std::end(kCommands) ? nullptr : found;
 }
 
+std::string similar_command(const std::string& name)
+{
+    std::vector<std::string> names;
+    for (const Command& command : kCommands) {
+        names.emplace_back(command.name);
+    }
+    return most_similar(name, names);
+}
+
+void describe_command(const Command& command, const Describe& describe)
+{
+    std::string name(command.name);
+    std::array words = {name.data(), static_cast<char*>(nullptr)};
+    command.run(
+        {.command = command.name, .count = 1, .words = words.data(), .describe = &describe});
+}
+
 std::string commands_text()
 {
     constexpr size_t kColumn = 14;
     std::string text;
-    for (const Command& command : kCommands) {
-        text.append(text.empty() ? "  " : "\n  ").append(command.name);
-        text.append(kColumn - command.name.size(), ' ').append(command.help);
+    for (const Heading& heading : kHeadings) {
+        text.append(text.empty() ? "" : "\n").append(heading.text);
+        for (const Command& command : kCommands) {
+            if (command.group == heading.group) {
+                text.append("\n  ").append(command.name);
+                text.append(kColumn - command.name.size(), ' ').append(command.help);
+            }
+        }
     }
     return text;
 }
@@ -59,6 +114,11 @@ ExitStatus run_command(int argc, char** argv)
     const Command* const named = argc > 1 ? find_command(argv[1]) : nullptr;
     if (named != nullptr) {
         return named->run({.command = named->name, .count = argc - 1, .words = argv + 1});
+    }
+    if (const std::string complaint = argc > 1 ? complaint_about(argv[1]) : "";
+        !complaint.empty()) {
+        write_message("kzfp: " + complaint);
+        return wrong_usage;
     }
     return run_fingerprint({.command = {}, .count = argc, .words = argv});
 }
