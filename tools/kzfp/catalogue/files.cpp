@@ -24,10 +24,12 @@ namespace fs = std::filesystem;
 
 constexpr size_t kBlock = size_t{1} << 18;
 
-constexpr std::string_view kEndings[] = {".wav",  ".wave", ".w64",  ".rf64", ".bwf", ".aif",
-                                         ".aiff", ".aifc", ".au",   ".snd",  ".caf", ".flac",
-                                         ".ogg",  ".oga",  ".opus", ".mp3",  ".mp2", ".mp1",
-                                         ".voc",  ".iff",  ".8svx", ".svx",  ".kzt"};
+constexpr std::string_view kEndings[] = {
+    ".wav", ".wave", ".w64",  ".rf64", ".bwf", ".aif",  ".aiff", ".aifc", ".au",
+    ".snd", ".caf",  ".flac", ".ogg",  ".oga", ".opus", ".mp3",  ".mp2",  ".mp1",
+    ".voc", ".iff",  ".8svx", ".svx",  ".kzt", ".m4a",  ".m4b",  ".mp4",  ".m4v",
+    ".mov", ".3gp",  ".aac",  ".ac3",  ".mka", ".mkv",  ".webm", ".wma",  ".wmv",
+    ".asf", ".ape",  ".wv",   ".mpc",  ".tta", ".dsf",  ".amr",  ".avi",  ".flv"};
 
 bool sounds(const fs::path& path)
 {
