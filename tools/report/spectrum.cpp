@@ -11,6 +11,7 @@
 #include <numbers>
 #include <span>
 
+#include "kzsdk/abs/startup.h"
 #include "kzsdk/dsp/dct.h"
 
 namespace report {
@@ -20,6 +21,19 @@ namespace {
 constexpr double kWindowSeconds = 0.093;
 constexpr int kRows = kDrawnBands * kRowsOfBand;
 constexpr double kLeastPower = 1e-20;
+
+/// The library allocates only while it is held.
+struct LibraryHold {
+    LibraryHold()
+    {
+        if (kzinit_acquire() != KZ_OK) {
+            throw std::bad_alloc();
+        }
+    }
+    LibraryHold(const LibraryHold&) = delete;
+    LibraryHold& operator=(const LibraryHold&) = delete;
+    ~LibraryHold() { static_cast<void>(kzinit_release()); }
+};
 
 struct DestroyTransform {
     void operator()(KZDSP_DCT* transform) const { KZDSP_DestroyDCT(transform); }
@@ -93,6 +107,7 @@ private:
         return power;
     }
 
+    LibraryHold hold_;
     int order_;
     std::unique_ptr<KZDSP_DCT, DestroyTransform> transform_;
     size_t length_;
