@@ -30,7 +30,7 @@ Table table_of(const MonitorPage& page)
                                {"to", true},
                                {"length", true},
                                {"what", false},
-                               {"time", true},
+                               {"time it ran", true},
                                {"details", false}},
                    .rows = {}};
     for (const Run& run : page.runs) {

@@ -83,7 +83,7 @@ double most_false(const std::vector<Kind>& kinds)
             most = std::max(most, share_of(kind.false_matches, kind.strangers).high);
         }
     }
-    for (const double limit : {0.05, 0.1, 0.2, 0.5}) {
+    for (const double limit : {0.05, 0.1, 0.2, 0.3, 0.5}) {
         if (most <= limit) {
             return limit;
         }

@@ -9,7 +9,7 @@ namespace {
 
 constexpr const char* kLight =
     "--paper:#fcfcfb;--raised:#f1f1ee;--ink:#1b1b19;--soft:#5c5b57;--grid:#dddcd7;"
-    "--one:#1f66c1;--two:#c9580c;--other:#8f8e88;--mark:#1b1b19;--image:none;";
+    "--one:#1f66c1;--two:#b94f0a;--other:#73726d;--mark:#1b1b19;--image:none;";
 constexpr const char* kDark =
     "--paper:#191918;--raised:#252523;--ink:#f3f2ee;--soft:#b4b3ad;--grid:#3c3c39;"
     "--one:#6da8f5;--two:#f0935a;--other:#85847e;--mark:#f3f2ee;"
@@ -26,7 +26,7 @@ constexpr const char* kDrawing =
 .one{fill:var(--one)}
 .two{fill:var(--two)}
 .other{fill:var(--other)}
-.empty{fill:var(--raised)}
+.empty{fill:var(--raised);stroke:var(--grid);stroke-width:1}
 .hole{fill:var(--paper);stroke:var(--soft);stroke-width:1;stroke-dasharray:3 3}
 .line-one,.line-two,.line-other{fill:none;stroke:var(--one);stroke-width:2;stroke-linejoin:round;stroke-linecap:round}
 .line-two{stroke:var(--two)}
@@ -45,7 +45,7 @@ constexpr const char* kPage =
     R"(*{box-sizing:border-box}
 html{-webkit-text-size-adjust:100%;text-size-adjust:100%}
 body{margin:0 auto;max-width:1080px;padding:32px 24px;background:var(--paper);color:var(--ink);font:16px/1.5 system-ui,-apple-system,"Segoe UI","DejaVu Sans",sans-serif}
-h1,h2,h3,p,dd,summary,.entry{overflow-wrap:anywhere}
+h1,h2,h3,p,li,dd,summary,.entry{overflow-wrap:anywhere}
 h1{font-size:26px;line-height:1.25;margin:0 0 8px}
 h2{font-size:20px;line-height:1.3;margin:0 0 8px}
 h3{font-size:16px;margin:24px 0 4px}
@@ -65,10 +65,11 @@ dd{margin:0;font-size:18px;font-weight:600}
 .swatch{width:12px;height:12px;margin-right:6px;vertical-align:-1px}
 .entry{margin-right:16px}
 table{border-collapse:collapse;font-size:14px;min-width:50%}
-th,td{text-align:left;vertical-align:top;padding:5px 20px 5px 0;border-bottom:1px solid var(--grid)}
-td{overflow-wrap:anywhere;min-width:5em;max-width:32em}
-th{color:var(--soft);font-weight:600;white-space:nowrap}
-.number{text-align:right;min-width:0;font-variant-numeric:tabular-nums;white-space:nowrap}
+th,td{text-align:left;vertical-align:top;padding:5px 16px 5px 0;border-bottom:1px solid var(--grid)}
+td{overflow-wrap:anywhere;min-width:9em;max-width:32em}
+th{color:var(--soft);font-weight:600;vertical-align:bottom}
+td.number{white-space:nowrap}
+.number{text-align:right;min-width:0;font-variant-numeric:tabular-nums}
 summary{cursor:pointer;color:var(--soft);font-size:14px;padding:6px 0}
 footer{margin-top:48px;border-top:1px solid var(--grid);padding-top:12px}
 @media (max-width:600px){body{padding:20px 16px}h1{font-size:22px}.answer{font-size:16px}}

@@ -71,10 +71,13 @@ void append(std::string& text, char32_t character)
     }
 }
 
+/// What XML forbids, and what turns round the direction of the text that follows, which makes names
+/// look like others.
 bool is_forbidden(char32_t character)
 {
-    return character < 0x20 || (character >= 0x7F && character < 0xA0) || character == 0xFFFE ||
-           character == 0xFFFF;
+    return (character >= 0x202A && character < 0x202F) ||
+           (character >= 0x2066 && character < 0x206A) || character < 0x20 ||
+           (character >= 0x7F && character < 0xA0) || character == 0xFFFE || character == 0xFFFF;
 }
 
 void append_escaped(std::string& text, char32_t character)

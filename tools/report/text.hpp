@@ -7,8 +7,8 @@
 
 namespace report {
 
-/// As text or the value of an attribute in XML. What is not UTF-8, and what XML forbids, becomes
-/// U+FFFD; line breaks and tabs become spaces.
+/// As text or the value of an attribute in XML. What is not UTF-8, what XML forbids, and what turns
+/// round the direction of writing becomes U+FFFD; line breaks and tabs become spaces.
 std::string escaped(std::string_view text);
 
 /// Not yet escaped: cut with an ellipsis so that it takes at most `width` times the size of its

@@ -15,7 +15,7 @@ namespace {
 
 constexpr double kWidth = 960;
 constexpr double kLeft = 76;
-constexpr double kRight = kWidth - 16;
+constexpr double kRight = kWidth - 34;
 constexpr double kTop = 28;
 constexpr double kLine = 30;
 constexpr double kGap = 12;
@@ -134,7 +134,7 @@ void draw_lines(Svg& svg, const Wrapping& wrapping, const Stretch& time)
     const bool one = wrapping.lines == 1;
     // The ticks of several lines count from the beginning of each.
     const double base = one ? 0 : first.low;
-    const auto all = time_ticks(first.low - base, first.high - base, 12);
+    const auto all = time_ticks(first.low - base, first.high - base, 9);
     const double bottom = top_of(wrapping.lines - 1) + kLine;
     for (const double tick : all) {
         svg.line(first(tick + base), kTop - 4, first(tick + base), bottom, "grid");
@@ -145,7 +145,9 @@ void draw_lines(Svg& svg, const Wrapping& wrapping, const Stretch& time)
         const Scale scale = scale_of(wrapping, line);
         const double middle = top_of(line) + kLine / 2;
         svg.line(kLeft, middle, scale(time.end), middle, "axis");
-        svg.text(kLeft - 10, middle + 4, whole_clock_text(scale.low), Anchor::end, "tick");
+        if (!one) {
+            svg.text(kLeft - 10, middle + 4, whole_clock_text(scale.low), Anchor::end, "tick");
+        }
     }
 }
 

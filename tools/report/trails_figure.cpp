@@ -19,10 +19,10 @@ namespace {
 constexpr double kWidth = 960;
 constexpr double kLeft = 110;
 constexpr double kRight = kWidth - 130;
-constexpr double kStrip = 96;
+constexpr double kStrip = 128;      ///< two pixels a bit
 constexpr double kOverview = 40;    ///< top of the bar for the whole track
 constexpr double kFirstStrip = 108; ///< top
-constexpr double kCurve = kFirstStrip + 3 * (kStrip + 8) + 18;
+constexpr double kCurve = kFirstStrip + 3 * (kStrip + 8) + 30;
 constexpr double kCurveHeight = 130;
 constexpr double kHeight = kCurve + kCurveHeight + 46;
 constexpr double kHighest = 0.6;   ///< of the curve

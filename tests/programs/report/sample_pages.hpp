@@ -9,6 +9,9 @@ namespace report::test {
 /// Notes of a melody with harmonics, so that the spectrogram has something to show.
 Sound sample_sound(const std::string& name, double seconds);
 
+/// The same minute sixty times.
+Sound an_hour_of_sound(const std::string& name);
+
 Fingerprint sample_fingerprint(const std::string& name, int32_t shift);
 
 /// A clip of `codes` codes out of the middle of a track, with a fifth of its bits wrong.
