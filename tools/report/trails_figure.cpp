@@ -22,7 +22,8 @@ constexpr double kRight = kWidth - 130;
 constexpr double kStrip = 128;      ///< two pixels a bit
 constexpr double kOverview = 40;    ///< top of the bar for the whole track
 constexpr double kFirstStrip = 108; ///< top
-constexpr double kCurve = kFirstStrip + 3 * (kStrip + 8) + 30;
+constexpr double kStripsEnd = kFirstStrip + 3 * (kStrip + 8) - 8;
+constexpr double kCurve = kStripsEnd + 46; ///< top; its title is above it
 constexpr double kCurveHeight = 130;
 constexpr double kHeight = kCurve + kCurveHeight + 46;
 constexpr double kHighest = 0.6;   ///< of the curve
@@ -88,7 +89,9 @@ void draw_matched(Svg& svg, const Trails& trails, const Scale& scale)
         return;
     }
     for (const double edge : {trails.matched->begin, trails.matched->end}) {
-        svg.line(scale(edge), kFirstStrip - 4, scale(edge), kCurve + kCurveHeight, "mark");
+        // Not through the title between the strips and the curve.
+        svg.line(scale(edge), kFirstStrip - 4, scale(edge), kStripsEnd + 4, "mark");
+        svg.line(scale(edge), kCurve, scale(edge), kCurve + kCurveHeight, "mark");
     }
     svg.text((scale(trails.matched->begin) + scale(trails.matched->end)) / 2, kFirstStrip - 8,
              "matching stretch", Anchor::middle);
@@ -140,7 +143,7 @@ void draw_curve(Svg& svg, const Trails& trails, const Scale& time)
     if (!data.empty()) {
         svg.path(data, "line-two");
     }
-    svg.text(kLeft, kCurve - 8, "Share of differing bits", Anchor::start, "strong");
+    svg.text(kLeft, kCurve - 14, "Share of differing bits", Anchor::start, "strong");
 }
 
 void draw_times(Svg& svg, const Scale& scale)

@@ -172,6 +172,28 @@ TEST(TrailsFigure, SaysTheShareOfTheMatchingStretch)
     EXPECT_NE(std::string::npos, trails_figure(trails).find("0.0 % differ"));
 }
 
+TEST(TrailsFigure, MarksKeepClearOfTheCurvesTitle)
+{
+    const std::string figure = trails_figure(sample_trails(100));
+    std::vector<double> titles;
+    for (const Element& text : elements_of(figure, "text")) {
+        if (text.text == "Share of differing bits") {
+            titles.push_back(text.number("y"));
+        }
+    }
+    ASSERT_EQ(1U, titles.size());
+    size_t marks = 0;
+    for (const Element& line : elements_of(figure, "line")) {
+        if (line.attributes.at("class") == "mark") {
+            ++marks;
+            const bool above = line.number("y2") < titles[0] - 12;
+            const bool below = line.number("y1") > titles[0] + 4;
+            EXPECT_TRUE(above || below);
+        }
+    }
+    EXPECT_EQ(4U, marks);
+}
+
 TEST(Timeline, HasABlockForEveryRun)
 {
     const auto figure = timeline_figure(monitor_page());
