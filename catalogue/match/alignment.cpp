@@ -135,8 +135,8 @@ public:
         for (size_t i = start + 1; i < blocks.size(); ++i) {
             blocks[i] = best_near(blocks[i], blocks[i - 1].lag);
         }
-        for (size_t i = start; i-- > 0;) {
-            blocks[i] = best_near(blocks[i], blocks[i + 1].lag);
+        for (size_t i = start; i > 0; --i) {
+            blocks[i - 1] = best_near(blocks[i - 1], blocks[i].lag);
         }
         return blocks;
     }
