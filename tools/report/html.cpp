@@ -11,7 +11,8 @@ namespace {
 
 /// A page may show what it holds itself, and do nothing else.
 constexpr const char* kPolicy =
-    R"(<meta http-equiv="Content-Security-Policy" content="default-src 'none'; img-src data:; style-src 'unsafe-inline'"/>)";
+    R"(<meta http-equiv="Content-Security-Policy" content="default-src 'none'; img-src data:; )"
+    R"(style-src 'unsafe-inline'"/>)";
 
 std::string cell(const Column& column, const std::string& text, const char* name)
 {
@@ -151,9 +152,9 @@ std::string whole_page(const Heading& heading, const std::string& body)
 
 std::string legend_entry(std::string_view kind, std::string_view name)
 {
-    const std::string swatch =
-        R"(<svg class="swatch" viewBox="0 0 12 12" aria-hidden="true"><rect width="12" height="12" class=")" +
-        std::string(kind) + "\"/></svg>";
+    const std::string swatch = R"(<svg class="swatch" viewBox="0 0 12 12" aria-hidden="true">)"
+                               R"(<rect width="12" height="12" class=")" +
+                               std::string(kind) + "\"/></svg>";
     return element("span", "class=\"entry\"", swatch + name_element(name)) + " ";
 }
 

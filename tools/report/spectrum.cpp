@@ -1,6 +1,6 @@
 // Hann windows of about 0.1 s and the library's cosine transform, whose bin k of length L lies at
-// k * rate / (2 L). Power is summed over the rows of a scale on which all critical bands are equally
-// high. However long the sound is, no more windows are transformed than there are columns.
+// k * rate / (2 L). Power is summed over the rows of a scale on which all critical bands are
+// equally high. However long the sound is, no more windows are transformed than there are columns.
 
 #include "report/spectrum.hpp"
 

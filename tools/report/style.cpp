@@ -28,7 +28,8 @@ constexpr const char* kDrawing =
 .other{fill:var(--other)}
 .empty{fill:var(--raised);stroke:var(--grid);stroke-width:1}
 .hole{fill:var(--paper);stroke:var(--soft);stroke-width:1;stroke-dasharray:3 3}
-.line-one,.line-two,.line-other{fill:none;stroke:var(--one);stroke-width:2;stroke-linejoin:round;stroke-linecap:round}
+.line-one,.line-two,.line-other{fill:none;stroke:var(--one);stroke-width:2}
+.line-one,.line-two,.line-other{stroke-linejoin:round;stroke-linecap:round}
 .line-two{stroke:var(--two)}
 .line-other{stroke:var(--other)}
 .area-one{fill:var(--one);opacity:.14}
@@ -44,7 +45,8 @@ constexpr const char* kDrawing =
 constexpr const char* kPage =
     R"(*{box-sizing:border-box}
 html{-webkit-text-size-adjust:100%;text-size-adjust:100%}
-body{margin:0 auto;max-width:1080px;padding:32px 24px;background:var(--paper);color:var(--ink);font:16px/1.5 system-ui,-apple-system,"Segoe UI","DejaVu Sans",sans-serif}
+body{margin:0 auto;max-width:1080px;padding:32px 24px;background:var(--paper)}
+body{color:var(--ink);font:16px/1.5 system-ui,-apple-system,"Segoe UI","DejaVu Sans",sans-serif}
 h1,h2,h3,p,li,dd,summary,.entry{overflow-wrap:anywhere}
 h1{font-size:26px;line-height:1.25;margin:0 0 8px}
 h2{font-size:20px;line-height:1.3;margin:0 0 8px}
@@ -60,7 +62,8 @@ figure{margin:0 0 24px}
 dt{color:var(--soft);font-size:13px}
 dd{margin:0;font-size:18px;font-weight:600}
 .plot,.scroll{overflow-x:auto;max-width:100%}
-.plot:focus-visible,.scroll:focus-visible,summary:focus-visible{outline:2px solid var(--one);outline-offset:2px}
+.plot:focus-visible,.scroll:focus-visible,
+summary:focus-visible{outline:2px solid var(--one);outline-offset:2px}
 .drawing{display:block;width:100%;min-width:760px;height:auto}
 .swatch{width:12px;height:12px;margin-right:6px;vertical-align:-1px}
 .entry{margin-right:16px}
@@ -73,7 +76,9 @@ td.number{white-space:nowrap}
 summary{cursor:pointer;color:var(--soft);font-size:14px;padding:6px 0}
 footer{margin-top:48px;border-top:1px solid var(--grid);padding-top:12px}
 @media (max-width:600px){body{padding:20px 16px}h1{font-size:22px}.answer{font-size:16px}}
-@media print{body{max-width:none;padding:0;font-size:11pt}.plot,.scroll{overflow:visible}.drawing{min-width:0}figure,tr{break-inside:avoid}details::details-content{content-visibility:visible;display:block}}
+@media print{body{max-width:none;padding:0;font-size:11pt}.plot,.scroll{overflow:visible}
+.drawing{min-width:0}figure,tr{break-inside:avoid}
+details::details-content{content-visibility:visible;display:block}}
 )";
 
 } // namespace

@@ -1,5 +1,5 @@
-// From top to bottom: where the clip lies in the track, the codes of both, the bits that differ, and
-// the share of them along time.
+// From top to bottom: where the clip lies in the track, the codes of both, the bits that differ,
+// and the share of them along time.
 
 #include <algorithm>
 #include <cmath>

@@ -66,8 +66,8 @@ std::string to_csv(const Answer& answer, const Lookup& lookup);
 std::string to_text(const Answer& answer, const Lookup& lookup);
 
 /// How sure it is that a clip is from a track: "certain", "very likely" or "likely" when the score
-/// is at least 3 above what is needed, at least 1, or reaches it; "perhaps" within half a unit below
-/// it; "unlikely". By document: "likely", or "perhaps" when it is weak.
+/// is at least 3 above what is needed, at least 1, or reaches it; "perhaps" within half a unit
+/// below it; "unlikely". By document: "likely", or "perhaps" when it is weak.
 const char* sure_text(const FoundTrack& track);
 
 /// A part of a clip: a track, or nothing that was recognised.
