@@ -317,6 +317,38 @@ TEST_F(Evaluate, SaysWhereItCouldWorkInstead)
     EXPECT_TRUE(contains(full.err, "/dev/full cannot be written")) << full.err;
 }
 
+TEST_F(Evaluate, DrawsAPage)
+{
+    const ScratchDirectory scratch;
+    const std::string page = scratch.path("page.html");
+    ProcessSetup setup;
+    setup.environment = {"PATH="};
+    const ProcessResult result = evaluate(
+        {"--clips", "1", "--kinds", "clean,white_20,white_0,gsm", "--report", page}, setup);
+    EXPECT_FALSE(result.out.empty());
+    const std::string html = contents(page);
+    for (const char* part : {"<svg", "How well clips are recognised", "white noise",
+                             "the clip as it is", "apt-get install ffmpeg", "</html>"}) {
+        EXPECT_TRUE(contains(html, part)) << part;
+    }
+    EXPECT_FALSE(contains(html, "tempo"));
+}
+
+TEST_F(Evaluate, KeepsItsInputsFromItsPage)
+{
+    const std::string file = path("music/1.wav");
+    const std::string before = contents(file);
+    const ProcessResult result =
+        kz::test::kzfp({"evaluate", file, "--clips", "1", "--kinds", "clean", "--report", file});
+    EXPECT_EQ(1, result.status);
+    EXPECT_TRUE(contains(result.err, "--report needs another file")) << result.err;
+    EXPECT_EQ(before, contents(file));
+    const ProcessResult nowhere = evaluate({"--kinds", "clean", "--report", path("no/page.html")});
+    EXPECT_EQ(1, nowhere.status);
+    EXPECT_TRUE(contains(nowhere.err, "page.html cannot be written")) << nowhere.err;
+    EXPECT_EQ("", nowhere.out);
+}
+
 /// Starts the command with its output in a file, and ends it by a signal once that says how.
 class Interrupted {
 public:

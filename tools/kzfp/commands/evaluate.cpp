@@ -11,9 +11,11 @@
 #include "kzfp/command_line/file_options.hpp"
 #include "kzfp/command_line/output_options.hpp"
 #include "kzfp/command_line/section.hpp"
+#include "kzfp/evaluate/page.hpp"
 #include "kzfp/evaluate/run.hpp"
 #include "kzfp/output/interruption.hpp"
 #include "kzfp/output/write.hpp"
+#include "kzfp/pages/report_file.hpp"
 
 namespace kzfp {
 
@@ -51,6 +53,7 @@ struct EvaluateOptions {
     OutputOptions output;
     std::string kinds;
     std::string lengths = "15";
+    std::string report;
     evaluate::Settings settings;
 };
 
@@ -128,6 +131,7 @@ void add_options(CLI::App& parser, EvaluateOptions& options)
                     "them (truth.jsonl)")
         ->type_name("FOLDER");
     add_output_options(parser, kFormats, options.output);
+    add_report_option(parser, options.report);
     add_jobs_option(parser, options.settings.jobs);
 }
 
@@ -175,6 +179,15 @@ std::string text_of(const evaluate::Table& table, Format format)
     return format == Format::csv ? to_csv(table) : to_text(table);
 }
 
+/// What the page must not replace.
+std::vector<std::string> other_files(const EvaluateOptions& options)
+{
+    std::vector<std::string> files = options.settings.files;
+    files.push_back(options.settings.catalogue);
+    files.push_back(options.output.output);
+    return files;
+}
+
 ExitStatus run(EvaluateOptions& options)
 {
     options.settings.files = all_files(options.files);
@@ -183,9 +196,13 @@ ExitStatus run(EvaluateOptions& options)
     options.settings.progress = options.output.progress;
     watch_for_interruption();
     OutputFile output(options.output.output, options.settings.files);
+    ReportFile report(options.report, other_files(options));
     const evaluate::Evaluation evaluation = evaluate::evaluate(options.settings);
     write_output(text_of(evaluation.table, options.output.format));
     output.finish();
+    if (report.is_wanted()) {
+        report.finish(to_page(evaluation.table));
+    }
     if (evaluation.table.partial) {
         return interrupted_by_user;
     }
