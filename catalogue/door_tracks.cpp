@@ -8,44 +8,12 @@ namespace {
 
 using namespace kzcat;
 
-Source to_source(const kzcat_source& source)
-{
-    require(source.uri != nullptr && *source.uri != 0,
-            "a source has no uri; pass the path that the "
-            "track comes from, or any name for it");
-    Source result = {
-        .uri = source.uri, .size = source.size, .mtime_ns = source.mtime_ns, .hash = {}};
-    if (source.hash != nullptr) {
-        result.hash.emplace();
-        std::copy_n(source.hash, KZCAT_HASH_SIZE, result.hash->begin());
-    }
-    return result;
-}
-
-std::vector<Tag> to_tags(const kzcat_new_track& track)
-{
-    require(track.tags != nullptr || track.tag_count == 0,
-            "the tags are null; pass some, or a count of 0");
-    std::vector<Tag> tags;
-    for (const kzcat_tag& tag : std::span(track.tags, static_cast<size_t>(track.tag_count))) {
-        require(tag.name != nullptr && tag.value != nullptr,
-                "the name or the value of a tag is null; pass texts");
-        tags.push_back({.name = tag.name, .value = tag.value});
-    }
-    return tags;
-}
-
 NewTrack to_new_track(const kzcat_new_track& track)
 {
-    require(track.trail != nullptr, "a track has no trail; make one with a builder");
-    if (track.trail->trail.codes.empty()) {
-        throw Failure(KZCAT_ERROR_INVALID_ARGUMENT,
-                      "a trail is empty, since its sound is shorter than a second; pass longer "
-                      "sound");
-    }
+    require_codes(track.trail);
     return {.trail = track.trail->trail,
             .document_bands = track.trail->document_bands,
-            .tags = to_tags(track),
+            .tags = to_tags(track.tags, track.tag_count),
             .source = to_source(track.source)};
 }
 
@@ -103,6 +71,42 @@ const Item& item_at(const std::vector<Item>& items, uint32_t place, const char* 
 }
 
 } // namespace
+
+Source kzcat::to_source(const kzcat_source& source)
+{
+    require(source.uri != nullptr && *source.uri != 0,
+            "a source has no uri; pass the path that the "
+            "track comes from, or any name for it");
+    Source result = {
+        .uri = source.uri, .size = source.size, .mtime_ns = source.mtime_ns, .hash = {}};
+    if (source.hash != nullptr) {
+        result.hash.emplace();
+        std::copy_n(source.hash, KZCAT_HASH_SIZE, result.hash->begin());
+    }
+    return result;
+}
+
+std::vector<Tag> kzcat::to_tags(const kzcat_tag* tags, uint64_t count)
+{
+    require(tags != nullptr || count == 0, "the tags are null; pass some, or a count of 0");
+    std::vector<Tag> result;
+    for (const kzcat_tag& tag : std::span(tags, static_cast<size_t>(count))) {
+        require(tag.name != nullptr && tag.value != nullptr,
+                "the name or the value of a tag is null; pass texts");
+        result.push_back({.name = tag.name, .value = tag.value});
+    }
+    return result;
+}
+
+void kzcat::require_codes(const kzcat_trail* trail)
+{
+    require(trail != nullptr, "a track has no trail; make one with a builder");
+    if (trail->trail.codes.empty()) {
+        throw Failure(KZCAT_ERROR_INVALID_ARGUMENT,
+                      "a trail is empty, since its sound is shorter than a second; pass longer "
+                      "sound");
+    }
+}
 
 kzcat_status kzcat_add(kzcat_catalogue* catalogue, const kzcat_new_track* tracks, uint64_t count,
                        kzcat_added* out_added) noexcept

@@ -113,6 +113,11 @@ void copy_out(std::span<const Item> items, Item* room, uint64_t capacity, uint64
 /// Checks a caller's format; the extractors then refuse what they cannot use.
 SoundFormat to_sound_format(const kzcat_format* format);
 
+/// A caller's records as the store has them. They throw Failure.
+Source to_source(const kzcat_source& source);
+std::vector<Tag> to_tags(const kzcat_tag* tags, uint64_t count);
+void require_codes(const kzcat_trail* trail);
+
 /// Reports on a format that an extractor refuses, by the status for that.
 template <class Make>
 auto with_format_checked(Make make)

@@ -437,6 +437,33 @@ KZ_API kzcat_status kzcat_trail_get_bit_errors(const kzcat_trail* first, const k
                                                uint64_t* out_count) KZ_NOEXCEPT;
 
 /**
+ * Copies what lets a trail answer query documents: 15 band energies, low band first, as 256 times
+ * their logarithm to base 2, for each frame of 2.97 s, one of which begins every 0.51 s.
+ *
+ * @param bands     Room for @p capacity numbers; null, with a @p capacity of 0, asks for the count.
+ * @param[out] out_count  The numbers there are, also when the room is too small; 0 for a trail that
+ *                        does not answer documents, and on every other failure.
+ * @return 0; KZCAT_ERROR_INVALID_ARGUMENT; KZCAT_ERROR_ROOM when @p capacity is below the count.
+ */
+KZ_API kzcat_status kzcat_trail_get_document_bands(const kzcat_trail* trail, uint16_t* bands,
+                                                   uint64_t capacity,
+                                                   uint64_t* out_count) KZ_NOEXCEPT;
+
+/**
+ * Makes a copy of a trail that answers query documents by these band energies, as
+ * kzcat_trail_get_document_bands() gave them for the same recording.
+ *
+ * @param bands  @p count of them, read only during the call. May be null when there are 0: the copy
+ *               then answers no documents.
+ * @param[out] out_trail  Freed by the caller with kzcat_trail_free(); null on failure.
+ * @return 0; KZCAT_ERROR_INVALID_ARGUMENT, also when the trail is longer or shorter than these
+ *         bands; KZCAT_ERROR_MEMORY.
+ */
+KZ_API kzcat_status kzcat_trail_create_with_document_bands(const kzcat_trail* trail,
+                                                           const uint16_t* bands, uint64_t count,
+                                                           kzcat_trail** out_trail) KZ_NOEXCEPT;
+
+/**
  * Frees a trail and sets the caller's pointer to null.
  *
  * @return 0, also when *trail_ref is null; KZCAT_ERROR_INVALID_ARGUMENT when @p trail_ref is null.
@@ -493,6 +520,29 @@ typedef struct kzcat_added {
  */
 KZ_API kzcat_status kzcat_add(kzcat_catalogue* catalogue, const kzcat_new_track* tracks,
                               uint64_t count, kzcat_added* out_added) KZ_NOEXCEPT;
+
+/** A track as another catalogue kept it; everything is read only during the call. */
+typedef struct kzcat_stored_track {
+    const kzcat_trail* trail;
+    const kzcat_source* sources; /**< may be null when there are 0 */
+    uint64_t source_count;
+    const kzcat_tag* tags; /**< may be null when there are 0 */
+    uint64_t tag_count;
+    int64_t added;        /**< when, in seconds since 1970; 0: now */
+    uint32_t reserved[4]; /**< 0 */
+} kzcat_stored_track;
+
+/**
+ * Adds tracks that another catalogue kept, all of them or none. They yield to what is there, as
+ * those of kzcat_merge() do: a source stays with the track that has it, and a track with the same
+ * codes gains the sources, and the tags whose names it lacks. So it may be repeated.
+ *
+ * @param tracks  @p count of them.
+ * @param[out] out_added  Room for @p count records, in the same order; may be null.
+ * @return As kzcat_add() does.
+ */
+KZ_API kzcat_status kzcat_import(kzcat_catalogue* catalogue, const kzcat_stored_track* tracks,
+                                 uint64_t count, kzcat_added* out_added) KZ_NOEXCEPT;
 
 /**
  * Gives a track one source more, or renews what is known of one.

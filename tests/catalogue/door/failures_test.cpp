@@ -260,4 +260,32 @@ TEST_F(DoorFailures, AreReportedByMerging)
     });
 }
 
+TEST_F(DoorFailures, AreReportedByImporting)
+{
+    const Trail trail = trail_of(piece(1, 3), true);
+    const kzcat_tag tag = {"title", "A title that is longer than a short string"};
+    const kzcat_source sources[] = {{"one", -1, -1, nullptr}, {"two", -1, -1, nullptr}};
+    const kzcat_stored_track track = {trail.get(), sources, 2, &tag, 1, 7, {}};
+    expect_reported([&]() -> kzcat_status {
+        const Catalogue into = open_memory();
+        return into == nullptr ? kzcat_status{KZCAT_ERROR_MEMORY}
+                               : kzcat_import(into.get(), &track, 1, nullptr);
+    });
+}
+
+TEST_F(DoorFailures, AreReportedByDocumentBands)
+{
+    const Trail trail = trail_of(piece(1, 3), true);
+    std::vector<uint16_t> bands(1000);
+    uint64_t count = 0;
+    ASSERT_EQ(KZCAT_OK,
+              kzcat_trail_get_document_bands(trail.get(), bands.data(), bands.size(), &count));
+    expect_reported([&] {
+        return make<Trail>(kzcat_trail_create_with_document_bands,
+                           static_cast<const kzcat_trail*>(trail.get()),
+                           static_cast<const uint16_t*>(bands.data()), count)
+            .status;
+    });
+}
+
 } // namespace

@@ -128,6 +128,21 @@ TEST(CatalogueRecordLayout, OfNewTracks)
     });
 }
 
+TEST(CatalogueRecordLayout, OfStoredTracks)
+{
+    using Record = kzcat_stored_track;
+    expect_layout<Record>({
+        FIELD(Record, trail),
+        FIELD(Record, sources),
+        FIELD(Record, source_count),
+        FIELD(Record, tags),
+        FIELD(Record, tag_count),
+        FIELD(Record, added),
+        FIELD(Record, reserved),
+    });
+    EXPECT_EQ(64U, sizeof(Record));
+}
+
 TEST(CatalogueRecordLayout, OfAddedTracks)
 {
     using Record = kzcat_added;

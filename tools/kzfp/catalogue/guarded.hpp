@@ -23,7 +23,7 @@ inline void check_output(const std::string& catalogue, const std::string& output
             check_is_not_of(catalogue, output);
         }
     } catch (const audio::FileError& error) {
-        throw audio::FileError(output + ": " + error.what() + "; --output needs another file");
+        throw audio::FileError(output + ": " + error.what() + "; the output needs another file");
     }
 }
 

@@ -67,6 +67,11 @@ void add_output_options(CLI::App& parser, std::span<const FormatChoice> offered,
         .add_option("-o,--output", options.output,
                     "A file for the results, instead of standard output")
         ->type_name("FILE");
+    add_progress_options(parser, options);
+}
+
+void add_progress_options(CLI::App& parser, OutputOptions& options)
+{
     add_choice(parser, "--progress", "HOW", "a way to show progress", kProgressModes,
                options.progress);
     parser.add_flag_callback(

@@ -41,4 +41,7 @@ inline constexpr FormatChoice kCsvFormat = {"csv", Format::csv,
 void add_output_options(CLI::App& parser, std::span<const FormatChoice> offered,
                         OutputOptions& options);
 
+/// Adds -q,--quiet and --progress alone, for commands whose results have one form and place.
+void add_progress_options(CLI::App& parser, OutputOptions& options);
+
 } // namespace kzfp

@@ -22,6 +22,8 @@ ExitStatus run_list(const Arguments& arguments);
 ExitStatus run_remove(const Arguments& arguments);
 ExitStatus run_verify(const Arguments& arguments);
 ExitStatus run_merge(const Arguments& arguments);
+ExitStatus run_export(const Arguments& arguments);
+ExitStatus run_import(const Arguments& arguments);
 ExitStatus run_disc(const Arguments& arguments);
 ExitStatus run_help(const Arguments& arguments);
 
@@ -38,6 +40,9 @@ constexpr Command kCommands[] = {
     {"remove", "Removes tracks from a catalogue", run_remove, Group::catalogues},
     {"verify", "Finds out whether a catalogue is whole", run_verify, Group::catalogues},
     {"merge", "Adds the tracks of other catalogues to one", run_merge, Group::catalogues},
+    {"export", "Writes the tracks of a catalogue as text, for a backup", run_export,
+     Group::catalogues},
+    {"import", "Adds the tracks of exported catalogues to one", run_import, Group::catalogues},
     {"disc", "Reports what is on a Blu-ray disc or a DVD", run_disc, Group::program},
     {"help", "Prints the help of a command", run_help, Group::program},
 };
