@@ -28,10 +28,10 @@ double processor_milliseconds()
 
 Query query_of(const Pcm& pcm)
 {
-    const kzcat_format format = {.format = KZ_STREAM_FORMAT_PCM16,
-                                 .sample_rate = pcm.rate,
-                                 .channels = pcm.channels,
-                                 .reserved = 0};
+    kzcat_format format = {};
+    format.format = KZ_STREAM_FORMAT_PCM16;
+    format.sample_rate = pcm.rate;
+    format.channels = pcm.channels;
     auto query = made<Query>(kzcat_query_create, &format);
     check(kzcat_query_feed(query.get(), pcm.samples.data(), pcm.samples.size() * sizeof(int16_t)));
     check(kzcat_query_finish(query.get()));

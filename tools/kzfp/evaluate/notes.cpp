@@ -51,7 +51,8 @@ void add_not_made(const Table& table, std::vector<std::string>& notes)
         }
     }
     for (const auto& [reason, names] : reasons) {
-        notes.push_back("Not made, since " + reason + ": " + names + ".");
+        notes.push_back(
+            std::string("Not made, since ").append(reason).append(": ").append(names).append("."));
     }
 }
 

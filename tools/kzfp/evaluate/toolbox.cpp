@@ -6,8 +6,10 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
+#include <cstring>
 #include <filesystem>
 #include <fstream>
+#include <span>
 #include <sstream>
 
 #include "audio/source.hpp"
@@ -81,10 +83,11 @@ std::string lacking(const std::string& program, const std::string& package)
 
 void write_floats(const std::string& path, const Clip& clip)
 {
+    const auto bytes = std::as_bytes(std::span(clip.samples));
+    std::string text(bytes.size(), 0);
+    std::ranges::transform(bytes, text.begin(), [](std::byte b) { return static_cast<char>(b); });
     std::ofstream file(path, std::ios::binary);
-    // NOLINTNEXTLINE(cppcoreguidelines-pro-type-reinterpret-cast): bytes of the samples
-    file.write(reinterpret_cast<const char*>(clip.samples.data()),
-               static_cast<std::streamsize>(clip.samples.size() * sizeof(float)));
+    file.write(text.data(), static_cast<std::streamsize>(text.size()));
     if (!file.flush()) {
         throw audio::FileError(path +
                                " cannot be written; make room, or set TMPDIR to another place");
@@ -95,9 +98,9 @@ std::vector<int16_t> read_words(const std::string& path)
 {
     const std::string bytes = contents_of(path, kMostBytes);
     std::vector<int16_t> samples(bytes.size() / 2);
-    std::copy_n(bytes.data(), 2 * samples.size(),
-                // NOLINTNEXTLINE(cppcoreguidelines-pro-type-reinterpret-cast): as above
-                reinterpret_cast<char*>(samples.data()));
+    for (size_t i = 0; i < samples.size(); ++i) {
+        std::memcpy(&samples[i], &bytes[2 * i], sizeof samples[i]);
+    }
     return samples;
 }
 
