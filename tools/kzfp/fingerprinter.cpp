@@ -5,7 +5,10 @@
 #include <algorithm>
 #include <cmath>
 #include <cstdio>
+#include <deque>
 #include <memory>
+#include <span>
+#include <utility>
 
 #include "kzsdk/stream/stream.h"
 
@@ -146,6 +149,115 @@ std::vector<int16_t> values_of(kz_stream& stream)
     return values;
 }
 
+Fingerprint fingerprint_of(kz_stream& stream)
+{
+    return {.document = document_of(stream),
+            .values = values_of(stream),
+            .signal_offset = silence_of(stream).samples};
+}
+
+bool has_sound(const kz_stream& stream)
+{
+    kz_stream_state state;
+    kz_stream_get_state(&stream, &state);
+    return state.phase != KZ_STREAM_NOTHING_FED && state.phase != KZ_STREAM_SILENT;
+}
+
+/// The windows that have begun and not ended yet, the oldest first.
+class Windows {
+public:
+    Windows(audio::Source& source, Algorithm algorithm, double step,
+            const std::function<void(const Window&)>& deliver)
+        : source_(source), algorithm_(algorithm), step_(step), deliver_(deliver)
+    {
+    }
+
+    void run()
+    {
+        const size_t frame = source_.format().frame_bytes();
+        std::vector<std::byte> block(kBlock * frame);
+        for (size_t got = kBlock; got == kBlock;) {
+            got = source_.read(block);
+            take(std::span(std::as_const(block)).first(got * frame), got);
+        }
+        finish();
+    }
+
+private:
+    struct Open {
+        size_t number;
+        Stream stream;
+        uint8_t complete = 0;
+    };
+
+    uint64_t first_frame(size_t number) const
+    {
+        const double seconds = static_cast<double>(number) * step_;
+        return static_cast<uint64_t>(std::llround(seconds * source_.format().rate));
+    }
+
+    /// `frames` more have come.
+    void take(std::span<const std::byte> bytes, size_t frames)
+    {
+        while (first_frame(begun_) < position_ + frames) {
+            open_.push_back({begun_++, create(source_.format(), algorithm_)});
+        }
+        for (Open& window : open_) {
+            const uint64_t first = first_frame(window.number);
+            const size_t before = first > position_ ? static_cast<size_t>(first - position_) : 0;
+            const auto mine = bytes.subspan(before * source_.format().frame_bytes());
+            if (window.complete == 0) {
+                check("adding audio", kz_stream_feed(window.stream.get(), mine.data(), mine.size(),
+                                                     nullptr, &window.complete));
+            }
+        }
+        position_ += frames;
+        while (!open_.empty() && deliver_oldest()) {
+            open_.pop_front();
+        }
+    }
+
+    /// False while it is not known yet what will become of it.
+    bool deliver_oldest()
+    {
+        const Open& oldest = open_.front();
+        Window window = {.time = static_cast<double>(oldest.number) * step_, .fingerprint = {}};
+        if (oldest.complete != 0) {
+            window.fingerprint = fingerprint_of(*oldest.stream);
+        } else if (has_sound(*oldest.stream) || position_ < first_frame(oldest.number + 1)) {
+            return false;
+        }
+        deliver_(window);
+        any_ = true;
+        return true;
+    }
+
+    void finish()
+    {
+        for (Open& window : open_) {
+            check("adding audio", kz_stream_finish(window.stream.get(), &window.complete));
+        }
+        if (!any_ && (open_.empty() || open_.front().complete == 0)) {
+            const Stream none = create(source_.format(), algorithm_);
+            throw audio::FileError(
+                too_little(open_.empty() ? *none : *open_.front().stream, source_));
+        }
+        while (!open_.empty() && open_.front().complete != 0) {
+            deliver_oldest();
+            open_.pop_front();
+        }
+    }
+
+    audio::Source& source_;
+    Algorithm algorithm_;
+    double step_;
+    const std::function<void(const Window&)>& deliver_;
+    std::deque<Open> open_;
+    size_t begun_ = 0;
+    uint64_t position_ = 0; ///< frames read
+    bool any_ = false;      ///< a window was delivered
+};
+
 } // namespace
 
 std::string sound_needed() { return hundredths(KZ_FPX_MILLISECONDS_NEEDED / 1000.0); }
@@ -154,9 +266,13 @@ Fingerprint take_fingerprint(audio::Source& source, Algorithm algorithm)
 {
     const Stream stream = create(source.format(), algorithm);
     feed(*stream, source);
-    return {.document = document_of(*stream),
-            .values = values_of(*stream),
-            .signal_offset = silence_of(*stream).samples};
+    return fingerprint_of(*stream);
+}
+
+void take_windows(audio::Source& source, Algorithm algorithm, double step,
+                  const std::function<void(const Window&)>& deliver)
+{
+    Windows(source, algorithm, step, deliver).run();
 }
 
 } // namespace kzfp

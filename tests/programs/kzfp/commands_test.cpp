@@ -119,7 +119,7 @@ void expect_in_man_page_and_help(const ::kzfp::Choice<Value> (&choices)[count])
 
 TEST(KzfpCommands, HaveTheirChoicesInTheManPageAndHelp)
 {
-    expect_in_man_page_and_help(::kzfp::kOutputFormats);
+    expect_in_man_page_and_help(::kzfp::kFingerprintFormats);
     expect_in_man_page_and_help(::kzfp::kAlgorithms);
     expect_in_man_page_and_help(::kzfp::kEncodings);
 }
@@ -224,13 +224,14 @@ TEST(KzfpCommands, LeaveFilesOfTheirNamesReachable)
     const std::filesystem::path before = std::filesystem::current_path();
     std::filesystem::current_path(directory.path());
     const std::string expected = output_of({clip("tone.wav")});
+    const std::string values = output_of({"-f", "values", clip("tone.wav")});
     for (const std::string& name : command_names()) {
         directory.write(name, contents(clip("tone.wav")));
         EXPECT_EQ(expected, output_of({"./" + name})) << name;
         EXPECT_EQ(expected, output_of({"--", name})) << name;
         EXPECT_EQ(expected, output_of({"fingerprint", name})) << name;
         EXPECT_EQ(expected, output_of({"--format", "document", name})) << name;
-        EXPECT_EQ(expected + expected, output_of({clip("tone.wav"), name})) << name;
+        EXPECT_EQ(values + values, output_of({"-f", "values", clip("tone.wav"), name})) << name;
     }
     std::filesystem::current_path(before);
 }

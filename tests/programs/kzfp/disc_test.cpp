@@ -54,7 +54,8 @@ TEST(KzfpDisc, TellsABlurayDisc)
               "found: AACS/Content000.cer\n"
               "playlists: 00000.mpls 00007.mpls\n",
               output_of({"disc", kImages + "bluray"}));
-    const json expected = {{"path", kImages + "bluray"},
+    const json expected = {{"schema", 1},
+                           {"path", kImages + "bluray"},
                            {"bluray", true},
                            {"dvd", false},
                            {"control_files",
@@ -73,7 +74,8 @@ TEST(KzfpDisc, TellsADvd)
               "found: VIDEO_TS/VIDEO_TS.IFO\n"
               "title sets: 1 2\n",
               output_of({"disc", kImages + "dvd"}));
-    const json expected = {{"path", kImages + "dvd"},
+    const json expected = {{"schema", 1},
+                           {"path", kImages + "dvd"},
                            {"bluray", false},
                            {"dvd", true},
                            {"control_files", {{"VIDEO_TS/VIDEO_TS.IFO", true}}},
@@ -143,7 +145,8 @@ TEST(KzfpDisc, TellsTheLabelsOfAnImage)
 {
     EXPECT_EQ("ISO 9660 label: HOLIDAY_2026\nUDF label: HOLIDAY_2026\n",
               output_of({"disc", kImages + "dvd.iso"}));
-    const json expected = {{"path", kImages + "bluray.iso"},
+    const json expected = {{"schema", 1},
+                           {"path", kImages + "bluray.iso"},
                            {"iso9660_label", "SUMMER_FILM"},
                            {"udf_label", "SUMMER_FILM"}};
     EXPECT_EQ(expected, json_of(kImages + "bluray.iso"));

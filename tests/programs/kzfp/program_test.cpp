@@ -114,8 +114,8 @@ TEST(KzfpOutput, JsonStaysJsonWhateverTheNameOfTheFile)
 
 TEST(KzfpOutput, SeveralFilesFollowEachOtherInTheOrderGiven)
 {
-    EXPECT_EQ(output_of({clip("tone.wav")}) + output_of({kMusic}),
-              output_of({clip("tone.wav"), kMusic}));
+    EXPECT_EQ(output_of({"-f", "values", clip("tone.wav")}) + output_of({"-f", "values", kMusic}),
+              output_of({"-f", "values", clip("tone.wav"), kMusic}));
 }
 
 TEST(KzfpOutput, IsTheSameEveryTime)
@@ -409,10 +409,10 @@ TEST(KzfpMessages, AreOneLineWhateverTheNameOfTheFile)
 
 TEST(KzfpStatus, OneBadFileDoesNotStopTheOthers)
 {
-    const ProcessResult result =
-        kzfp({clip("words.txt"), kMusic, "/nowhere.wav", clip("tone.wav"), clip("short.wav")});
+    const ProcessResult result = kzfp({"-f", "human", clip("words.txt"), kMusic, "/nowhere.wav",
+                                       clip("tone.wav"), clip("short.wav")});
     EXPECT_EQ(1, result.status);
-    EXPECT_EQ(output_of({kMusic, clip("tone.wav")}), result.out);
+    EXPECT_EQ(output_of({"-f", "human", kMusic, clip("tone.wav")}), result.out);
     EXPECT_EQ(3u, lines_in(result.err)) << result.err;
 }
 
@@ -430,7 +430,9 @@ TEST(KzfpStatus, ReaderThatLeavesEndsTheProgramQuietly)
 {
     ProcessSetup setup;
     setup.close_output_after = 1;
-    const ProcessResult result = kzfp(std::vector<std::string>(20, kMusic), setup);
+    std::vector<std::string> arguments(20, kMusic);
+    arguments.insert(arguments.begin(), "--format=json");
+    const ProcessResult result = kzfp(arguments, setup);
     EXPECT_EQ(1, result.status);
     EXPECT_EQ("", result.err);
 }
@@ -452,7 +454,7 @@ TEST(KzfpStatus, WrongUsageIsTwo)
 {
     expect_wrong_usage({}, "FILE is required");
     expect_wrong_usage({"--colour", kMusic}, "--colour");
-    expect_wrong_usage({"--format", "xml", kMusic}, "document, json, values");
+    expect_wrong_usage({"--format", "mp3", kMusic}, "xml, json, csv, values, human");
     expect_wrong_usage({"--algorithm", "best", kMusic}, "'best' is not an algorithm");
     expect_wrong_usage({"--raw", "44100", kMusic}, "RATE,CHANNELS,ENCODING");
     expect_wrong_usage({"--raw", "", kMusic}, "RATE,CHANNELS,ENCODING");
@@ -465,7 +467,10 @@ TEST(KzfpStatus, WrongUsageIsTwo)
     }
 }
 
-TEST(KzfpProgress, IsForTerminalsOnly) { EXPECT_EQ("", kzfp({kMusic, kMusic}).err); }
+TEST(KzfpProgress, IsForTerminalsOnly)
+{
+    EXPECT_EQ("", kzfp({"--format", "json", kMusic, kMusic}).err);
+}
 
 // `script` runs the program on a terminal of its own.
 TEST(KzfpProgress, IsShownOnATerminalAndClearedBeforeEachResult)

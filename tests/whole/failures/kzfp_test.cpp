@@ -118,6 +118,16 @@ void expect_same_or_complaint(const ProcessResult& whole, const ProcessResult& r
     }
 }
 
+/// In JSON, a file that failed has its line, unless memory is too short for that as well.
+void expect_same_or_error_line(const ProcessResult& whole, const ProcessResult& result)
+{
+    ProcessResult rest = result;
+    if (result.status != 0 && result.out.find(",\"error\":\"") != std::string::npos) {
+        rest.out.clear();
+    }
+    expect_same_or_complaint(whole, rest);
+}
+
 TEST_F(FailingSystem, AnyAllocationMayFailForHeaderlessSamples)
 {
     const std::string file = scratch_.write("music.raw", bytes_of(tune(kRate, 1, 15)));
@@ -130,7 +140,7 @@ TEST_F(FailingSystem, AnyAllocationMayFailOnTheRoadOfASoundFile)
     const std::string file =
         scratch_.write("music.wav", wav_header(static_cast<uint32_t>(samples.size())) + samples);
     for_every_failure("ALLOCATION", {"--algorithm", "float", "--format", "json", file},
-                      expect_same_or_complaint);
+                      expect_same_or_error_line);
 }
 
 TEST_F(FailingSystem, AnyAllocationMayFailInTheDiscCommand)

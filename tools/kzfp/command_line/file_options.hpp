@@ -17,8 +17,12 @@ struct FileArguments {
 /// Adds the positional FILE and --files-from. One of them is needed. `files` outlives the parsing.
 void add_file_options(CLI::App& parser, FileArguments& files, const std::string& help);
 
+/// Throws CLI::RequiredError when there is neither a file nor a list. For commands that set the
+/// parser's callback themselves.
+void check_files_are_given(const FileArguments& files);
+
 /// What was named, then the lines of the list; a list that holds a NUL is divided at NULs. Empty
-/// lines are passed over. Throws audio::FileError.
+/// lines are passed over. Throws audio::FileError, also when standard input would be read twice.
 std::vector<std::string> all_files(const FileArguments& files);
 
 } // namespace kzfp

@@ -1,38 +1,85 @@
 // `kzfp fingerprint`: one result for each file, in the order given. A file that fails gets one line
 // on standard error and does not stop the others.
 
+#include <filesystem>
+#include <map>
 #include <new>
+#include <span>
 #include <string>
-#include <utility>
+#include <system_error>
 
 #include "audio/input.hpp"
+#include "kzfp/catalogue/in_order.hpp"
 #include "kzfp/commands/fingerprint_options.hpp"
 #include "kzfp/fingerprinter.hpp"
-#include "kzfp/output/json.hpp"
+#include "kzfp/output/fingerprint_text.hpp"
+#include "kzfp/output/interruption.hpp"
 #include "kzfp/output/progress.hpp"
-#include "kzfp/output/text.hpp"
 #include "kzfp/output/write.hpp"
 
 namespace kzfp {
 
 namespace {
 
-struct Result {
-    audio::InputFacts facts;
-    Fingerprint fingerprint;
+/// What came of one file.
+struct Outcome {
+    std::string text;     ///< its results, as far as they are not written yet
+    std::string note;     ///< how it was read, when not as it is
+    std::string warning;  ///< about damage
+    std::string error;    ///< why it failed; empty when it did not
+    bool skipped = false; ///< the user wanted an end before it was begun
 };
+
+FingerprintForm form_of(const FingerprintOptions& options)
+{
+    return {.format = options.output.format, .wrapped = options.wrapped};
+}
+
+std::string shown_name(const std::string& name) { return name == "-" ? "standard input" : name; }
+
+FingerprintRecord record_of(const std::string& name, const FingerprintOptions& options,
+                            const audio::InputFacts& facts, const Fingerprint& fingerprint)
+{
+    return {.file = name,
+            .algorithm = name_of(kAlgorithms, options.algorithm),
+            .facts = facts,
+            .fingerprint = fingerprint};
+}
+
+void note_conversion(Outcome& outcome, const FingerprintOptions& options, uint32_t rate)
+{
+    if (!takes_rate(options.algorithm, rate)) {
+        outcome.note = "converted from " + std::to_string(rate) + " Hz to " +
+                       std::to_string(audio::kConvertedRate) + " Hz";
+    }
+}
+
+/// About damage before the end of what was needed; empty when there is none.
+std::string damage_text(const FingerprintOptions& options, const audio::Source& source)
+{
+    const std::string trouble = source.trouble();
+    if (options.strict && !trouble.empty()) {
+        throw audio::FileError("is damaged (" + trouble + ")");
+    }
+    return trouble.empty() ? "" : "is damaged (" + trouble + "); what can be read was used";
+}
 
 /// Tries with more and more of a pipe; a regular file is read once. A decoder that met the end of
 /// what has arrived may have made up the last samples, so its complaint counts as "not enough" too.
-Result process(const std::string& name, const FingerprintOptions& options)
+void take_one(const std::string& name, const FingerprintOptions& options, Outcome& outcome)
 {
     audio::Input input(name, options.request);
     for (;;) {
         try {
             const audio::OpenedInput opened = input.open();
-            Fingerprint fingerprint = take_fingerprint(*opened.source, options.algorithm);
+            const Fingerprint fingerprint = take_fingerprint(*opened.source, options.algorithm);
             if (opened.source->trouble().empty() || !input.extend()) {
-                return {opened.facts, std::move(fingerprint)};
+                note_conversion(outcome, options, opened.facts.rate);
+                outcome.warning = damage_text(options, *opened.source);
+                FingerprintRecord record = record_of(name, options, opened.facts, fingerprint);
+                record.warning = outcome.warning;
+                outcome.text = fingerprint_text(form_of(options), record);
+                return;
             }
         } catch (const audio::FileError&) {
             if (!input.extend()) {
@@ -42,61 +89,166 @@ Result process(const std::string& name, const FingerprintOptions& options)
     }
 }
 
-/// One result in the requested form, with its line break.
-std::string to_output(const FingerprintOptions& options, const std::string& name,
-                      const Result& result)
+/// Lines for people do not name the file themselves.
+void name_windows(const std::string& name, const FingerprintOptions& options)
 {
-    switch (options.format) {
-    case OutputFormat::json:
-        return to_json({.file = name,
-                        .algorithm = name_of(kAlgorithms, options.algorithm),
-                        .facts = result.facts,
-                        .fingerprint = result.fingerprint});
-    case OutputFormat::values:
-        return to_text(result.fingerprint.values);
-    case OutputFormat::document:
-        break;
+    if (options.output.format == Format::human && options.files.size() > 1) {
+        write_output(without_control_characters(shown_name(name)) + '\n');
     }
-    return result.fingerprint.document + '\n';
 }
 
-std::string shown_name(const std::string& name) { return name == "-" ? "standard input" : name; }
-
-/// True when the file's fingerprint was written.
-bool process_and_write(const std::string& name, const FingerprintOptions& options,
-                       Progress& progress)
+/// A sound file in a pipe is copied to its end first; headerless sound is taken as it comes.
+void take_every(const std::string& name, const FingerprintOptions& options, Outcome& outcome)
 {
-    const auto report = [&](const std::string& what) {
-        progress.clear();
-        write_message(shown_name(name) + ": " + what);
-        return false;
-    };
-    try {
-        const Result result = process(name, options);
-        if (!takes_rate(options.algorithm, result.facts.rate)) {
-            report("converted from " + std::to_string(result.facts.rate) + " Hz to " +
-                   std::to_string(audio::kConvertedRate) + " Hz");
-        }
-        progress.clear();
-        write_output(to_output(options, name, result));
-        return true;
-    } catch (const audio::FileError& error) {
-        return report(error.what());
-    } catch (const std::bad_alloc&) {
-        return report("not enough memory");
+    audio::Input input(name, options.request);
+    while (input.extend()) {
     }
+    const audio::OpenedInput opened = input.open();
+    note_conversion(outcome, options, opened.facts.rate);
+    name_windows(name, options);
+    const FingerprintForm form = form_of(options);
+    take_windows(*opened.source, options.algorithm, *options.every, [&](const Window& window) {
+        const double time = options.request.section.start + window.time;
+        if (window.fingerprint) {
+            FingerprintRecord record = record_of(name, options, opened.facts, *window.fingerprint);
+            record.time = time;
+            write_output(fingerprint_text(form, record));
+        } else {
+            write_output(failure_text(form, name, "silence", time));
+        }
+    });
+    outcome.warning = damage_text(options, *opened.source);
+}
+
+Outcome outcome_of(const std::string& name, const FingerprintOptions& options)
+{
+    Outcome outcome;
+    if (interrupted()) {
+        outcome.skipped = true;
+        return outcome;
+    }
+    try {
+        options.every ? take_every(name, options, outcome) : take_one(name, options, outcome);
+    } catch (const audio::FileError& error) {
+        outcome.error = error.what();
+    } catch (const std::bad_alloc&) {
+        outcome.error = "not enough memory";
+    }
+    return outcome;
+}
+
+/// DIR/NAME.xml.
+std::string document_path(const FingerprintOptions& options, const std::string& file)
+{
+    const std::string name =
+        file == "-" ? "stdin" : std::filesystem::path(file).filename().string();
+    return (std::filesystem::path(options.directory) / (name + ".xml")).string();
+}
+
+/// Two files whose documents would have the same name; empty when there are none.
+std::string clash_in_directory(const FingerprintOptions& options)
+{
+    std::map<std::string, std::string> owners;
+    for (const std::string& file : options.files) {
+        const auto [owner, fresh] = owners.emplace(document_path(options, file), file);
+        if (!fresh) {
+            return owner->second + " and " + file + " would both be written to " + owner->first +
+                   "; run kzfp twice, with an --output-dir each";
+        }
+    }
+    return {};
+}
+
+/// What keeps the results from being written as they are wanted; empty when nothing does.
+std::string complaint_about(const FingerprintOptions& options)
+{
+    if (!options.directory.empty()) {
+        return clash_in_directory(options);
+    }
+    if (options.output.format != Format::xml || options.wrapped || options.files.size() < 2) {
+        return {};
+    }
+    return "the documents of " + std::to_string(options.files.size()) +
+           " files do not make one document; choose --output-dir DIR for a file each, --wrap to "
+           "put them into one, or --format json, csv, values or human";
+}
+
+/// Throws OutputError.
+void make_directory(const std::string& path)
+{
+    std::error_code error;
+    if (!path.empty() && !std::filesystem::create_directories(path, error) && error) {
+        throw OutputError(path + " cannot be made (" + error.message() + ")");
+    }
+}
+
+void write_result(const FingerprintOptions& options, const std::string& name,
+                  const std::string& text)
+{
+    if (options.directory.empty()) {
+        write_output(text);
+        return;
+    }
+    OutputFile file(document_path(options, name), std::span(&name, 1));
+    write_output(text);
+    file.finish();
+}
+
+/// False when the file failed.
+bool report(const std::string& name, const FingerprintOptions& options, const Outcome& outcome)
+{
+    for (const std::string& line : {outcome.note, outcome.warning, outcome.error}) {
+        if (!line.empty()) {
+            write_message(shown_name(name) + ": " + line);
+        }
+    }
+    if (outcome.error.empty()) {
+        write_result(options, name, outcome.text);
+        return true;
+    }
+    write_output(failure_text(form_of(options), name, outcome.error));
+    return false;
 }
 
 ExitStatus process_all(const FingerprintOptions& options)
 {
-    Progress progress(options.files.size());
+    Progress progress(options.files.size(), options.output.progress);
+    size_t skipped = 0;
     ExitStatus status = all_done;
-    for (size_t i = 0; i < options.files.size(); ++i) {
-        progress.show(i + 1, options.files[i]);
-        if (!process_and_write(options.files[i], options, progress)) {
+    const auto work = [&](size_t i) {
+        if (options.every) { // one file at a time, in this thread, and written as it goes
+            progress.clear();
+        }
+        return outcome_of(options.files[i], options);
+    };
+    const auto deliver = [&](size_t i, const Outcome& outcome) {
+        progress.clear();
+        if (outcome.skipped) {
+            ++skipped;
+            return;
+        }
+        if (!report(options.files[i], options, outcome)) {
             status = some_file_failed;
         }
+        progress.show(i + 1, options.files[i]);
+    };
+    in_order(options.files.size(), options.every ? 1 : options.jobs, work, deliver);
+    if (skipped > 0) {
+        write_message("interrupted: " + std::to_string(skipped) + " of " +
+                      std::to_string(options.files.size()) + " files were left out");
     }
+    return interrupted() ? interrupted_by_user : status;
+}
+
+ExitStatus fingerprint(const FingerprintOptions& options)
+{
+    make_directory(options.directory);
+    watch_for_interruption();
+    OutputFile output(options.output.output, options.files);
+    write_output(fingerprint_heading(form_of(options)));
+    const ExitStatus status = process_all(options);
+    write_output(fingerprint_ending(form_of(options)));
+    output.finish();
     return status;
 }
 
@@ -108,7 +260,12 @@ ExitStatus run_fingerprint(const Arguments& arguments)
     if (const auto* status = std::get_if<ExitStatus>(&parsed)) {
         return *status;
     }
-    return process_all(std::get<FingerprintOptions>(parsed));
+    const auto& options = std::get<FingerprintOptions>(parsed);
+    if (const std::string complaint = complaint_about(options); !complaint.empty()) {
+        write_message("kzfp: " + complaint);
+        return wrong_usage;
+    }
+    return fingerprint(options);
 }
 
 } // namespace kzfp

@@ -4,14 +4,20 @@
 
 #include <utility>
 
+#include "kzfp/command_line/common_options.hpp"
+#include "kzfp/command_line/file_options.hpp"
 #include "kzfp/command_line/section.hpp"
 #include "kzfp/command_line/sound_options.hpp"
 #include "kzfp/commands/table.hpp"
 #include "kzfp/fingerprinter.hpp"
+#include "kzfp/output/interruption.hpp"
+#include "kzfp/output/write.hpp"
 
 namespace kzfp {
 
 namespace {
+
+constexpr double kShortestStep = 0.1; ///< seconds
 
 constexpr const char* kAboutCommands =
     "\n  Each has a help of its own: kzfp COMMAND --help. A sound file that is named like a\n"
@@ -35,7 +41,8 @@ std::string description()
 {
     return "Prints the fingerprint of each FILE: the query document that a recognition service is "
            "sent.\n"
-           "A FILE is any sound file that libsndfile reads (WAV, FLAC, OGG, MP3, AIFF, AU, ...);\n"
+           "A FILE is any sound file that libsndfile or FFmpeg reads (WAV, FLAC, OGG, MP3, M4A, "
+           "...);\n"
            "- is standard input. " +
            sound_needed() + " of sound are needed after leading silence; reading stops there.";
 }
@@ -57,7 +64,8 @@ constexpr const char* kMoreNotes =
     "Encodings: A-law and mu-law files go to the library as they are, everything else as 16-bit\n"
     "           PCM. That includes 8-bit files, since the library's own 8-bit input makes\n"
     "           fingerprints that match no other encoding; --raw RATE,CHANNELS,u8 uses it.\n"
-    "Exit:      0 success, 1 a file failed (one line each on standard error), 2 wrong usage.";
+    "Exit:      0 success, 1 a file failed (one line each on standard error), 2 wrong usage,\n"
+    "           130 interrupted: what is done by then is kept.";
 
 /// The algorithm decides on the rates of headerless files, which are never converted.
 void check_raw_rate(const FingerprintOptions& options)
@@ -76,6 +84,63 @@ std::string notes(const Arguments& arguments)
     return listing + about_rates() + kMoreNotes;
 }
 
+void add_every_option(CLI::App& parser, std::optional<double>& every)
+{
+    const auto check = [](const std::string& text) {
+        const auto seconds = to_seconds(text);
+        return seconds && *seconds >= kShortestStep ? std::string() : not_a_time(text, "from 0.1");
+    };
+    parser
+        .add_option_function<std::string>(
+            "--every", [&every](const std::string& text) { every = to_seconds(text); },
+            "A fingerprint for each window of a file or a pipe, this far apart,\n"
+            "on a line with its time")
+        ->type_name("TIME")
+        ->check(check);
+}
+
+void add_document_options(CLI::App& parser, FingerprintOptions& options)
+{
+    parser
+        .add_option("--output-dir", options.directory,
+                    "Write the document of each file NAME to DIR/NAME.xml")
+        ->type_name("DIR");
+    parser.add_flag("--wrap", options.wrapped, "Write the documents of all files as parts of one");
+}
+
+void add_options(CLI::App& parser, FingerprintOptions& options, FileArguments& files)
+{
+    add_file_options(parser, files, "Sound files; - is standard input");
+    add_output_options(parser, kFingerprintFormats, options.output);
+    add_document_options(parser, options);
+    add_every_option(parser, options.every);
+    add_raw_option(parser, options.request.raw);
+    add_section_options(parser, options.request.section);
+    add_choice(parser, "--algorithm", "NAME", "an algorithm", kAlgorithms, options.algorithm);
+    add_strict_option(parser, options.strict);
+    add_timeout_option(parser, options.request.patience.timeout);
+    add_jobs_option(parser, options.jobs);
+}
+
+void check_documents(const FingerprintOptions& options)
+{
+    const bool documents = options.output.format == Format::xml;
+    const bool has_directory = !options.directory.empty();
+    for (const auto& [name, given] :
+         {std::pair{"--output-dir", has_directory}, std::pair{"--wrap", options.wrapped}}) {
+        if (given && !documents) {
+            throw CLI::ValidationError(name, "is for documents; it goes with --format xml");
+        }
+        if (given && has_directory && (options.wrapped || !options.output.output.empty())) {
+            throw CLI::ValidationError("--output-dir", "excludes --output and --wrap");
+        }
+    }
+    if (options.every && documents) {
+        throw CLI::ValidationError(
+            "--every", "gives lines; choose --format json, csv, values or human with it");
+    }
+}
+
 } // namespace
 
 std::variant<FingerprintOptions, ExitStatus> parse_fingerprint_options(const Arguments& arguments)
@@ -83,22 +148,26 @@ std::variant<FingerprintOptions, ExitStatus> parse_fingerprint_options(const Arg
     CLI::App parser(description(), program_name(arguments));
     parser.footer(notes(arguments));
     FingerprintOptions options;
-    parser.add_option("FILE", options.files, "Sound files; - is standard input")
-        ->required()
-        ->type_name("");
-    add_choice(parser, "-f,--format", "FORMAT", "a format", kOutputFormats, options.format);
-    add_raw_option(parser, options.request.raw);
-    add_section_options(parser, options.request.section);
-    add_timeout_option(parser, options.request.patience.timeout);
-    add_choice(parser, "--algorithm", "NAME", "an algorithm", kAlgorithms, options.algorithm);
-    // Once all options are parsed.
-    parser.callback([&options] { check_raw_rate(options); });
+    FileArguments files;
+    add_options(parser, options, files);
+    parser.callback([&] {
+        check_files_are_given(files);
+        check_raw_rate(options);
+        check_documents(options);
+    });
     if (const auto status = parse(parser, arguments)) {
         return *status;
+    }
+    try {
+        options.files = all_files(files);
+    } catch (const audio::FileError& error) {
+        write_message(std::string("kzfp: ") + error.what());
+        return some_file_failed;
     }
     options.request.accepts_rate = [algorithm = options.algorithm](uint32_t rate) {
         return takes_rate(algorithm, rate);
     };
+    options.request.patience.stop = interrupted;
     return options;
 }
 

@@ -2,6 +2,7 @@
 /// The command line of `kzfp fingerprint`.
 #pragma once
 
+#include <optional>
 #include <string>
 #include <variant>
 #include <vector>
@@ -9,23 +10,29 @@
 #include "audio/input.hpp"
 #include "kzfp/command_line/choice.hpp"
 #include "kzfp/command_line/command_line.hpp"
+#include "kzfp/command_line/output_options.hpp"
 #include "kzfp/library.hpp"
 
 namespace kzfp {
 
-enum class OutputFormat { document, json, values };
-
 struct FingerprintOptions {
     std::vector<std::string> files;
-    OutputFormat format = OutputFormat::document;
+    OutputOptions output = {};
+    bool wrapped = false;  ///< the documents of all files are parts of one
+    std::string directory; ///< a document for each file goes here; empty when none is wanted
     Algorithm algorithm = Algorithm::fixed;
-    audio::Request request;
+    audio::Request request = {};
+    std::optional<double> every; ///< seconds from one window to the next; without it, one is made
+    bool strict = false;
+    size_t jobs = 1;
 };
 
-inline constexpr Choice<OutputFormat> kOutputFormats[] = {
-    {"document", OutputFormat::document, "the query document"},
-    {"json", OutputFormat::json, "one object per file, each on a line of its own (JSON Lines)"},
-    {"values", OutputFormat::values, "the 30 values on one line"},
+inline constexpr FormatChoice kFingerprintFormats[] = {
+    {"xml", Format::xml, "the query document"},
+    kJsonFormat,
+    kCsvFormat,
+    {"values", Format::values, "the 30 values on one line"},
+    {"human", Format::human, "numbers for people, with bars on a terminal"},
 };
 
 inline constexpr Choice<Algorithm> kAlgorithms[] = {

@@ -4,32 +4,24 @@
 
 #include <cmath>
 
-#include <nlohmann/json.hpp>
+#include "kzfp/output/json_object.hpp"
 
 namespace kzfp {
 
 namespace {
 
-using Object = nlohmann::ordered_json;
-
 double to_microseconds(double seconds) { return std::round(seconds * 1e6) / 1e6; }
-
-/// Not made into an object by its first member: without memory for that, it could not be destroyed.
-Object make_object() { return Object::object_t(); }
-
-std::string to_line(const Object& object)
-{
-    // A name or label that is not UTF-8 is shown with replacement characters.
-    return object.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace) + '\n';
-}
 
 } // namespace
 
 std::string to_json(const FingerprintRecord& record)
 {
     const uint32_t offset = record.fingerprint.signal_offset;
-    Object object = make_object();
-    object["file"] = record.file;
+    JsonObject object = make_object();
+    set_path(object, "file", record.file);
+    if (record.time) {
+        object["time"] = to_microseconds(*record.time);
+    }
     object["algorithm"] = record.algorithm;
     object["duration"] = nullptr;
     if (record.facts.duration) {
@@ -41,16 +33,19 @@ std::string to_json(const FingerprintRecord& record)
     object["signal_offset_samples"] = offset;
     object["signal_offset_rate"] = kWorkingRate;
     object["values"] = record.fingerprint.values;
+    if (!record.warning.empty()) {
+        object["warning"] = record.warning;
+    }
     return to_line(object);
 }
 
 std::string to_json(const std::string& path, const DiscContent& content)
 {
-    Object object = make_object();
-    object["path"] = path;
+    JsonObject object = make_object();
+    set_path(object, "path", path);
     object["bluray"] = content.is_bluray;
     object["dvd"] = content.is_dvd;
-    object["control_files"] = Object::object();
+    object["control_files"] = JsonObject::object();
     for (const ControlFile& file : content.control_files) {
         object["control_files"][file.name] = file.found;
     }
@@ -61,8 +56,8 @@ std::string to_json(const std::string& path, const DiscContent& content)
 
 std::string to_json(const std::string& path, const DiscLabels& labels)
 {
-    Object object = make_object();
-    object["path"] = path;
+    JsonObject object = make_object();
+    set_path(object, "path", path);
     object["iso9660_label"] = nullptr;
     object["udf_label"] = nullptr;
     if (labels.iso9660) {

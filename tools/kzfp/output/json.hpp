@@ -2,6 +2,7 @@
 /// Results as JSON Lines: one object on one line, with its line break.
 #pragma once
 
+#include <optional>
 #include <string>
 #include <string_view>
 
@@ -18,6 +19,8 @@ struct FingerprintRecord {
     std::string_view algorithm;
     const audio::InputFacts& facts;
     const Fingerprint& fingerprint;
+    std::optional<double> time = {}; ///< of the file, at which a window of --every begins
+    std::string_view warning = {};   ///< about damage; empty when there is none
 };
 
 std::string to_json(const FingerprintRecord& record);
