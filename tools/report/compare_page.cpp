@@ -18,7 +18,7 @@ std::string to_html(const ComparePage& page)
     for (const Sound& sound : page.sounds) {
         body += spectrogram_figure(sound);
     }
-    return whole_page(page.heading, body);
+    return whole_page(page.heading, body + notes_list(page.notes));
 }
 
 } // namespace report

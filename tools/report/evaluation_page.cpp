@@ -60,23 +60,12 @@ Table table_of(const std::vector<Kind>& kinds)
     return table;
 }
 
-std::string list_of(const std::vector<std::string>& notes)
-{
-    std::string items;
-    for (const std::string& note : notes) {
-        items += element("li", "", name_element(note));
-    }
-    return items.empty()
-               ? ""
-               : element("h3", "", "Notes") + element("ul", "class=\"explanation\"", items) + "\n";
-}
-
 } // namespace
 
 std::string to_html(const EvaluationPage& page)
 {
     std::string body = recall_figure(page.kinds) + curve_figures(page.kinds) +
-                       to_html(table_of(page.kinds)) + list_of(page.notes);
+                       to_html(table_of(page.kinds)) + notes_list(page.notes);
     for (const Table& table : page.tables) {
         body += to_html(table);
     }

@@ -128,6 +128,17 @@ std::string to_html(const Figure& figure)
            "\n";
 }
 
+std::string notes_list(const std::vector<std::string>& notes)
+{
+    std::string items;
+    for (const std::string& note : notes) {
+        items += element("li", "", name_element(note));
+    }
+    return items.empty()
+               ? ""
+               : element("h3", "", "Notes") + element("ul", "class=\"explanation\"", items) + "\n";
+}
+
 std::string section(std::string_view title, const std::string& content)
 {
     return element("section", "", element("h2", "", name_element(title)) + "\n" + content) + "\n";

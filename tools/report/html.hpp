@@ -34,6 +34,9 @@ struct Figure {
 
 std::string to_html(const Figure& figure);
 
+/// What else is to be said. Empty text when there is nothing.
+std::string notes_list(const std::vector<std::string>& notes);
+
 /// A part of a page under a heading.
 std::string section(std::string_view title, const std::string& content);
 

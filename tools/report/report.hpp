@@ -64,17 +64,19 @@ struct Fingerprint {
     std::array<int32_t, kValueCount> values = {};
 };
 
-/// The codes of a clip laid against those of a track. The clip's speed is undone before, as far as
-/// it can be: code i of the clip belongs to code `clip_at + i` of the track.
+/// The codes of a clip laid against those of a track: code i of the clip belongs to code
+/// `clip_at + i` of the track. A clip that runs at another speed has been read at the track's.
 struct Trails {
     std::string clip_name = {};
     std::string track_name = {};
     std::vector<uint64_t> clip = {};
     std::vector<uint64_t> track = {};
-    int64_t clip_at = 0; ///< negative when the clip begins before the track
-    double code_seconds = 2048.0 / 11025;
-    std::optional<Stretch> matched = {}; ///< seconds of the clip
-    std::optional<double> needed = {};   ///< no clip with a larger share of wrong bits could match
+    int64_t clip_at = 0;                  ///< negative when the clip begins before the track
+    double code_seconds = 2048.0 / 11025; ///< of the track
+    double clip_begin = 0;                ///< seconds of the clip at its first code
+    double clip_speed = 1;                ///< seconds of the track in one of the clip
+    std::optional<Stretch> matched = {};  ///< seconds of the clip
+    std::optional<double> needed = {};    ///< no clip with a larger share of wrong bits could match
 };
 
 /// The largest share of wrong bits with which a clip of so many codes could reach a score, a
@@ -88,23 +90,7 @@ struct ComparePage {
     std::vector<Sound> sounds = {};
     std::vector<Fingerprint> fingerprints = {}; ///< each is drawn over the first one
     std::vector<Trails> trails = {};            ///< one for each pair that has sound in common
-};
-
-/// A clip that was looked up.
-struct MatchedClip {
-    std::string name = {};
-    std::string verdict = {};       ///< "match", "no match", "not sure", "too quiet" or "error"
-    std::string sentence = {};      ///< the answer in words, or the error
-    std::vector<Fact> facts = {};   ///< such as the score and the place
-    std::vector<Sound> sounds = {}; ///< the clip, and the passage of the track when it is at hand
-    std::vector<Fingerprint> fingerprints = {};
-    std::optional<Trails> trails = {};
-    std::optional<Table> tracks = {}; ///< matches or candidates
-};
-
-struct MatchPage {
-    Heading heading = {};
-    std::vector<MatchedClip> clips = {};
+    std::vector<std::string> notes = {};        ///< such as what could not be drawn, and why
 };
 
 /// What ran for a while on a stream.
@@ -120,6 +106,27 @@ struct Run {
     std::string name = {};    ///< of a track
     std::string details = {}; ///< such as its score and place; may be empty
     uint32_t nth = 1;         ///< 2 when the track runs for the second time
+};
+
+/// A clip that was looked up.
+struct MatchedClip {
+    std::string name = {};
+    std::string verdict = {};       ///< "match", "no match", "not sure", "too quiet" or "error"
+    std::string sentence = {};      ///< the answer in words, or the error
+    std::vector<Fact> facts = {};   ///< such as the score and the place
+    std::vector<Sound> sounds = {}; ///< the clip, and the passage of the track when it is at hand
+    std::vector<Fingerprint> fingerprints = {};
+    std::vector<Trails> trails = {};     ///< one for each track that was found
+    std::optional<Table> tracks = {};    ///< matches or candidates
+    Stretch time = {};                   ///< of the clip, when it has runs
+    std::vector<Run> runs = {};          ///< what ran in a clip of several tracks
+    std::vector<std::string> notes = {}; ///< such as what could not be drawn, and why
+};
+
+struct MatchPage {
+    Heading heading = {};
+    std::vector<Table> tables = {}; ///< such as all clips
+    std::vector<MatchedClip> clips = {};
 };
 
 struct MonitorPage {
@@ -157,6 +164,12 @@ std::string to_html(const ComparePage& page);
 std::string to_html(const MatchPage& page);
 std::string to_html(const MonitorPage& page);
 std::string to_html(const EvaluationPage& page);
+
+/// A clip's part of a page: many clips need not be held at once.
+std::string to_html(const MatchedClip& clip);
+
+/// The page around such parts, whatever `page.clips` has.
+std::string to_html(const MatchPage& page, const std::string& clips);
 
 /// One drawing by itself, as an SVG file for documents: it holds its colours for both themes.
 std::string to_svg(const Trails& trails);

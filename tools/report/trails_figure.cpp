@@ -29,11 +29,24 @@ constexpr double kHeight = kCurve + kCurveHeight + 46;
 constexpr double kHighest = 0.6;   ///< of the curve
 constexpr size_t kLeastWindow = 8; ///< codes under one point of the curve, 1.5 s
 
+/// Seconds of the clip at which a code of it begins.
+double clip_time(const Trails& trails, double code)
+{
+    return trails.clip_begin + code * trails.code_seconds / trails.clip_speed;
+}
+
+/// The code that begins at a time of the clip.
+size_t code_at(const Trails& trails, double seconds)
+{
+    const double code = (seconds - trails.clip_begin) * trails.clip_speed / trails.code_seconds;
+    return static_cast<size_t>(std::clamp(code, 0.0, static_cast<double>(trails.clip.size())));
+}
+
 /// Along the clip, in seconds of it.
 Scale clip_scale(const Trails& trails)
 {
-    return {.low = 0,
-            .high = static_cast<double>(trails.clip.size()) * trails.code_seconds,
+    return {.low = clip_time(trails, 0),
+            .high = clip_time(trails, static_cast<double>(trails.clip.size())),
             .from = kLeft,
             .to = kRight};
 }
@@ -41,7 +54,7 @@ Scale clip_scale(const Trails& trails)
 void draw_overview(Svg& svg, const Trails& trails)
 {
     const double begin = static_cast<double>(trails.clip_at) * trails.code_seconds;
-    const double end = begin + clip_scale(trails).high;
+    const double end = begin + static_cast<double>(trails.clip.size()) * trails.code_seconds;
     const double length = static_cast<double>(trails.track.size()) * trails.code_seconds;
     const Scale scale = {
         .low = std::min(0.0, begin), .high = std::max(length, end), .from = kLeft, .to = kRight};
@@ -135,7 +148,7 @@ void draw_curve(Svg& svg, const Trails& trails, const Scale& time)
         const size_t begin = i > window / 2 ? i - window / 2 : 0;
         const auto rate = rates[i] ? mean_of(rates, begin, i + window / 2) : std::nullopt;
         if (rate) {
-            const double middle = (static_cast<double>(i) + 0.5) * trails.code_seconds;
+            const double middle = clip_time(trails, static_cast<double>(i) + 0.5);
             data += (drawing ? "L" : "M") + point(time(middle), height(*rate));
         }
         drawing = rate.has_value();
@@ -167,16 +180,15 @@ Table table_of(const Trails& trails)
                    .rows = {}};
     const ErrorRates rates = error_rates(trails);
     const size_t step = std::max(kLeastWindow, (rates.size() + 19) / 20);
-    const auto seconds = [&trails](double codes) {
-        return clock_text(codes * trails.code_seconds);
-    };
     for (size_t i = 0; i < rates.size(); i += step) {
         const auto begin = static_cast<double>(i);
         const size_t end = std::min(rates.size(), i + step);
         const auto rate = mean_of(rates, i, end);
-        table.rows.push_back({seconds(begin), seconds(static_cast<double>(end)),
-                              seconds(begin + static_cast<double>(trails.clip_at)),
-                              rate ? percent_text(*rate) : "nothing to compare"});
+        table.rows.push_back(
+            {clock_text(clip_time(trails, begin)),
+             clock_text(clip_time(trails, static_cast<double>(end))),
+             clock_text((begin + static_cast<double>(trails.clip_at)) * trails.code_seconds),
+             rate ? percent_text(*rate) : "nothing to compare"});
     }
     return table;
 }
@@ -184,12 +196,8 @@ Table table_of(const Trails& trails)
 std::string explanation_of(const Trails& trails)
 {
     const ErrorRates rates = error_rates(trails);
-    const double second = 1 / trails.code_seconds;
-    const size_t begin =
-        trails.matched ? static_cast<size_t>(std::max(0.0, trails.matched->begin * second)) : 0;
-    const size_t end = trails.matched
-                           ? static_cast<size_t>(std::max(0.0, trails.matched->end * second))
-                           : rates.size();
+    const size_t begin = trails.matched ? code_at(trails, trails.matched->begin) : 0;
+    const size_t end = trails.matched ? code_at(trails, trails.matched->end) : rates.size();
     const auto rate = mean_of(rates, begin, end);
     std::string text = "A column is the code of one moment: 64 bits, each of which says which of "
                        "two neighbouring bands is gaining on the other. ";
@@ -205,7 +213,7 @@ std::string explanation_of(const Trails& trails)
 bool can_be_drawn(const Trails& trails)
 {
     const auto count = static_cast<int64_t>(trails.clip.size());
-    return count > 0 && !trails.track.empty() && trails.code_seconds > 0 &&
+    return count > 0 && !trails.track.empty() && trails.code_seconds > 0 && trails.clip_speed > 0 &&
            trails.clip_at < static_cast<int64_t>(trails.track.size()) && trails.clip_at > -count;
 }
 

@@ -132,7 +132,7 @@ MatchPage match_page()
                          .facts = {{"score", "23.1 (7.3 needed)"}, {"place", "0:11.0"}},
                          .sounds = {sample_sound("clip.mp3", 10)},
                          .fingerprints = {},
-                         .trails = sample_trails(77),
+                         .trails = {sample_trails(77)},
                          .tracks = Table{.title = "Tracks",
                                          .columns = {{"track", false}, {"score", true}},
                                          .rows = {{"Trip on the Funny Boat", "23.1"}}}};
@@ -214,8 +214,8 @@ MatchPage hard_match_page()
         clip.sentence = hard_name();
         clip.sounds.clear();
     }
-    page.clips[0].trails->clip_at = -40; // the clip begins before the track
-    page.clips[0].trails->clip_name = hard_name();
+    page.clips[0].trails[0].clip_at = -40; // the clip begins before the track
+    page.clips[0].trails[0].clip_name = hard_name();
     return page;
 }
 

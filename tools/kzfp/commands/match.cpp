@@ -16,6 +16,8 @@
 #include "kzfp/output/interruption.hpp"
 #include "kzfp/output/progress.hpp"
 #include "kzfp/output/write.hpp"
+#include "kzfp/pages/match_report.hpp"
+#include "kzfp/pages/report_file.hpp"
 
 namespace kzfp {
 
@@ -49,6 +51,7 @@ struct MatchSettings {
     bool no_speeds = false;
     uint32_t plan = KZCAT_PLAN_MEASURED;
     size_t jobs = 1;
+    std::string report;
 };
 
 void add_lookup_options(CLI::App& parser, MatchSettings& settings)
@@ -75,6 +78,7 @@ void add_options(CLI::App& parser, MatchSettings& settings)
     add_output_options(parser, kFormats, settings.output);
     add_sound_options(parser, settings.sound);
     add_jobs_option(parser, settings.jobs);
+    add_report_option(parser, settings.report);
 }
 
 Answer failed(const std::string& why)
@@ -183,12 +187,14 @@ private:
 /// Thrown to end the work between two files.
 struct Interrupted {};
 
-ExitStatus match_all(const MatchSettings& settings, const std::vector<std::string>& files)
+ExitStatus match_all(const MatchSettings& settings, const std::vector<std::string>& files,
+                     ReportFile& report_file)
 {
     const Catalogue catalogue = open(settings);
     const std::vector<ClipInput> inputs = clip_inputs(files, settings.kind);
     watch_for_interruption();
     Answers answers(settings, inputs.size());
+    MatchReport report(settings.catalogue);
     const auto work = [&](size_t i) -> std::optional<Answer> {
         if (interrupted()) {
             return {};
@@ -203,13 +209,27 @@ ExitStatus match_all(const MatchSettings& settings, const std::vector<std::strin
             throw Interrupted();
         }
         answers.write(*answer, name_of(inputs[i]));
+        if (report_file.is_wanted()) {
+            report.add(*answer, inputs[i], settings.sound, *catalogue);
+        }
     };
     try {
         in_order(inputs.size(), settings.jobs, work, deliver);
     } catch (const Interrupted&) {
         answers.stop();
     }
+    if (report_file.is_wanted()) {
+        report_file.finish(report.page());
+    }
     return answers.status();
+}
+
+/// What a report must not replace.
+std::vector<std::string> files_used(const MatchSettings& settings, std::vector<std::string> files)
+{
+    files.push_back(settings.catalogue);
+    files.push_back(settings.output.output);
+    return files;
 }
 
 ExitStatus match(const MatchSettings& settings)
@@ -217,7 +237,8 @@ ExitStatus match(const MatchSettings& settings)
     try {
         const std::vector<std::string> files = all_files(settings.files);
         OutputFile output(settings.output.output, files);
-        const ExitStatus status = match_all(settings, files);
+        ReportFile report(settings.report, files_used(settings, files));
+        const ExitStatus status = match_all(settings, files, report);
         output.finish();
         return status;
     } catch (const CatalogueError& error) {
