@@ -61,6 +61,7 @@ make_containers() {
     sox_plain "$source" -b 16 music.flac
     sox_plain "$source" -C 4 music.ogg
     sox_plain "$source" -C 128 music.mp3
+    sox_plain music-22050-mono-s16.wav -C 64 music-22050-mono.mp3
     sox_plain "$source" -b 16 music.aiff
     sox_plain music-8000-mono-s16.wav -e mu-law music-ulaw.au
     # Louder than full scale as floats: what is above has to be clipped, not to wrap round.
@@ -76,6 +77,53 @@ make_containers() {
     sox_plain music-22050-mono-s16.wav -t raw -e unsigned -b 8 music-22050-mono.u8
 }
 
+# Without what differs from one run to the next: dates, the encoder's name.
+ffmpeg_plain() {
+    ffmpeg -nostdin -loglevel error -y "$@"
+}
+
+# The same music as files that libsndfile does not read.
+make_compressed() {
+    set -- -i music-44100-stereo-s16.wav -fflags +bitexact -flags:a +bitexact
+    tags='-metadata title=Trip -metadata artist=JDruid -metadata album=Boats -metadata date=2006'
+    # shellcheck disable=SC2086 # the tags are meant to be split
+    {
+        ffmpeg_plain "$@" -c:a aac -b:a 128k $tags -metadata track=3 music.m4a
+        ffmpeg_plain "$@" -c:a wmav2 -b:a 128k $tags -metadata track=3 music.wma
+    }
+    ffmpeg_plain "$@" -c:a alac music-alac.m4a
+    ffmpeg_plain "$@" -c:a libopus -b:a 96k music.webm
+    ffmpeg_plain "$@" -c:a ac3 -b:a 192k music.ac3
+    ffmpeg_plain "$@" -c:a aac -b:a 128k -f adts music.aac
+    # A film, the picture of an album in front of the sound, and music before another sound.
+    ffmpeg_plain -f lavfi -i testsrc=size=64x48:rate=5:duration=20 "$@" -map 0:v -map 1:a \
+        -c:v mpeg4 -c:a aac -b:a 128k music.mp4
+    ffmpeg_plain -f lavfi -i testsrc=size=64x48 -frames:v 1 picture.png
+    ffmpeg_plain -i picture.png "$@" -map 0:v -map 1:a -c:v copy -disposition:v attached_pic \
+        -c:a alac music-picture.m4a
+    rm picture.png
+    ffmpeg_plain -f lavfi -i anoisesrc=d=20:seed=1:r=44100 "$@" -map 1:a -map 0:a -c:a flac \
+        music-two-sounds.mkv
+    ffmpeg_plain -f lavfi -i testsrc=size=64x48:rate=5:duration=2 -c:v mpeg4 -fflags +bitexact \
+        no-sound.mp4
+    ffmpeg_plain "$@" -c:a aac -b:a 128k -movflags +faststart index-first.m4a
+    head -c 150000 index-first.m4a >broken.m4a
+    head -c 150000 music.m4a >no-index.m4a
+    rm index-first.m4a
+    head -c 150000 music.wma >broken.wma
+    head -c 1000000 music-two-sounds.mkv >broken.mkv
+    head -c 100000 music.mp3 >cut.mp3
+    head -c 100000 music.ogg >broken.ogg
+    head -c 1000000 music-44100-stereo-s16.wav >broken.wav
+    head -c 1000000 music.aiff >broken.aiff
+    # With a tag that has the length; in the second, the bit rate of its quiet start is not that of
+    # the rest, and no tag says so.
+    ffmpeg_plain "$@" -c:a libmp3lame -b:a 128k music-tagged.mp3
+    head -c 150000 music-tagged.mp3 >broken.mp3
+    ffmpeg_plain "$@" -af "volume=enable='lt(t,3)':volume=0" -c:a libmp3lame -q:a 6 -write_xing 0 \
+        music-varying.mp3
+}
+
 make_silences() {
     for rate in 8000 22050 44100 48000; do
         for channels in mono stereo; do
@@ -89,6 +137,11 @@ make_silences() {
     sox_plain -n -r 44100 -b 16 -c 1 no-samples.wav trim 0 0
     # The music begins far beyond the first million bytes of a pipe.
     sox_plain music-44100-stereo-s16.wav very-late.wav pad 60
+    for name in very-late.m4a very-late.mkv; do
+        codec=alac
+        [ $name = very-late.m4a ] || codec=flac
+        ffmpeg_plain -i very-late.wav -fflags +bitexact -flags:a +bitexact -c:a $codec $name
+    done
 }
 
 make_others() {
@@ -115,6 +168,7 @@ main() {
         return
     fi
     need espeak-ng espeak-ng
+    need ffmpeg ffmpeg
     stamp=$(sha256sum <"$root/scripts/make_clips.sh")
     if [ -f "$clips/stamp" ] && [ "$(cat "$clips/stamp")" = "$stamp" ]; then
         return
@@ -124,6 +178,7 @@ main() {
     cd "$clips"
     make_music
     make_containers
+    make_compressed
     make_silences
     make_others
     echo "$stamp" >stamp

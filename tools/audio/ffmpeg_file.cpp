@@ -1,10 +1,14 @@
 // The first piece of sound is decoded at once: only then the rate and the channels are certain.
 
 #include <algorithm>
+#include <array>
+#include <charconv>
 #include <cmath>
-#include <cstdio>
 #include <cstring>
+#include <string_view>
 #include <utility>
+
+#include <unistd.h>
 
 #include "audio/ffmpeg_decoder.hpp"
 #include "audio/ffmpeg_samples.hpp"
@@ -20,11 +24,32 @@ namespace {
 
 constexpr double kPreroll = 2;       ///< seconds before a place from which decoding is right again
 constexpr double kWorthSeeking = 10; ///< seconds; below, everything is decoded
-constexpr double kMissing = 0.5;     ///< seconds at the end that a container may overstate
 
 bool is_same(const StreamFormat& a, const StreamFormat& b)
 {
     return a.rate == b.rate && a.channels == b.channels && a.encoding == b.encoding;
+}
+
+/// Of "00:03:20.5", as Matroska files have it for each stream: whole seconds.
+std::optional<double> to_duration(std::string_view text)
+{
+    uint32_t seconds = 0;
+    for (int colons_left = 2;; --colons_left) {
+        uint32_t number = 0;
+        const auto [stop, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+        if (error != std::errc{} || number > 9999) {
+            return {};
+        }
+        seconds = seconds * 60 + number;
+        if (colons_left == 0) {
+            return seconds;
+        }
+        text.remove_prefix(static_cast<size_t>(stop - text.data()));
+        if (!text.starts_with(':')) {
+            return {};
+        }
+        text.remove_prefix(1);
+    }
 }
 
 /// A file that FFmpeg reads.
@@ -186,14 +211,17 @@ std::optional<double> FfmpegFile::duration() const
 {
     const AVFormatContext& container = decoder_->container();
     const AVStream& stream = decoder_->stream();
+    if (container.duration_estimation_method == AVFMT_DURATION_FROM_BITRATE) {
+        return {}; // a guess
+    }
     if (stream.duration != AV_NOPTS_VALUE && stream.duration > 0) {
         return static_cast<double>(stream.duration) * av_q2d(stream.time_base);
     }
-    if (container.nb_streams == 1 && container.duration > 0 &&
-        container.duration_estimation_method != AVFMT_DURATION_FROM_BITRATE) {
+    if (container.nb_streams == 1 && container.duration > 0) {
         return static_cast<double>(container.duration) / AV_TIME_BASE;
     }
-    return {};
+    const AVDictionaryEntry* const tag = av_dict_get(stream.metadata, "DURATION", nullptr, 0);
+    return tag == nullptr ? std::nullopt : to_duration(tag->value);
 }
 
 /// The names of tags differ between formats; FFmpeg has one set of them for most.
@@ -227,9 +255,7 @@ std::string FfmpegFile::early_end() const
     if (!ended_ || !duration() || *duration() <= seconds + kMissing) {
         return {};
     }
-    char text[96];
-    std::snprintf(text, sizeof text, "it should last %.1f s", *duration());
-    return text;
+    return should_last(*duration());
 }
 
 std::string FfmpegFile::trouble() const
@@ -242,6 +268,13 @@ std::string FfmpegFile::trouble() const
     return count + (count == "1" ? " piece of it" : " pieces of it") + " cannot be decoded";
 }
 
+bool is_mp4(int file)
+{
+    std::array<char, 8> start = {};
+    return ::pread(file, start.data(), start.size(), 0) == ssize_t{start.size()} &&
+           std::string_view(start.data(), start.size()).ends_with("ftyp");
+}
+
 } // namespace
 
 std::unique_ptr<FileSource> open_with_ffmpeg(int file, const AcceptsRate& accepts_rate, bool floats)
@@ -249,7 +282,9 @@ std::unique_ptr<FileSource> open_with_ffmpeg(int file, const AcceptsRate& accept
     try {
         return std::make_unique<FfmpegFile>(file, accepts_rate, floats);
     } catch (const NotRecognised&) {
-        throw NotRecognised(not_recognised_text());
+        throw NotRecognised(is_mp4(file) ? "is an MP4 file without its index, as one that was cut "
+                                           "off; copy or record it again"
+                                         : not_recognised_text());
     }
 }
 

@@ -2,6 +2,8 @@
 
 #include "audio/file_source.hpp"
 
+#include <cstdio>
+
 #include <sndfile.h>
 
 #include "audio/sound_file.hpp"
@@ -21,6 +23,13 @@ std::string not_recognised_text()
 {
     return "is not a sound file that can be read (WAV, FLAC, OGG, MP3, ...); headerless audio "
            "needs --raw";
+}
+
+std::string should_last(double seconds)
+{
+    char text[64];
+    std::snprintf(text, sizeof text, "it should last %.1f s", seconds);
+    return text;
 }
 
 std::string readers()

@@ -32,6 +32,12 @@ struct NotRecognised : FileError {
     using FileError::FileError;
 };
 
+/// What a container may overstate its length by, in seconds.
+constexpr double kMissing = 0.5;
+
+/// Why a file that ended early is damaged.
+std::string should_last(double seconds);
+
 /// What is wrong with such a file, and what would help.
 std::string not_recognised_text();
 

@@ -49,6 +49,7 @@ public:
 private:
     std::unique_ptr<FfmpegDecoder> open(Descriptor pipe, const std::string& url);
     static int ends_wait(void* self) noexcept;
+    void check_given_up() const;
     bool stops() const;
     void decode() noexcept;
     bool hand_over(const AVFrame& frame);
@@ -58,7 +59,8 @@ private:
     std::atomic<bool> stop_ = false;
     std::function<bool()> stop_of_user_;
     Patience patience_;
-    Wait silence_; ///< since the last piece; of the thread that decodes
+    Wait silence_;         ///< since the last piece; of the thread that decodes
+    std::string given_up_; ///< why a wait was ended; empty when none was
     std::unique_ptr<FfmpegDecoder> decoder_;
     StreamFormat format_; ///< of what was read last
     std::string trouble_;
@@ -81,7 +83,7 @@ LiveFfmpeg::LiveFfmpeg(Descriptor pipe, const std::string& url, const Patience& 
       silence_(patience_), decoder_(open(std::move(pipe), url))
 {
     const AVFrame* const first = decoder_->next();
-    silence_.check();
+    check_given_up();
     if (first == nullptr || !hand_over(*first)) {
         throw FileError(decoder_->trouble().empty() ? "holds no sound that can be decoded"
                                                     : decoder_->trouble());
@@ -109,16 +111,31 @@ std::unique_ptr<FfmpegDecoder> LiveFfmpeg::open(Descriptor pipe, const std::stri
         return std::make_unique<FfmpegDecoder>(
             url, AVIOInterruptCB{.callback = ends_wait, .opaque = this});
     } catch (const NotRecognised& error) {
-        silence_.check(); // what ended the wait, if anything did
+        check_given_up();
         throw FileError(url.empty() ? "is not sound that can be read as it comes; headerless audio "
                                       "needs --raw"
                                     : std::string("cannot be opened (") + error.what() + ")");
     }
 }
 
+/// Notes why: FFmpeg may still give what it has before it ends.
 int LiveFfmpeg::ends_wait(void* self) noexcept
 {
-    return static_cast<const LiveFfmpeg*>(self)->silence_.is_over() ? 1 : 0;
+    auto& live = *static_cast<LiveFfmpeg*>(self);
+    try {
+        live.silence_.check();
+        return 0;
+    } catch (const std::exception& error) {
+        live.given_up_ = error.what();
+        return 1;
+    }
+}
+
+void LiveFfmpeg::check_given_up() const
+{
+    if (!given_up_.empty()) {
+        throw FileError(given_up_);
+    }
 }
 
 bool LiveFfmpeg::stops() const { return stop_.load() || (stop_of_user_ && stop_of_user_()); }
@@ -138,8 +155,7 @@ void LiveFfmpeg::decode() noexcept
                 return;
             }
         }
-        silence_.check();
-        finish(decoder_->trouble());
+        finish(given_up_.empty() ? decoder_->trouble() : given_up_);
     } catch (const std::exception& error) {
         finish(error.what());
     }

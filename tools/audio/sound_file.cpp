@@ -12,6 +12,7 @@
 
 #include <unistd.h>
 
+#include "audio/missing_samples.hpp"
 #include "audio/samples.hpp"
 
 namespace audio {
@@ -40,6 +41,8 @@ SoundFile::SoundFile(int file, const AcceptsRate& accepts_rate, bool floats)
         throw FileError("cannot be read (" + SoundFile::trouble() + ")");
     }
     check();
+    cut_off_ = why_cut_off(file_.get(), info_);
+    states_length_ = (info_.format & SF_FORMAT_TYPEMASK) == SF_FORMAT_MPEG && has_length_tag(file);
     if (is_companded() && info_.channels <= 2 && accepts_rate(file_rate())) {
         const bool alaw = (info_.format & SF_FORMAT_SUBMASK) == SF_FORMAT_ALAW;
         encoding_ = alaw ? Encoding::alaw : Encoding::ulaw;
@@ -53,7 +56,9 @@ void SoundFile::select(const Section& section)
     if (section.length) {
         frames_left_ = static_cast<uint64_t>(std::llround(*section.length * file_rate()));
     }
-    go_to(std::llround(section.start * file_rate()));
+    const sf_count_t start = std::llround(section.start * file_rate());
+    go_to(start);
+    position_ = static_cast<uint64_t>(start);
 }
 
 void SoundFile::check() const
@@ -170,6 +175,8 @@ size_t SoundFile::read(std::span<std::byte> bytes)
         const sf_count_t got = sf_read_raw(file_.get(), wanted.data(), size);
         done = static_cast<size_t>(std::max<sf_count_t>(got, 0)) / frame_bytes;
     }
+    ended_ = done < frames;
+    position_ += done;
     frames_left_ -= done;
     return done;
 }
@@ -177,7 +184,10 @@ size_t SoundFile::read(std::span<std::byte> bytes)
 std::string SoundFile::trouble() const
 {
     if (sf_error(file_.get()) == SF_ERR_NO_ERROR) {
-        return {};
+        if (!ended_) {
+            return {};
+        }
+        return is_too_short() ? should_last(*duration()) : cut_off_;
     }
     std::string text = sf_strerror(file_.get());
     if (text.starts_with("Error : ")) {
@@ -189,9 +199,22 @@ std::string SoundFile::trouble() const
     return text;
 }
 
+/// The length that an MP3 file states is right to a few frames.
+bool SoundFile::is_too_short() const
+{
+    return states_length_ && duration() &&
+           static_cast<double>(position_) / info_.samplerate + kMissing < *duration();
+}
+
 size_t SoundFile::read_pcm16(std::span<std::byte> bytes)
 {
     const size_t frame_bytes = format().frame_bytes();
+    if (info_.channels <= 2 && !is_decoded_to_float()) {
+        auto* const samples = reinterpret_cast<int16_t*>(bytes.data());
+        const auto all = static_cast<sf_count_t>(bytes.size() / frame_bytes);
+        return static_cast<size_t>(
+            std::max<sf_count_t>(sf_readf_short(file_.get(), samples, all), 0));
+    }
     size_t done = 0;
     const size_t frames = bytes.size() / frame_bytes;
     while (done < frames) {
@@ -211,20 +234,10 @@ size_t SoundFile::read_pcm16(std::span<std::byte> bytes)
 
 size_t SoundFile::read_floats(std::span<std::byte> bytes)
 {
-    const size_t frame_bytes = format().frame_bytes();
-    floats_.resize(kBlock * file_channels());
-    size_t done = 0;
-    for (const size_t frames = bytes.size() / frame_bytes; done < frames;) {
-        const auto wanted = static_cast<sf_count_t>(std::min(kBlock, frames - done));
-        const sf_count_t got = sf_readf_float(file_.get(), floats_.data(), wanted);
-        if (got <= 0) {
-            break;
-        }
-        const size_t count = static_cast<size_t>(got);
-        std::memcpy(bytes.data() + done * frame_bytes, floats_.data(), count * frame_bytes);
-        done += count;
-    }
-    return done;
+    auto* const samples = reinterpret_cast<float*>(bytes.data());
+    const auto frames = static_cast<sf_count_t>(bytes.size() / format().frame_bytes());
+    return static_cast<size_t>(
+        std::max<sf_count_t>(sf_readf_float(file_.get(), samples, frames), 0));
 }
 
 /// Reads frames of all channels into `samples_`.

@@ -40,6 +40,7 @@ private:
     };
 
     void check() const;
+    bool is_too_short() const;
     bool is_companded() const;
     bool is_decoded_to_float() const;
     void go_to(sf_count_t start);
@@ -50,7 +51,11 @@ private:
     std::unique_ptr<SNDFILE, Close> file_;
     SF_INFO info_ = {};
     Encoding encoding_ = Encoding::s16;
+    bool states_length_ = false; ///< in a tag that is not corrected to what is there
+    std::string cut_off_;        ///< why the file is not whole; empty when nothing is known of that
     uint64_t frames_left_ = UINT64_MAX;
+    uint64_t position_ = 0;        ///< frames from the start of the file
+    bool ended_ = false;           ///< before the section did
     std::vector<int16_t> samples_; ///< of all channels
     std::vector<float> floats_;
 };

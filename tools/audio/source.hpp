@@ -40,8 +40,8 @@ public:
     /// The form of the samples that read() gives.
     virtual StreamFormat format() const = 0;
 
-    /// Fills `bytes`, a whole number of frames. Returns the frames read: fewer only at the end.
-    /// Throws FileError.
+    /// Fills `bytes`, a whole number of frames at an address that is aligned for the samples.
+    /// Returns the frames read: fewer only at the end. Throws FileError.
     virtual size_t read(std::span<std::byte> bytes) = 0;
 
     /// Why the stream ended early; empty when there is no reason to doubt it.

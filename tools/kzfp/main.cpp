@@ -12,6 +12,7 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include "audio/decoder_messages.hpp"
 #include "kzfp/commands/table.hpp"
 #include "kzfp/output/write.hpp"
 
@@ -66,6 +67,7 @@ int main(int argc, char** argv)
     }
     std::signal(SIGPIPE, SIG_IGN); // a closed pipe shows as an error of write()
     std::signal(SIGXFSZ, SIG_IGN); // so does a limit on the size of files
+    audio::silence_decoders();
     try {
         return run_command(argc, argv);
     } catch (const OutputError& error) {

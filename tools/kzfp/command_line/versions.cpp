@@ -2,8 +2,7 @@
 
 #include "kzfp/command_line/versions.hpp"
 
-#include <sndfile.h>
-
+#include "audio/file_source.hpp"
 #include "kzcat.h"
 #include "kzsdk/abs/version.h"
 
@@ -12,7 +11,7 @@ namespace kzfp {
 std::string versions_text()
 {
     return std::string("kzfp " KZFP_VERSION " (libkzsdk ") + kzsdk_get_version() + ", libkzcat " +
-           kzcat_get_version() + ")\nreads sound with " + sf_version_string();
+           kzcat_get_version() + ")\nreads sound with " + audio::readers();
 }
 
 } // namespace kzfp

@@ -144,8 +144,7 @@ void Progress::show_line(size_t done, const std::string& file)
     const size_t taken = std::min(columns, before.size() + behind.size());
     const std::string name =
         cut(without_control_characters(file), std::max<size_t>(columns - taken, 8));
-    std::fputs(cut(before + name + behind, columns).c_str(), stderr);
-    std::fflush(stderr);
+    write_to_standard_error(cut(before + name + behind, columns));
     shown_ = true;
 }
 
@@ -161,13 +160,13 @@ void Progress::show_object(size_t done, const std::string& file) const
     if (const auto seconds = pace_.remaining(files_ - std::min(done, files_))) {
         object["remaining"] = to_milliseconds(*seconds);
     }
-    std::fputs(to_line(object).c_str(), stderr);
+    write_to_standard_error(to_line(object));
 }
 
 void Progress::clear()
 {
     if (shown_) {
-        std::fputs("\r\033[K", stderr);
+        write_to_standard_error("\r\033[K");
         shown_ = false;
     }
 }

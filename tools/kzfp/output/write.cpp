@@ -152,9 +152,23 @@ void write_output(const std::string& text)
     }
 }
 
+void write_to_standard_error(std::string_view text)
+{
+    while (!text.empty()) {
+        const ssize_t count = ::write(STDERR_FILENO, text.data(), text.size());
+        if (count < 0 && errno == EINTR) {
+            continue;
+        }
+        if (count <= 0) {
+            return; // there is no place left to complain at
+        }
+        text.remove_prefix(static_cast<size_t>(count));
+    }
+}
+
 void write_message(const std::string& line)
 {
-    std::fprintf(stderr, "%s\n", without_control_characters(line).c_str());
+    write_to_standard_error(without_control_characters(line) + '\n');
 }
 
 } // namespace kzfp

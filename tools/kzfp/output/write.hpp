@@ -5,6 +5,7 @@
 #include <span>
 #include <stdexcept>
 #include <string>
+#include <string_view>
 
 namespace kzfp {
 
@@ -53,6 +54,9 @@ void write_output(const std::string& text);
 
 /// What write_output() writes to.
 int output_descriptor();
+
+/// Writes to standard error, as it is.
+void write_to_standard_error(std::string_view text);
 
 /// Writes one line to standard error; control characters in it are shown as question marks.
 void write_message(const std::string& line);
