@@ -108,11 +108,14 @@ TEST_F(MatchReports, UndoTheSpeedOfAClip)
 TEST_F(MatchReports, ShowASetList)
 {
     std::vector<int16_t> mix = part(piece(2), 5, 20);
-    const std::vector<int16_t> more = part(piece(1), 2, 20);
-    mix.insert(mix.end(), more.begin(), more.end());
+    for (const uint64_t seed : {uint64_t{1}, uint64_t{2}}) {
+        const std::vector<int16_t> more = part(piece(seed), 2, 20);
+        mix.insert(mix.end(), more.begin(), more.end());
+    }
     const std::string page = page_of({"--all", scratch_->write("mix.wav", wav(mix))});
     EXPECT_TRUE(contains(page, "What ran when"));
-    EXPECT_EQ(6u, pictures_in(page, "picture"));
+    EXPECT_TRUE(contains(page, "two (2), 0:"));
+    EXPECT_EQ(9u, pictures_in(page, "picture"));
 }
 
 TEST_F(MatchReports, ShowWhatWasNotRecognised)

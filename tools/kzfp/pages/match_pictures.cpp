@@ -13,8 +13,9 @@ namespace kzfp {
 
 namespace {
 
-constexpr size_t kMostTracks = 12; ///< of a clip, that are laid against it
-constexpr double kAround = 5;      ///< seconds before and behind a passage of a long clip
+constexpr size_t kMostTracks = 12;   ///< of a clip, that are laid against it
+constexpr double kAround = 5;        ///< seconds before and behind a passage of a long clip
+constexpr double kValueSeconds = 60; ///< enough for 30 values and some silence before them
 
 /// What cannot be done is said on the page.
 void noting(report::MatchedClip& clip, const std::string& what, const std::function<void()>& work)
@@ -46,6 +47,11 @@ report::Sound sound_of(const ClipInput& input, const SoundOptions& options,
                                       part_of(options, part.begin, part.end - part.begin));
     sound.begin = part.begin;
     return sound;
+}
+
+double seconds_of(const report::Sound& sound)
+{
+    return static_cast<double>(sound.samples.size()) / std::max(1U, sound.rate);
 }
 
 report::Trails trails_for(const report::Sound& sound, const ClipInput& input,
@@ -89,8 +95,9 @@ public:
         }
         noting(clip_, name_text(found), [&] { lay(sound, found); });
         if (answer_.matches.size() < 2 && input_.kind == ClipKind::sound) {
-            add_track_sound(found, part, sound);
+            const double seconds = seconds_of(sound);
             add_clip_sound(std::move(sound), &found);
+            add_track_sound(found, part, seconds);
         }
     }
 
@@ -122,17 +129,31 @@ private:
         if (found != nullptr) {
             sound.matched = {.begin = start + found->clip_begin, .end = start + found->clip_end};
         }
-        clip_.sounds.insert(clip_.sounds.begin(), std::move(sound));
-        noting(clip_, name_of(input_), [&] {
-            if (const auto values = drawn_values(name_of(input_), input_.path, options_)) {
-                clip_.fingerprints.insert(clip_.fingerprints.begin(), *values);
+        clip_.sounds.push_back(std::move(sound));
+        const double begin = found == nullptr ? 0 : begin_of_values(*found);
+        add_values(name_of(input_), input_.path, part_of(options_, begin, kValueSeconds));
+    }
+
+    /// Two that begin alike are compared: with the passage, where the clip begins with other sound.
+    static double begin_of_values(const FoundTrack& found)
+    {
+        return found.clip_begin < 1 ? 0 : found.clip_begin;
+    }
+
+    /// The 30 values of what begins where a section does. A file that is too short has none.
+    void add_values(const std::string& name, const std::string& path, const SoundOptions& options)
+    {
+        const double begin = options.section.start;
+        const std::string place = begin == 0 ? "" : " from " + clock_text(begin);
+        noting(clip_, name, [&] {
+            if (const auto values = drawn_values(name + place, path, options)) {
+                clip_.fingerprints.push_back(*values);
             }
         });
     }
 
     /// The passage of the track that the clip lies on, when its file is at hand.
-    void add_track_sound(const FoundTrack& found, const report::Stretch& part,
-                         const report::Sound& sound)
+    void add_track_sound(const FoundTrack& found, const report::Stretch& part, double seconds)
     {
         const std::string name = found.title.value_or(found.source);
         if (!can_be_drawn(found.source)) {
@@ -141,23 +162,18 @@ private:
             return;
         }
         const double place = found.offset + part.begin * found.tempo;
-        const double seconds =
-            static_cast<double>(sound.samples.size()) / std::max(1U, sound.rate) * found.tempo;
         const SoundOptions passage =
-            part_of({}, std::max(0.0, place), seconds + std::min(0.0, place));
+            part_of({}, std::max(0.0, place), seconds * found.tempo + std::min(0.0, place));
         noting(clip_, name_text(found), [&] {
             report::Sound track = drawn_sound(name, found.source, passage);
             track.matched = {.begin = found.offset + found.clip_begin * found.tempo,
                              .end = found.offset + found.clip_end * found.tempo};
             clip_.sounds.push_back(std::move(track));
-            // Only the same sound has the same values: not what begins elsewhere.
-            const auto values = place >= 0 && part.begin == 0
-                                    ? drawn_values(name, found.source, passage)
-                                    : std::nullopt;
-            if (values) {
-                clip_.fingerprints.push_back(*values);
-            }
         });
+        const double begin = found.offset + begin_of_values(found) * found.tempo;
+        if (begin >= 0 && !clip_.fingerprints.empty()) {
+            add_values(name, found.source, part_of({}, begin, kValueSeconds));
+        }
     }
 
     report::MatchedClip& clip_;

@@ -3,6 +3,7 @@
 #include "kzfp/pages/match_report.hpp"
 
 #include <algorithm>
+#include <map>
 
 #include "kzfp/pages/match_pictures.hpp"
 #include "report/numbers.hpp"
@@ -111,12 +112,14 @@ report::Table tracks_of(const Answer& answer)
 void add_runs(report::MatchedClip& clip, const Answer& answer)
 {
     clip.time = {.begin = 0, .end = answer.seconds};
+    std::map<int64_t, uint32_t> times_run;
     for (const ClipPart& part : parts_of(answer)) {
         report::Run run = {.time = {.begin = part.begin, .end = part.end},
                            .kind = report::Run::Kind::unknown};
         if (part.found != nullptr) {
             run.kind = report::Run::Kind::track;
             run.name = part.found->title.value_or(part.found->source);
+            run.nth = ++times_run[part.found->track];
             run.details = "score " + report::number_text(part.found->score, 1);
         }
         clip.time.end = std::max(clip.time.end, part.end);
