@@ -8,7 +8,9 @@
 // Allocations by libsndfile's own code succeed: it writes through null when a header's buffer
 // cannot grow, which the program cannot prevent.
 //
-// It is called before the program's first line, so nothing here may need initialising.
+// It counts from the program's own start on, which is before its first line: some of the libraries
+// that it loads abort when they cannot start, which the program cannot prevent either. It is called
+// even before that, so nothing here may need initialising.
 
 // Checked forms of the functions that are replaced here would be defined twice.
 #undef _FORTIFY_SOURCE
@@ -30,6 +32,8 @@ void* __libc_realloc(void* block, size_t size);
 }
 
 namespace {
+
+bool started = false; ///< the libraries are there
 
 const char* setting(const char* name)
 {
@@ -55,7 +59,7 @@ void report()
 bool fails(const char* kind, long& count, int error)
 {
     const char* const nth = setting(kind);
-    if (nth == nullptr) {
+    if (nth == nullptr || !started) {
         return false;
     }
     const long at = std::strtol(nth, nullptr, 10);
@@ -85,9 +89,23 @@ bool allocation_fails(const void* caller)
 }
 bool read_fails() { return fails("KZ_FAIL_READ", reads, EIO); }
 
+using Main = int (*)(int, char**, char**);
+using Start = int (*)(Main, int, char**, void (*)(), void (*)(), void (*)(), void*);
+
 } // namespace
 
 extern "C" {
+
+/// Comes after the constructors of all libraries, and before those of the program.
+int __libc_start_main(Main main, int argc, char** argv, void (*init)(), void (*fini)(),
+                      void (*end_of_loader)(), void* stack)
+{
+    Start start = nullptr;
+    void* const next = ::dlsym(RTLD_NEXT, "__libc_start_main");
+    std::memcpy(&start, &next, sizeof start);
+    started = true;
+    return start(main, argc, argv, init, fini, end_of_loader, stack);
+}
 
 void* malloc(size_t size)
 {
