@@ -97,13 +97,28 @@ void name_windows(const std::string& name, const FingerprintOptions& options)
     }
 }
 
-/// A sound file in a pipe is copied to its end first; headerless sound is taken as it comes.
+/// A sound file in a pipe is copied to its end first; headerless sound is taken as it comes. What
+/// has arrived is looked at again and again, since a pipe without sound is not copied for ever.
+audio::OpenedInput open_whole(audio::Input& input)
+{
+    for (bool more = true; more;) {
+        try {
+            static_cast<void>(input.open());
+            more = input.extend();
+        } catch (const audio::FileError&) {
+            if (!input.extend()) {
+                throw;
+            }
+        }
+    }
+    return input.open();
+}
+
+/// Writes each window as soon as it is complete.
 void take_every(const std::string& name, const FingerprintOptions& options, Outcome& outcome)
 {
     audio::Input input(name, options.request);
-    while (input.extend()) {
-    }
-    const audio::OpenedInput opened = input.open();
+    const audio::OpenedInput opened = open_whole(input);
     note_conversion(outcome, options, opened.facts.rate);
     name_windows(name, options);
     const FingerprintForm form = form_of(options);
