@@ -34,7 +34,10 @@ std::string printed(const char* format, Numbers... numbers)
 }
 
 /// A single band that holds everything wraps to -32768.
-double share(int16_t value) { return (value < 0 ? value + 65536.0 : static_cast<double>(value)) / 32768.0; }
+double share(int16_t value)
+{
+    return (value < 0 ? value + 65536.0 : static_cast<double>(value)) / 32768.0;
+}
 
 double largest_share(Values values)
 {
