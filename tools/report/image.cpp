@@ -13,6 +13,7 @@ namespace report {
 namespace {
 
 constexpr uint32_t kSteps = 32;
+constexpr size_t kPaletteBytes = 128; ///< red, green, blue and ink of each
 
 struct Colour {
     uint8_t red;
@@ -23,11 +24,12 @@ struct Colour {
 constexpr Colour kBlue = {.red = 0x0C, .green = 0x36, .blue = 0x78};
 constexpr Colour kOrange = {.red = 0xB4, .green = 0x46, .blue = 0x00};
 
-std::array<uint8_t, kSteps * 4> palette_of(Ink ink)
+std::array<uint8_t, kPaletteBytes> palette_of(Ink ink)
 {
     const Colour colour = ink == Ink::blue ? kBlue : kOrange;
-    std::array<uint8_t, kSteps* 4> palette = {};
-    for (uint32_t i = 0; i < kSteps; ++i) {
+    static_assert(kPaletteBytes == size_t{kSteps} * 4);
+    std::array<uint8_t, kPaletteBytes> palette = {};
+    for (size_t i = 0; i < kSteps; ++i) {
         palette[4 * i] = colour.red;
         palette[4 * i + 1] = colour.green;
         palette[4 * i + 2] = colour.blue;

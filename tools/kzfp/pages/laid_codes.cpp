@@ -59,8 +59,7 @@ private:
 
     std::vector<uint64_t> codes_after(std::span<const float> samples) const
     {
-        const kzcat_format format = {
-            .format = KZ_STREAM_FORMAT_FLOAT32, .sample_rate = rate_, .channels = 1, .reserved = 0};
+        const kzcat_format format = {KZ_STREAM_FORMAT_FLOAT32, rate_, 1, 0};
         const auto builder = made<Builder>(kzcat_builder_create, &format,
                                            static_cast<const kzcat_builder_settings*>(nullptr));
         check(kzcat_builder_feed(builder.get(), samples.data(), samples.size_bytes()));

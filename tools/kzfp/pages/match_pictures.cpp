@@ -219,7 +219,7 @@ void add_pictures(report::MatchedClip& clip, const Answer& answer, const ClipInp
         return;
     }
     if (!can_be_drawn(input.path)) {
-        clip.notes.push_back("There are no pictures: what comes through a pipe is read once.");
+        clip.notes.emplace_back("There are no pictures: what comes through a pipe is read once.");
         return;
     }
     Pictures pictures(clip, answer, input, options, catalogue);
