@@ -62,7 +62,7 @@ MatchAnswer recognise_one(WindowSearch& search, const MatchOptions& options)
     return answer;
 }
 
-MatchAnswer recognise_source(Source& source, Searcher& searcher, const MatchOptions& options)
+MatchAnswer recognise_source(ClipSource& source, Searcher& searcher, const MatchOptions& options)
 {
     WindowSearch search(source, searcher, options);
     return options.passages ? recognise_passages(search, options) : recognise_one(search, options);

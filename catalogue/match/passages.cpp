@@ -38,19 +38,19 @@ struct Passage {
     Hit hit;
     size_t first;          ///< window
     size_t last;           ///< window
-    Alignment first_place; ///< of the track, as each of these windows has it: over a long passage a
-    Alignment last_place;  ///< small error of the tempo adds up
+    Placement first_place; ///< of the track, as each of these windows has it: over a long passage a
+    Placement last_place;  ///< small error of the tempo adds up
 };
 
 /// Whether the track goes on in another window; its place there, if so.
-std::optional<Alignment> place_in(WindowSearch& search, const Hit& hit, const Alignment& expected,
+std::optional<Placement> place_in(WindowSearch& search, const Hit& hit, const Placement& expected,
                                   size_t window)
 {
     const TrackScore score = search.score_near(window, hit.track, expected, kNearby);
     if (!score.found || score.score < kGoesOn) {
         return std::nullopt;
     }
-    Alignment place = expected;
+    Placement place = expected;
     place.offset = search.offset_of(window, expected, score);
     return place;
 }
@@ -78,7 +78,7 @@ bool came_before(WindowSearch& search, Passage& passage)
 
 Passage passage_of(WindowSearch& search, const Hit& hit)
 {
-    const Alignment place = search.align(hit);
+    const Placement place = search.align(hit);
     const size_t window = hit.attempt->window;
     return {.hit = hit, .first = window, .last = window, .first_place = place, .last_place = place};
 }
@@ -156,9 +156,9 @@ struct Extent {
     double end;
 };
 
-Extent extent_of(WindowSearch& search, int64_t track, const Alignment& place, size_t window)
+Extent extent_of(WindowSearch& search, int64_t track, const Placement& place, size_t window)
 {
-    Source& source = search.source();
+    ClipSource& source = search.source();
     const size_t first = window > 0 ? window - 1 : 0;
     const size_t end = std::min(window + 2, source.windows());
     const Reading reading = source.read_windows(first, end - first, place.hypothesis);
@@ -250,7 +250,7 @@ double pooled_score(WindowSearch& search, const Hit& hit)
     const size_t first = std::min(own - std::min(own, kPooledWindows / 2),
                                   windows - std::min(windows, kPooledWindows));
     const size_t end = std::min(first + kPooledWindows, windows);
-    const Alignment place = coarse_alignment(hit.attempt->reading, hit.score);
+    const Placement place = coarse_alignment(hit.attempt->reading, hit.score);
     double sum = 0;
     for (size_t window = first; window < end; ++window) {
         const TrackScore here =

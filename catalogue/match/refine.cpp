@@ -222,7 +222,7 @@ double reported_pitch(double pitch, double stretch)
 
 } // namespace
 
-Alignment coarse_alignment(const Reading& reading, const TrackScore& score)
+Placement coarse_alignment(const Reading& reading, const TrackScore& score)
 {
     const Sequence& sequence = reading.sequences[score.phase];
     return {.hypothesis = reading.hypothesis,
@@ -232,10 +232,10 @@ Alignment coarse_alignment(const Reading& reading, const TrackScore& score)
             .agreement = 0};
 }
 
-Alignment refined_alignment(QueryReader& reader, std::span<const Code> track,
+Placement refined_alignment(QueryReader& reader, std::span<const Code> track,
                             const Reading& reading, const TrackScore& score)
 {
-    const Alignment coarse = coarse_alignment(reading, score);
+    const Placement coarse = coarse_alignment(reading, score);
     Refiner refiner(reader, track);
     Hypothesis best = reading.hypothesis;
     Stretched stretched =
@@ -245,7 +245,7 @@ Alignment refined_alignment(QueryReader& reader, std::span<const Code> track,
     const double middle = stretched.fit.middle;
     const Pitched pitched = best_pitch(refiner, best, middle);
     best.pitch_steps = pitched.steps;
-    Alignment result{.hypothesis = best, .offset = 0, .stretch = stretched.interpolated};
+    Placement result{.hypothesis = best, .offset = 0, .stretch = stretched.interpolated};
     Fit fit = pitched.fit;
     const Fit same_tempo = refiner.fit({.pitch_steps = best.pitch_steps}, middle);
     if (std::fabs(result.stretch - 1) < kUnchanged ||

@@ -10,7 +10,7 @@
 namespace kzcat {
 
 /// Where a clip lies in a track and how it was changed.
-struct Alignment {
+struct Placement {
     Hypothesis hypothesis; ///< of the reading that fits best
     double offset = 0;     ///< seconds of the track at which the clip begins
     double stretch = 1;    ///< the clip runs this much faster
@@ -19,11 +19,11 @@ struct Alignment {
 };
 
 /// What a score says of the place: to the nearest phase and hypothesis.
-Alignment coarse_alignment(const Reading& reading, const TrackScore& score);
+Placement coarse_alignment(const Reading& reading, const TrackScore& score);
 
 /// Tries stretches up to 7 % and pitches one fine band around what was found, at places up to half
 /// a second around it, and interpolates between the best and its neighbours.
-Alignment refined_alignment(QueryReader& reader, std::span<const Code> track,
+Placement refined_alignment(QueryReader& reader, std::span<const Code> track,
                             const Reading& reading, const TrackScore& score);
 
 } // namespace kzcat

@@ -31,7 +31,7 @@ bool says_enough(const Reading& reading)
 }
 
 /// Of the first window; the others are as long.
-double window_seconds(const Source& source)
+double window_seconds(const ClipSource& source)
 {
     return source.windows() == 0 ? 0.0 : source.end(0) - source.begin(0);
 }
@@ -70,7 +70,7 @@ void Hits::take(const Hits& others)
 
 void Hits::sort() { std::sort(hits_.begin(), hits_.end(), comes_first); }
 
-WindowSearch::WindowSearch(Source& source, Searcher& searcher, const MatchOptions& options)
+WindowSearch::WindowSearch(ClipSource& source, Searcher& searcher, const MatchOptions& options)
     : source_(source), searcher_(searcher), speeds_(options.speeds && source.adjustable()),
       threshold_(threshold_for(searcher.code_count(), source.windows(), window_seconds(source)))
 {
@@ -135,7 +135,7 @@ void WindowSearch::score_found(Searcher& searcher, const Attempt& attempt, size_
     hits.sort();
 }
 
-TrackScore WindowSearch::score_near(size_t window, int64_t track, const Alignment& alignment,
+TrackScore WindowSearch::score_near(size_t window, int64_t track, const Placement& alignment,
                                     int64_t codes)
 {
     const Attempt* here = attempt(window, alignment.hypothesis);
@@ -144,13 +144,13 @@ TrackScore WindowSearch::score_near(size_t window, int64_t track, const Alignmen
                : here->scorer.score_near(searcher_.codes(track), alignment.offset, codes);
 }
 
-double WindowSearch::offset_of(size_t window, const Alignment& alignment, const TrackScore& score)
+double WindowSearch::offset_of(size_t window, const Placement& alignment, const TrackScore& score)
 {
     const Attempt* here = attempt(window, alignment.hypothesis);
     return here == nullptr ? alignment.offset : coarse_alignment(here->reading, score).offset;
 }
 
-Alignment WindowSearch::align(const Hit& hit)
+Placement WindowSearch::align(const Hit& hit)
 {
     if (hit.margin() < -kUnsureBelow) {
         return coarse_alignment(hit.attempt->reading, hit.score);
@@ -160,7 +160,7 @@ Alignment WindowSearch::align(const Hit& hit)
             return known.alignment;
         }
     }
-    const Alignment alignment = source_.align(hit.attempt->window, searcher_.codes(hit.track),
+    const Placement alignment = source_.align(hit.attempt->window, searcher_.codes(hit.track),
                                               hit.attempt->reading, hit.score);
     aligned_.push_back({.attempt = hit.attempt, .track = hit.track, .alignment = alignment});
     return alignment;
@@ -176,7 +176,7 @@ void WindowSearch::keep(std::span<const Attempt* const> used)
     std::erase_if(attempts_, [&](const auto& one) { return is_unused(one.get()); });
 }
 
-TrackMatch WindowSearch::describe(const Hit& hit, const Alignment& alignment) const
+TrackMatch WindowSearch::describe(const Hit& hit, const Placement& alignment) const
 {
     TrackMatch match{.track = hit.track,
                      .score = hit.score.score,

@@ -68,38 +68,38 @@ struct WindowHits {
 class WindowSearch {
 public:
     /// All of them have to outlive the search, and the search what it finds.
-    WindowSearch(Source& source, Searcher& searcher, const MatchOptions& options);
+    WindowSearch(ClipSource& source, Searcher& searcher, const MatchOptions& options);
 
     /// Reads the window as it is and, if `further` is wanted and that left doubts, at other speeds.
     /// When nothing reaches its threshold the searcher's thorough one is asked as well.
     WindowHits search(size_t window, bool further);
 
     /// The score of a reading of a window near a place of a track, no more than so many codes away.
-    TrackScore score_near(size_t window, int64_t track, const Alignment& alignment, int64_t codes);
+    TrackScore score_near(size_t window, int64_t track, const Placement& alignment, int64_t codes);
 
     /// Seconds of the track at which the clip begins, by such a score.
-    double offset_of(size_t window, const Alignment& alignment, const TrackScore& score);
+    double offset_of(size_t window, const Placement& alignment, const TrackScore& score);
 
-    TrackMatch describe(const Hit& hit, const Alignment& alignment) const;
+    TrackMatch describe(const Hit& hit, const Placement& alignment) const;
 
     /// The verdict on what was found, the best tracks whatever their score, and the runner-up.
     MatchAnswer summary(const WindowHits& found, const MatchOptions& options);
 
     /// Where a hit lies: exact when it matches or nearly so.
-    Alignment align(const Hit& hit);
+    Placement align(const Hit& hit);
 
     /// Frees the attempts that are not among these; no hit may have them any more.
     void keep(std::span<const Attempt* const> used);
 
     std::span<const Code> codes(int64_t track) { return searcher_.codes(track); }
-    Source& source() { return source_; }
+    ClipSource& source() { return source_; }
 
 private:
     const Attempt* attempt(size_t window, const Hypothesis& hypothesis);
     void search_in(Searcher& searcher, size_t window, bool further, WindowHits& found);
     void score_found(Searcher& searcher, const Attempt& attempt, size_t limit, Hits& hits);
 
-    Source& source_;
+    ClipSource& source_;
     Searcher& searcher_;
     bool speeds_;
     double threshold_;
@@ -107,7 +107,7 @@ private:
     struct Aligned {
         const Attempt* attempt;
         int64_t track;
-        Alignment alignment;
+        Placement alignment;
     };
     std::vector<Aligned> aligned_; ///< what was asked before
 };

@@ -36,7 +36,7 @@ Window joined(std::span<const Window> windows)
             .count = last.first + last.count - windows.front().first};
 }
 
-class BandsSource final : public Source {
+class BandsSource final : public ClipSource {
 public:
     explicit BandsSource(const QueryBands& bands) : bands_(bands)
     {
@@ -58,7 +58,7 @@ public:
             .read(hypothesis);
     }
     void release(size_t window) override { readers_[window].release(); }
-    Alignment align(size_t window, std::span<const Code> track, const Reading& reading,
+    Placement align(size_t window, std::span<const Code> track, const Reading& reading,
                     const TrackScore& score) override
     {
         return refined_alignment(readers_[window], track, reading, score);
@@ -83,7 +83,7 @@ private:
     std::vector<QueryReader> readers_;
 };
 
-class TrailSource final : public Source {
+class TrailSource final : public ClipSource {
 public:
     explicit TrailSource(const Trail& trail)
         : trail_(trail), windows_(windows_of(trail.codes.size(), kLongestWindow, 0))
@@ -100,7 +100,7 @@ public:
         return read_window(joined(std::span(windows_).subspan(first, count)), hypothesis);
     }
     void release(size_t) override {}
-    Alignment align(size_t, std::span<const Code>, const Reading& reading,
+    Placement align(size_t, std::span<const Code>, const Reading& reading,
                     const TrackScore& score) override
     {
         return coarse_alignment(reading, score);
@@ -135,12 +135,12 @@ private:
 
 } // namespace
 
-std::unique_ptr<Source> source_of(const QueryBands& bands)
+std::unique_ptr<ClipSource> source_of(const QueryBands& bands)
 {
     return std::make_unique<BandsSource>(bands);
 }
 
-std::unique_ptr<Source> source_of(const Trail& trail)
+std::unique_ptr<ClipSource> source_of(const Trail& trail)
 {
     return std::make_unique<TrailSource>(trail);
 }

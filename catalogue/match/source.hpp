@@ -15,9 +15,9 @@
 
 namespace kzcat {
 
-class Source {
+class ClipSource {
 public:
-    virtual ~Source() = default;
+    virtual ~ClipSource() = default;
 
     virtual size_t windows() const = 0;
 
@@ -33,7 +33,7 @@ public:
     virtual void release(size_t window) = 0;
 
     /// Where and how a window lies in a track in which it was found.
-    virtual Alignment align(size_t window, std::span<const Code> track, const Reading& reading,
+    virtual Placement align(size_t window, std::span<const Code> track, const Reading& reading,
                             const TrackScore& score) = 0;
 
     /// Seconds of the clip that a window begins and ends at.
@@ -45,7 +45,7 @@ public:
 };
 
 /// The bands or the trail have to outlive what is made of them.
-std::unique_ptr<Source> source_of(const QueryBands& bands);
-std::unique_ptr<Source> source_of(const Trail& trail);
+std::unique_ptr<ClipSource> source_of(const QueryBands& bands);
+std::unique_ptr<ClipSource> source_of(const Trail& trail);
 
 } // namespace kzcat
