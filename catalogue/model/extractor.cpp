@@ -163,12 +163,17 @@ void QueryExtractor::feed(std::span<const std::byte> bytes)
         bytes, [this](Frame frame) { state_->add(frame); }, [](std::span<const float>) {});
 }
 
+QueryBands QueryExtractor::take()
+{
+    state_->bands.samples = state_->feeder.samples();
+    return std::exchange(state_->bands, {});
+}
+
 QueryBands QueryExtractor::finish()
 {
     require_open(state_->ended);
     state_->ended = true;
-    state_->bands.samples = state_->feeder.samples();
-    return std::move(state_->bands);
+    return take();
 }
 
 } // namespace kzcat

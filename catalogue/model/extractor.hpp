@@ -62,6 +62,11 @@ public:
 
     void feed(std::span<const std::byte> bytes);
 
+    /// The bands of the frames that are complete, oldest first; each is given once, so that memory
+    /// does not grow with the stream. `samples` are all that were heard so far. finish() then gives
+    /// the rest.
+    QueryBands take();
+
     /// Ends the stream.
     QueryBands finish();
 
