@@ -56,25 +56,6 @@ uint32_t to_number(Verdict verdict)
     return KZCAT_VERDICT_TOO_QUIET;
 }
 
-/// What people call a track, from its tags.
-void add_names(Store& store, kzcat_found& found)
-{
-    const auto info = store.find_track(found.record.track);
-    if (!info) {
-        return; // removed meanwhile
-    }
-    if (!info->sources.empty()) {
-        found.source = info->sources.front().uri;
-    }
-    for (const Tag& tag : info->tags) {
-        if (tag.name == "title" && !found.title) {
-            found.title = tag.value;
-        } else if (tag.name == "artist" && !found.artist) {
-            found.artist = tag.value;
-        }
-    }
-}
-
 kzcat_found to_found(const TrackMatch& match)
 {
     kzcat_found found;
@@ -116,7 +97,7 @@ std::vector<kzcat_found> to_found(Catalogue& catalogue, const std::vector<Match>
     }
     catalogue.with_store([&](Store& store) {
         for (kzcat_found& found : all) {
-            add_names(store, found);
+            found.names = names_of(store, found.record.track);
         }
     });
     return all;
@@ -159,9 +140,9 @@ void look_up(Catalogue& catalogue, const kzcat_query& query, const MatchOptions&
 kzcat_match record_of(const kzcat_found& found)
 {
     kzcat_match record = found.record;
-    record.source = found.source.c_str();
-    record.title = found.title ? found.title->c_str() : nullptr;
-    record.artist = found.artist ? found.artist->c_str() : nullptr;
+    record.source = found.names.source.c_str();
+    record.title = found.names.title ? found.names.title->c_str() : nullptr;
+    record.artist = found.names.artist ? found.names.artist->c_str() : nullptr;
     return record;
 }
 
@@ -183,6 +164,26 @@ kzcat_status give_match(const kzcat_result* result, std::vector<kzcat_found> kzc
 }
 
 } // namespace
+
+kzcat_names kzcat::names_of(Store& store, int64_t track)
+{
+    kzcat_names names;
+    const auto info = store.find_track(track);
+    if (!info) {
+        return names; // removed meanwhile
+    }
+    if (!info->sources.empty()) {
+        names.source = info->sources.front().uri;
+    }
+    for (const Tag& tag : info->tags) {
+        if (tag.name == "title" && !names.title) {
+            names.title = tag.value;
+        } else if (tag.name == "artist" && !names.artist) {
+            names.artist = tag.value;
+        }
+    }
+    return names;
+}
 
 kzcat_status kzcat_query_create(const kzcat_format* format, kzcat_query** out_query) noexcept
 {

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <deque>
 #include <memory>
 #include <optional>
 #include <span>
@@ -14,6 +15,7 @@
 #include "catalogue/catalogue.hpp"
 #include "catalogue/failure.hpp"
 #include "catalogue/model/extractor.hpp"
+#include "catalogue/monitor/monitor.hpp"
 #include "kzcat.h"
 
 struct kzcat_catalogue {
@@ -43,12 +45,17 @@ struct kzcat_query {
     bool broken = false;                            ///< sound may have been lost
 };
 
+/// What people call a track.
+struct kzcat_names {
+    std::string source; ///< empty when the track has gone
+    std::optional<std::string> title;
+    std::optional<std::string> artist;
+};
+
 /// A match with the texts that its record points to.
 struct kzcat_found {
     kzcat_match record{};
-    std::string source;
-    std::optional<std::string> title;
-    std::optional<std::string> artist;
+    kzcat_names names;
 };
 
 struct kzcat_result {
@@ -57,7 +64,28 @@ struct kzcat_result {
     std::vector<kzcat_found> candidates;
 };
 
+struct kzcat_monitor {
+    kzcat_monitor(const kzcat::SoundFormat& format, const kzcat::MonitorOptions& options)
+        : whole(format, options)
+    {
+    }
+
+    struct Event {
+        kzcat::MonitorEvent event;
+        kzcat_names names;
+    };
+
+    kzcat::Monitor whole;
+    enum { taking, broken, finished } state = taking;
+    std::deque<Event> events; ///< with names; those of `whole` have none yet
+    Event taken;              ///< the caller has its texts
+    kzcat_names names;        ///< of the track that was heard last
+};
+
 namespace kzcat {
+
+/// Reads the names of a track from its tags; empty ones when there is no such track.
+kzcat_names names_of(Store& store, int64_t track);
 
 /// Checks the place for a handle and clears it, so that it is null whatever fails later.
 template <class Handle>

@@ -44,13 +44,13 @@
  *
  * Threads and processes. A catalogue handle may be used by any number of threads at once:
  * recognising runs in parallel, everything else takes turns. A query that was finished, a trail, a
- * track and a result never change and may be shared; a builder and an unfinished query belong to
- * one thread at a time. No handle may be in use while it is freed. Any number of processes may have
- * a catalogue file open; one of them writes at a time, and the others go on reading. A second
- * writer waits up to 10 s before it fails with KZCAT_ERROR_BUSY. A handle sees what others have
- * added or removed from its next call on. There is one exception: when another handle or process
- * gives a track that is there what answers documents, this one sees it after it was opened again.
- * Do not use a handle across fork().
+ * track and a result never change and may be shared; a builder, a monitor and an unfinished query
+ * belong to one thread at a time. No handle may be in use while it is freed. Any number of
+ * processes may have a catalogue file open; one of them writes at a time, and the others go on
+ * reading. A second writer waits up to 10 s before it fails with KZCAT_ERROR_BUSY. A handle sees
+ * what others have added or removed from its next call on. There is one exception: when another
+ * handle or process gives a track that is there what answers documents, this one sees it after it
+ * was opened again. Do not use a handle across fork().
  *
  * Failures. Every call that can fail returns a kzcat_status, and whatever fails has changed nothing
  * in the catalogue. kzcat_get_error_text() then has a sentence about this very failure, with what
@@ -163,6 +163,8 @@ typedef struct kzcat_query kzcat_query;
 typedef struct kzcat_result kzcat_result;
 /** A track of a catalogue with its tags and sources. Opaque. */
 typedef struct kzcat_track kzcat_track;
+/** A stream that is followed. Opaque. */
+typedef struct kzcat_monitor kzcat_monitor;
 
 /**
  * How far a long call is; called by the thread that made the call.
@@ -850,6 +852,161 @@ KZ_API kzcat_status kzcat_result_get_candidate(const kzcat_result* result, uint6
  *         null.
  */
 KZ_API kzcat_status kzcat_result_free(kzcat_result** result_ref) KZ_NOEXCEPT;
+
+/* ---- Monitoring a stream --------------------------------------------------------------------- */
+
+/** What an entry of a timeline is about. */
+enum {
+    KZCAT_HEARD_TRACK = 1,  /**< a track of the catalogue */
+    KZCAT_HEARD_GAP = 2,    /**< sound that was not recognised */
+    KZCAT_HEARD_SILENCE = 3 /**< silence, or sound that was missing */
+};
+
+/** What an event says about an entry of the timeline. */
+enum {
+    KZCAT_STAGE_BEGINS = 1,  /**< it has begun */
+    KZCAT_STAGE_GOES_ON = 2, /**< it still goes on */
+    KZCAT_STAGE_ENDS = 3     /**< it has ended; nothing more is reported about it */
+};
+
+/** How a stream is followed; filled by kzcat_initialize_monitor_options(). */
+typedef struct kzcat_monitor_options {
+    double silence_level;  /**< what is below this is silence: decibels, -120 to 0, of a sine at
+                                full scale; -60 at first */
+    double least_silence;  /**< seconds, 0.5 to 3600: shorter silences are not reported;
+                                2 at first */
+    double least_gap;      /**< seconds, 0 to 3600: shorter gaps are not reported; 2 at first */
+    double report_every;   /**< seconds between events that an entry goes on, 0 to 1e9; 0
+                                (at first): none */
+    uint32_t speeds;       /**< 1 (at first): tracks may be played at other speeds, tempi and
+                                pitches, up to 6 % either way; 0: only as they are, which is faster
+                                where nothing is recognised */
+    uint32_t reserved[11]; /**< 0 */
+} kzcat_monitor_options;
+
+/**
+ * Fills options with what is usual.
+ *
+ * @return 0; KZCAT_ERROR_INVALID_ARGUMENT when @p options is null.
+ */
+KZ_API kzcat_status kzcat_initialize_monitor_options(kzcat_monitor_options* options) KZ_NOEXCEPT;
+
+/** Something that was noticed about a stream. All times are seconds of the stream. */
+typedef struct kzcat_event {
+    uint32_t stage;     /**< one of KZCAT_STAGE_... */
+    uint32_t heard;     /**< one of KZCAT_HEARD_... */
+    double begin;       /**< when the entry began */
+    double end;         /**< when it ended, or up to when it is known to go on */
+    double known;       /**< how much of the stream had been fed when this was noticed */
+    int64_t track;      /**< its id; this and all that follows is 0 or null unless a track is
+                             heard */
+    const char* source; /**< the path as it was added first; empty when the track has gone since */
+    const char* title;  /**< null when there is none */
+    const char* artist; /**< null when there is none */
+    double score;       /**< how sure, when it was recognised: as in kzcat_match */
+    double threshold;   /**< that this score had to reach */
+    double place_begin; /**< seconds of the track that are heard at @c begin */
+    double place_end;   /**< and at @c end */
+    double speed;       /**< as in kzcat_match */
+    double tempo;       /**< as in kzcat_match */
+    double pitch;       /**< as in kzcat_match */
+    uint64_t repeat;    /**< how often this monitor had heard the track before this entry */
+    uint32_t reserved[8]; /**< 0 */
+} kzcat_event;
+
+/**
+ * Creates a monitor: a running stream in, a timeline of what ran from when to when out.
+ *
+ *     kzcat_monitor_create(&format, NULL, &monitor);
+ *     while (bytes are at hand) {
+ *         kzcat_monitor_feed(monitor, catalogue, bytes, byte_count);
+ *         while (kzcat_monitor_next_event(monitor, &event) == KZCAT_OK) {
+ *             ...
+ *         }
+ *     }
+ *     kzcat_monitor_finish(monitor, catalogue);          and the last events
+ *
+ * A track is reported 5 to 24 s after it has begun, the sooner the clearer it is; that it has ended
+ * up to 24 s later, at once when it has run to its end or another one has begun; gaps and silences
+ * 24 s after they have begun. The times in the events are exact to about a second all the same. A
+ * track goes on when it was not heard for up to 18 s and then is where it would be. One that is
+ * faded in begins before the last one has ended.
+ *
+ * Every stretch of the stream is in one entry, but for gaps that are too short to report and for
+ * the overlap of tracks. The same bytes have the same events, however they are cut, as long as the
+ * catalogue does not change.
+ *
+ * Memory: about 2 MB, and some bytes for each track that was heard, however long the stream is.
+ *
+ * @param format   Of the samples; read only during the call.
+ * @param options  Null for what is usual; read only during the call.
+ * @param[out] out_monitor  Freed by the caller with kzcat_monitor_free(); null on failure.
+ * @return 0; KZCAT_ERROR_INVALID_ARGUMENT, KZCAT_ERROR_FORMAT or KZCAT_ERROR_MEMORY.
+ */
+KZ_API kzcat_status kzcat_monitor_create(const kzcat_format* format,
+                                         const kzcat_monitor_options* options,
+                                         kzcat_monitor** out_monitor) KZ_NOEXCEPT;
+
+/**
+ * Feeds what follows, any number of bytes, cut anywhere, and looks it up: every 4.6 s of sound that
+ * takes as long as a kzcat_recognise(), or much less while a known track goes on. Tracks that are
+ * added to the catalogue meanwhile are found from then on.
+ *
+ * @param catalogue   In which tracks are looked up; it may be another handle each time, of the same
+ *                    catalogue.
+ * @param bytes       At any address; read only during the call. May be null when there are 0.
+ * @param byte_count  Of @p bytes.
+ * @return 0; KZCAT_ERROR_INVALID_ARGUMENT; KZCAT_ERROR_ORDER after kzcat_monitor_finish();
+ *         KZCAT_ERROR_BUSY, KZCAT_ERROR_DAMAGED, KZCAT_ERROR_OTHER_PROFILE or KZCAT_ERROR_FAILED
+ *         when the catalogue could not be read: all bytes were taken, and the stream is looked up
+ *         again with the next call; KZCAT_ERROR_MEMORY: sound may then be lost, so every later feed
+ *         and finish fails too.
+ */
+KZ_API kzcat_status kzcat_monitor_feed(kzcat_monitor* monitor, kzcat_catalogue* catalogue,
+                                       const void* bytes, uint64_t byte_count) KZ_NOEXCEPT;
+
+/**
+ * Changes the format of what is fed from now on, as when a station switches from stereo to mono.
+ * The timeline goes on. Bytes of an unfinished frame are left out.
+ *
+ * @return As kzcat_monitor_feed(); KZCAT_ERROR_FORMAT, and then the format is as before.
+ */
+KZ_API kzcat_status kzcat_monitor_set_format(kzcat_monitor* monitor, kzcat_catalogue* catalogue,
+                                             const kzcat_format* format) KZ_NOEXCEPT;
+
+/**
+ * Leaves out a part of the stream that was lost, so that times stay right. It is taken for silence.
+ *
+ * @param seconds  0 to 86400; call again for more.
+ * @return As kzcat_monitor_feed().
+ */
+KZ_API kzcat_status kzcat_monitor_skip(kzcat_monitor* monitor, kzcat_catalogue* catalogue,
+                                       double seconds) KZ_NOEXCEPT;
+
+/**
+ * Ends the stream, and with it what is going on. Its events stay until they are taken.
+ *
+ * @return As kzcat_monitor_feed(). When the catalogue could not be read it may be called again.
+ */
+KZ_API kzcat_status kzcat_monitor_finish(kzcat_monitor* monitor,
+                                         kzcat_catalogue* catalogue) KZ_NOEXCEPT;
+
+/**
+ * Takes the oldest event that was not taken yet. Entries begin in the order of time.
+ *
+ * @param[out] out_event  Its texts stay until the next call with this monitor.
+ * @return 0; KZCAT_ERROR_NOT_FOUND when there is none now; KZCAT_ERROR_INVALID_ARGUMENT.
+ */
+KZ_API kzcat_status kzcat_monitor_next_event(kzcat_monitor* monitor,
+                                             kzcat_event* out_event) KZ_NOEXCEPT;
+
+/**
+ * Frees a monitor, finished or not, and sets the caller's pointer to null.
+ *
+ * @return 0, also when *monitor_ref is null; KZCAT_ERROR_INVALID_ARGUMENT when @p monitor_ref is
+ *         null.
+ */
+KZ_API kzcat_status kzcat_monitor_free(kzcat_monitor** monitor_ref) KZ_NOEXCEPT;
 
 /* ---- Care ------------------------------------------------------------------------------------ */
 

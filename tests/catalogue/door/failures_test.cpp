@@ -238,6 +238,51 @@ TEST_F(DoorFailures, AreReportedByRecognising)
     }
 }
 
+TEST_F(DoorFailures, AreReportedByMonitors)
+{
+    const auto samples = piece(1, 5);
+    const Catalogue catalogue = open_memory();
+    add(catalogue.get(), trail_of(samples).get(), "one");
+    kzcat_monitor_options options;
+    kzcat_initialize_monitor_options(&options);
+    options.speeds = 0;
+    const auto attempt = [&]() -> kzcat_status {
+        const auto monitor = make<Monitor>(kzcat_monitor_create, &kFormat,
+                                           static_cast<const kzcat_monitor_options*>(&options));
+        if (monitor.status != KZCAT_OK) {
+            EXPECT_EQ(nullptr, monitor.handle);
+            return monitor.status;
+        }
+        kzcat_status status = kzcat_monitor_feed(monitor.handle.get(), catalogue.get(),
+                                                 samples.data(), samples.size() * 2);
+        status = status == KZCAT_OK ? kzcat_monitor_finish(monitor.handle.get(), catalogue.get())
+                                    : status;
+        if (status != KZCAT_OK) {
+            EXPECT_EQ(KZCAT_ERROR_MEMORY,
+                      kzcat_monitor_feed(monitor.handle.get(), catalogue.get(), "ab", 2))
+                << "sound may be lost, so it must not go on";
+        }
+        return status;
+    };
+    ASSERT_EQ(KZCAT_OK, attempt()); // the index stays in memory from then on
+    for (uint64_t nth = 1; !HasFailure(); nth += nth < 64 ? 1 : 61) {
+        const int64_t before = live_blocks();
+        kzcat_status status = KZCAT_OK;
+        bool fired = false;
+        {
+            const AllocationFault fault(nth);
+            status = attempt();
+            fired = fault.fired();
+        }
+        EXPECT_EQ(fired ? kzcat_status{KZCAT_ERROR_MEMORY} : kzcat_status{KZCAT_OK}, status) << nth;
+        EXPECT_EQ(before, live_blocks()) << "left over after failed allocation " << nth;
+        if (!fired) {
+            EXPECT_GT(nth, 100u);
+            break;
+        }
+    }
+}
+
 TEST_F(DoorFailures, AreReportedByOpeningTheIndex)
 {
     add(open_file(path_).get(), trail_of(piece(1, 3)).get(), "one");

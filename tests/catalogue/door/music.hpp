@@ -25,6 +25,7 @@ using Builder = std::unique_ptr<kzcat_builder, FreeHandle<kzcat_builder_free>>;
 using Trail = std::unique_ptr<kzcat_trail, FreeHandle<kzcat_trail_free>>;
 using Track = std::unique_ptr<kzcat_track, FreeHandle<kzcat_track_free>>;
 using Query = std::unique_ptr<kzcat_query, FreeHandle<kzcat_query_free>>;
+using Monitor = std::unique_ptr<kzcat_monitor, FreeHandle<kzcat_monitor_free>>;
 using Result = std::unique_ptr<kzcat_result, FreeHandle<kzcat_result_free>>;
 
 /// What a call that makes a handle gave: the handle, or its status.

@@ -14,6 +14,45 @@ namespace {
 using kz::test::expect_layout;
 using kz::test::Field;
 
+TEST(CatalogueRecordLayout, OfMonitorOptions)
+{
+    using Record = kzcat_monitor_options;
+    expect_layout<Record>({
+        FIELD(Record, silence_level),
+        FIELD(Record, least_silence),
+        FIELD(Record, least_gap),
+        FIELD(Record, report_every),
+        FIELD(Record, speeds),
+        FIELD(Record, reserved),
+    });
+    EXPECT_EQ(80U, sizeof(Record));
+}
+
+TEST(CatalogueRecordLayout, OfEvent)
+{
+    using Record = kzcat_event;
+    expect_layout<Record>({
+        FIELD(Record, stage),
+        FIELD(Record, heard),
+        FIELD(Record, begin),
+        FIELD(Record, end),
+        FIELD(Record, known),
+        FIELD(Record, track),
+        FIELD(Record, source),
+        FIELD(Record, title),
+        FIELD(Record, artist),
+        FIELD(Record, score),
+        FIELD(Record, threshold),
+        FIELD(Record, place_begin),
+        FIELD(Record, place_end),
+        FIELD(Record, speed),
+        FIELD(Record, tempo),
+        FIELD(Record, pitch),
+        FIELD(Record, repeat),
+        FIELD(Record, reserved),
+    });
+}
+
 TEST(CatalogueRecordLayout, OfSettings)
 {
     using Record = kzcat_settings;
