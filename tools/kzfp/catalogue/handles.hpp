@@ -64,6 +64,7 @@ using Trail = std::unique_ptr<kzcat_trail, FreeHandle<kzcat_trail_free>>;
 using Track = std::unique_ptr<kzcat_track, FreeHandle<kzcat_track_free>>;
 using Query = std::unique_ptr<kzcat_query, FreeHandle<kzcat_query_free>>;
 using Result = std::unique_ptr<kzcat_result, FreeHandle<kzcat_result_free>>;
+using Monitor = std::unique_ptr<kzcat_monitor, FreeHandle<kzcat_monitor_free>>;
 
 /// Makes a handle by a call whose last argument is the place for it: made<Trail>(read, a, b).
 template <class Owner, class Make, class... Arguments>

@@ -23,23 +23,6 @@ using Take = std::function<void(std::span<const std::byte>)>;
 /// Begins to take sound of a format.
 using Begin = std::function<Take(const kzcat_format&)>;
 
-uint32_t to_stream_format(audio::Encoding encoding)
-{
-    switch (encoding) {
-    case audio::Encoding::u8:
-        return KZ_STREAM_FORMAT_LINEAR8;
-    case audio::Encoding::alaw:
-        return KZ_STREAM_FORMAT_ALAW;
-    case audio::Encoding::ulaw:
-        return KZ_STREAM_FORMAT_ULAW;
-    case audio::Encoding::f32:
-        return KZ_STREAM_FORMAT_FLOAT32;
-    case audio::Encoding::s16:
-        break;
-    }
-    return KZ_STREAM_FORMAT_PCM16;
-}
-
 /// Feeds a source to its end; gives the seconds that it had.
 double feed(audio::Source& source, const Begin& begin)
 {
@@ -164,6 +147,23 @@ Content content_of_file(const std::string& path)
         return Content::document;
     }
     return text.starts_with("\x89KZT") ? Content::trail : Content::sound;
+}
+
+uint32_t to_stream_format(audio::Encoding encoding)
+{
+    switch (encoding) {
+    case audio::Encoding::u8:
+        return KZ_STREAM_FORMAT_LINEAR8;
+    case audio::Encoding::alaw:
+        return KZ_STREAM_FORMAT_ALAW;
+    case audio::Encoding::ulaw:
+        return KZ_STREAM_FORMAT_ULAW;
+    case audio::Encoding::f32:
+        return KZ_STREAM_FORMAT_FLOAT32;
+    case audio::Encoding::s16:
+        break;
+    }
+    return KZ_STREAM_FORMAT_PCM16;
 }
 
 Recording read_recording(const std::string& path, const SoundOptions& options, bool documents)

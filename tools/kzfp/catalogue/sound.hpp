@@ -11,6 +11,9 @@
 
 namespace kzfp {
 
+/// The library's number for an encoding.
+uint32_t to_stream_format(audio::Encoding encoding);
+
 /// What a file holds, by its first bytes.
 enum class Content { sound, trail, document };
 

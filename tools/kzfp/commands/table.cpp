@@ -18,6 +18,7 @@ ExitStatus run_add(const Arguments& arguments);
 ExitStatus run_match(const Arguments& arguments);
 ExitStatus run_compare(const Arguments& arguments);
 ExitStatus run_duplicates(const Arguments& arguments);
+ExitStatus run_monitor(const Arguments& arguments);
 ExitStatus run_evaluate(const Arguments& arguments);
 ExitStatus run_list(const Arguments& arguments);
 ExitStatus run_remove(const Arguments& arguments);
@@ -37,6 +38,7 @@ constexpr Command kCommands[] = {
     {"match", "Names the track of a catalogue that a clip is from", run_match},
     {"duplicates", "Finds files that hold the same recording, and the best of them",
      run_duplicates},
+    {"monitor", "Prints what runs on a stream, from when to when", run_monitor},
     {"evaluate", "Measures how well clips of your own music are recognised", run_evaluate},
     {"add", "Adds sound files to a catalogue", run_add, Group::catalogues},
     {"list", "Lists the tracks of a catalogue", run_list, Group::catalogues},
