@@ -61,7 +61,7 @@ void draw_overview(Svg& svg, const Trails& trails)
     svg.text(kLeft, 16,
              shortened("The clip lies at " + clock_text(begin) + " to " + clock_text(end) + " of " +
                            trails.track_name,
-                       (kWidth - kLeft) / 13),
+                       (kWidth - kLeft) / 15), // the letters are bold
              Anchor::start, "strong");
     svg.rectangle({scale(0), kOverview, scale(length) - scale(0), 14}, "empty");
     const double from = scale(begin);

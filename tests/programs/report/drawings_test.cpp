@@ -12,6 +12,7 @@
 #include "programs/report/xml.hpp"
 #include "report/alignment.hpp"
 #include "report/spectrum.hpp"
+#include "report/text.hpp"
 
 namespace report::test {
 namespace {
@@ -192,6 +193,17 @@ TEST(TrailsFigure, MarksKeepClearOfTheCurvesTitle)
         }
     }
     EXPECT_EQ(4U, marks);
+}
+
+TEST(TrailsFigure, LongNamesAreCutWhereTheDrawingEnds)
+{
+    Trails trails = sample_trails(20);
+    trails.track_name = std::string(300, 'n');
+    const auto texts = of_class(trails_figure(trails), "text", "strong");
+    ASSERT_FALSE(texts.empty());
+    EXPECT_TRUE(texts[0].text.ends_with("\u2026"));
+    // The widest letters of 13 pixels that are in use are bold.
+    EXPECT_LT(texts[0].number("x") + width_of(texts[0].text) * 14.5, 960);
 }
 
 TEST(Timeline, HasABlockForEveryRun)
