@@ -53,6 +53,9 @@ IndexOptions to_index_options(const char* path, const kzcat_settings& settings)
     }
     options.fall_back = settings.fall_back == 1;
     options.plan = to_plan(settings.plan);
+    if (settings.index_from != 0) {
+        options.write_from = settings.index_from;
+    }
     return options;
 }
 

@@ -200,7 +200,9 @@ typedef struct kzcat_settings {
                                 the access. It may be deleted at any time: that costs time, never
                                 an answer. 0: none is read or written */
     uint32_t fall_back;    /**< 1 (at first): scan when the table of parts finds nothing */
-    uint32_t reserved[13]; /**< 0 */
+    uint32_t index_from;   /**< codes from which on the index file is made; 0 (at first): as many as
+                                it takes to be worth it, some 4 million or 3000 tracks */
+    uint32_t reserved[12]; /**< 0 */
 } kzcat_settings;
 
 /**

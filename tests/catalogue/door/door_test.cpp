@@ -365,8 +365,30 @@ TEST(DoorCatalogue, SettingsHaveToBeInRange)
     settings.index_file = 2;
     EXPECT_EQ(KZCAT_ERROR_INVALID_ARGUMENT, status());
     kzcat_initialize_settings(&settings);
-    settings.reserved[12] = 1;
+    settings.reserved[11] = 1;
     EXPECT_EQ(KZCAT_ERROR_INVALID_ARGUMENT, status());
+}
+
+TEST(DoorCatalogue, MakesItsIndexFileFromTheStatedSize)
+{
+    const ScratchDirectory scratch;
+    const std::string path = scratch.path("c.kzc");
+    add(open_file(path).get(), trail_of(piece(1, 30)).get(), "piece1", "Title 1");
+    kzcat_settings settings;
+    kzcat_initialize_settings(&settings);
+    settings.plan = KZCAT_PLAN_PARTS;
+    const auto plan = [&] {
+        const auto opened = make<Catalogue>(kzcat_open, path.c_str(), uint32_t{KZCAT_ACCESS_READ},
+                                            static_cast<const kzcat_settings*>(&settings));
+        kzcat_facts facts = {};
+        EXPECT_EQ(KZCAT_OK, kzcat_get_facts(opened.handle.get(), 1, &facts)) << error_text();
+        return facts.plan;
+    };
+    EXPECT_EQ(uint32_t{KZCAT_PLAN_SCAN}, plan()); // the catalogue is too small for an index
+    settings.index_from = 1000;
+    EXPECT_EQ(uint32_t{KZCAT_PLAN_SCAN}, plan());
+    settings.index_from = 1;
+    EXPECT_EQ(uint32_t{KZCAT_PLAN_PARTS}, plan());
 }
 
 // ---- Recognising

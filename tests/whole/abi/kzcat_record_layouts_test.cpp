@@ -60,6 +60,7 @@ TEST(CatalogueRecordLayout, OfSettings)
         FIELD(Record, plan),
         FIELD(Record, index_file),
         FIELD(Record, fall_back),
+        FIELD(Record, index_from),
         FIELD(Record, reserved),
     });
     EXPECT_EQ(64U, sizeof(Record));

@@ -38,8 +38,8 @@ constexpr const char* kFooter =
 constexpr Choice<Plan> kPlans[] = {
     {"measured", Plan::measured, "whichever is faster for the catalogue"},
     {"scan", Plan::scan, "every place of every track"},
-    {"parts", Plan::parts, "through the table of parts of codes, then by scan"},
-    {"both", Plan::both, "also count what the table of parts alone finds of what a scan finds"},
+    {"parts", Plan::parts, "through the index, then by scan"},
+    {"both", Plan::both, "also count what the index alone finds of what a scan finds"},
 };
 
 constexpr FormatChoice kFormats[] = {

@@ -95,6 +95,10 @@ std::vector<std::string> notes(const Table& table)
     if (table.both_plans) {
         notes.push_back(about_plans(all));
     }
+    if (table.without_index) {
+        notes.push_back("The index was not compared with a scan: a catalogue of this size has "
+                        "none.");
+    }
     add_not_made(table, notes);
     if (all.silent != 0) {
         notes.push_back(plural(all.silent, "clip was", "clips were") + " left out: silent.");

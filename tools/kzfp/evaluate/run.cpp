@@ -25,12 +25,19 @@ namespace {
 
 namespace fs = std::filesystem;
 
-Catalogue open_with(const std::string& path, uint32_t plan, bool fall_back)
+struct Opening {
+    uint32_t plan;
+    bool fall_back;
+    uint32_t index_from = 0;
+};
+
+Catalogue open_with(const std::string& path, const Opening& opening)
 {
     kzcat_settings settings;
     check(kzcat_initialize_settings(&settings));
-    settings.plan = plan;
-    settings.fall_back = fall_back ? 1 : 0;
+    settings.plan = opening.plan;
+    settings.fall_back = opening.fall_back ? 1 : 0;
+    settings.index_from = opening.index_from;
     return made<Catalogue>(kzcat_open, path.c_str(), uint32_t{KZCAT_ACCESS_READ},
                            static_cast<const kzcat_settings*>(&settings));
 }
@@ -46,30 +53,47 @@ uint32_t usual_plan(Plan plan)
 /// The catalogue, opened as often as is needed.
 class OpenCatalogue {
 public:
-    OpenCatalogue(const std::string& path, Plan plan)
-        : usual_(open_with(path, usual_plan(plan), true))
+    /// A catalogue that is `ours` gets an index whatever its size when the plan needs one; beside
+    /// one that was there already, no file is left that would not be there otherwise.
+    OpenCatalogue(const std::string& path, Plan plan, bool ours)
+        : usual_(open_with(path, {.plan = usual_plan(plan),
+                                  .fall_back = true,
+                                  .index_from = ours && plan == Plan::parts ? 1U : 0U})),
+          facts_(facts_of(usual_))
     {
-        check(kzcat_get_facts(usual_.get(), 1, &facts_));
-        // Where the table of parts is in use, what it misses is worth a line.
-        both_ = plan == Plan::both ||
-                (plan == Plan::measured && facts_.plan == uint32_t{KZCAT_PLAN_PARTS});
-        if (both_) {
-            scan_ = open_with(path, KZCAT_PLAN_SCAN, false);
-            parts_ = open_with(path, KZCAT_PLAN_PARTS, false);
+        // Where the index is in use, what it misses is worth a line.
+        if (plan == Plan::both || (plan == Plan::measured && has_index(facts_))) {
+            scan_ = open_with(path, {.plan = KZCAT_PLAN_SCAN, .fall_back = false});
+            parts_ = open_with(
+                path, {.plan = KZCAT_PLAN_PARTS, .fall_back = false, .index_from = ours ? 1U : 0U});
+            both_ = has_index(facts_of(parts_));
         }
     }
     const kzcat_facts& facts() const { return facts_; }
     bool both() const { return both_; }
+    bool lacks_index() const { return parts_ && !both_; }
     Catalogues handles() const
     {
-        return {.usual = usual_.get(), .scan = scan_.get(), .parts = parts_.get()};
+        return both_ ? Catalogues{usual_.get(), scan_.get(), parts_.get()}
+                     : Catalogues{.usual = usual_.get()};
     }
 
 private:
+    static kzcat_facts facts_of(const Catalogue& catalogue)
+    {
+        kzcat_facts facts;
+        check(kzcat_get_facts(catalogue.get(), 1, &facts));
+        return facts;
+    }
+    static bool has_index(const kzcat_facts& facts)
+    {
+        return facts.plan == uint32_t{KZCAT_PLAN_PARTS};
+    }
+
     Catalogue usual_;
     Catalogue scan_;
     Catalogue parts_;
-    kzcat_facts facts_ = {};
+    kzcat_facts facts_;
     bool both_ = false;
 };
 
@@ -115,9 +139,10 @@ public:
             settings_.catalogue.empty() ? scratch_.path("music.kzc") : settings_.catalogue;
         read(path);
         if (!interrupted()) {
-            const OpenCatalogue catalogue(path, settings_.plan);
+            const OpenCatalogue catalogue(path, settings_.plan, settings_.catalogue.empty());
             table().catalogue_tracks = catalogue.facts().tracks;
             table().both_plans = catalogue.both();
+            table().without_index = catalogue.lacks_index();
             examine_all(catalogue);
         }
         table().partial = interrupted();

@@ -33,7 +33,7 @@ struct Outcome {
     double milliseconds = 0; ///< processor time from samples to answer
     double score = 0;
     std::optional<bool> by_scan;     ///< right when looked up by scan
-    std::optional<bool> by_parts;    ///< right when looked up by the table of parts alone
+    std::optional<bool> by_parts;    ///< right when looked up by the index alone
     std::vector<SameRecording> same; ///< pairs that were found to have the same sound
 };
 
@@ -61,7 +61,7 @@ struct Tally {
     size_t silent = 0;
     size_t failed = 0;
     size_t scanned = 0;  ///< clips that were found by scan, where both plans were tried
-    size_t by_parts = 0; ///< and of these, those that the table of parts found
+    size_t by_parts = 0; ///< and of these, those that the index alone found
     std::vector<double> place_errors; ///< seconds
     std::vector<double> milliseconds;
 

@@ -30,6 +30,7 @@ struct Table {
     uint64_t seed = 1;
     bool partial = false; ///< the user ended the run
     bool both_plans = false;
+    bool without_index = false; ///< both were asked for, but the catalogue has no index
     std::vector<SameRecording> identical;
     std::map<SameRecording, size_t> same_sound; ///< clips for which the other track was named
 
