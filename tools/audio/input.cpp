@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include "audio/file_source.hpp"
+#include "audio/live.hpp"
 #include "audio/rate_converter.hpp"
 #include "audio/raw_samples.hpp"
 
@@ -27,6 +28,10 @@ Descriptor open_input(const std::string& name)
     }
     // A FIFO into which nobody writes yet is waited for when it is read.
     const int number = ::open(name.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
+    if (number < 0 && errno == ENOENT && is_live_only(name)) {
+        throw FileError("is not a file; only monitor listens to streams and microphones. Fetch the "
+                        "sound with another program, and give it as a file or through a pipe");
+    }
     if (number < 0) {
         throw system_error("cannot be opened", errno);
     }

@@ -256,6 +256,7 @@ TEST(KzfpDamaged, WhatIsNoSoundGetsTheCure)
         {scratch.path(), "is a directory, a sound file is needed"},
         {"/dev/null", "is empty, a sound file is needed"},
         {scratch.path("nothing.m4a"), "No such file or directory"},
+        {"http://127.0.0.1/music.mp3", "only monitor listens to streams"},
         {unreadable, ::geteuid() == 0 ? "" : "Permission denied"}};
     for (const auto& [path, why] : kCases) {
         const ProcessResult result = kzfp({path});
