@@ -2,7 +2,6 @@
 
 #include "kzfp.hpp"
 
-#include <cstdio>
 #include <filesystem>
 
 #include <sys/stat.h>
@@ -10,8 +9,6 @@
 
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
-
-#include "kzsdk/abs/status.h"
 
 namespace {
 
@@ -34,13 +31,6 @@ void expect_failure(const std::string& path, const std::string& what)
     EXPECT_EQ(1, result.status);
     EXPECT_EQ("", result.out);
     EXPECT_EQ(path + ": " + what + "\n", result.err);
-}
-
-std::string hexadecimal(kz_status status)
-{
-    char text[16];
-    std::snprintf(text, sizeof text, "0x%08X", static_cast<unsigned>(status));
-    return text;
 }
 
 // ---- Mounted discs
@@ -185,12 +175,29 @@ TEST(KzfpDisc, RefusesWhatIsNoDisc)
     expect_failure(directory.write("empty", ""), what);
     expect_failure(directory.write("noise", std::string(100'000, 'x')), what);
     expect_failure(kImages + "far.udf", what);
-    expect_failure(directory.path("missing"),
-                   "cannot be opened: " + std::string(kz_status_text(KZ_DISC_ERROR_NOT_FOUND)) +
-                       " (status " + hexadecimal(KZ_DISC_ERROR_NOT_FOUND) + ")");
+    expect_failure(directory.path("missing"), "cannot be opened (No such file or directory)");
 }
 
 // ---- The command line
+
+TEST(KzfpDisc, FailuresHaveALineOfJsonToo)
+{
+    const ScratchDirectory directory;
+    const std::string path = directory.path("missing");
+    const ProcessResult result = kzfp({"disc", "--format", "json", path});
+    EXPECT_EQ(1, result.status);
+    const json expected = {
+        {"schema", 1}, {"path", path}, {"error", "cannot be opened (No such file or directory)"}};
+    EXPECT_EQ(expected, json::parse(result.out));
+}
+
+TEST(KzfpDisc, WritesToAFileWhenAsked)
+{
+    const ScratchDirectory directory;
+    const std::string file = directory.path("found.txt");
+    EXPECT_EQ("", output_of({"disc", "--output", file, kImages + "dvd"}));
+    EXPECT_EQ(output_of({"disc", "--format", "text", kImages + "dvd"}), contents(file));
+}
 
 TEST(KzfpDisc, NeedsOnePathAndAKnownFormat)
 {

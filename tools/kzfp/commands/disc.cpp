@@ -1,14 +1,17 @@
 // `kzfp disc`: of a directory, what the disc that is mounted there holds; of a device or an image,
 // its volume labels.
 
-#include <filesystem>
+#include <array>
+#include <cerrno>
 #include <string>
-#include <system_error>
 
-#include "kzfp/command_line/choice.hpp"
+#include <sys/stat.h>
+
 #include "kzfp/command_line/command_line.hpp"
+#include "kzfp/command_line/output_options.hpp"
 #include "kzfp/disc/families.hpp"
 #include "kzfp/output/json.hpp"
+#include "kzfp/output/json_object.hpp"
 #include "kzfp/output/text.hpp"
 #include "kzfp/output/write.hpp"
 
@@ -22,34 +25,65 @@ constexpr const char* kDescription = "Reports what is on the optical disc that i
                                      "title sets. Of a device or an image, it\n"
                                      "reports the volume labels.";
 
-enum class DiscFormat { text, json };
-
-constexpr Choice<DiscFormat> kDiscFormats[] = {
-    {"text", DiscFormat::text, "one line for each finding"},
-    {"json", DiscFormat::json, "one object on one line"},
+constexpr FormatChoice kFormats[] = {
+    {"human", Format::human, "one line for each finding"},
+    {"json", Format::json, "one object on one line"},
 };
 
 struct DiscOptions {
     std::string path;
-    DiscFormat format = DiscFormat::text;
+    OutputOptions output;
 };
 
 template <class Found>
 void write_found(const DiscOptions& options, const Found& found)
 {
-    write_output(options.format == DiscFormat::json ? to_json(options.path, found)
-                                                    : to_text(found));
+    write_output(options.output.format == Format::json ? to_json(options.path, found)
+                                                       : to_text(found));
+}
+
+bool is_directory(const std::string& path)
+{
+    struct stat facts = {};
+    if (::stat(path.c_str(), &facts) != 0) {
+        throw audio::system_error("cannot be opened", errno);
+    }
+    return S_ISDIR(facts.st_mode);
 }
 
 void look_and_write(const DiscOptions& options)
 {
     const DiscFamilies families;
-    std::error_code error;
-    if (std::filesystem::is_directory(options.path, error)) {
+    if (is_directory(options.path)) {
         write_found(options, content_of(options.path));
     } else {
         write_found(options, labels_of(options.path));
     }
+}
+
+void report(const DiscOptions& options, const std::string& error)
+{
+    write_message(options.path + ": " + error);
+    if (options.output.format == Format::json) {
+        JsonObject object = make_object();
+        set_path(object, "path", options.path);
+        object["error"] = error;
+        write_output(to_line(object));
+    }
+}
+
+ExitStatus run(const DiscOptions& options)
+{
+    OutputFile file(options.output.output, std::array{options.path});
+    ExitStatus status = all_done;
+    try {
+        look_and_write(options);
+    } catch (const audio::FileError& error) {
+        report(options, error.what());
+        status = some_file_failed;
+    }
+    file.finish();
+    return status;
 }
 
 } // namespace
@@ -61,17 +95,11 @@ ExitStatus run_disc(const Arguments& arguments)
     parser.add_option("PATH", options.path, "Mounted disc, directory, device or image")
         ->required()
         ->type_name("");
-    add_choice(parser, "-f,--format", "FORMAT", "a format", kDiscFormats, options.format);
+    add_output_options(parser, kFormats, options.output);
     if (const auto status = parse(parser, arguments)) {
         return *status;
     }
-    try {
-        look_and_write(options);
-        return all_done;
-    } catch (const audio::FileError& error) {
-        write_message(options.path + ": " + error.what());
-        return some_file_failed;
-    }
+    return run(options);
 }
 
 } // namespace kzfp
