@@ -15,7 +15,7 @@ packages_of() {
     catalogue) echo "libsqlite3-dev nettle-dev pkg-config sqlite3" ;; # keeping and hashing; a second reader for tests
     # FFmpeg's libraries read what libsndfile does not, PortAudio listens to microphones.
     tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev libavformat-dev libavcodec-dev portaudio19-dev libpng-dev" ;;
-    test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso python3 libexpat1-dev libpng-dev chromium-headless-shell" ;;
+    test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso python3 zsh fish libexpat1-dev libpng-dev chromium-headless-shell" ;;
     # The Java front and its tests; Android's log and threads as a desktop has them.
     java) echo "default-jdk-headless junit4 android-liblog-dev android-libutils-dev" ;;
     clips) echo "sox libsox-fmt-all espeak-ng ffmpeg" ;; # the demo's music, and the tests' clips

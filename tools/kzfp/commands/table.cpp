@@ -27,6 +27,7 @@ ExitStatus run_merge(const Arguments& arguments);
 ExitStatus run_export(const Arguments& arguments);
 ExitStatus run_import(const Arguments& arguments);
 ExitStatus run_disc(const Arguments& arguments);
+ExitStatus run_completions(const Arguments& arguments);
 ExitStatus run_help(const Arguments& arguments);
 
 namespace {
@@ -49,6 +50,8 @@ constexpr Command kCommands[] = {
      Group::catalogues},
     {"import", "Adds the tracks of exported catalogues to one", run_import, Group::catalogues},
     {"disc", "Reports what is on a Blu-ray disc or a DVD", run_disc, Group::program},
+    {"completions", "Prints what a shell needs to complete command lines", run_completions,
+     Group::program},
     {"help", "Prints the help of a command", run_help, Group::program},
 };
 
