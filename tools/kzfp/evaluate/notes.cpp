@@ -96,8 +96,8 @@ std::vector<std::string> notes(const Table& table)
         notes.push_back(about_plans(all));
     }
     if (table.without_index) {
-        notes.push_back("The index was not compared with a scan: a catalogue of this size has "
-                        "none.");
+        notes.emplace_back("The index was not compared with a scan: a catalogue of this size has "
+                           "none.");
     }
     add_not_made(table, notes);
     if (all.silent != 0) {
