@@ -130,6 +130,7 @@ TEST(KzfpCommands, HaveAHelpOfTheirOwn)
         const std::string help = output_of({name, "--help"});
         EXPECT_TRUE(contains(help, "\nUsage: kzfp " + name + " [OPTIONS]")) << help;
         EXPECT_EQ(help, output_of({"help", name})) << name;
+        EXPECT_FALSE(contains(help, ":INT") || contains(help, ":NONNEG")) << help;
         EXPECT_EQ(help, output_of({name, "-h"})) << name;
     }
 }
@@ -140,6 +141,13 @@ TEST(KzfpCommands, AnswerWithTheVersionToo)
     for (const std::string& name : command_names()) {
         EXPECT_EQ(version, output_of({name, "--version"})) << name;
     }
+}
+
+TEST(KzfpCommands, HelpOfTheProgramShowsHowToRecogniseFirst)
+{
+    const std::string help = output_of({"--help"});
+    EXPECT_LT(help.find("kzfp match music.kzc clip.mp3"), help.find("\nUsage: kzfp [OPTIONS]"));
+    EXPECT_LT(help.find("\n  verify "), help.find("\nUsage: kzfp [OPTIONS]"));
 }
 
 TEST(KzfpCommands, HelpAloneIsTheHelpOfTheProgram)

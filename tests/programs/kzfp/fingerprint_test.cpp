@@ -194,6 +194,20 @@ TEST(KzfpDocuments, NeedADirectoryThatCanBeMade)
     EXPECT_EQ(1, lines_of(result.err).size()) << result.err;
 }
 
+// A limit on the size of files, as a full disk would be.
+TEST(KzfpDocuments, ThatCannotBeWrittenLeaveNothing)
+{
+    const ScratchDirectory directory;
+    const std::string command =
+        "ulimit -f 0; exec " KZFP_PROGRAM " --output-dir " + directory.path("to") + " " + kMusic;
+    const ProcessResult result = run({"/bin/sh", "-c", command});
+    EXPECT_EQ(1, result.status);
+    EXPECT_EQ("kzfp: " + directory.path("to/music-44100-stereo-s16.wav.xml") +
+                  " cannot be written (File too large)\n",
+              result.err);
+    EXPECT_TRUE(std::filesystem::is_empty(directory.path("to")));
+}
+
 TEST(KzfpDocuments, AreWrappedIntoOneThatIsWellFormed)
 {
     const std::string odd = "a<b>&\"c\"\xff\x01\n.wav";

@@ -59,7 +59,7 @@ void report()
 bool fails(const char* kind, long& count, int error)
 {
     const char* const nth = setting(kind);
-    if (nth == nullptr || !started) {
+    if (nth == nullptr) {
         return false;
     }
     const long at = std::strtol(nth, nullptr, 10);
@@ -85,9 +85,9 @@ bool is_spared(const void* caller)
 
 bool allocation_fails(const void* caller)
 {
-    return !is_spared(caller) && fails("KZ_FAIL_ALLOCATION", allocations, ENOMEM);
+    return started && !is_spared(caller) && fails("KZ_FAIL_ALLOCATION", allocations, ENOMEM);
 }
-bool read_fails() { return fails("KZ_FAIL_READ", reads, EIO); }
+bool read_fails() { return started && fails("KZ_FAIL_READ", reads, EIO); }
 
 using Main = int (*)(int, char**, char**);
 using Start = int (*)(Main, int, char**, void (*)(), void (*)(), void (*)(), void*);

@@ -31,6 +31,12 @@ inline void add_catalogue_option(CLI::App& parser, std::string& path)
         ->type_name("");
 }
 
+/// Accepts whole numbers of a range, without showing it in the help behind the option's name.
+inline CLI::Validator between(int least, int most)
+{
+    return CLI::Range(least, most).description("");
+}
+
 /// How many files are worked on at once: as many as there are processors unless stated.
 inline void add_jobs_option(CLI::App& parser, size_t& jobs)
 {
@@ -38,7 +44,7 @@ inline void add_jobs_option(CLI::App& parser, size_t& jobs)
     parser
         .add_option("-j,--jobs", jobs, "Files to work on at once (default: one for each processor)")
         ->type_name("NUMBER")
-        ->check(CLI::Range(1, 256));
+        ->check(between(1, 256));
 }
 
 } // namespace kzfp

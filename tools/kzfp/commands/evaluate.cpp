@@ -97,7 +97,7 @@ void add_clip_options(CLI::App& parser, EvaluateOptions& options)
         .add_option("--clips", options.settings.clips,
                     "Clips of each kind, and half as many of strangers (default: 30)")
         ->type_name("NUMBER")
-        ->check(CLI::Range(1, 100000));
+        ->check(between(1, 100000));
     parser
         .add_option("--length", options.lengths,
                     "How long clips are; several lengths, such as 15,6, make\nseveral rows "

@@ -130,7 +130,7 @@ void add_options(CLI::App& parser, ExportSettings& settings)
         .add_option("--after", settings.after,
                     "Only tracks with higher ids, which were added later: a backup of what is new")
         ->type_name("ID")
-        ->check(CLI::NonNegativeNumber)
+        ->check(CLI::NonNegativeNumber.description(""))
         ->excludes(trail);
     add_progress_options(parser, settings.output);
 }

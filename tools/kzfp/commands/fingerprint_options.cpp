@@ -37,14 +37,24 @@ std::string rates_of(Algorithm algorithm)
     return text;
 }
 
-std::string description()
+constexpr const char* kAboutProgram =
+    "Recognises sound.\n\n"
+    "  kzfp add music.kzc ~/Music       keeps what the music below a folder sounds like\n"
+    "  kzfp match music.kzc clip.mp3    names the track that a clip is from, and the place in it\n"
+    "  kzfp song.mp3                    prints a fingerprint\n\n";
+
+/// The help of the program as a whole begins with what it is for and its commands.
+std::string description(const Arguments& arguments)
 {
-    return "Prints the fingerprint of each FILE: the query document that a recognition service is "
-           "sent.\n"
-           "A FILE is any sound file that libsndfile or FFmpeg reads (WAV, FLAC, OGG, MP3, M4A, "
-           "...);\n"
-           "- is standard input. " +
-           sound_needed() + " of sound are needed after leading silence; reading stops there.";
+    const std::string program =
+        arguments.command.empty()
+            ? kAboutProgram + commands_text() + kAboutCommands + "Without a command, kzfp prints"
+            : "Prints";
+    return program +
+           " the fingerprint of each FILE: the query document that a recognition\n"
+           "service is sent. A FILE is any sound file that libsndfile or FFmpeg reads (WAV, FLAC,\n"
+           "OGG, MP3, M4A, ...); - is standard input. " +
+           sound_needed() + " of sound are needed after leading silence;\nreading stops there.";
 }
 
 std::string about_rates()
@@ -75,13 +85,6 @@ void check_raw_rate(const FingerprintOptions& options)
                         (options.algorithm == Algorithm::fixed ? "one of " : "") +
                             rates_of(options.algorithm));
     }
-}
-
-/// The help of the program as a whole also lists its commands.
-std::string notes(const Arguments& arguments)
-{
-    const std::string listing = arguments.command.empty() ? commands_text() + kAboutCommands : "";
-    return listing + about_rates() + kMoreNotes;
 }
 
 void add_every_option(CLI::App& parser, std::optional<double>& every)
@@ -145,8 +148,8 @@ void check_documents(const FingerprintOptions& options)
 
 std::variant<FingerprintOptions, ExitStatus> parse_fingerprint_options(const Arguments& arguments)
 {
-    CLI::App parser(description(), program_name(arguments));
-    parser.footer(notes(arguments));
+    CLI::App parser(description(arguments), program_name(arguments));
+    parser.footer(about_rates() + kMoreNotes);
     FingerprintOptions options;
     FileArguments files;
     add_options(parser, options, files);

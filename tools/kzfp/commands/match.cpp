@@ -60,7 +60,7 @@ void add_lookup_options(CLI::App& parser, MatchSettings& settings)
         .add_option("--top,--candidates", settings.lookup.candidates,
                     "Also show the best tracks whatever their score, this many")
         ->type_name("NUMBER")
-        ->check(CLI::Range(1, 1000));
+        ->check(between(1, 1000));
     parser.add_flag("--all,--passages", settings.lookup.passages,
                     "Everything that is recognised in a long file, from when to when, with the\n"
                     "gaps: a set list");

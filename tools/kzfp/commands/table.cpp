@@ -113,7 +113,7 @@ std::string commands_text()
     constexpr size_t kColumn = 14;
     std::string text;
     for (const Heading& heading : kHeadings) {
-        text.append(text.empty() ? "" : "\n").append(heading.text);
+        text.append(text.empty() ? "" : "\n\n").append(heading.text);
         for (const Command& command : kCommands) {
             if (command.group == heading.group) {
                 text.append("\n  ").append(command.name);
