@@ -26,6 +26,15 @@ constexpr double kHighestBar = 0.15;
 
 double bar_of(double share) { return std::min(share / 2, kHighestBar); }
 
+/// A code that says less counts as if it had this many bits, so that a silence does not join a code
+/// before it, which agrees by chance, to the track behind it.
+constexpr int32_t kLeastBits = 16;
+
+double gain_of(const CodeAgreement& one, double bar)
+{
+    return one.surplus - bar * std::max(one.weight, kLeastBits);
+}
+
 /// Rounds of finding a stretch and taking its average anew.
 constexpr int kRounds = 4;
 
@@ -105,7 +114,7 @@ Range best_range(const Agreements& agreements, double bar)
     double sum = 0;
     size_t first = 0;
     for (size_t k = 0; k < agreements.size(); ++k) {
-        const double gain = agreements[k].surplus - bar * agreements[k].weight;
+        const double gain = gain_of(agreements[k], bar);
         if (sum <= 0) {
             sum = 0;
             first = k;
@@ -200,7 +209,7 @@ double heard_until(const Agreements& agreements, double sure, double share)
         if (one.time < sure) {
             continue;
         }
-        sum += one.surplus - bar_of(share) * one.weight;
+        sum += gain_of(one, bar_of(share));
         if (sum > most) {
             most = sum;
             until = one.time + kCodeSeconds / 2;

@@ -52,6 +52,20 @@ TEST(MonitorLine, BridgesAShortHole)
     EXPECT_NEAR(45, heard->end, 1);
 }
 
+TEST(MonitorLine, SilenceBeforeATrackIsNoPartOfIt)
+{
+    Agreements agreements = codes_of(50, 20, 50, 0.6, 1);
+    for (CodeAgreement& one : agreements) {
+        if (one.time < 20) {
+            const bool chance = one.time > 11 && one.time < 11 + kCodeSeconds;
+            one = {.time = one.time, .weight = chance ? 48 : 0, .surplus = chance ? 24 : 0};
+        }
+    }
+    const auto heard = heard_stretch(agreements);
+    ASSERT_TRUE(heard);
+    EXPECT_NEAR(20, heard->begin, 0.5);
+}
+
 TEST(MonitorLine, FindsNothingWhereNothingAgrees)
 {
     EXPECT_FALSE(heard_stretch({}));
