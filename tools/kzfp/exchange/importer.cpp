@@ -1,5 +1,5 @@
-// Tracks are added in batches, each of which is on disk as a whole or not at all. A line that cannot
-// be used is left out and reported; the others are added.
+// Tracks are added in batches, each of which is on disk as a whole or not at all. A line that
+// cannot be used is left out and reported; the others are added.
 
 #include "kzfp/exchange/importer.hpp"
 
