@@ -132,8 +132,8 @@ private:
         }
     }
 
-    /// The clock starts with the first sound. Sound that is late although it was waited for did not come in time; sound that this program
-    /// was too slow for has not been waited for.
+    /// The clock starts with the first sound. Sound that is late although it was waited for did not
+    /// come in time; sound that this program was too slow for has not been waited for.
     void report_interruption()
     {
         if (seconds() == 0) {
