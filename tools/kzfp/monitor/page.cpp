@@ -5,6 +5,7 @@
 #include <cstdio>
 
 #include "kzfp/catalogue/answer.hpp"
+#include "kzfp/pages/gather.hpp"
 
 namespace kzfp {
 
@@ -52,9 +53,7 @@ std::string MonitorReport::page(const std::string& stream, const Summary& summar
                                 const StreamFacts& facts) const
 {
     report::MonitorPage page;
-    page.heading.title = stream == "-" ? "standard input" : stream;
-    page.heading.subtitle = summary.sentence(facts);
-    page.heading.program = "kzfp " KZFP_VERSION;
+    page.heading = heading_of(stream == "-" ? "standard input" : stream, summary.sentence(facts));
     page.heading.facts = summary.facts(facts);
     page.time = {.begin = 0, .end = facts.seconds};
     page.runs = runs_;
