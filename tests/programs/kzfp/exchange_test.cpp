@@ -254,6 +254,21 @@ TEST_F(KzfpExchange, AFullDiskLeavesTheFileAsItWas)
     EXPECT_EQ("before", contents(file_));
 }
 
+TEST_F(KzfpExchange, AnImportGoesOnAfterAFullDisk)
+{
+    kzfp({"export", "-q", catalogue_, file_});
+    rlimit usual = {};
+    ASSERT_EQ(0, getrlimit(RLIMIT_FSIZE, &usual));
+    const rlimit low = {.rlim_cur = 40'000, .rlim_max = usual.rlim_max};
+    ASSERT_EQ(0, setrlimit(RLIMIT_FSIZE, &low));
+    const ProcessResult result = kzfp({"import", into_, file_});
+    ASSERT_EQ(0, setrlimit(RLIMIT_FSIZE, &usual));
+    EXPECT_EQ(1, result.status);
+    EXPECT_EQ("", result.out);
+    EXPECT_TRUE(contains(result.err, "make room")) << result.err;
+    EXPECT_EQ(file_ + ": 3 added, 0 known\n", output_of({"import", into_, file_}));
+}
+
 TEST_F(KzfpExchange, ImportsAreReportedAsJsonAndCsv)
 {
     kzfp({"export", catalogue_, file_});
