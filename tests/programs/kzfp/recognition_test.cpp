@@ -210,39 +210,6 @@ TEST_F(Recognition, MissingCataloguesAreNamed)
 
 // ---- Comparing
 
-TEST_F(Recognition, CompareRefusesWhatCannotBeReadTwice)
-{
-    const ProcessResult result = kzfp({"compare", music(), "-"}, fed_with(contents(music())));
-    EXPECT_EQ(1, result.status);
-    EXPECT_EQ("", result.out);
-    EXPECT_EQ("-: is read twice, so it must be a file; write the sound to one first\n", result.err);
-}
-
-TEST_F(Recognition, CompareFindsWhereOneFileBeginsInTheOther)
-{
-    const std::string inner = scratch_->write("inner.wav", wav(part(piece(1), 9, 12)));
-    const std::string outer = scratch_->path("piece1.wav");
-    const auto compared = [](const std::string& a, const std::string& b) {
-        return json::parse(output_of({"compare", "--format", "json", a, b}));
-    };
-    const json forth = compared(outer, inner);
-    EXPECT_EQ("match", forth["verdict"]);
-    EXPECT_EQ(inner, forth["file"]);
-    EXPECT_EQ(outer, forth["matches"][0]["source"]);
-    EXPECT_NEAR(9, forth["matches"][0]["offset"].get<double>(), 0.03);
-    const json back = compared(inner, outer);
-    EXPECT_EQ(outer, back["file"]);
-    EXPECT_NEAR(-9, back["matches"][0]["offset"].get<double>(), 0.03);
-    EXPECT_TRUE(
-        contains(output_of({"compare", outer, inner}), inner + " begins at 0:09.0 of " + outer));
-}
-
-TEST_F(Recognition, CompareKnowsTheSameRecordingFromAnother)
-{
-    EXPECT_TRUE(contains(output_of({"compare", music(), clip("music.mp3")}), "the same recording"));
-    EXPECT_TRUE(contains(output_of({"compare", music(), clip("speech.wav")}), ": different"));
-}
-
 // ---- Documents
 
 TEST(KzfpDocuments, AreAnsweredByTracksAddedForThem)

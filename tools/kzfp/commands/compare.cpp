@@ -1,133 +1,189 @@
-// `kzfp compare`: whether two files have sound in common, and how they lie to each other.
+// `kzfp compare`: what files have in common with the first of them.
 
-#include <cmath>
+#include <algorithm>
+#include <new>
+#include <optional>
 #include <string>
-#include <utility>
+#include <vector>
 
-#include "kzfp/catalogue/answer.hpp"
-#include "kzfp/catalogue/files.hpp"
-#include "kzfp/catalogue/sound.hpp"
-#include "kzfp/command_line/common_options.hpp"
+#include "kzfp/command_line/output_options.hpp"
+#include "kzfp/command_line/sound_options.hpp"
+#include "kzfp/compare/output.hpp"
+#include "kzfp/compare/page.hpp"
+#include "kzfp/output/interruption.hpp"
+#include "kzfp/output/progress.hpp"
 #include "kzfp/output/write.hpp"
+#include "kzfp/pages/report_file.hpp"
 
 namespace kzfp {
 
 namespace {
 
 constexpr const char* kDescription =
-    "Compares two sound files: whether one is from the other, and where it begins there.";
+    "Compares FIRST with each OTHER: the same recording, the same start, related, or different.\n"
+    "Files are sound, trails (.kzt), query documents (.xml) or a line of 30 values.";
 
 constexpr const char* kFooter =
-    "Exit: 0 the files were compared, whatever came of it; 1 a file could not "
-    "be read; 2 wrong usage.";
+    "Exit: 0 all are the same recording as FIRST, or begin alike where only documents could be\n"
+    "compared; 1 one is not; 2 a file could not be compared, or wrong usage; 130 interrupted.";
+
+constexpr ExitStatus kDifferent = some_file_failed; ///< 1, as cmp and diff have it
+constexpr ExitStatus kTrouble = wrong_usage;        ///< 2
+
+constexpr FormatChoice kFormats[] = {kHumanFormat, kJsonFormat, kCsvFormat};
 
 struct CompareSettings {
     std::string first;
-    std::string second;
-    TextOrJson format = TextOrJson::text;
+    std::vector<std::string> others;
+    OutputOptions output;
+    SoundOptions sound;
+    std::string report;
 };
 
-/// A file in both forms: as a track and as a clip.
-struct Compared {
-    std::string path;
-    Recording recording;
-    double seconds = 0;
-};
+void add_options(CLI::App& parser, CompareSettings& settings)
+{
+    parser.add_option("FIRST", settings.first, "The file that the others are compared with")
+        ->required()
+        ->type_name("");
+    parser.add_option("OTHER", settings.others, "Other files")->required()->type_name("");
+    add_output_options(parser, kFormats, settings.output);
+    add_sound_options(parser, settings.sound);
+    add_report_option(parser, settings.report);
+}
 
-/// An error in one file, with its name.
+/// Runs `work`; what a file or the system could not do is noted in `error`.
 template <class Work>
-auto naming(const std::string& path, Work work)
+auto attempt(std::string& error, Work work) -> std::optional<decltype(work())>
 {
     try {
         return work();
-    } catch (const audio::FileError& error) {
-        throw audio::FileError(path + ": " + error.what());
-    } catch (const CatalogueError& error) {
-        throw audio::FileError(path + ": " + error.what());
+    } catch (const audio::FileError& failure) {
+        error = failure.what();
+    } catch (const CatalogueError& failure) {
+        error = failure.what();
+    } catch (const std::bad_alloc&) {
+        error = "not enough memory";
+    }
+    return {};
+}
+
+std::string formatted(Format format, const ComparedPair& pair)
+{
+    switch (format) {
+    case Format::json:
+        return to_json(pair);
+    case Format::csv:
+        return to_csv(pair);
+    default:
+        return to_text(pair);
     }
 }
 
-Compared read(const std::string& path)
+std::string failed(const CompareSettings& settings, const std::string& other,
+                   const std::string& error)
 {
-    return naming(path, [&path] {
-        if (path == "-" || state_of(path).size < 0) {
-            throw audio::FileError(
-                "is read twice, so it must be a file; write the sound to one first");
+    switch (settings.output.format) {
+    case Format::json:
+        return failed_json(settings.first, other, error);
+    case Format::csv:
+        return failed_csv(settings.first, other, error);
+    default:
+        return {};
+    }
+}
+
+bool is_same(const Comparison& comparison)
+{
+    return comparison.verdict == PairVerdict::same_recording ||
+           (comparison.verdict == PairVerdict::same_start && comparison.by_document);
+}
+
+/// `page` is null when none is wanted.
+ExitStatus compare_one(const CompareSettings& settings, const Side& first, const std::string& other,
+                       Progress& progress, ComparisonPage* page)
+{
+    std::string error;
+    const auto second = attempt(error, [&] { return read_side(other, settings.sound); });
+    const auto comparison =
+        second ? attempt(error, [&] { return compare(first, *second, settings.sound); })
+               : std::nullopt;
+    progress.clear();
+    if (second && !second->warning.empty()) {
+        write_message(other + ": " + second->warning);
+    }
+    if (!comparison) {
+        write_message(other + ": " + error);
+        write_output(failed(settings, other, error));
+        if (page != nullptr) {
+            page->add_failed(other, error);
         }
-        Compared compared = {.path = path, .recording = read_recording(path, {}, false)};
-        kzcat_trail_facts facts;
-        check(kzcat_trail_get_facts(compared.recording.trail.get(), &facts));
-        compared.seconds = static_cast<double>(facts.samples) / facts.sample_rate;
-        return compared;
-    });
+        return kTrouble;
+    }
+    if (page != nullptr) {
+        page->add(first, *second, *comparison, settings.sound);
+    }
+    write_output(formatted(settings.output.format, {settings.first, other, *comparison}));
+    if (comparison->verdict == PairVerdict::too_quiet) {
+        return kTrouble;
+    }
+    return is_same(*comparison) ? all_done : kDifferent;
 }
 
-/// Looks the sound of `clip` up in a catalogue of `track` alone.
-Answer look_up_in(const Compared& track, const Compared& clip)
+/// When the first file cannot be read, each pair has its line all the same.
+ExitStatus fail_all(const CompareSettings& settings, const std::string& error, ComparisonPage* page)
 {
-    const auto catalogue =
-        made<Catalogue>(kzcat_open, static_cast<const char*>(nullptr),
-                        uint32_t{KZCAT_ACCESS_CREATE}, static_cast<const kzcat_settings*>(nullptr));
-    const kzcat_new_track added = {
-        .trail = track.recording.trail.get(),
-        .source = {.uri = track.path.c_str(), .size = -1, .mtime_ns = -1, .hash = nullptr},
-        .tags = nullptr,
-        .tag_count = 0};
-    check(kzcat_add(catalogue.get(), &added, 1, nullptr));
-    const Clip sound = naming(clip.path, [&clip] { return read_clip(clip.path, {}); });
-    return look_up(*catalogue, *sound.query, clip.path, {});
-}
-
-/// The same finding seen from the other file: its place and speed in the first one.
-void turn_round(FoundTrack& found, const std::string& source)
-{
-    found.offset = -found.offset / found.tempo / found.speed;
-    found.speed = 1 / found.speed;
-    found.tempo = 1 / found.tempo;
-    found.pitch = 1 / found.pitch;
-    found.source = source;
-}
-
-std::string to_line(const Answer& answer, const Compared& first, const Compared& second)
-{
-    const std::string pair = first.path + " and " + second.path;
-    if (answer.verdict == KZCAT_VERDICT_TOO_QUIET) {
-        return pair + ": too quiet or too short to say anything";
-    }
-    if (answer.verdict != KZCAT_VERDICT_MATCH || answer.matches.empty()) {
-        return pair + ": " + (answer.verdict == KZCAT_VERDICT_NOT_SURE ? "not sure" : "different");
-    }
-    const FoundTrack& found = answer.matches.front();
-    const bool whole = std::fabs(found.offset) < 1 && std::fabs(first.seconds - second.seconds) < 2;
-    char score[64];
-    std::snprintf(score, sizeof score, ", score %.1f (%.1f needed)", found.score, found.threshold);
-    if (whole) {
-        return pair + ": the same recording" + change_text(found) + score;
-    }
-    return second.path + " begins at " + clock_text(found.offset) + " of " + first.path +
-           change_text(found) + score;
-}
-
-void compare(const CompareSettings& settings)
-{
-    const Compared first = read(settings.first);
-    const Compared second = read(settings.second);
-    const bool turned = first.seconds < second.seconds;
-    Answer answer = turned ? look_up_in(second, first) : look_up_in(first, second);
-    if (turned) {
-        answer.file = second.path;
-        for (FoundTrack& found : answer.matches) {
-            turn_round(found, first.path);
-        }
-    }
-    for (const Compared* file : {&first, &second}) {
-        if (!file->recording.warning.empty()) {
-            write_message(file->path + ": " + file->recording.warning);
+    write_message(settings.first + ": " + error);
+    for (const std::string& other : settings.others) {
+        write_output(failed(settings, other, settings.first + ": " + error));
+        if (page != nullptr) {
+            page->add_failed(other, settings.first + ": " + error);
         }
     }
-    write_output(settings.format == TextOrJson::json
-                     ? to_json(answer, {})
-                     : without_control_characters(to_line(answer, first, second)) + '\n');
+    return kTrouble;
+}
+
+ExitStatus compare_all(const CompareSettings& settings, ComparisonPage* page)
+{
+    if (settings.output.format == Format::csv) {
+        write_output(comparison_csv_header());
+    }
+    std::string error;
+    const auto first = attempt(error, [&] { return read_side(settings.first, settings.sound); });
+    if (!first) {
+        return fail_all(settings, error, page);
+    }
+    if (!first->warning.empty()) {
+        write_message(settings.first + ": " + first->warning);
+    }
+    watch_for_interruption();
+    Progress progress(settings.others.size(), settings.output.progress);
+    ExitStatus status = all_done;
+    size_t done = 0;
+    for (const std::string& other : settings.others) {
+        if (interrupted()) {
+            write_message("interrupted before " + other);
+            return interrupted_by_user;
+        }
+        status = std::max(status, compare_one(settings, *first, other, progress, page));
+        progress.show(++done, other);
+    }
+    return status;
+}
+
+ExitStatus compare_files(const CompareSettings& settings)
+{
+    std::vector<std::string> inputs = settings.others;
+    inputs.push_back(settings.first);
+    OutputFile output(settings.output.output, inputs);
+    inputs.push_back(settings.output.output);
+    ReportFile report(settings.report, inputs);
+    ComparisonPage page(settings.first);
+    const ExitStatus status = compare_all(settings, report.is_wanted() ? &page : nullptr);
+    output.finish();
+    if (report.is_wanted()) {
+        report.finish(page.html());
+    }
+    return status;
 }
 
 } // namespace
@@ -137,21 +193,18 @@ ExitStatus run_compare(const Arguments& arguments)
     CLI::App parser(kDescription, program_name(arguments));
     parser.footer(kFooter);
     CompareSettings settings;
-    parser.add_option("FIRST", settings.first, "A sound file")->required()->type_name("");
-    parser.add_option("SECOND", settings.second, "Another one")->required()->type_name("");
-    add_format_option(parser, settings.format);
+    add_options(parser, settings);
     if (const auto status = parse(parser, arguments)) {
         return *status;
     }
     try {
-        compare(settings);
-        return all_done;
-    } catch (const audio::FileError& error) {
-        write_message(error.what());
-    } catch (const CatalogueError& error) {
-        write_message(settings.first + " and " + settings.second + ": " + error.what());
+        return compare_files(settings);
+    } catch (const OutputError& error) { // 1 would say that the files differ
+        if (!error.reader_left) {
+            write_message(std::string("kzfp: ") + error.what());
+        }
+        return kTrouble;
     }
-    return some_file_failed;
 }
 
 } // namespace kzfp

@@ -35,7 +35,7 @@ namespace {
 constexpr Command kCommands[] = {
     {"fingerprint", "Prints the fingerprints of sound files; the command when none is named",
      run_fingerprint},
-    {"compare", "Finds out whether one sound file is from another", run_compare},
+    {"compare", "Finds out what sound files have in common", run_compare},
     {"match", "Names the track of a catalogue that a clip is from", run_match},
     {"duplicates", "Finds files that hold the same recording, and the best of them",
      run_duplicates},
