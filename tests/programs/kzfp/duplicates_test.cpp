@@ -202,6 +202,31 @@ TEST_F(Duplicates, OfSilenceAreCopiesOnly)
         relations_in(groups[0]));
 }
 
+TEST_F(Duplicates, WithEqualTrailsMayStillSoundDifferent)
+{
+    const ScratchDirectory scratch;
+    const Samples half = scaled(piece(8), 0.5);
+    scratch.write("a.wav", wav(half));
+    scratch.write("b.wav", wav(scaled(half, 2)));
+    const json files = groups_in(scratch.path()).at(0)["files"];
+    EXPECT_EQ(files[0]["track"], files[1]["track"]);
+    EXPECT_EQ(0, files[1]["error_rate"]);
+    EXPECT_EQ("same recording", files[1]["relation"]);
+}
+
+TEST_F(Duplicates, MayBeOtherNamesOfOneFile)
+{
+    const ScratchDirectory scratch;
+    const std::string file = scratch.write("a.wav", wav(piece(8)));
+    fs::create_symlink(file, scratch.path("b.wav"));
+    fs::create_hard_link(file, scratch.path("c.wav"));
+    EXPECT_EQ((std::map<std::string, std::string>{
+                  {"a.wav", "best"}, {"b.wav", "same file"}, {"c.wav", "same file"}}),
+              relations_in(groups_in(scratch.path()).at(0)));
+    const std::string script = output_of({"duplicates", "--script", scratch.path()});
+    EXPECT_FALSE(contains(script, "b.wav")) << script;
+}
+
 TEST_F(Duplicates, DoNotDependOnTheNumberOfThreads)
 {
     const auto found = [](const std::string& jobs) {

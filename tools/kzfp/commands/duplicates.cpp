@@ -15,6 +15,7 @@
 #include "kzfp/duplicates/script.hpp"
 #include "kzfp/duplicates/search.hpp"
 #include "kzfp/output/json_object.hpp"
+#include "kzfp/output/progress.hpp"
 
 namespace kzfp {
 
@@ -120,6 +121,7 @@ private:
     {
         write_beginning();
         size_t more = 0;
+        Progress progress(groups.size(), settings_.output.progress);
         in_order(
             groups.size(), settings_.jobs,
             [&](size_t i) {
@@ -129,9 +131,12 @@ private:
             [&](size_t i, const Finding& finding) {
                 if (!interrupted()) {
                     more += finding.files.size() - 1;
+                    progress.clear();
                     write_output(text_of(finding, i + 1));
+                    progress.show(i + 1, finding.files.front().file.path);
                 }
             });
+        progress.clear();
         if (settings_.output.format == Format::human && !settings_.script && !interrupted()) {
             write_output(summary_text(groups.size(), more, recordings.size()) + '\n');
         }
