@@ -128,6 +128,22 @@ TEST(DuplicatesScript, RemovesMoreOnlyOnRequest)
     EXPECT_EQ("10000", left({"REVIEW=yes"}));
 }
 
+TEST(DuplicatesScript, RemovesCopiesOfWhatItRemoves)
+{
+    const ScratchDirectory scratch;
+    Quality lossy = lossless_file();
+    lossy.lossless = false;
+    Finding finding;
+    finding.files = {file_of(scratch.write("kept", "1"), lossless_file(), Kinship::best),
+                     file_of(scratch.write("lossy", "2"), lossy, Kinship::same_recording),
+                     file_of(scratch.write("copy", "2"), lossy, Kinship::same_recording)};
+    finding.files[2].copy_of = 1;
+    run_script(scratch, script_header(scratch.path()) + to_script(finding, 1), {"INFERIOR=yes"});
+    EXPECT_TRUE(std::filesystem::exists(scratch.path("kept")));
+    EXPECT_FALSE(std::filesystem::exists(scratch.path("lossy")));
+    EXPECT_FALSE(std::filesystem::exists(scratch.path("copy")));
+}
+
 TEST(DuplicatesScript, LeavesGroupsWithoutTheirBestFile)
 {
     Finding finding;
