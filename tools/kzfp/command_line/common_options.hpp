@@ -11,18 +11,6 @@
 
 namespace kzfp {
 
-enum class TextOrJson { text, json };
-
-inline constexpr Choice<TextOrJson> kTextOrJson[] = {
-    {"text", TextOrJson::text, "lines for people"},
-    {"json", TextOrJson::json, "one object on each line (JSON Lines)"},
-};
-
-inline void add_format_option(CLI::App& parser, TextOrJson& format)
-{
-    add_choice(parser, "-f,--format", "FORMAT", "a format", kTextOrJson, format);
-}
-
 /// The catalogue that a command is about. `path` outlives the parsing.
 inline void add_catalogue_option(CLI::App& parser, std::string& path)
 {
