@@ -7,6 +7,7 @@
 #include <regex>
 #include <set>
 
+#include <CLI/CLI.hpp>
 #include <gtest/gtest.h>
 
 #include "kzfp/command_line/sound_options.hpp"

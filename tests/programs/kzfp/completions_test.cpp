@@ -7,6 +7,7 @@
 #include <set>
 #include <sstream>
 
+#include <CLI/CLI.hpp>
 #include <gtest/gtest.h>
 
 #include "kzfp/commands/table.hpp"

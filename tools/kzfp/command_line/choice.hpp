@@ -8,8 +8,7 @@
 #include <string>
 #include <string_view>
 
-#include <CLI/CLI.hpp>
-
+#include "kzfp/command_line/parser.hpp"
 namespace kzfp {
 
 template <class Value>
@@ -77,14 +76,14 @@ std::string not_a_choice(const Choice<Value> (&choices)[count], std::string_view
 /// An option that takes a name of the table; the first one is the default. `choices` and `value`
 /// outlive the parsing.
 template <class Value, size_t count>
-void add_choice(CLI::App& app, const char* option, const char* type_name, std::string_view noun,
+void add_choice(Parser& parser, const char* option, const char* type_name, std::string_view noun,
                 const Choice<Value> (&choices)[count], Value& value)
 {
     value = choices[0].value;
     const auto take = [&choices, &value](const std::string& name) {
         value = *value_of(choices, name);
     };
-    app.add_option_function<std::string>(option, take, explanations_in(choices, " (default)"))
+    parser.add_option(option, take, explanations_in(choices, " (default)"))
         ->type_name(type_name)
         ->check([&choices, noun](const std::string& name) {
             return value_of(choices, name) ? std::string() : not_a_choice(choices, noun, name);

@@ -8,6 +8,8 @@
 #include <span>
 #include <system_error>
 
+#include <CLI/CLI.hpp>
+
 #include "kzfp/command_line/similar.hpp"
 #include "kzfp/command_line/versions.hpp"
 #include "kzfp/output/write.hpp"
@@ -103,22 +105,23 @@ std::string program_name(const Arguments& arguments)
     return name;
 }
 
-std::optional<ExitStatus> parse(CLI::App& parser, const Arguments& arguments)
+std::optional<ExitStatus> parse(Parser& parser, const Arguments& arguments)
 {
-    parser.set_version_flag("-V,-v,--version", versions_text, "Print the versions and exit");
-    parser.get_formatter()->column_width(32);
+    CLI::App& app = parser.app();
+    app.set_version_flag("-V,-v,--version", versions_text, "Print the versions and exit");
+    app.get_formatter()->column_width(32);
     if (arguments.describe != nullptr) {
-        (*arguments.describe)(parser);
+        (*arguments.describe)(app);
         return all_done;
     }
     try {
-        parser.parse(arguments.count, arguments.words);
+        app.parse(arguments.count, arguments.words);
         return {};
     } catch (const CLI::ParseError& error) {
         if (error.get_exit_code() != 0 || !file_with_a_dash(arguments).empty()) {
-            return refuse(parser, arguments, error);
+            return refuse(app, arguments, error);
         }
-        parser.exit(error, std::cout, std::cerr);
+        app.exit(error, std::cout, std::cerr);
         return std::cout.flush() ? all_done : some_file_failed;
     }
 }

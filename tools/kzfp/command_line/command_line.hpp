@@ -7,7 +7,7 @@
 #include <string>
 #include <string_view>
 
-#include <CLI/CLI.hpp>
+#include "kzfp/command_line/parser.hpp"
 
 namespace kzfp {
 
@@ -19,7 +19,7 @@ enum ExitStatus : int {
 };
 
 /// Takes a command's parser, once it has all its options.
-using Describe = std::function<void(CLI::App& parser)>;
+using Describe = std::function<void(const CLI::App& parser)>;
 
 /// The words that a command is run with.
 struct Arguments {
@@ -35,6 +35,6 @@ std::string program_name(const Arguments& arguments);
 /// Reads the words, with --help and --version besides the parser's own options. Prints what was
 /// requested or what is wrong, and returns the status to end with; nothing when the command is to
 /// be carried out.
-std::optional<ExitStatus> parse(CLI::App& parser, const Arguments& arguments);
+std::optional<ExitStatus> parse(Parser& parser, const Arguments& arguments);
 
 } // namespace kzfp

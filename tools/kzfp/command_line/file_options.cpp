@@ -47,7 +47,7 @@ void add_listed(std::vector<std::string>& all, const std::string& path)
 
 } // namespace
 
-void add_file_options(CLI::App& parser, FileArguments& files, const std::string& help)
+void add_file_options(Parser& parser, FileArguments& files, const std::string& help)
 {
     parser.add_option("FILE", files.named, help)->type_name("");
     parser
@@ -55,13 +55,13 @@ void add_file_options(CLI::App& parser, FileArguments& files, const std::string&
                     "Also work on the files that are listed in FILE, one on each line or with a\n"
                     "NUL behind each; - is standard input")
         ->type_name("FILE");
-    parser.callback([&files] { check_files_are_given(files); });
+    parser.when_read([&files] { check_files_are_given(files); });
 }
 
 void check_files_are_given(const FileArguments& files)
 {
     if (files.named.empty() && files.from.empty()) {
-        throw CLI::RequiredError("FILE");
+        refuse_missing("FILE");
     }
 }
 

@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include <CLI/CLI.hpp>
+#include "kzfp/command_line/parser.hpp"
 
 namespace kzfp {
 
@@ -15,9 +15,9 @@ struct FileArguments {
 };
 
 /// Adds the positional FILE and --files-from. One of them is needed. `files` outlives the parsing.
-void add_file_options(CLI::App& parser, FileArguments& files, const std::string& help);
+void add_file_options(Parser& parser, FileArguments& files, const std::string& help);
 
-/// Throws CLI::RequiredError when there is neither a file nor a list. For commands that set the
+/// Ends the parsing when there is neither a file nor a list. For commands that set the
 /// parser's callback themselves.
 void check_files_are_given(const FileArguments& files);
 

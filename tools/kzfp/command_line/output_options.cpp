@@ -41,13 +41,13 @@ std::string listed(std::span<const FormatChoice> offered, std::string_view betwe
     return text;
 }
 
-void add_format(CLI::App& parser, std::span<const FormatChoice> offered, Format& format)
+void add_format(Parser& parser, std::span<const FormatChoice> offered, Format& format)
 {
     format = offered.front().value;
     const auto take = [offered, &format](const std::string& name) {
         format = find_format(offered, name)->value;
     };
-    parser.add_option_function<std::string>("-f,--format", take, listed(offered, "\n", true))
+    parser.add_option("-f,--format", take, listed(offered, "\n", true))
         ->type_name("FORMAT")
         ->check([offered](const std::string& name) {
             return find_format(offered, name) != nullptr
@@ -59,7 +59,7 @@ void add_format(CLI::App& parser, std::span<const FormatChoice> offered, Format&
 
 } // namespace
 
-void add_output_options(CLI::App& parser, std::span<const FormatChoice> offered,
+void add_output_options(Parser& parser, std::span<const FormatChoice> offered,
                         OutputOptions& options)
 {
     add_format(parser, offered, options.format);
@@ -70,11 +70,11 @@ void add_output_options(CLI::App& parser, std::span<const FormatChoice> offered,
     add_progress_options(parser, options);
 }
 
-void add_progress_options(CLI::App& parser, OutputOptions& options)
+void add_progress_options(Parser& parser, OutputOptions& options)
 {
     add_choice(parser, "--progress", "HOW", "a way to show progress", kProgressModes,
                options.progress);
-    parser.add_flag_callback(
+    parser.add_flag(
         "-q,--quiet", [&options] { options.progress = ProgressMode::none; },
         "Show no progress; messages about what failed remain");
 }

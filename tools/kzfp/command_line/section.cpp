@@ -4,6 +4,8 @@
 
 #include <cmath>
 
+#include <CLI/CLI.hpp>
+
 namespace kzfp {
 
 namespace {
@@ -36,11 +38,11 @@ std::string check_time(const std::string& text)
     return to_seconds(text) ? std::string() : not_a_time(text, "from 0 to 1000000000 s");
 }
 
-void add_time_option(CLI::App& parser, const char* names, const char* help,
+void add_time_option(Parser& parser, const char* names, const char* help,
                      const std::function<void(double)>& take)
 {
     parser
-        .add_option_function<std::string>(
+        .add_option(
             names, [take](const std::string& text) { take(*to_seconds(text)); }, help)
         ->type_name("TIME")
         ->check(check_time);
@@ -73,7 +75,7 @@ std::string not_a_time(const std::string& text, std::string_view bounds)
            std::string(bounds);
 }
 
-void add_section_options(CLI::App& parser, audio::Section& section)
+void add_section_options(Parser& parser, audio::Section& section)
 {
     add_time_option(parser, "--start,--offset", "Start at this time: 90, 1:30 or 0:01:30.5",
                     [&section](double seconds) { section.start = seconds; });

@@ -6,9 +6,8 @@
 #include <string>
 #include <string_view>
 
-#include <CLI/CLI.hpp>
-
 #include "audio/stream_format.hpp"
+#include "kzfp/command_line/parser.hpp"
 
 namespace kzfp {
 
@@ -21,6 +20,6 @@ std::optional<double> to_seconds(std::string_view text);
 std::string not_a_time(const std::string& text, std::string_view bounds);
 
 /// Adds --start and --length. `section` outlives the parsing.
-void add_section_options(CLI::App& parser, audio::Section& section);
+void add_section_options(Parser& parser, audio::Section& section);
 
 } // namespace kzfp

@@ -6,6 +6,8 @@
 #include <string_view>
 #include <vector>
 
+#include <CLI/CLI.hpp>
+
 #include "kzfp/command_line/section.hpp"
 #include "kzsdk/stream/stream.h"
 
@@ -21,7 +23,7 @@ std::optional<uint32_t> to_number(std::string_view text)
     return error == std::errc{} && stop == end ? std::optional(number) : std::nullopt;
 }
 
-[[noreturn]] void refuse_raw(const std::string& what) { throw CLI::ValidationError("--raw", what); }
+[[noreturn]] void refuse_raw(const std::string& what) { refuse_value("--raw", what); }
 
 std::string usual_rates()
 {
@@ -57,10 +59,10 @@ void refuse_raw_rate(uint32_t rate, const std::string& rates)
     refuse_raw("a rate of '" + std::to_string(rate) + "' Hz is not supported; it is " + rates);
 }
 
-void add_raw_option(CLI::App& parser, std::optional<audio::StreamFormat>& raw)
+void add_raw_option(Parser& parser, std::optional<audio::StreamFormat>& raw)
 {
     parser
-        .add_option_function<std::string>(
+        .add_option(
             "--raw", [&raw](const std::string& text) { raw = to_raw_format(text); },
             "The files hold samples only: hertz, channels and an encoding,\n"
             "for example 44100,2,s16\n" +
@@ -68,17 +70,17 @@ void add_raw_option(CLI::App& parser, std::optional<audio::StreamFormat>& raw)
         ->type_name("RATE,CHANNELS,ENCODING");
 }
 
-void add_strict_option(CLI::App& parser, bool& strict)
+void add_strict_option(Parser& parser, bool& strict)
 {
     parser.add_flag("--strict", strict,
                     "A damaged file fails; without this what can be read of it is used,\n"
                     "with a warning");
 }
 
-void add_timeout_option(CLI::App& parser, std::optional<double>& timeout)
+void add_timeout_option(Parser& parser, std::optional<double>& timeout)
 {
     parser
-        .add_option_function<std::string>(
+        .add_option(
             "--timeout", [&timeout](const std::string& text) { timeout = to_seconds(text); },
             "Give a file up when nothing of it has come for this long: a pipe\n"
             "into which nobody writes (default: wait)")
@@ -89,7 +91,7 @@ void add_timeout_option(CLI::App& parser, std::optional<double>& timeout)
         });
 }
 
-void add_sound_options(CLI::App& parser, SoundOptions& options)
+void add_sound_options(Parser& parser, SoundOptions& options)
 {
     add_raw_option(parser, options.raw);
     add_section_options(parser, options.section);

@@ -6,10 +6,9 @@
 #include <optional>
 #include <string>
 
-#include <CLI/CLI.hpp>
-
 #include "audio/input.hpp"
 #include "kzfp/command_line/choice.hpp"
+#include "kzfp/command_line/parser.hpp"
 
 namespace kzfp {
 
@@ -29,18 +28,18 @@ inline constexpr Choice<audio::Encoding> kEncodings[] = {
 };
 
 /// Adds --raw, --start, --length, --strict and --timeout. `options` outlives the parsing.
-void add_sound_options(CLI::App& parser, SoundOptions& options);
+void add_sound_options(Parser& parser, SoundOptions& options);
 
 /// Adds --raw alone. Which rates there are, a command may narrow with refuse_raw_rate().
-void add_raw_option(CLI::App& parser, std::optional<audio::StreamFormat>& raw);
+void add_raw_option(Parser& parser, std::optional<audio::StreamFormat>& raw);
 
 /// Adds --strict. `strict` outlives the parsing.
-void add_strict_option(CLI::App& parser, bool& strict);
+void add_strict_option(Parser& parser, bool& strict);
 
 /// Adds --timeout. `timeout` outlives the parsing.
-void add_timeout_option(CLI::App& parser, std::optional<double>& timeout);
+void add_timeout_option(Parser& parser, std::optional<double>& timeout);
 
-/// Throws CLI::ValidationError for a rate of --raw. `rates` names those that are possible.
+/// Ends the parsing because of a rate of --raw. `rates` names those that are possible.
 [[noreturn]] void refuse_raw_rate(uint32_t rate, const std::string& rates);
 
 } // namespace kzfp

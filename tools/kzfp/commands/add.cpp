@@ -109,7 +109,7 @@ ExitStatus add_all(const AddSettings& settings)
 
 ExitStatus run_add(const Arguments& arguments)
 {
-    CLI::App parser(kDescription, program_name(arguments));
+    Parser parser(kDescription, program_name(arguments));
     parser.footer(kFooter);
     AddSettings settings;
     add_catalogue_option(parser, settings.catalogue);

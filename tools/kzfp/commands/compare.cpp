@@ -40,7 +40,7 @@ struct CompareSettings {
     std::string report;
 };
 
-void add_options(CLI::App& parser, CompareSettings& settings)
+void add_options(Parser& parser, CompareSettings& settings)
 {
     parser.add_option("FIRST", settings.first, "The file that the others are compared with")
         ->required()
@@ -190,7 +190,7 @@ ExitStatus compare_files(const CompareSettings& settings)
 
 ExitStatus run_compare(const Arguments& arguments)
 {
-    CLI::App parser(kDescription, program_name(arguments));
+    Parser parser(kDescription, program_name(arguments));
     parser.footer(kFooter);
     CompareSettings settings;
     add_options(parser, settings);

@@ -23,9 +23,9 @@ constexpr Choice<Script> kShells[] = {
 
 ExitStatus run_completions(const Arguments& arguments)
 {
-    CLI::App parser("Prints a script from which SHELL learns to complete the commands, options and "
-                    "choices\nof this program.",
-                    program_name(arguments));
+    Parser parser("Prints a script from which SHELL learns to complete the commands, options and "
+                  "choices\nof this program.",
+                  program_name(arguments));
     std::string shell;
     parser.add_option("SHELL", shell, explanations_in(kShells))
         ->required()

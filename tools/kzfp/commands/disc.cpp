@@ -90,7 +90,7 @@ ExitStatus run(const DiscOptions& options)
 
 ExitStatus run_disc(const Arguments& arguments)
 {
-    CLI::App parser(kDescription, program_name(arguments));
+    Parser parser(kDescription, program_name(arguments));
     DiscOptions options;
     parser.add_option("PATH", options.path, "Mounted disc, directory, device or image")
         ->required()

@@ -43,7 +43,7 @@ struct DuplicatesSettings {
     bool script = false;
 };
 
-void add_options(CLI::App& parser, DuplicatesSettings& settings)
+void add_options(Parser& parser, DuplicatesSettings& settings)
 {
     add_file_options(parser, settings.files, "A catalogue; or folders, sound files and trails");
     add_output_options(parser, kFormats, settings.output);
@@ -181,7 +181,7 @@ ExitStatus find_duplicates(const DuplicatesSettings& settings)
 
 ExitStatus run_duplicates(const Arguments& arguments)
 {
-    CLI::App parser(kDescription, program_name(arguments));
+    Parser parser(kDescription, program_name(arguments));
     parser.footer(kFooter);
     DuplicatesSettings settings;
     add_options(parser, settings);

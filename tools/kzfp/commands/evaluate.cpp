@@ -91,13 +91,13 @@ std::string check_lengths(const std::string& text)
     return parts_of(text).empty() ? "a length is needed, such as 15" : "";
 }
 
-void add_clip_options(CLI::App& parser, EvaluateOptions& options)
+void add_clip_options(Parser& parser, EvaluateOptions& options)
 {
     parser
         .add_option("--clips", options.settings.clips,
                     "Clips of each kind, and half as many of strangers (default: 30)")
         ->type_name("NUMBER")
-        ->check(between(1, 100000));
+        ->range(1, 100000);
     parser
         .add_option("--length", options.lengths,
                     "How long clips are; several lengths, such as 15,6, make\nseveral rows "
@@ -116,7 +116,7 @@ void add_clip_options(CLI::App& parser, EvaluateOptions& options)
         ->type_name("NUMBER");
 }
 
-void add_options(CLI::App& parser, EvaluateOptions& options)
+void add_options(Parser& parser, EvaluateOptions& options)
 {
     add_file_options(parser, options.files, "Sound files and folders of them");
     parser
@@ -217,7 +217,7 @@ ExitStatus run(EvaluateOptions& options)
 
 ExitStatus run_evaluate(const Arguments& arguments)
 {
-    CLI::App parser(kDescription, program_name(arguments));
+    Parser parser(kDescription, program_name(arguments));
     parser.footer(kFooter);
     EvaluateOptions options;
     add_options(parser, options);

@@ -115,22 +115,21 @@ ExitStatus export_to_file(const ExportSettings& settings)
                           : export_all(catalogue, settings);
 }
 
-void add_options(CLI::App& parser, ExportSettings& settings)
+void add_options(Parser& parser, ExportSettings& settings)
 {
     add_catalogue_option(parser, settings.catalogue);
     parser.add_option("FILE", settings.output.output, "Where it goes; - is standard output")
         ->required()
         ->type_name("");
-    CLI::Option* const trail =
-        parser
-            .add_option("--trail", settings.trail,
-                        "Write the trail of this track alone, as a .kzt file")
-            ->type_name("ID");
+    Option* const trail = parser
+                              .add_option("--trail", settings.trail,
+                                          "Write the trail of this track alone, as a .kzt file")
+                              ->type_name("ID");
     parser
         .add_option("--after", settings.after,
                     "Only tracks with higher ids, which were added later: a backup of what is new")
         ->type_name("ID")
-        ->check(CLI::NonNegativeNumber.description(""))
+        ->not_negative()
         ->excludes(trail);
     add_progress_options(parser, settings.output);
 }
@@ -139,7 +138,7 @@ void add_options(CLI::App& parser, ExportSettings& settings)
 
 ExitStatus run_export(const Arguments& arguments)
 {
-    CLI::App parser(kDescription, program_name(arguments));
+    Parser parser(kDescription, program_name(arguments));
     parser.footer("Exit: 0 it is written; 1 a track is damaged and left out, or nothing could be\n"
                   "      written; 2 wrong usage; 130 interrupted, FILE is as it was.");
     ExportSettings settings;

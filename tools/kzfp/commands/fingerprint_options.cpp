@@ -87,14 +87,14 @@ void check_raw_rate(const FingerprintOptions& options)
     }
 }
 
-void add_every_option(CLI::App& parser, std::optional<double>& every)
+void add_every_option(Parser& parser, std::optional<double>& every)
 {
     const auto check = [](const std::string& text) {
         const auto seconds = to_seconds(text);
         return seconds && *seconds >= kShortestStep ? std::string() : not_a_time(text, "from 0.1");
     };
     parser
-        .add_option_function<std::string>(
+        .add_option(
             "--every", [&every](const std::string& text) { every = to_seconds(text); },
             "A fingerprint for each window of a file or a pipe, this far apart,\n"
             "on a line with its time")
@@ -102,7 +102,7 @@ void add_every_option(CLI::App& parser, std::optional<double>& every)
         ->check(check);
 }
 
-void add_document_options(CLI::App& parser, FingerprintOptions& options)
+void add_document_options(Parser& parser, FingerprintOptions& options)
 {
     parser
         .add_option("--output-dir", options.directory,
@@ -111,7 +111,7 @@ void add_document_options(CLI::App& parser, FingerprintOptions& options)
     parser.add_flag("--wrap", options.wrapped, "Write the documents of all files as parts of one");
 }
 
-void add_options(CLI::App& parser, FingerprintOptions& options, FileArguments& files)
+void add_options(Parser& parser, FingerprintOptions& options, FileArguments& files)
 {
     add_file_options(parser, files, "Sound files; - is standard input");
     add_output_options(parser, kFingerprintFormats, options.output);
@@ -132,15 +132,14 @@ void check_documents(const FingerprintOptions& options)
     for (const auto& [name, given] :
          {std::pair{"--output-dir", has_directory}, std::pair{"--wrap", options.wrapped}}) {
         if (given && !documents) {
-            throw CLI::ValidationError(name, "is for documents; it goes with --format xml");
+            refuse_value(name, "is for documents; it goes with --format xml");
         }
         if (given && has_directory && (options.wrapped || !options.output.output.empty())) {
-            throw CLI::ValidationError("--output-dir", "excludes --output and --wrap");
+            refuse_value("--output-dir", "excludes --output and --wrap");
         }
     }
     if (options.every && documents) {
-        throw CLI::ValidationError(
-            "--every", "gives lines; choose --format json, csv, values or human with it");
+        refuse_value("--every", "gives lines; choose --format json, csv, values or human with it");
     }
 }
 
@@ -148,12 +147,12 @@ void check_documents(const FingerprintOptions& options)
 
 std::variant<FingerprintOptions, ExitStatus> parse_fingerprint_options(const Arguments& arguments)
 {
-    CLI::App parser(description(arguments), program_name(arguments));
+    Parser parser(description(arguments), program_name(arguments));
     parser.footer(about_rates() + kMoreNotes);
     FingerprintOptions options;
     FileArguments files;
     add_options(parser, options, files);
-    parser.callback([&] {
+    parser.when_read([&] {
         check_files_are_given(files);
         check_raw_rate(options);
         check_documents(options);

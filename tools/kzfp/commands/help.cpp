@@ -39,8 +39,8 @@ ExitStatus print_help(const std::string& name)
 
 ExitStatus run_help(const Arguments& arguments)
 {
-    CLI::App parser("Prints the help of COMMAND, or of the program when none is named.",
-                    program_name(arguments));
+    Parser parser("Prints the help of COMMAND, or of the program when none is named.",
+                  program_name(arguments));
     std::string name;
     parser.add_option("COMMAND", name, "Whose help is wanted")->type_name("")->check(check_command);
     if (const auto status = parse(parser, arguments)) {

@@ -145,7 +145,7 @@ ExitStatus import_all(const ImportSettings& settings)
 
 ExitStatus run_import(const Arguments& arguments)
 {
-    CLI::App parser(kDescription, program_name(arguments));
+    Parser parser(kDescription, program_name(arguments));
     parser.footer("Exit: 0 all tracks are there; 1 a file or a line of one could not be used (one\n"
                   "      line each on standard error), the others are there; 2 wrong usage;\n"
                   "      130 interrupted: what was imported is kept.");

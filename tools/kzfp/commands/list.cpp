@@ -120,9 +120,9 @@ ExitStatus list(const ListSettings& settings)
 
 ExitStatus run_list(const Arguments& arguments)
 {
-    CLI::App parser("Lists the tracks of CATALOGUE with their ids, lengths, sources and tags, and "
-                    "how it\nis looked up.",
-                    program_name(arguments));
+    Parser parser("Lists the tracks of CATALOGUE with their ids, lengths, sources and tags, and "
+                  "how it\nis looked up.",
+                  program_name(arguments));
     ListSettings settings;
     add_catalogue_option(parser, settings.catalogue);
     add_output_options(parser, kFormats, settings.output);

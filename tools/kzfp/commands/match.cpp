@@ -54,13 +54,13 @@ struct MatchSettings {
     std::string report;
 };
 
-void add_lookup_options(CLI::App& parser, MatchSettings& settings)
+void add_lookup_options(Parser& parser, MatchSettings& settings)
 {
     parser
         .add_option("--top,--candidates", settings.lookup.candidates,
                     "Also show the best tracks whatever their score, this many")
         ->type_name("NUMBER")
-        ->check(between(1, 1000));
+        ->range(1, 1000);
     parser.add_flag("--all,--passages", settings.lookup.passages,
                     "Everything that is recognised in a long file, from when to when, with the\n"
                     "gaps: a set list");
@@ -70,7 +70,7 @@ void add_lookup_options(CLI::App& parser, MatchSettings& settings)
     add_choice(parser, "--plan", "PLAN", "a plan", kPlans, settings.plan);
 }
 
-void add_options(CLI::App& parser, MatchSettings& settings)
+void add_options(Parser& parser, MatchSettings& settings)
 {
     add_catalogue_option(parser, settings.catalogue);
     add_file_options(parser, settings.files, "Clips; - is standard input");
@@ -253,7 +253,7 @@ ExitStatus match(const MatchSettings& settings)
 
 ExitStatus run_match(const Arguments& arguments)
 {
-    CLI::App parser(kDescription, program_name(arguments));
+    Parser parser(kDescription, program_name(arguments));
     parser.footer(kFooter);
     MatchSettings settings;
     add_options(parser, settings);

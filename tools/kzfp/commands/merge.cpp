@@ -103,7 +103,7 @@ ExitStatus merge_all(const MergeSettings& settings)
 
 ExitStatus run_merge(const Arguments& arguments)
 {
-    CLI::App parser(kDescription, program_name(arguments));
+    Parser parser(kDescription, program_name(arguments));
     parser.footer(
         "Exit: 0 all are merged; 1 one could not be, or not as a whole; 2 wrong usage;\n"
         "      130 interrupted: what was merged is kept, and the command can be repeated.");

@@ -35,10 +35,10 @@ constexpr Choice<ClockKind> kClocks[] = {
     {"wall", ClockKind::wall, "the time of day, for a stream that is heard as it is played"},
 };
 
-void add_seconds(CLI::App& parser, const char* name, const char* help, double highest, double& to)
+void add_seconds(Parser& parser, const char* name, const char* help, double highest, double& to)
 {
     parser
-        .add_option_function<std::string>(
+        .add_option(
             name, [&to](const std::string& text) { to = *to_seconds(text); }, help)
         ->type_name("TIME")
         ->check([highest](const std::string& text) {
@@ -49,7 +49,7 @@ void add_seconds(CLI::App& parser, const char* name, const char* help, double hi
         });
 }
 
-void add_options(CLI::App& parser, MonitorSettings& settings)
+void add_options(Parser& parser, MonitorSettings& settings)
 {
     add_catalogue_option(parser, settings.catalogue);
     parser.add_option("STREAM", settings.stream, "What is listened to; - is standard input")
@@ -64,7 +64,7 @@ void add_options(CLI::App& parser, MonitorSettings& settings)
     add_timeout_option(parser, settings.timeout);
     add_choice(parser, "--clock", "CLOCK", "a clock", kClocks, settings.clock);
     parser
-        .add_option_function<std::string>(
+        .add_option(
             "--for", [&settings](const std::string& text) { settings.longest = to_seconds(text); },
             "Stop after this much of the stream")
         ->type_name("TIME")
@@ -79,8 +79,8 @@ void add_options(CLI::App& parser, MonitorSettings& settings)
         .add_option("--silence", settings.options.silence_level,
                     "What is below this level is silence, in dB of full scale (default: -60)")
         ->type_name("DB")
-        ->check(CLI::Range(-120.0, 0.0).description(""));
-    parser.add_flag_callback(
+        ->range(-120.0, 0.0);
+    parser.add_flag(
         "--no-speeds", [&settings] { settings.options.speeds = 0; },
         "Look for tracks only at their own speed, tempo and pitch");
 }
@@ -89,7 +89,7 @@ void add_options(CLI::App& parser, MonitorSettings& settings)
 
 ExitStatus run_monitor(const Arguments& arguments)
 {
-    CLI::App parser(kDescription, program_name(arguments));
+    Parser parser(kDescription, program_name(arguments));
     parser.footer(kFooter);
     MonitorSettings settings;
     kzcat_initialize_monitor_options(&settings.options);

@@ -152,14 +152,14 @@ ExitStatus remove_all(const RemoveSettings& settings)
     });
 }
 
-void add_options(CLI::App& parser, RemoveSettings& settings)
+void add_options(Parser& parser, RemoveSettings& settings)
 {
     add_catalogue_option(parser, settings.catalogue);
-    CLI::Option* const words =
+    Option* const words =
         parser.add_option("WHAT", settings.words, "Ids of tracks, or paths of sources")
             ->type_name("");
     parser.add_flag("--paths", settings.paths, "Numbers are paths too");
-    CLI::Option* const missing =
+    Option* const missing =
         parser
             .add_flag("--missing", settings.missing,
                       "Remove the absolute paths at which there is nothing any more")
@@ -170,9 +170,9 @@ void add_options(CLI::App& parser, RemoveSettings& settings)
         ->needs(missing);
     parser.add_flag("-n,--dry-run", settings.dry_run, "Only print what would be removed");
     add_output_options(parser, kFormats, settings.output);
-    parser.callback([words, missing] {
+    parser.when_read([words, missing] {
         if (words->count() == 0 && missing->count() == 0) {
-            throw CLI::RequiredError("WHAT or --missing");
+            refuse_missing("WHAT or --missing");
         }
     });
 }
@@ -181,7 +181,7 @@ void add_options(CLI::App& parser, RemoveSettings& settings)
 
 ExitStatus run_remove(const Arguments& arguments)
 {
-    CLI::App parser(kDescription, program_name(arguments));
+    Parser parser(kDescription, program_name(arguments));
     parser.footer("Exit: 0 all are removed; 1 one was not there; 2 wrong usage; 130 interrupted.");
     RemoveSettings settings;
     add_options(parser, settings);

@@ -97,9 +97,9 @@ ExitStatus verify(const VerifySettings& settings)
 
 ExitStatus run_verify(const Arguments& arguments)
 {
-    CLI::App parser("Reads everything in CATALOGUE and reports what is damaged, one line each on "
-                    "standard error.",
-                    program_name(arguments));
+    Parser parser("Reads everything in CATALOGUE and reports what is damaged, one line each on "
+                  "standard error.",
+                  program_name(arguments));
     parser.footer("Exit: 0 the catalogue is whole; 1 it is not, or cannot be read; 2 wrong usage;\n"
                   "      130 interrupted.");
     VerifySettings settings;

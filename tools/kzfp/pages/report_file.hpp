@@ -5,14 +5,13 @@
 #include <span>
 #include <string>
 
-#include <CLI/CLI.hpp>
-
+#include "kzfp/command_line/parser.hpp"
 #include "kzfp/output/write.hpp"
 
 namespace kzfp {
 
 /// Adds --report. `path` outlives the parsing.
-inline void add_report_option(CLI::App& parser, std::string& path)
+inline void add_report_option(Parser& parser, std::string& path)
 {
     parser
         .add_option("--report", path,
