@@ -27,6 +27,12 @@ LICENCES = {
     "libsndfile1": "LGPL-2.1-or-later",
     "libsqlite3-0": "blessing",
     "libsoxr0": "LGPL-2.1-or-later",
+    "libpng16-16": "libpng-2.0",
+    "libportaudio2": "MIT",
+    # Debian builds FFmpeg with its parts under the GPL.
+    "libavcodec59": "GPL-2.0-or-later",
+    "libavformat59": "GPL-2.0-or-later",
+    "libavutil57": "GPL-2.0-or-later",
     "libcli11-dev": "BSD-3-Clause",
     "nlohmann-json3-dev": "MIT",
 }

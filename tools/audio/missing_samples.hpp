@@ -10,8 +10,8 @@
 
 namespace audio {
 
-/// The bytes of samples that a header states and the file does not have, by what libsndfile writes
-/// down while it reads the header. 0 where nothing is missing, or where the header states no length.
+/// The bytes of samples that a header states and the file does not have, by what libsndfile
+/// writes down while it reads the header. 0 where nothing is missing or no length is stated.
 uint64_t missing_bytes(std::string_view log);
 
 /// Why a file is damaged that was read to its end: it was cut off. Empty when it was not. For files

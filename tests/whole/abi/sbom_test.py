@@ -38,7 +38,8 @@ class Sbom(unittest.TestCase):
     def test_the_program_needs_the_libraries_and_its_packages(self):
         self.assertEqual(
             self.depends["kzfp"],
-            ["deb:libc6", "deb:libcli11-dev", "deb:libgcc-s1", "deb:libnettle8", "deb:libsndfile1",
+            ["deb:libavcodec59", "deb:libavformat59", "deb:libavutil57", "deb:libc6", "deb:libcli11-dev",
+             "deb:libgcc-s1", "deb:libnettle8", "deb:libpng16-16", "deb:libportaudio2", "deb:libsndfile1",
              "deb:libsoxr0", "deb:libsqlite3-0", "deb:libstdc++6", "deb:nlohmann-json3-dev", "libkzcat",
              "libkzsdk"])
 
