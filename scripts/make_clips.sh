@@ -93,6 +93,8 @@ make_compressed() {
     }
     ffmpeg_plain "$@" -c:a alac music-alac.m4a
     ffmpeg_plain "$@" -c:a libopus -b:a 96k music.webm
+    # Out of packets of changing length, as many files of Opus are.
+    ffmpeg_plain -i music.ogg -fflags +bitexact -flags:a +bitexact -c:a libopus music.opus
     ffmpeg_plain "$@" -c:a ac3 -b:a 192k music.ac3
     ffmpeg_plain "$@" -c:a aac -b:a 128k -f adts music.aac
     # A film, the picture of an album in front of the sound, and music before another sound.

@@ -51,6 +51,8 @@ SoundFile::SoundFile(int file, const AcceptsRate& accepts_rate, bool floats)
     }
 }
 
+bool SoundFile::is_opus() const { return (info_.format & SF_FORMAT_SUBMASK) == SF_FORMAT_OPUS; }
+
 void SoundFile::select(const Section& section)
 {
     if (section.length) {

@@ -34,6 +34,9 @@ public:
     size_t read(std::span<std::byte> bytes) override;
     std::string trouble() const override;
 
+    /// libsndfile 1.2 reads such files wrongly where packets change their length.
+    bool is_opus() const;
+
 private:
     struct Close {
         void operator()(SNDFILE* file) const { sf_close(file); }

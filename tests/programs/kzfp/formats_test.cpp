@@ -90,6 +90,16 @@ TEST_F(KzfpFormats, StartsAreFoundToTheSample)
     EXPECT_EQ(expected, from_start("very-late.mkv"));
 }
 
+TEST_F(KzfpFormats, OpusIsReadToItsEnd)
+{
+    const ScratchDirectory scratch;
+    const std::string catalogue = scratch.path("music.kzc");
+    const ProcessResult result = kzfp({"add", "-q", catalogue, clip("music.opus")});
+    EXPECT_EQ("", result.err);
+    const json track = json::parse(output_of({"list", "--format", "json", catalogue}));
+    EXPECT_NEAR(20, track["seconds"].get<double>(), 0.2) << track;
+}
+
 TEST_F(KzfpFormats, TagsAreThoseOfTheFile)
 {
     const ScratchDirectory scratch;
