@@ -61,7 +61,7 @@ fi
 # The very command of the README, which ends with the suite's own count.
 step "g++: build and all tests" ./run test -DKZ_WERROR=ON
 step "the same bytes in another folder" ./run check-reproducible build/release
-# The program is the same source with every compiler, and the sanitizers' step builds it with clang++.
+# The sanitizers' step builds the program with clang++ too, which takes long.
 step "clang++: the libraries and their tests" clang_libraries
 # Clang's sanitizers see more, and g++'s take some headers of its own library for faulty.
 step "address, undefined-behaviour, integer and leak sanitizers: all tests" tests asan-clang

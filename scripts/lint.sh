@@ -1,6 +1,6 @@
 #!/bin/sh
-# Checks the tree: format, clang-tidy, cppcheck, man pages, scripts, documents. Every check runs; any
-# complaint makes the whole fail.
+# Checks the tree: format, clang-tidy, cppcheck, man pages, scripts, documents. Every check runs;
+# any complaint makes the whole fail.
 #
 #   scripts/lint.sh [build-directory]     with compile_commands.json; default build/lint, made here
 #
