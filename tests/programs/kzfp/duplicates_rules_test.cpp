@@ -160,6 +160,21 @@ TEST(DuplicatesQuality, LossyIsInferiorIfNothingIsBetter)
     EXPECT_FALSE(is_clearly_inferior(lossy([](Quality&) {}), transcoded));
 }
 
+/// The start of a file of Sony's Wave64, which names a chunk in 16 bytes.
+std::string wave64(char form)
+{
+    return "riff" + std::string(36, '\0') + "fmt " + std::string(20, '\0') + form +
+           std::string(1, '\0');
+}
+
+std::string mp4(const std::string& form, const std::string& title)
+{
+    return std::string("\0\0\0\x10"
+                       "ftypM4A \0\0\0\0stsd",
+                       20) +
+           std::string(12, '\0') + form + title;
+}
+
 TEST(DuplicatesQuality, KnowsWhatKeepsAllOfTheSound)
 {
     EXPECT_TRUE(is_lossless("fLaC"));
@@ -170,6 +185,14 @@ TEST(DuplicatesQuality, KnowsWhatKeepsAllOfTheSound)
                             "FLAC"));
     EXPECT_FALSE(is_lossless(std::string("OggS") + std::string(24, '\0') + "\1vorbis"));
     EXPECT_FALSE(is_lossless("ID3"));
+    EXPECT_TRUE(is_lossless(std::string("ID3\4\0\0\0\0\0\3***fLaC", 17)));
+    EXPECT_TRUE(is_lossless(std::string("RIFX\0\0\0\0WAVEfmt \0\0\0\x10\0\1", 22)));
+    EXPECT_TRUE(is_lossless(wave64(1)));
+    EXPECT_FALSE(is_lossless(wave64(0x11)));
+    EXPECT_TRUE(is_lossless(std::string(".snd\0\0\0\x18\0\0\0\0\0\0\0\3", 16)));
+    EXPECT_FALSE(is_lossless(std::string(".snd\0\0\0\x18\0\0\0\0\0\0\0\1", 16)));
+    EXPECT_TRUE(is_lossless(mp4("alac", "")));
+    EXPECT_FALSE(is_lossless(mp4("mp4a", "Palace")));
     EXPECT_FALSE(is_lossless("RIFF"));
     EXPECT_FALSE(is_lossless(""));
 }

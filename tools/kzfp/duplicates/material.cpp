@@ -9,6 +9,7 @@
 #include "kzfp/catalogue/tracks.hpp"
 #include "kzfp/output/interruption.hpp"
 #include "kzfp/output/progress.hpp"
+#include "kzfp/output/write.hpp"
 
 namespace kzfp {
 
@@ -135,11 +136,12 @@ Catalogue catalogue_of_files(const std::vector<std::string>& named, const SoundO
         list.files.size(), jobs, [&](size_t i) { return read_file(list.files[i], sound); },
         [&](size_t i, const ReadFile& read) {
             const std::string& path = list.files[i].path;
-            const std::string& trouble =
-                read.trouble.empty() ? read.recording.warning : read.trouble;
-            if (!trouble.empty() && !interrupted()) {
+            if (!read.trouble.empty() && !interrupted()) {
                 progress.clear();
-                complain(path, trouble);
+                complain(path, read.trouble);
+            } else if (!read.recording.warning.empty() && !interrupted()) {
+                progress.clear();
+                write_message(path + ": " + read.recording.warning);
             }
             if (read.recording.trail) {
                 add(*catalogue, path, read);

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
+#include <fstream>
 #include <string_view>
 #include <tuple>
 #include <vector>
@@ -19,6 +20,7 @@ namespace kzfp {
 namespace {
 
 constexpr size_t kBeginning = 65536;
+constexpr uint64_t kLongestFile = uint64_t{1} << 62U;
 constexpr double kLookedAt = 20; ///< seconds
 constexpr double kBandwidthStep = 2000;
 constexpr double kAudible = 20000; ///< hertz
@@ -31,13 +33,79 @@ uint32_t little_endian_16(std::string_view bytes, size_t at)
                : 0;
 }
 
+bool is_whole_numbers_or_floats(uint32_t form) { return form == 1 || form == 3; }
+
 /// Whole numbers, floats, or either as the extensible form has them.
 bool is_lossless_wave(std::string_view bytes)
 {
     const size_t chunk = bytes.find("fmt ");
-    const uint32_t form = chunk == std::string_view::npos ? 0 : little_endian_16(bytes, chunk + 8);
-    return form == 1 || form == 3 || form == 0xFFFE;
+    if (chunk == std::string_view::npos) {
+        return false;
+    }
+    const size_t at = chunk + (bytes.starts_with("riff") ? 24 : 8); // Wave64 has longer names
+    uint32_t form = little_endian_16(bytes, at);
+    if (bytes.starts_with("RIFX")) {
+        form = (form & 0xFFU) << 8U | form >> 8U;
+    }
+    return is_whole_numbers_or_floats(form == 0xFFFE ? little_endian_16(bytes, at + 24) : form);
 }
+
+/// What follows the tag, whose length has seven bits in each byte.
+std::string_view behind_id3(std::string_view bytes)
+{
+    size_t length = 0;
+    for (size_t at = 6; at < 10 && at < bytes.size(); ++at) {
+        length = length << 7U | (static_cast<uint8_t>(bytes[at]) & 0x7FU);
+    }
+    return bytes.substr(std::min(bytes.size(), 10 + length));
+}
+
+/// Of any of the sounds in it.
+bool is_lossless_mp4(std::string_view bytes)
+{
+    for (size_t at = bytes.find("stsd"); at != std::string_view::npos;
+         at = bytes.find("stsd", at + 4)) {
+        if (bytes.size() >= at + 20 && bytes.substr(at + 16, 4) == "alac") {
+            return true;
+        }
+    }
+    return false;
+}
+
+uint64_t big_endian(std::string_view bytes)
+{
+    uint64_t number = 0;
+    for (const char byte : bytes) {
+        number = number << 8U | static_cast<uint8_t>(byte);
+    }
+    return number;
+}
+
+/// Where an MP4 file says what is in it: at its start, or behind everything else.
+std::string description_in_mp4(const std::string& path)
+{
+    std::ifstream file(path, std::ios::binary);
+    uint64_t at = 0;
+    std::string box(16, '\0');
+    while (file.seekg(static_cast<std::streamoff>(at)) && file.read(box.data(), 16)) {
+        const std::string_view bytes = box;
+        const uint64_t short_size = big_endian(bytes.substr(0, 4));
+        const uint64_t size = short_size == 1 ? big_endian(bytes.substr(8, 8)) : short_size;
+        if (bytes.substr(4, 4) == "moov") {
+            std::string text(kBeginning, '\0');
+            file.read(text.data(), static_cast<std::streamsize>(text.size()));
+            text.resize(static_cast<size_t>(file.gcount()));
+            return text;
+        }
+        if (size < 8 || size > kLongestFile - at) {
+            break;
+        }
+        at += size;
+    }
+    return {};
+}
+
+bool is_mp4(std::string_view bytes) { return bytes.size() >= 8 && bytes.substr(4, 4) == "ftyp"; }
 
 bool is_lossless_aifc(std::string_view bytes)
 {
@@ -97,11 +165,19 @@ bool is_lossless(const std::string& beginning)
                                         "FLAC") != std::string_view::npos;
     }
     if (begins("caff")) {
-        return bytes.find("lpcm") != std::string_view::npos ||
-               bytes.find("alac") != std::string_view::npos;
+        const size_t chunk = bytes.find("desc");
+        const std::string_view form =
+            bytes.substr(std::min(bytes.size(), chunk + (chunk < bytes.size() ? 20 : 0)), 4);
+        return form == "lpcm" || form == "alac";
     }
-    if (bytes.size() >= 8 && bytes.substr(4, 4) == "ftyp") {
-        return bytes.find("alac") != std::string_view::npos;
+    if (is_mp4(bytes)) {
+        return is_lossless_mp4(bytes);
+    }
+    if (begins(".snd")) {
+        return bytes.size() >= 16 && bytes[15] >= 2 && bytes[15] <= 7;
+    }
+    if (begins("ID3")) {
+        return behind_id3(bytes).starts_with("fLaC");
     }
     return begins("fLaC") || begins("wvPk") || begins("MAC ") || begins("TTA1");
 }
@@ -119,7 +195,9 @@ Quality quality_of(const std::string& path, const SoundOptions& sound)
         if (!S_ISREG(facts.st_mode)) {
             throw audio::FileError("is no regular file any more");
         }
-        quality.lossless = sound.raw || is_lossless(beginning_of(path, kBeginning));
+        const std::string beginning = beginning_of(path, kBeginning);
+        quality.lossless = sound.raw || is_lossless(beginning) ||
+                           (is_mp4(beginning) && is_lossless_mp4(description_in_mp4(path)));
         if (sound.raw || content_of_file(path) == Content::sound) {
             look_at_sound(path, sound, quality);
         }
