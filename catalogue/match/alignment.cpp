@@ -56,7 +56,8 @@ public:
         : longer_(longer), shorter_(shorter), votes_(longer.size() + shorter.size())
     {
         const size_t length = std::min(kSegment, shorter.size());
-        const size_t segments = std::clamp<size_t>(shorter.size() / kSegment, 1, kMostSegments);
+        const size_t covering = (shorter.size() + kSegment - 1) / kSegment;
+        const size_t segments = std::clamp<size_t>(covering, 1, kMostSegments);
         for (size_t i = 0; i < segments; ++i) {
             const size_t room = shorter.size() - length;
             add(segments == 1 ? 0 : room * i / (segments - 1), length);

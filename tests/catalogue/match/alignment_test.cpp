@@ -71,6 +71,15 @@ TEST(Alignment, OfATrailWithItselfHasNoErrors)
     }
 }
 
+TEST(Alignment, FindsShortTrailsThatBeginWithSilence)
+{
+    Codes codes = random_codes(60, 2);
+    std::fill_n(codes.begin(), 24, 0);
+    const auto found = align(codes, codes);
+    ASSERT_TRUE(found);
+    EXPECT_EQ(0, found->lag);
+}
+
 TEST(Alignment, FindsAnExcerptWhicheverComesFirst)
 {
     const Codes whole = random_codes(1000, 2);
