@@ -244,7 +244,7 @@ TEST(KzfpAdd, FoldersAreWalkedInTheOrderOfNames)
     fs::create_directory_symlink(scratch.path("m"), scratch.path("m/loop"));
     const std::string folder = scratch.path("m");
     EXPECT_EQ("added " + folder + "/a.wav\nadded " + folder + "/b/1.WAV\nadded " + folder +
-                  "/b/2.wav\n3 added; 1 file that is no sound passed over; 1 link to a folder not "
+                  "/b/2.wav\n3 added; 1 file passed over that is not sound; 1 link to a folder not "
                   "followed (name the folder to add what is below it)\n",
               output_of({"add", "-j", "3", catalogue, folder}));
 }

@@ -42,6 +42,32 @@ std::string error_of(const std::string& path, const std::vector<std::string>& in
     }
 }
 
+TEST(KzfpOutput, NeverReplacesWhatIsNoResult)
+{
+    const ScratchDirectory scratch;
+    for (const std::string& bytes : {contents(clip("music.ogg")), contents(clip("music.mp3"))}) {
+        const std::string song = scratch.write("song", bytes);
+        EXPECT_NE(std::string::npos, error_of(song).find("would be lost")) << error_of(song);
+        EXPECT_EQ(bytes, contents(song));
+    }
+    const std::string catalogue = scratch.path("music.kzc");
+    ASSERT_EQ(0, kz::test::kzfp({"add", "-q", catalogue, clip("music.ogg")}).status);
+    const std::string whole = contents(catalogue);
+    EXPECT_EQ(
+        1, kz::test::kzfp({"match", "-q", "-o", catalogue, catalogue, clip("music.ogg")}).status);
+    EXPECT_EQ(whole, contents(catalogue));
+}
+
+TEST(KzfpOutput, ListsOfFilesAreNotReplaced)
+{
+    const ScratchDirectory scratch;
+    const std::string list = scratch.write("list", clip("music.ogg") + "\n");
+    const std::string catalogue = scratch.path("music.kzc");
+    EXPECT_EQ(1, kz::test::kzfp({"add", "-q", catalogue, "--files-from", list, "-o", list}).status);
+    EXPECT_NE(0, kz::test::kzfp({"--files-from", list, "-o", list}).status);
+    EXPECT_EQ(clip("music.ogg") + "\n", contents(list));
+}
+
 TEST(KzfpOutputFile, AppearsWhenTheCommandEnds)
 {
     const ScratchDirectory directory;
@@ -66,12 +92,12 @@ TEST(KzfpOutputFile, KeepsWhatWasThereWhenTheCommandFails)
     EXPECT_EQ(1u, files_in(directory.path()));
 }
 
-TEST(KzfpOutputFile, GrowsAtOnceWhenItIsLive)
+TEST(KzfpOutputFile, GrowsFromTheFirstResultOnWhenLive)
 {
     const ScratchDirectory directory;
     const std::string path = directory.write("out", "old");
     const OutputFile file(path, {}, OutputFile::Mode::live);
-    EXPECT_EQ("", contents(path));
+    EXPECT_EQ("old", contents(path));
     write_output("new");
     EXPECT_EQ("new", contents(path));
 }

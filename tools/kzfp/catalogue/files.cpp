@@ -53,7 +53,8 @@ void list_entry(const fs::path& entry, FileList& list)
         ++list.links; // it may lead round in circles
     } else if (type == fs::file_type::directory) {
         list_folder(entry, list);
-    } else if (sounds(entry)) {
+    } else if (sounds(entry) &&
+               (type == fs::file_type::regular || type == fs::file_type::not_found)) {
         list.files.push_back({.path = entry.string(), .trouble = {}});
     } else {
         ++list.passed_over;
@@ -147,9 +148,9 @@ bool is_gone(const std::string& path)
 void check_is_not_of(const std::string& catalogue, const std::string& path)
 {
     std::error_code error;
-    const std::string real = fs::weakly_canonical(catalogue, error).string();
-    const std::string named = fs::weakly_canonical(path, error).string();
-    for (const char* ending : {"", "-wal", "-shm", "-journal"}) {
+    const std::string real = fs::weakly_canonical(fs::absolute(catalogue, error), error).string();
+    const std::string named = fs::weakly_canonical(fs::absolute(path, error), error).string();
+    for (const char* ending : {"", "-wal", "-shm", "-journal", ".idx"}) {
         const std::string own = real + ending;
         // By name as well, since another program may make the file at any moment.
         if (path != "-" && (named == own || fs::equivalent(path, own, error))) {

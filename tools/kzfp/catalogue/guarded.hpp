@@ -16,14 +16,17 @@
 namespace kzfp {
 
 /// Throws audio::FileError when the results would replace the catalogue or a file beside it.
-inline void check_output(const std::string& catalogue, const std::string& output)
+/// `option` is how the file was named.
+inline void check_output(const std::string& catalogue, const std::string& output,
+                         const std::string& option = "the output")
 {
     try {
         if (!output.empty()) {
             check_is_not_of(catalogue, output);
         }
     } catch (const audio::FileError& error) {
-        throw audio::FileError(output + ": " + error.what() + "; the output needs another file");
+        throw audio::FileError(output + ": " + error.what() + "; " + option +
+                               " needs another file");
     }
 }
 

@@ -27,7 +27,7 @@ bool is_file(const std::string& word)
 /// A word that was read as options, while it is the name of a file; empty when there is none.
 std::string file_with_a_dash(const Arguments& arguments)
 {
-    for (const std::string word :
+    for (std::string word :
          std::span(arguments.words, static_cast<size_t>(arguments.count)).subspan(1)) {
         if (word == "--") {
             break;
@@ -61,11 +61,12 @@ std::string about_extras(const CLI::App& parser, const CLI::ParseError& error)
         const std::string meant =
             most_similar(word.substr(0, word.find('=')), long_options(parser));
         if (!meant.empty()) {
-            return text + "; did you mean " + meant + "?";
+            return text.append("; did you mean ").append(meant).append("?");
         }
-        return word.starts_with("--")
-                   ? text
-                   : text + "; a file of that name is given as ./" + word + " or after --";
+        if (!word.starts_with("--")) {
+            text.append("; a file of that name is given as ./").append(word).append(" or after --");
+        }
+        return text;
     }
     return error.what();
 }

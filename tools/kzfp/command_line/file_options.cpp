@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdio>
 #include <fstream>
 #include <iostream>
 #include <iterator>
@@ -24,7 +25,10 @@ std::string read_all(const std::string& path)
     std::istream& list = path == "-" ? std::cin : file;
     try {
         if (list) {
-            return {std::istreambuf_iterator<char>(list), {}};
+            std::string text{std::istreambuf_iterator<char>(list), {}};
+            if (path != "-" || std::ferror(stdin) == 0) {
+                return text;
+            }
         }
     } catch (const std::ios_base::failure&) { // of a directory, for example
     }
@@ -63,6 +67,15 @@ void check_files_are_given(const FileArguments& files)
     if (files.named.empty() && files.from.empty()) {
         refuse_missing("FILE");
     }
+}
+
+std::vector<std::string> inputs_of(const FileArguments& files)
+{
+    std::vector<std::string> inputs = files.named;
+    if (!files.from.empty()) {
+        inputs.push_back(files.from);
+    }
+    return inputs;
 }
 
 std::vector<std::string> all_files(const FileArguments& files)

@@ -21,6 +21,10 @@ void add_file_options(Parser& parser, FileArguments& files, const std::string& h
 /// parser's callback themselves.
 void check_files_are_given(const FileArguments& files);
 
+/// The files that are named on the command line, the list among them: what results must not
+/// replace.
+std::vector<std::string> inputs_of(const FileArguments& files);
+
 /// What was named, then the lines of the list; a list that holds a NUL is divided at NULs. Empty
 /// lines are passed over. Throws audio::FileError, also when standard input would be read twice.
 std::vector<std::string> all_files(const FileArguments& files);

@@ -2,6 +2,7 @@
 
 #include "kzfp/command_line/parser.hpp"
 
+#include <cmath>
 #include <utility>
 
 #include <CLI/CLI.hpp>
@@ -36,7 +37,12 @@ Option* Option::range(int lowest, int highest)
 
 Option* Option::range(double lowest, double highest)
 {
-    option_->check(CLI::Range(lowest, highest).description(""));
+    const CLI::Validator within = CLI::Range(lowest, highest);
+    option_->check([within](const std::string& word) {
+        double number = 0;
+        const bool is_nan = CLI::detail::lexical_cast(word, number) && std::isnan(number);
+        return is_nan ? "'" + word + "' is not a number" : within(word);
+    });
     return this;
 }
 
@@ -116,7 +122,8 @@ Option* Parser::add_option(const std::string& names, std::optional<uint32_t>& va
     return keep(app_->add_option(names, value, help));
 }
 
-Option* Parser::add_option(const std::string& names, std::function<void(const std::string&)> take,
+Option* Parser::add_option(const std::string& names,
+                           const std::function<void(const std::string&)>& take,
                            const std::string& help)
 {
     return keep(app_->add_option_function<std::string>(names, take, help));

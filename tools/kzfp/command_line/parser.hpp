@@ -66,7 +66,8 @@ public:
                        const std::string& help);
 
     /// Hands the word to `take`, after all checks.
-    Option* add_option(const std::string& names, std::function<void(const std::string&)> take,
+    Option* add_option(const std::string& names,
+                       const std::function<void(const std::string&)>& take,
                        const std::string& help);
 
     Option* add_flag(const std::string& names, bool& value, const std::string& help);

@@ -55,8 +55,8 @@ std::string summary(const Writer& writer, const FileList& list)
     std::string text = counts_text(writer.counts());
     text = text.empty() ? "nothing to add" : text;
     if (list.passed_over != 0) {
-        text += "; " + files_text(list.passed_over) +
-                (list.passed_over == 1 ? " that is" : " that are") + " no sound passed over";
+        text += "; " + files_text(list.passed_over) + " passed over that " +
+                (list.passed_over == 1 ? "is" : "are") + " not sound";
     }
     if (list.links != 0) {
         text += "; " + std::to_string(list.links) +
@@ -126,7 +126,7 @@ ExitStatus run_add(const Arguments& arguments)
         return *status;
     }
     watch_for_interruption();
-    return guarded(settings.catalogue, settings.output, settings.files.named,
+    return guarded(settings.catalogue, settings.output, inputs_of(settings.files),
                    OutputFile::Mode::live, [&settings] { return add_all(settings); });
 }
 

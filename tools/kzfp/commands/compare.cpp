@@ -149,13 +149,16 @@ ExitStatus compare_all(const CompareSettings& settings, ComparisonPage* page)
     }
     std::string error;
     const auto first = attempt(error, [&] { return read_side(settings.first, settings.sound); });
+    if (!first && interrupted()) {
+        write_message("interrupted");
+        return interrupted_by_user;
+    }
     if (!first) {
         return fail_all(settings, error, page);
     }
     if (!first->warning.empty()) {
         write_message(settings.first + ": " + first->warning);
     }
-    watch_for_interruption();
     Progress progress(settings.others.size(), settings.output.progress);
     ExitStatus status = all_done;
     size_t done = 0;
@@ -172,6 +175,7 @@ ExitStatus compare_all(const CompareSettings& settings, ComparisonPage* page)
 
 ExitStatus compare_files(const CompareSettings& settings)
 {
+    watch_for_interruption();
     std::vector<std::string> inputs = settings.others;
     inputs.push_back(settings.first);
     OutputFile output(settings.output.output, inputs);

@@ -190,7 +190,7 @@ ExitStatus run_duplicates(const Arguments& arguments)
     }
     watch_for_interruption();
     const std::string first = settings.files.named.empty() ? "" : settings.files.named.front();
-    return guarded(first, settings.output, settings.files.named, OutputFile::Mode::whole,
+    return guarded(first, settings.output, inputs_of(settings.files), OutputFile::Mode::whole,
                    [&settings] { return find_duplicates(settings); });
 }
 

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "audio/source.hpp"
+#include "kzfp/catalogue/guarded.hpp"
 #include "kzfp/command_line/common_options.hpp"
 #include "kzfp/command_line/file_options.hpp"
 #include "kzfp/command_line/output_options.hpp"
@@ -184,7 +185,7 @@ std::vector<std::string> other_files(const EvaluateOptions& options)
 {
     std::vector<std::string> files = options.settings.files;
     files.push_back(options.settings.catalogue);
-    files.push_back(options.output.output);
+    files.push_back(options.files.from);
     return files;
 }
 
@@ -195,8 +196,14 @@ ExitStatus run(EvaluateOptions& options)
     options.settings.lengths = lengths_of(options.lengths);
     options.settings.progress = options.output.progress;
     watch_for_interruption();
-    OutputFile output(options.output.output, options.settings.files);
-    ReportFile report(options.report, other_files(options));
+    std::vector<std::string> others = other_files(options);
+    if (!options.settings.catalogue.empty()) {
+        check_output(options.settings.catalogue, options.output.output);
+        check_output(options.settings.catalogue, options.report, "--report");
+    }
+    OutputFile output(options.output.output, others);
+    others.push_back(options.output.output);
+    ReportFile report(options.report, others);
     const evaluate::Evaluation evaluation = evaluate::evaluate(options.settings);
     write_output(text_of(evaluation.table, options.output.format));
     output.finish();

@@ -99,9 +99,9 @@ void name_windows(const std::string& name, const FingerprintOptions& options)
 
 /// A sound file in a pipe is copied to its end first; headerless sound is taken as it comes. What
 /// has arrived is looked at again and again, since a pipe without sound is not copied for ever.
-audio::OpenedInput open_whole(audio::Input& input)
+audio::OpenedInput open_whole(audio::Input& input, bool headerless)
 {
-    for (bool more = true; more;) {
+    for (bool more = !headerless; more;) {
         try {
             static_cast<void>(input.open());
             more = input.extend();
@@ -118,7 +118,7 @@ audio::OpenedInput open_whole(audio::Input& input)
 void take_every(const std::string& name, const FingerprintOptions& options, Outcome& outcome)
 {
     audio::Input input(name, options.request);
-    const audio::OpenedInput opened = open_whole(input);
+    const audio::OpenedInput opened = open_whole(input, options.request.raw.has_value());
     note_conversion(outcome, options, opened.facts.rate);
     name_windows(name, options);
     const FingerprintForm form = form_of(options);
@@ -259,7 +259,9 @@ ExitStatus fingerprint(const FingerprintOptions& options)
 {
     make_directory(options.directory);
     watch_for_interruption();
-    OutputFile output(options.output.output, options.files);
+    std::vector<std::string> inputs = options.files;
+    inputs.push_back(options.list);
+    OutputFile output(options.output.output, inputs);
     write_output(fingerprint_heading(form_of(options)));
     const ExitStatus status = process_all(options);
     write_output(fingerprint_ending(form_of(options)));

@@ -162,6 +162,7 @@ std::variant<FingerprintOptions, ExitStatus> parse_fingerprint_options(const Arg
     }
     try {
         options.files = all_files(files);
+        options.list = files.from;
     } catch (const audio::FileError& error) {
         write_message(std::string("kzfp: ") + error.what());
         return some_file_failed;

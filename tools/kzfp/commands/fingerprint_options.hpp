@@ -17,6 +17,7 @@ namespace kzfp {
 
 struct FingerprintOptions {
     std::vector<std::string> files;
+    std::string list; ///< the file that some of them were listed in; empty for none
     OutputOptions output = {};
     bool wrapped = false;  ///< the documents of all files are parts of one
     std::string directory; ///< a document for each file goes here; empty when none is wanted

@@ -16,8 +16,8 @@ std::string check_command(const std::string& name)
         return {};
     }
     const std::string meant = similar_command(name);
-    return "'" + name + "' is not a command; " +
-           (meant.empty() ? "" : "did you mean '" + meant + "'? ") + "These are:\n" +
+    return "'" + name + "' is not a command" +
+           (meant.empty() ? ". " : "; did you mean '" + meant + "'? ") + "The commands are:\n" +
            commands_text();
 }
 

@@ -8,6 +8,7 @@
 #include "kzfp/catalogue/answer.hpp"
 #include "kzfp/catalogue/clip_inputs.hpp"
 #include "kzfp/catalogue/files.hpp"
+#include "kzfp/catalogue/guarded.hpp"
 #include "kzfp/catalogue/in_order.hpp"
 #include "kzfp/command_line/common_options.hpp"
 #include "kzfp/command_line/file_options.hpp"
@@ -151,7 +152,7 @@ private:
     {
         for (const std::string& complaint : {answer.error, answer.warning}) {
             if (!complaint.empty()) {
-                write_message(name + ": " + complaint);
+                write_message(std::string(name).append(": ").append(complaint));
             }
         }
         if (answer.left_out > 0 && !complained_) {
@@ -224,11 +225,11 @@ ExitStatus match_all(const MatchSettings& settings, const std::vector<std::strin
     return answers.status();
 }
 
-/// What a report must not replace.
+/// What neither the results nor a report may replace.
 std::vector<std::string> files_used(const MatchSettings& settings, std::vector<std::string> files)
 {
     files.push_back(settings.catalogue);
-    files.push_back(settings.output.output);
+    files.push_back(settings.files.from);
     return files;
 }
 
@@ -236,8 +237,12 @@ ExitStatus match(const MatchSettings& settings)
 {
     try {
         const std::vector<std::string> files = all_files(settings.files);
-        OutputFile output(settings.output.output, files);
-        ReportFile report(settings.report, files_used(settings, files));
+        std::vector<std::string> used = files_used(settings, files);
+        check_output(settings.catalogue, settings.output.output);
+        check_output(settings.catalogue, settings.report, "--report");
+        OutputFile output(settings.output.output, used);
+        used.push_back(settings.output.output);
+        ReportFile report(settings.report, used);
         const ExitStatus status = match_all(settings, files, report);
         output.finish();
         return status;

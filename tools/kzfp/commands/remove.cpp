@@ -129,7 +129,7 @@ std::vector<std::string> missing_paths(const Catalogue& catalogue, const RemoveS
                       (paths.relative == 1 ? " relative path is" : " relative paths are") +
                       " kept: what they were relative to is not known");
     }
-    if (!settings.all_missing && paths.there == 0 && !paths.gone.empty()) {
+    if (!interrupted() && !settings.all_missing && paths.there == 0 && !paths.gone.empty()) {
         throw audio::FileError(settings.catalogue +
                                ": not one of its files is there; connect the disk that they are "
                                "on, or pass --all-missing to remove them all");

@@ -52,7 +52,8 @@ void transform(std::vector<Complex>& values)
 /// The power of each step of frequency, 1 for a full sine, on average over the moments.
 std::vector<double> powers_of(std::span<const float> samples, uint32_t rate)
 {
-    std::vector<double> powers(static_cast<size_t>(rate / 2 / kStep) + 1);
+    const uint32_t highest = rate / 2;
+    std::vector<double> powers(static_cast<size_t>(highest / kStep) + 1);
     std::vector<Complex> frame(kLength);
     size_t moments = 0;
     for (size_t at = 0; at + kLength <= samples.size(); at += kHop, ++moments) {

@@ -52,7 +52,8 @@ void Importer::import(const std::string& path)
 {
     LineReader reader(path);
     std::string text;
-    while (!interrupted() && reader.next(text)) {
+    // Without its rest, a line that was being read says nothing.
+    while (!interrupted() && reader.next(text) && !interrupted()) {
         read(reader.number(), text);
     }
     imported_.interrupted = interrupted();

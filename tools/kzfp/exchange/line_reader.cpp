@@ -43,7 +43,9 @@ bool LineReader::fill()
     const size_t longest = number_ == 0 ? kLongestFirstLine : kLongestLine;
     if (size > longest) {
         throw audio::FileError("line " + std::to_string(number_ + 1) + " has more than " +
-                               std::to_string(longest) + " bytes, as no exported catalogue has");
+                               std::to_string(longest) +
+                               " bytes, so this is not an exported catalogue; pass a file that "
+                               "'kzfp export' wrote");
     }
     buffer_.resize(size + kBlock);
     ssize_t count = -1;

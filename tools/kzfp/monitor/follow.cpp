@@ -2,6 +2,7 @@
 // interruption is noticed.
 
 #include "kzfp/monitor/follow.hpp"
+#include "kzfp/catalogue/guarded.hpp"
 
 #include <algorithm>
 #include <cmath>
@@ -237,11 +238,16 @@ void check_report(const MonitorSettings& settings, std::span<const std::string> 
     namespace fs = std::filesystem;
     const std::string& path = settings.report;
     std::error_code error;
+    if (path == "-") {
+        throw OutputError("a report is a file and cannot go to standard output; --report needs a "
+                          "name, such as report.html");
+    }
     if (path.empty() || (fs::exists(path, error) && !fs::is_regular_file(path, error))) {
         return;
     }
     if (!settings.output.output.empty() &&
-        fs::weakly_canonical(path, error) == fs::weakly_canonical(settings.output.output, error)) {
+        fs::weakly_canonical(fs::absolute(path, error), error) ==
+            fs::weakly_canonical(fs::absolute(settings.output.output, error), error)) {
         throw OutputError(path + " is the file of --output; --report needs another one");
     }
     const OutputFile tried(path, inputs); // leaves everything as it was
@@ -252,6 +258,12 @@ void check_report(const MonitorSettings& settings, std::span<const std::string> 
 StreamFacts follow_stream(const MonitorSettings& settings)
 {
     const std::string inputs[] = {settings.catalogue, settings.stream};
+    try {
+        check_output(settings.catalogue, settings.output.output);
+        check_output(settings.catalogue, settings.report, "--report");
+    } catch (const audio::FileError& error) {
+        throw OutputError(error.what());
+    }
     check_report(settings, inputs);
     const auto source = audio::open_live(
         {.name = settings.stream,
@@ -259,7 +271,7 @@ StreamFacts follow_stream(const MonitorSettings& settings)
          .patience = {.timeout = settings.timeout, .stop = [] { return interrupted(); }}});
     Following following(settings, *source);
     OutputFile output(settings.output.output, inputs, OutputFile::Mode::live);
-    const StreamFacts facts = following.run();
+    StreamFacts facts = following.run();
     output.finish();
     if (!settings.report.empty()) {
         OutputFile report(settings.report, inputs);

@@ -47,7 +47,7 @@ void Printer::print(const Entry& entry)
     }
 }
 
-void Printer::print_notice(Notice notice)
+void Printer::print_notice(const Notice& notice)
 {
     switch (format_) {
     case Format::json:

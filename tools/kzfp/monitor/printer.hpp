@@ -36,7 +36,7 @@ public:
 
 private:
     void print(const Entry& entry);
-    void print_notice(Notice notice);
+    void print_notice(const Notice& notice);
 
     const MonitorSettings& settings_;
     Format format_;

@@ -9,6 +9,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
+#include <fstream>
 #include <system_error>
 #include <utility>
 
@@ -20,15 +21,26 @@ namespace kzfp {
 
 namespace {
 
+constexpr std::string_view kTrailFile = "\x89KZT"; ///< such a file is a result, of an export
+
 struct Destination {
     int file = STDOUT_FILENO;
     std::string name = "standard output";
+    bool to_be_emptied = false; ///< has what it had before, until there is a result
 };
 
 Destination& destination()
 {
     static Destination only;
     return only;
+}
+
+/// What is no regular file, such as a pipe, cannot be emptied and need not.
+void empty_once(Destination& to)
+{
+    if (std::exchange(to.to_be_emptied, false)) {
+        static_cast<void>(!::ftruncate(to.file, 0));
+    }
 }
 
 OutputError failure(const std::string& name, int error)
@@ -55,6 +67,17 @@ void check_apart(const std::string& path, std::span<const std::string> inputs)
     }
 }
 
+/// Results never replace sound, a catalogue or a file beside one, whatever else is wrong with the
+/// command: all of these have zero bytes near their start, and results have none.
+bool is_text(const std::string& path)
+{
+    std::ifstream file(path, std::ios::binary);
+    std::string bytes(65536, '.');
+    file.read(bytes.data(), static_cast<std::streamsize>(bytes.size()));
+    bytes.resize(static_cast<size_t>(file.gcount()));
+    return bytes.find('\0') == std::string::npos || bytes.starts_with(kTrailFile);
+}
+
 /// The permissions of the file that is replaced; for a new file, the usual ones.
 void take_permissions(int file, const std::string& path)
 {
@@ -66,6 +89,15 @@ void take_permissions(int file, const std::string& path)
 
 } // namespace
 
+void check_is_replaceable(const std::string& path, const std::string& option)
+{
+    std::error_code error;
+    if (std::filesystem::is_regular_file(path, error) && !is_text(path)) {
+        throw OutputError(path + " holds something else than results, which would be lost; " +
+                          option + " needs another file");
+    }
+}
+
 OutputFile::OutputFile(const std::string& path, std::span<const std::string> inputs, Mode mode)
     : path_(path == "-" ? "" : without_links(path))
 {
@@ -73,8 +105,9 @@ OutputFile::OutputFile(const std::string& path, std::span<const std::string> inp
         return;
     }
     check_apart(path_, inputs);
+    check_is_replaceable(path_, "--output");
     open(mode);
-    destination() = {.file = file_, .name = path_};
+    destination() = {.file = file_, .name = path_, .to_be_emptied = temporary_.empty()};
 }
 
 void OutputFile::open(Mode mode)
@@ -85,7 +118,8 @@ void OutputFile::open(Mode mode)
         temporary_ = path_ + ".part-" + std::to_string(::getpid());
     }
     const std::string& name = temporary_.empty() ? path_ : temporary_;
-    file_ = ::open(name.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0666);
+    const int emptied = temporary_.empty() ? 0 : O_TRUNC;
+    file_ = ::open(name.c_str(), O_WRONLY | O_CREAT | emptied | O_CLOEXEC, 0666);
     if (file_ < 0) {
         throw failure(path_, errno);
     }
@@ -115,6 +149,7 @@ void OutputFile::finish()
     if (file_ < 0) {
         return;
     }
+    empty_once(destination());
     destination() = {};
     // Some file systems report a full disk only when the file is closed.
     const bool closed = ::close(std::exchange(file_, -1)) == 0;
@@ -138,7 +173,8 @@ int output_descriptor() { return destination().file; }
 
 void write_output(const std::string& text)
 {
-    const Destination& to = destination();
+    Destination& to = destination();
+    empty_once(to);
     size_t done = 0;
     while (done < text.size()) {
         const ssize_t count = ::write(to.file, text.data() + done, text.size() - done);

@@ -18,12 +18,16 @@ struct OutputError : std::runtime_error {
     bool reader_left; ///< the reader of a pipe has had enough
 };
 
+/// Throws OutputError when a file is there that holds no text: it is no result of before. `option`
+/// is how the file was named, such as "--output".
+void check_is_replaceable(const std::string& path, const std::string& option);
+
 /// As long as it lives, write_output() writes to a file instead of standard output: --output.
 class OutputFile {
 public:
     enum class Mode {
         whole, ///< the file appears, or is replaced, when finish() is called
-        live   ///< the file is emptied at once and grows while the command runs
+        live   ///< the file is emptied by the first result and grows while the command runs
     };
 
     /// For an empty path or "-", everything stays as it is. A path that is there and is no regular

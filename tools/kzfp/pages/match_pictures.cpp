@@ -162,8 +162,8 @@ private:
             return;
         }
         const double place = found.offset + part.begin * found.tempo;
-        const SoundOptions passage =
-            part_of({}, std::max(0.0, place), seconds * found.tempo + std::min(0.0, place));
+        const SoundOptions passage = part_of(
+            {}, std::max(0.0, place), std::max(0.0, seconds * found.tempo + std::min(0.0, place)));
         noting(clip_, name_text(found), [&] {
             report::Sound track = drawn_sound(name, found.source, passage);
             track.matched = {.begin = found.offset + found.clip_begin * found.tempo,

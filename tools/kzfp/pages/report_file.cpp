@@ -75,6 +75,7 @@ ReportFile::ReportFile(const std::string& path, std::span<const std::string> oth
         return;
     }
     check_apart(path, others);
+    check_is_replaceable(path, "--report");
     path_ = real_path(path).string();
     struct stat facts = {};
     const bool there = ::stat(path_.c_str(), &facts) == 0;
