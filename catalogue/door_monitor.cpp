@@ -45,8 +45,9 @@ void check_taking(const kzcat_monitor& monitor)
                       "the monitor was finished already; create another one for more sound");
     }
     if (monitor.state == kzcat_monitor::broken) {
-        throw Failure(KZCAT_ERROR_MEMORY, "memory was short while the monitor took sound, and some "
-                                          "may be lost; free some and create another one");
+        throw Failure(KZCAT_ERROR_MEMORY,
+                      "an earlier call failed while the monitor took sound, and "
+                      "some may be lost; create another one");
     }
 }
 

@@ -88,7 +88,7 @@ FfmpegDecoder::FfmpegDecoder(std::unique_ptr<FfmpegInput> input) : input_(std::m
 {
     set_up();
     io_ = make_io(*input_);
-    const auto container = avformat_alloc_context();
+    auto* const container = avformat_alloc_context();
     if (container == nullptr) {
         throw std::bad_alloc();
     }
@@ -101,7 +101,7 @@ FfmpegDecoder::FfmpegDecoder(std::unique_ptr<FfmpegInput> input) : input_(std::m
 FfmpegDecoder::FfmpegDecoder(const std::string& url, const AVIOInterruptCB& interrupt)
 {
     set_up();
-    const auto container = avformat_alloc_context();
+    auto* const container = avformat_alloc_context();
     if (container == nullptr) {
         throw std::bad_alloc();
     }

@@ -260,7 +260,7 @@ std::string FfmpegFile::early_end() const
 
 std::string FfmpegFile::trouble() const
 {
-    const std::string end = early_end();
+    std::string end = early_end();
     if (!end.empty() || decoder_->damaged() == 0) {
         return end;
     }
@@ -282,8 +282,8 @@ std::unique_ptr<FileSource> open_with_ffmpeg(int file, const AcceptsRate& accept
     try {
         return std::make_unique<FfmpegFile>(file, accepts_rate, floats);
     } catch (const NotRecognised&) {
-        throw NotRecognised(is_mp4(file) ? "is an MP4 file without its index, as one that was cut "
-                                           "off; copy or record it again"
+        throw NotRecognised(is_mp4(file) ? "is an MP4 file without its index, probably because it "
+                                           "was cut off; copy or record it again"
                                          : not_recognised_text());
     }
 }

@@ -65,8 +65,8 @@ uint64_t missing_bytes(std::string_view log)
         log.remove_prefix(std::min(line.size() + 1, log.size()));
         const auto stated = number_behind(line, ": ");
         const auto there = number_behind(line, "(should be ");
-        if (is_about_samples(line) && stated && there &&
-            *stated<kUnknownLength&& * stated> * there) {
+        const bool is_known = stated && *stated < kUnknownLength;
+        if (is_about_samples(line) && is_known && there && *there < *stated) {
             return *stated - *there;
         }
     }

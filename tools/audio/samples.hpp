@@ -27,6 +27,9 @@ inline int16_t to_16_bits(float sample)
 /// rounded to the nearest 16-bit word.
 inline void mix_down(std::span<int16_t> samples, size_t channels)
 {
+    if (channels < 2) {
+        return;
+    }
     const auto shift = static_cast<int>(std::bit_width(channels - 1));
     const int32_t half = int32_t{1} << (shift - 1);
     for (size_t i = 0; i < samples.size() / channels; ++i) {

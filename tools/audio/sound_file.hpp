@@ -18,7 +18,7 @@ namespace audio {
 /// - what is decoded to floats, where these are wanted and the rate is accepted: floats of all
 ///   channels;
 /// - everything else: 16-bit PCM, in which more than two channels are mixed down to one.
-class SoundFile : public FileSource {
+class SoundFile final : public FileSource {
 public:
     /// `file` is a regular file that outlives the object; `accepts_rate` decides whether companded
     /// samples, and floats, are given as they are. Throws FileError; NotRecognised when it is of

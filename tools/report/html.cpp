@@ -169,6 +169,4 @@ std::string legend_entry(std::string_view kind, std::string_view name)
     return element("span", "class=\"entry\"", swatch + name_element(name)) + " ";
 }
 
-std::string legend(const std::string& entries) { return entries; }
-
 } // namespace report

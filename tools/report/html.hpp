@@ -46,6 +46,4 @@ std::string whole_page(const Heading& heading, const std::string& body);
 /// A small square in a series' colour with its name. `kind` is the class of the drawing's element.
 std::string legend_entry(std::string_view kind, std::string_view name);
 
-std::string legend(const std::string& entries);
-
 } // namespace report
