@@ -109,7 +109,10 @@ void Monitor::fill_up(const WithSearcher& with)
 
 void Monitor::finish(const WithSearcher& with)
 {
-    with([this](Searcher& searcher) { tracker_.finish(searcher, seconds()); });
+    if (!ended_) {
+        with([this](Searcher& searcher) { tracker_.finish(searcher, seconds()); });
+        ended_ = true;
+    }
 }
 
 } // namespace kzcat

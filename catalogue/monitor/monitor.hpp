@@ -75,6 +75,7 @@ private:
     QuietMeter quiet_;
     Timeline timeline_;
     Tracker tracker_;
+    bool ended_ = false;
     std::exception_ptr trouble_; ///< what `with` threw during this call
 };
 

@@ -239,11 +239,10 @@ std::string trails_figure(const Trails& trails)
     if (!can_be_drawn(trails)) {
         return {};
     }
-    return to_html(
-        {.title = "Why it matches: " + trails.clip_name + " laid against " + trails.track_name,
-         .explanation = explanation_of(trails),
-         .drawing = drawing_of(trails).finish(),
-         .numbers = folded(table_of(trails))});
+    return to_html({.title = trails.clip_name + " laid against " + trails.track_name,
+                    .explanation = explanation_of(trails),
+                    .drawing = drawing_of(trails).finish(),
+                    .numbers = folded(table_of(trails))});
 }
 
 std::string to_svg(const Trails& trails)

@@ -137,7 +137,7 @@ std::string figure_of(const Pair& pair)
     const double top = highest(pair) * 1.05;
     draw_half(svg, pair, 0, top);
     draw_half(svg, pair, 1, top);
-    return to_html({.title = "The 30 values of the first 14 seconds",
+    return to_html({.title = "The 30 values",
                     .explanation = explanation,
                     .drawing = svg.finish(),
                     .numbers = folded(table_of(pair))});

@@ -137,7 +137,7 @@ Clip read_clip(const ClipInput& input, const SoundOptions& options)
     case ClipKind::values:
         return values_clip(input.values);
     default:
-        return read_clip(input.path, options);
+        return read_sound_clip(input.path, options);
     }
 }
 

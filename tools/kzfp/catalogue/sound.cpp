@@ -192,6 +192,20 @@ Recording read_recording(const std::string& path, const SoundOptions& options, b
     return recording;
 }
 
+Clip read_sound_clip(const std::string& path, const SoundOptions& options)
+{
+    Clip clip;
+    const Begin begin = [&clip](const kzcat_format& format) {
+        clip.query = made<Query>(kzcat_query_create, &format);
+        return [&clip](std::span<const std::byte> bytes) {
+            check(kzcat_query_feed(clip.query.get(), bytes.data(), bytes.size()));
+        };
+    };
+    clip.warning = feed_file(path, options, begin).warning;
+    check(kzcat_query_finish(clip.query.get()));
+    return clip;
+}
+
 Clip read_clip(const std::string& path, const SoundOptions& options)
 {
     switch (content_of(path, options)) {
@@ -207,16 +221,7 @@ Clip read_clip(const std::string& path, const SoundOptions& options)
     case Content::sound:
         break;
     }
-    Clip clip;
-    const Begin begin = [&clip](const kzcat_format& format) {
-        clip.query = made<Query>(kzcat_query_create, &format);
-        return [&clip](std::span<const std::byte> bytes) {
-            check(kzcat_query_feed(clip.query.get(), bytes.data(), bytes.size()));
-        };
-    };
-    clip.warning = feed_file(path, options, begin).warning;
-    check(kzcat_query_finish(clip.query.get()));
-    return clip;
+    return read_sound_clip(path, options);
 }
 
 } // namespace kzfp

@@ -39,4 +39,7 @@ struct Clip {
 /// Reads a sound file, a trail file or a query document. Throws as read_recording() does.
 Clip read_clip(const std::string& path, const SoundOptions& options);
 
+/// The same of a file that is taken for sound whatever it begins with.
+Clip read_sound_clip(const std::string& path, const SoundOptions& options);
+
 } // namespace kzfp

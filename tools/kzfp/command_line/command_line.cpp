@@ -6,6 +6,7 @@
 #include <filesystem>
 #include <iostream>
 #include <span>
+#include <sstream>
 #include <system_error>
 
 #include <CLI/CLI.hpp>
@@ -90,8 +91,11 @@ std::string complaint(const CLI::App& parser, const Arguments& arguments,
 
 ExitStatus refuse(const CLI::App& parser, const Arguments& arguments, const CLI::ParseError& error)
 {
-    std::cerr << "kzfp: " << complaint(parser, arguments, error) << "\nSee '"
-              << program_name(arguments) << " --help'.\n";
+    std::istringstream lines("kzfp: " + complaint(parser, arguments, error));
+    for (std::string line; std::getline(lines, line);) {
+        write_message(line);
+    }
+    write_message("See '" + program_name(arguments) + " --help'.");
     return wrong_usage;
 }
 

@@ -107,7 +107,7 @@ private:
                                   settings_.output.progress, complain);
     }
 
-    /// A line for whatever could not be compared, or not as a whole.
+    /// A line for whatever could not be compared.
     void report_trouble(const std::string& what, const std::string& why)
     {
         status_ = some_file_failed;

@@ -1,7 +1,9 @@
 // `kzfp evaluate`: how well clips of the reader's own music are recognised.
 
 #include <algorithm>
+#include <charconv>
 #include <cstdint>
+#include <optional>
 #include <sstream>
 #include <string>
 #include <vector>
@@ -92,6 +94,19 @@ std::string check_lengths(const std::string& text)
     return parts_of(text).empty() ? "a length is needed, such as 15" : "";
 }
 
+std::optional<uint64_t> to_seed(const std::string& text)
+{
+    uint64_t number = 0;
+    const char* const end = text.data() + text.size();
+    const auto [stop, error] = std::from_chars(text.data(), end, number);
+    return error == std::errc{} && stop == end ? std::optional(number) : std::nullopt;
+}
+
+auto take_seed(uint64_t& seed)
+{
+    return [&seed](const std::string& text) { seed = *to_seed(text); };
+}
+
 void add_clip_options(Parser& parser, EvaluateOptions& options)
 {
     parser
@@ -112,9 +127,13 @@ void add_clip_options(Parser& parser, EvaluateOptions& options)
         ->type_name("LIST")
         ->check(check_kinds);
     parser
-        .add_option("--seed", options.settings.seed,
+        .add_option("--seed", take_seed(options.settings.seed),
                     "Draws other strangers, places and noises (default: 1)")
-        ->type_name("NUMBER");
+        ->type_name("NUMBER")
+        ->check([](const std::string& text) {
+            return to_seed(text) ? std::string()
+                                 : "'" + text + "' is not a whole number from 0 to 2^64 - 1";
+        });
 }
 
 void add_options(Parser& parser, EvaluateOptions& options)

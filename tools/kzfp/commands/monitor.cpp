@@ -71,7 +71,7 @@ void add_options(Parser& parser, MonitorSettings& settings)
         ->check([](const std::string& text) {
             return to_seconds(text) ? std::string() : not_a_time(text, "from 0 to 1000000000");
         });
-    add_seconds(parser, "--every", "Also report this often that a track goes on", 1e9,
+    add_seconds(parser, "--every", "Also report this often that an entry goes on", 1e9,
                 settings.options.report_every);
     add_seconds(parser, "--least-gap", "Leave out gaps that are shorter (default: 2)", 3600,
                 settings.options.least_gap);

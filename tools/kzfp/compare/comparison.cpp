@@ -81,7 +81,7 @@ void turn_round(FoundTrack& found)
     found.clip_end = end;
 }
 
-/// The shorter file is looked up in the longer one; what is found is told of the second one.
+/// The shorter file is looked up in the longer one; what is found is stated for the second one.
 uint32_t find(const Side& first, const Side& second, const SoundOptions& options,
               Comparison& comparison)
 {

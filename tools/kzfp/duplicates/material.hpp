@@ -23,7 +23,7 @@ struct HeldFile {
     std::optional<FileHash> hash;
 };
 
-/// Receives what could not be read, or not as a whole, and why.
+/// Receives what could not be read, and why.
 using Complain = std::function<void(const std::string& what, const std::string& why)>;
 
 /// Sound that is there once, or several times with codes that are equal to the bit.

@@ -28,8 +28,15 @@ std::string escaped(const std::string& utf8)
 
 std::string attribute(const std::string& name, const std::string& text)
 {
-    const JsonObject utf8 = JsonObject::parse(to_line(JsonObject(text)));
-    return ' ' + name + "=\"" + escaped(utf8.get<std::string>()) + '"';
+    const JsonObject parsed = JsonObject::parse(to_line(JsonObject(text)));
+    std::string utf8 = parsed.get<std::string>();
+    // Two characters that XML does not have.
+    for (const std::string_view none : {"\xef\xbf\xbe", "\xef\xbf\xbf"}) {
+        for (size_t at = utf8.find(none); at != std::string::npos; at = utf8.find(none, at)) {
+            utf8.replace(at, none.size(), "\xef\xbf\xbd");
+        }
+    }
+    return ' ' + name + "=\"" + escaped(utf8) + '"';
 }
 
 std::string start_of_element(const std::string& file)
