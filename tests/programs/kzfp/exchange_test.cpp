@@ -2,6 +2,7 @@
 
 #include "kzfp.hpp"
 
+#include <array>
 #include <csignal>
 #include <filesystem>
 #include <sstream>
@@ -9,9 +10,12 @@
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 #include <sys/resource.h>
+#include <sys/socket.h>
+#include <unistd.h>
 
 #include "kzcat.h"
 #include "recordings.hpp"
+#include "running.hpp"
 
 namespace {
 
@@ -137,6 +141,27 @@ TEST_F(KzfpExchange, WhatIsCutOffIsUsedAndReported)
     EXPECT_EQ(1, two.status);
     EXPECT_TRUE(contains(two.err, "line 2: the export before it has no last line")) << two.err;
     EXPECT_EQ(file_ + ": 2 added, 1 known\n", two.out);
+}
+
+// What was written to a socket can be read although its other end was closed with bytes unread;
+// behind it there is an error.
+TEST_F(KzfpExchange, WhatWasReadBeforeAnErrorIsKept)
+{
+    const std::vector<std::string> lines = exported_lines();
+    const std::string text = lines[0] + '\n' + lines[1] + '\n' + lines[2] + '\n';
+    std::array<int, 2> ends = {};
+    ASSERT_EQ(0, socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends.data()));
+    ASSERT_EQ(ssize_t(text.size()), write(ends[0], text.data(), text.size()));
+    ASSERT_EQ(1, write(ends[1], "x", 1));
+    close(ends[0]);
+    const std::string out = scratch_.path("out");
+    const std::string err = scratch_.path("err");
+    Running import({"import", into_, "-"}, out, err, {.input = ends[1]});
+    close(ends[1]);
+    EXPECT_EQ(1, import.wait());
+    EXPECT_EQ("-: cannot be read (Connection reset by peer)\n", contents(err));
+    EXPECT_EQ("-: 2 added, 0 known\n", contents(out));
+    EXPECT_EQ(2u, lines_of(listed(into_)).size());
 }
 
 TEST_F(KzfpExchange, WhatIsNoExportIsRefusedAtOnce)

@@ -15,72 +15,17 @@
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 #include <sys/stat.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include "catalogue/store/rounds.hpp"
 #include "recordings.hpp"
+#include "running.hpp"
 
 namespace {
 
 using namespace kz::test;
 using nlohmann::json;
 namespace fs = std::filesystem;
-
-/// The program while it runs. Its two outputs go to files.
-class Running {
-public:
-    Running(std::vector<std::string> arguments, const std::string& out, const std::string& err,
-            bool without_rights = false)
-        : process_(fork())
-    {
-        if (process_ == 0) {
-            start(std::move(arguments), out, err, without_rights);
-        }
-    }
-    ~Running()
-    {
-        if (process_ > 0) {
-            send(SIGKILL);
-            wait();
-        }
-    }
-    Running(const Running&) = delete;
-    Running& operator=(const Running&) = delete;
-
-    void send(int signal) const { ::kill(process_, signal); }
-
-    /// The exit status; 128 + n when signal n ended it.
-    int wait()
-    {
-        int status = 0;
-        EXPECT_EQ(process_, waitpid(process_, &status, 0));
-        process_ = 0;
-        return WIFSIGNALED(status) ? 128 + WTERMSIG(status) : WEXITSTATUS(status);
-    }
-
-private:
-    [[noreturn]] static void start(std::vector<std::string> arguments, const std::string& out,
-                                   const std::string& err, bool without_rights)
-    {
-        dup2(open(out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0666), STDOUT_FILENO);
-        dup2(open(err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0666), STDERR_FILENO);
-        constexpr uid_t kNobody = 65534;
-        if (without_rights && geteuid() == 0 && setuid(kNobody) != 0) {
-            _exit(99);
-        }
-        std::string program = KZFP_PROGRAM;
-        std::vector<char*> words = {program.data()};
-        for (std::string& argument : arguments) {
-            words.push_back(argument.data());
-        }
-        words.push_back(nullptr);
-        execv(program.c_str(), words.data());
-        _exit(98);
-    }
-
-    pid_t process_;
-};
 
 class KzfpReliability : public ::testing::Test {
 protected:
@@ -249,16 +194,16 @@ TEST_F(KzfpReliability, ACatalogueThatMayNotBeWrittenIsNamed)
           std::vector<std::string>{"remove", catalogue_, "1"},
           std::vector<std::string>{"merge", catalogue_, catalogue_},
           std::vector<std::string>{"import", catalogue_, "/dev/null"}}) {
-        Running running(arguments, out_, err_, true);
+        Running running(arguments, out_, err_, {.without_rights = true});
         const ProcessResult result = finish(running);
-        if (result.status == 98) {
+        if (result.status == Running::kMayNotRun) {
             GTEST_SKIP() << "the program may not be run without rights from where it is";
         }
         EXPECT_EQ(1, result.status) << arguments.front();
         EXPECT_EQ("", result.out) << arguments.front();
         EXPECT_TRUE(contains(result.err, "permissions")) << arguments.front() << result.err;
     }
-    Running list({"list", catalogue_}, out_, err_, true);
+    Running list({"list", catalogue_}, out_, err_, {.without_rights = true});
     EXPECT_EQ(0, finish(list).status) << contents(err_);
     EXPECT_EQ(1u, sources().size());
 }

@@ -50,11 +50,11 @@ struct Records {
 
 void Importer::import(const std::string& path)
 {
-    LineReader reader(path);
-    std::string text;
-    // Without its rest, a line that was being read says nothing.
-    while (!interrupted() && reader.next(text) && !interrupted()) {
-        read(reader.number(), text);
+    try {
+        read_lines(path);
+    } catch (const audio::FileError&) {
+        write(); // what came before is kept, wherever the file fails
+        throw;
     }
     imported_.interrupted = interrupted();
     write();
@@ -66,6 +66,16 @@ void Importer::import(const std::string& path)
     }
     if (!ended_) {
         miss(0, "it ends without its last line, so it was cut off; what it has was imported");
+    }
+}
+
+void Importer::read_lines(const std::string& path)
+{
+    LineReader reader(path);
+    std::string text;
+    // Without its rest, a line that was being read says nothing.
+    while (!interrupted() && reader.next(text) && !interrupted()) {
+        read(reader.number(), text);
     }
 }
 

@@ -36,8 +36,9 @@ public:
     {
     }
 
-    /// `path` may be "-". imported() is up to date also when this throws audio::FileError or
-    /// CatalogueError.
+    /// `path` may be "-". When this throws audio::FileError, because the file cannot be read any
+    /// further, what was read of it is in the catalogue. imported() is up to date then, and also
+    /// when it throws CatalogueError.
     void import(const std::string& path);
 
     const Imported& imported() const { return imported_; }
@@ -48,6 +49,7 @@ private:
         ExportedTrack track;
     };
 
+    void read_lines(const std::string& path);
     void read(uint64_t line, const std::string& text);
     void take(uint64_t line, const ExportBegin& begin);
     void take(uint64_t line, ExportedTrack track);

@@ -1,0 +1,67 @@
+#include "running.hpp"
+
+#include <csignal>
+#include <utility>
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+namespace kz::test {
+
+namespace {
+
+constexpr uid_t kNobody = 65534;
+
+[[noreturn]] void start(std::vector<std::string> arguments, const std::string& out,
+                        const std::string& err, const RunningSetup& setup)
+{
+    if (setup.input >= 0) {
+        dup2(setup.input, STDIN_FILENO);
+    }
+    dup2(open(out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0666), STDOUT_FILENO);
+    dup2(open(err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0666), STDERR_FILENO);
+    if (setup.without_rights && geteuid() == 0 && setuid(kNobody) != 0) {
+        _exit(99);
+    }
+    std::string program = KZFP_PROGRAM;
+    std::vector<char*> words = {program.data()};
+    for (std::string& argument : arguments) {
+        words.push_back(argument.data());
+    }
+    words.push_back(nullptr);
+    execv(program.c_str(), words.data());
+    _exit(Running::kMayNotRun);
+}
+
+} // namespace
+
+Running::Running(std::vector<std::string> arguments, const std::string& out, const std::string& err,
+                 const RunningSetup& setup)
+    : process_(fork())
+{
+    if (process_ == 0) {
+        start(std::move(arguments), out, err, setup);
+    }
+}
+
+Running::~Running()
+{
+    if (process_ > 0) {
+        send(SIGKILL);
+        wait();
+    }
+}
+
+void Running::send(int signal) const { ::kill(process_, signal); }
+
+int Running::wait()
+{
+    int status = 0;
+    EXPECT_EQ(process_, waitpid(process_, &status, 0));
+    process_ = 0;
+    return WIFSIGNALED(status) ? 128 + WTERMSIG(status) : WEXITSTATUS(status);
+}
+
+} // namespace kz::test
