@@ -13,6 +13,8 @@
 #include "kzfp/command_line/sound_options.hpp"
 #include "kzfp/commands/fingerprint_options.hpp"
 #include "kzfp/commands/table.hpp"
+#include "kzfp/compare/output.hpp"
+#include "kzfp/duplicates/output.hpp"
 
 namespace {
 
@@ -104,6 +106,33 @@ TEST(KzfpManPages, NameEveryOptionAndNoOther)
         const std::string name(command.name);
         EXPECT_EQ(options_of(command), documented_options(man_page("kzfp-" + name))) << name;
     }
+}
+
+/// The words of a man page that are set in bold.
+std::set<std::string> bold_words(const std::string& page)
+{
+    static const std::regex kBold("\n\\.(B|BR) ([^\n]*)");
+    static const std::regex kWord("[a-z_0-9]+");
+    std::set<std::string> words;
+    for (std::sregex_iterator line(page.begin(), page.end(), kBold), end; line != end; ++line) {
+        const std::string text = line->str(2);
+        words.insert(std::sregex_token_iterator(text.begin(), text.end(), kWord), {});
+    }
+    return words;
+}
+
+TEST(KzfpManPages, NameTheColumnsOfTables)
+{
+    const auto expect_columns = [](const std::string& page, const std::string& header) {
+        const std::set<std::string> words = bold_words(section_of(man_page(page), "OPTIONS"));
+        static const std::regex kColumn("[a-z_]+");
+        for (std::sregex_iterator column(header.begin(), header.end(), kColumn), end; column != end;
+             ++column) {
+            EXPECT_TRUE(words.contains(column->str())) << page << ' ' << column->str();
+        }
+    };
+    expect_columns("kzfp-compare", ::kzfp::comparison_csv_header());
+    expect_columns("kzfp-duplicates", ::kzfp::duplicates_csv_header());
 }
 
 template <class Value, size_t count>

@@ -48,6 +48,19 @@ TEST(DuplicatesTrouble, AreLookedForAmongTheFilesThatCanBeRead)
     EXPECT_EQ(2u, lines[5]["files"].size());
 }
 
+TEST(DuplicatesTrouble, AScriptHasNoFormat)
+{
+    for (const char* format : {"human", "json", "csv"}) {
+        const ProcessResult result = kzfp({"duplicates", "--script", "-f", format, "/dev"});
+        EXPECT_EQ(2, result.status);
+        EXPECT_EQ("", result.out);
+        EXPECT_TRUE(contains(result.err, "--script: prints a shell script, which has no other "
+                                         "form; leave --format out, or --script"))
+            << result.err;
+    }
+    EXPECT_TRUE(contains(kzfp({"duplicates", "--script"}).err, "FILE is required"));
+}
+
 TEST(DuplicatesTrouble, PassOverWhatIsNoFileAnyMore)
 {
     const ScratchDirectory scratch;

@@ -41,13 +41,13 @@ std::string listed(std::span<const FormatChoice> offered, std::string_view betwe
     return text;
 }
 
-void add_format(Parser& parser, std::span<const FormatChoice> offered, Format& format)
+Option* add_format(Parser& parser, std::span<const FormatChoice> offered, Format& format)
 {
     format = offered.front().value;
     const auto take = [offered, &format](const std::string& name) {
         format = find_format(offered, name)->value;
     };
-    parser.add_option("-f,--format", take, listed(offered, "\n", true))
+    return parser.add_option("-f,--format", take, listed(offered, "\n", true))
         ->type_name("FORMAT")
         ->check([offered](const std::string& name) {
             return find_format(offered, name) != nullptr
@@ -59,15 +59,16 @@ void add_format(Parser& parser, std::span<const FormatChoice> offered, Format& f
 
 } // namespace
 
-void add_output_options(Parser& parser, std::span<const FormatChoice> offered,
-                        OutputOptions& options)
+Option* add_output_options(Parser& parser, std::span<const FormatChoice> offered,
+                           OutputOptions& options)
 {
-    add_format(parser, offered, options.format);
+    Option* const format = add_format(parser, offered, options.format);
     parser
         .add_option("-o,--output", options.output,
                     "A file for the results, instead of standard output")
         ->type_name("FILE");
     add_progress_options(parser, options);
+    return format;
 }
 
 void add_progress_options(Parser& parser, OutputOptions& options)

@@ -37,9 +37,9 @@ inline constexpr FormatChoice kCsvFormat = {"csv", Format::csv,
 
 /// Adds -f,--format with the formats of `offered`, the first of which is the default, and
 /// -o,--output, -q,--quiet and --progress. "text" is taken for "human" and "document" for "xml".
-/// `offered` and `options` outlive the parsing.
-void add_output_options(Parser& parser, std::span<const FormatChoice> offered,
-                        OutputOptions& options);
+/// `offered` and `options` outlive the parsing. Returns the option of the format.
+Option* add_output_options(Parser& parser, std::span<const FormatChoice> offered,
+                           OutputOptions& options);
 
 /// Adds -q,--quiet and --progress alone, for commands whose results have one form and place.
 void add_progress_options(Parser& parser, OutputOptions& options);

@@ -46,7 +46,7 @@ struct DuplicatesSettings {
 void add_options(Parser& parser, DuplicatesSettings& settings)
 {
     add_file_options(parser, settings.files, "A catalogue; or folders, sound files and trails");
-    add_output_options(parser, kFormats, settings.output);
+    const Option* const format = add_output_options(parser, kFormats, settings.output);
     parser.add_flag("--script", settings.script,
                     "Print a shell script instead, for a person to read and run: it removes\n"
                     "files whose very bytes are there a second time, and more only on request");
@@ -54,6 +54,13 @@ void add_options(Parser& parser, DuplicatesSettings& settings)
     add_strict_option(parser, settings.sound.strict);
     add_timeout_option(parser, settings.sound.timeout);
     add_jobs_option(parser, settings.jobs);
+    parser.when_read([&settings, format] {
+        check_files_are_given(settings.files);
+        if (settings.script && format->count() > 0) {
+            refuse_value("--script", "prints a shell script, which has no other form; leave "
+                                     "--format out, or --script");
+        }
+    });
 }
 
 /// Whether a path is that of a catalogue, which SQLite keeps.

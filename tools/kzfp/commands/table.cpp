@@ -41,29 +41,29 @@ constexpr Command kCommands[] = {
      run_duplicates},
     {"monitor", "Prints what runs on a stream, from when to when", run_monitor},
     {"evaluate", "Measures how well clips of your own music are recognised", run_evaluate},
-    {"add", "Adds sound files to a catalogue", run_add, Group::catalogues},
-    {"list", "Lists the tracks of a catalogue", run_list, Group::catalogues},
-    {"remove", "Removes tracks from a catalogue", run_remove, Group::catalogues},
-    {"verify", "Finds out whether a catalogue is whole", run_verify, Group::catalogues},
-    {"merge", "Adds the tracks of other catalogues to one", run_merge, Group::catalogues},
+    {"add", "Adds sound files to a catalogue", run_add, Purpose::catalogues},
+    {"list", "Lists the tracks of a catalogue", run_list, Purpose::catalogues},
+    {"remove", "Removes tracks from a catalogue", run_remove, Purpose::catalogues},
+    {"verify", "Finds out whether a catalogue is whole", run_verify, Purpose::catalogues},
+    {"merge", "Adds the tracks of other catalogues to one", run_merge, Purpose::catalogues},
     {"export", "Writes the tracks of a catalogue as text, for a backup", run_export,
-     Group::catalogues},
-    {"import", "Adds the tracks of exported catalogues to one", run_import, Group::catalogues},
-    {"disc", "Reports what is on a Blu-ray disc or a DVD", run_disc, Group::program},
+     Purpose::catalogues},
+    {"import", "Adds the tracks of exported catalogues to one", run_import, Purpose::catalogues},
+    {"disc", "Reports what is on a Blu-ray disc or a DVD", run_disc, Purpose::program},
     {"completions", "Prints what a shell needs to complete command lines", run_completions,
-     Group::program},
-    {"help", "Prints the help of a command", run_help, Group::program},
+     Purpose::program},
+    {"help", "Prints the help of a command", run_help, Purpose::program},
 };
 
 struct Heading {
-    Group group;
+    Purpose purpose;
     std::string_view text;
 };
 
 constexpr Heading kHeadings[] = {
-    {Group::recognition, "Recognising sound:"},
-    {Group::catalogues, "Keeping a catalogue:"},
-    {Group::program, "And also:"},
+    {Purpose::recognition, "Recognising sound:"},
+    {Purpose::catalogues, "Keeping a catalogue:"},
+    {Purpose::program, "And also:"},
 };
 
 /// A first word that looks like a mistyped command rather than the name of a file. Empty, or what
@@ -115,7 +115,7 @@ std::string commands_text()
     for (const Heading& heading : kHeadings) {
         text.append(text.empty() ? "" : "\n\n").append(heading.text);
         for (const Command& command : kCommands) {
-            if (command.group == heading.group) {
+            if (command.purpose == heading.purpose) {
                 text.append("\n  ").append(command.name);
                 text.append(kColumn - command.name.size(), ' ').append(command.help);
             }

@@ -11,13 +11,13 @@
 namespace kzfp {
 
 /// What a command is about; the help lists them under these headings.
-enum class Group { recognition, catalogues, program };
+enum class Purpose { recognition, catalogues, program };
 
 struct Command {
     std::string_view name;
     std::string_view help; ///< one line
     ExitStatus (*run)(const Arguments& arguments);
-    Group group = Group::recognition;
+    Purpose purpose = Purpose::recognition;
 };
 
 std::span<const Command> commands();
