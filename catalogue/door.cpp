@@ -97,12 +97,31 @@ uint32_t to_number(Plan plan)
     return plan == Plan::parts ? uint32_t{KZCAT_PLAN_PARTS} : uint32_t{KZCAT_PLAN_SCAN};
 }
 
+uint32_t to_number(IndexState state)
+{
+    switch (state) {
+    case IndexState::current:
+        return KZCAT_INDEX_CURRENT;
+    case IndexState::missing:
+        return KZCAT_INDEX_MISSING;
+    case IndexState::stale:
+        return KZCAT_INDEX_STALE;
+    case IndexState::unusable:
+        return KZCAT_INDEX_UNUSABLE;
+    case IndexState::none:
+        break;
+    }
+    return KZCAT_INDEX_NONE;
+}
+
 void fill_index_facts(const IndexFacts& index, kzcat_facts& facts)
 {
     facts.index_bytes = index.file_bytes;
     facts.scan_ms = index.scan_ms;
     facts.parts_ms = index.parts_ms;
     facts.plan = to_number(index.plan);
+    facts.index_state = to_number(index.state);
+    facts.left_out = index.left_out;
 }
 
 } // namespace

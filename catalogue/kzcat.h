@@ -238,17 +238,34 @@ KZ_API kzcat_status kzcat_open(const char* path, uint32_t access, const kzcat_se
  */
 KZ_API kzcat_status kzcat_close(kzcat_catalogue** catalogue_ref) KZ_NOEXCEPT;
 
+/** What became of the index file. */
+enum {
+    KZCAT_INDEX_NOT_OPEN = 0, /**< the index is not open */
+    KZCAT_INDEX_CURRENT = 1,  /**< it serves; what came since it was made is searched beside it */
+    KZCAT_INDEX_NONE = 2,     /**< there is none, nor would it be worth it, or none is wanted */
+    KZCAT_INDEX_MISSING = 3,  /**< it would be worth it, but could not be made: its folder may not
+                                   be written or is full, or tracks are damaged */
+    KZCAT_INDEX_STALE = 4,    /**< more than a tenth of the catalogue or of it has changed since it
+                                   was made, and it could not be made again */
+    KZCAT_INDEX_UNUSABLE = 5  /**< it is damaged, of another version or catalogue, or may not be
+                                   read; it was neither used nor made again */
+};
+
 /** What a catalogue holds. */
 typedef struct kzcat_facts {
     uint64_t tracks;
-    uint64_t codes;        /**< 64-bit codes of all trails, 5.383 for a second of sound */
-    uint64_t index_bytes;  /**< of the index file; 0 when there is none */
-    double scan_ms;        /**< a look-up of 14.3 s by scan, as measured when the index was made; 0
+    uint64_t codes;       /**< 64-bit codes of all trails, 5.383 for a second of sound */
+    uint64_t index_bytes; /**< of the index file; 0 when there is none */
+    double scan_ms;       /**< a look-up of 14.3 s by scan, as measured when the index was made; 0
                                 when it was not */
-    double parts_ms;       /**< the same by the table of parts */
-    uint32_t plan;         /**< in use: KZCAT_PLAN_SCAN or KZCAT_PLAN_PARTS; 0 when the index is not
+    double parts_ms;      /**< the same by the table of parts */
+    uint32_t plan;        /**< in use: KZCAT_PLAN_SCAN or KZCAT_PLAN_PARTS; 0 when the index is not
                                 open */
-    uint32_t reserved[11]; /**< 0 */
+    uint32_t index_state; /**< one of KZCAT_INDEX_... Answers are the same in each, but those of a
+                                large catalogue come later in all but the first two that are open */
+    uint64_t left_out;    /**< tracks that are not looked through, because their trails are
+                                damaged; 0 when the index is not open */
+    uint32_t reserved[8]; /**< 0 */
 } kzcat_facts;
 
 /**

@@ -69,6 +69,7 @@ public:
         const Snapshot& snapshot = searches_->snapshot();
         IndexFacts facts;
         facts.plan = plan();
+        facts.state = state();
         facts.codes = snapshot.corpus().code_count();
         facts.tracks = snapshot.corpus().track_count();
         facts.tail_tracks = snapshot.tail().track_count();
@@ -101,6 +102,24 @@ private:
         return options_.plan.value_or(searches_->snapshot().mapped()->contents.header.plan);
     }
 
+    IndexState state() const
+    {
+        const Snapshot& snapshot = searches_->snapshot();
+        if (snapshot.mapped() != nullptr) {
+            return snapshot.is_stale() ? IndexState::stale : IndexState::current;
+        }
+        if (refused_) {
+            return IndexState::unusable;
+        }
+        return is_worth_a_file() ? IndexState::missing : IndexState::none;
+    }
+
+    bool is_worth_a_file() const
+    {
+        return !options_.path.empty() && options_.write &&
+               searches_->snapshot().corpus().code_count() >= options_.write_from;
+    }
+
     void set_snapshot(Snapshot snapshot)
     {
         searches_ = std::make_unique<Searches>(std::move(snapshot), options_.lists);
@@ -113,9 +132,11 @@ private:
             try {
                 return Snapshot(store, map_index(options_.path));
             } catch (const IndexFileError& error) {
+                refused_ = true;
                 note_ = "the side file " + options_.path + " " + error.what();
             } catch (const std::system_error& error) {
                 if (error.code() != std::errc::no_such_file_or_directory) {
+                    refused_ = true;
                     note_ = std::string("the side file cannot be read: ") + error.what();
                 }
             }
@@ -128,8 +149,7 @@ private:
     void keep_file(Store& store)
     {
         const Snapshot& snapshot = searches_->snapshot();
-        if (options_.path.empty() || !options_.write || !snapshot.is_stale() ||
-            snapshot.left_out() > 0 || snapshot.corpus().code_count() < options_.write_from) {
+        if (!is_worth_a_file() || !snapshot.is_stale() || snapshot.left_out() > 0) {
             return;
         }
         try {
@@ -162,6 +182,7 @@ private:
     IndexOptions options_;
     std::unique_ptr<Searches> searches_;
     std::string note_;
+    bool refused_ = false; ///< there is a side file, but it does not serve
 };
 
 } // namespace

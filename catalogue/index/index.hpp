@@ -15,8 +15,18 @@ namespace kzcat {
 
 enum class Plan { scan, parts };
 
+/// What became of the side file.
+enum class IndexState {
+    none,    ///< there is none, nor would it be worth it, or none is wanted
+    current, ///< it serves; what came since is searched beside it
+    missing, ///< it would be worth it, but could not be written
+    stale,   ///< a tenth has changed since, and it could not be written again
+    unusable ///< it could not be read or was refused, and was not written again
+};
+
 struct IndexFacts {
     Plan plan = Plan::scan;
+    IndexState state = IndexState::none;
     uint64_t codes = 0;
     uint64_t tracks = 0;
     uint64_t tail_tracks = 0; ///< not in the side file: kept in memory and scanned

@@ -126,6 +126,7 @@ TEST_F(SideFile, IsWrittenAndThenMapped)
     EXPECT_EQ(store_->code_count(), facts.codes);
     EXPECT_EQ(0U, facts.tail_tracks);
     EXPECT_EQ(std::filesystem::file_size(path_), facts.file_bytes);
+    EXPECT_EQ(IndexState::current, facts.state);
     EXPECT_LT(0, facts.scan_ms);
     EXPECT_LT(0, facts.parts_ms);
     EXPECT_EQ("", facts.note);
@@ -149,6 +150,7 @@ TEST_F(SideFile, IsNotWrittenForFewCodes)
     options.write_from = store_->code_count() + 1;
     const auto index = open_index(*store_, options);
     EXPECT_EQ(Plan::scan, index->facts().plan);
+    EXPECT_EQ(IndexState::none, index->facts().state);
     EXPECT_EQ(0U, index->facts().file_bytes);
     EXPECT_EQ(ids_[3], found(*index, 4));
     EXPECT_EQ(0U, folder_.files());
@@ -159,6 +161,7 @@ TEST_F(SideFile, IsNeitherNeededNorWrittenWithoutAPath)
     const auto index = open_index(*store_, {.path = "", .write_from = 1});
     EXPECT_EQ(ids_[3], found(*index, 4));
     EXPECT_EQ("", index->facts().note);
+    EXPECT_EQ(IndexState::none, index->facts().state);
     EXPECT_EQ(0U, folder_.files());
 }
 
@@ -290,6 +293,7 @@ TEST_F(SideFile, ThatCannotBeWrittenIsDoneWithout)
     std::filesystem::create_directory(path_ + ".new");
     const IndexFacts facts = expect_right_answers();
     EXPECT_EQ(Plan::scan, facts.plan);
+    EXPECT_EQ(IndexState::missing, facts.state);
     EXPECT_NE(std::string::npos, facts.note.find("was not written")) << facts.note;
 }
 
@@ -302,6 +306,7 @@ TEST_F(SideFile, OnAFullDiskIsDoneWithout)
         const test::FileLimit limit(100'000);
         const auto index = open();
         EXPECT_NE(std::string::npos, index->facts().note.find("was not written"));
+        EXPECT_EQ(IndexState::stale, index->facts().state);
         EXPECT_EQ(more[8], found(*index, kTracks + 9));
         EXPECT_EQ(ids_[8], found(*index, 9));
     }
@@ -312,7 +317,9 @@ TEST_F(SideFile, OnAFullDiskIsDoneWithout)
 TEST_F(SideFile, ThatIsAFolderIsDoneWithout)
 {
     std::filesystem::create_directory(path_);
-    EXPECT_NE("", expect_right_answers().note);
+    const IndexFacts facts = expect_right_answers();
+    EXPECT_NE("", facts.note);
+    EXPECT_EQ(IndexState::unusable, facts.state);
 }
 
 TEST_F(SideFile, IsLeftToTheProcessThatIsWritingIt)
@@ -489,6 +496,7 @@ TEST_F(SideFile, IsNotWrittenWhileTracksAreLeftOut)
     Damaged damaged(*store_, {ids_[7], ids_[20]});
     const auto index = open_index(damaged, options_for(path_));
     EXPECT_EQ(2U, index->facts().left_out);
+    EXPECT_EQ(IndexState::missing, index->facts().state);
     EXPECT_EQ(kTracks - 2, index->facts().tracks);
     EXPECT_EQ(0U, index->facts().file_bytes);
     EXPECT_EQ(ids_[8], found(*index, 9));

@@ -2,9 +2,15 @@
 
 #include "kzfp.hpp"
 
+#include <algorithm>
+#include <functional>
+#include <iterator>
+#include <random>
+
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 
+#include "catalogue/model/trail_file.hpp"
 #include "kzcat.h"
 #include "recordings.hpp"
 
@@ -109,6 +115,78 @@ TEST(KzfpList, SaysHowClipsAreLookedUp)
     EXPECT_EQ(catalogue, summary["catalogue"]);
     EXPECT_EQ(1, summary["tracks"]);
     EXPECT_EQ("scan", summary["plan"]);
+}
+
+json summary_of(const std::string& catalogue)
+{
+    return json::parse(output_of({"list", "--summary", "-f", "json", catalogue}));
+}
+
+/// Opens the index, which is made from this many codes on.
+void make_index(const std::string& catalogue, uint32_t from)
+{
+    kzcat_settings settings;
+    kzcat_facts facts;
+    kzcat_catalogue* opened = nullptr;
+    kzcat_initialize_settings(&settings);
+    settings.index_from = from;
+    ASSERT_EQ(KZCAT_OK, kzcat_open(catalogue.c_str(), KZCAT_ACCESS_READ, &settings, &opened));
+    EXPECT_EQ(KZCAT_OK, kzcat_get_facts(opened, 1, &facts));
+    EXPECT_EQ(KZCAT_INDEX_CURRENT, facts.index_state);
+    kzcat_close(&opened);
+}
+
+TEST(KzfpList, ReportsAStaleOrUnusableIndex)
+{
+    const ScratchDirectory scratch;
+    const std::string catalogue = scratch.path("c.kzc");
+    output_of({"add", catalogue, scratch.write("a.wav", wav(piece(1, 20)))});
+    EXPECT_EQ("none", summary_of(catalogue)["index"]);
+    make_index(catalogue, 1);
+    EXPECT_EQ("current", summary_of(catalogue)["index"]);
+    EXPECT_FALSE(contains(output_of({"list", catalogue}), "the index"));
+    output_of({"add", catalogue, scratch.write("b.wav", wav(piece(2, 20)))});
+    EXPECT_EQ("stale", summary_of(catalogue)["index"]);
+    const std::string listed = output_of({"list", catalogue});
+    EXPECT_TRUE(contains(listed, "the index " + catalogue + ".idx is stale")) << listed;
+    EXPECT_TRUE(contains(listed, "make its folder writable")) << listed;
+    scratch.write("c.kzc.idx", "damaged");
+    EXPECT_EQ("unusable", summary_of(catalogue)["index"]);
+    EXPECT_TRUE(
+        contains(output_of({"list", catalogue}), "cannot be used, which costs time; delete"));
+    EXPECT_TRUE(contains(output_of({"list", "--summary", "-f", "csv", catalogue}),
+                         "plan,index_bytes,index\n"));
+}
+
+/// Adds a track with so many codes.
+void add_codes(const std::string& catalogue, size_t count)
+{
+    kzcat::Trail noise;
+    noise.samples = kzcat::kFrameLength + (count - 1) * kzcat::kCodeHop;
+    std::mt19937_64 random(1);
+    std::generate_n(std::back_inserter(noise.codes), count, std::ref(random));
+    const std::vector<std::byte> bytes = kzcat::write_trail(noise);
+    kzcat_trail* trail = nullptr;
+    kzcat_catalogue* opened = nullptr;
+    ASSERT_EQ(KZCAT_OK, kzcat_trail_read(bytes.data(), bytes.size(), &trail));
+    ASSERT_EQ(KZCAT_OK, kzcat_open(catalogue.c_str(), KZCAT_ACCESS_CREATE, nullptr, &opened));
+    const kzcat_new_track track = {
+        .trail = trail, .source = {"a", -1, -1, nullptr}, .tags = nullptr, .tag_count = 0};
+    EXPECT_EQ(KZCAT_OK, kzcat_add(opened, &track, 1, nullptr));
+    kzcat_close(&opened);
+    kzcat_trail_free(&trail);
+}
+
+TEST(KzfpList, ReportsAMissingIndex)
+{
+    const ScratchDirectory scratch;
+    const std::string catalogue = scratch.path("c.kzc");
+    add_codes(catalogue, 4'000'000);
+    scratch.write("c.kzc.idx.new/file", "in the way of the index");
+    EXPECT_EQ("missing", summary_of(catalogue)["index"]);
+    const std::string listed = output_of({"list", catalogue});
+    EXPECT_TRUE(contains(listed, "the index " + catalogue + ".idx is missing")) << listed;
+    EXPECT_TRUE(contains(listed, "make its folder writable")) << listed;
 }
 
 TEST(KzfpList, ShowsEveryTagOfOneName)

@@ -76,6 +76,8 @@ TEST(CatalogueRecordLayout, OfFacts)
         FIELD(Record, scan_ms),
         FIELD(Record, parts_ms),
         FIELD(Record, plan),
+        FIELD(Record, index_state),
+        FIELD(Record, left_out),
         FIELD(Record, reserved),
     });
     EXPECT_EQ(88U, sizeof(Record));

@@ -32,6 +32,49 @@ const char* plan_text(const kzcat_facts& facts)
     return facts.plan == KZCAT_PLAN_PARTS ? "parts" : "scan";
 }
 
+const char* index_text(const kzcat_facts& facts)
+{
+    switch (facts.index_state) {
+    case KZCAT_INDEX_CURRENT:
+        return "current";
+    case KZCAT_INDEX_MISSING:
+        return "missing";
+    case KZCAT_INDEX_STALE:
+        return "stale";
+    case KZCAT_INDEX_UNUSABLE:
+        return "unusable";
+    default:
+        return "none";
+    }
+}
+
+/// What is wrong with the index file, and what cures it; empty when nothing is.
+std::string index_trouble(const std::string& path, const kzcat_facts& facts)
+{
+    const std::string file = without_control_characters(path) + ".idx";
+    std::string trouble;
+    switch (facts.index_state) {
+    case KZCAT_INDEX_MISSING:
+        trouble = "the index " + file + " is missing and could not be made";
+        break;
+    case KZCAT_INDEX_STALE:
+        trouble =
+            "the index " + file + " is stale: more than a tenth has changed since it was made";
+        break;
+    case KZCAT_INDEX_UNUSABLE:
+        return "the index " + file +
+               " cannot be used, which costs time; delete it, and it is made "
+               "again when it is worth it\n";
+    default:
+        return {};
+    }
+    if (facts.left_out != 0) {
+        return trouble + ", nor is it made while tracks are damaged; 'kzfp verify' names them\n";
+    }
+    return trouble + ", which costs time; make its folder writable with room for it, delete " +
+           file + " if it is there, and repeat this command\n";
+}
+
 std::string summary_json(const std::string& path, const kzcat_facts& facts)
 {
     JsonObject object = make_object();
@@ -48,15 +91,16 @@ std::string summary_json(const std::string& path, const kzcat_facts& facts)
         object["parts_ms"] = facts.parts_ms;
     }
     object["index_bytes"] = facts.index_bytes;
+    object["index"] = index_text(facts);
     return to_line(object);
 }
 
 std::string summary_csv(const std::string& path, const kzcat_facts& facts)
 {
-    return "catalogue,tracks,codes,plan,index_bytes\n" +
-           csv_line(std::array<std::string, 5>{path, std::to_string(facts.tracks),
-                                               std::to_string(facts.codes), plan_text(facts),
-                                               std::to_string(facts.index_bytes)});
+    return "catalogue,tracks,codes,plan,index_bytes,index\n" +
+           csv_line(std::array<std::string, 6>{
+               path, std::to_string(facts.tracks), std::to_string(facts.codes), plan_text(facts),
+               std::to_string(facts.index_bytes), index_text(facts)});
 }
 
 /// "239 tracks, 11.1 hours; looked up by scan (a clip takes 3.1 ms by scan, 1.2 ms by parts)".
@@ -85,7 +129,7 @@ std::string summary(const ListSettings& settings, const kzcat_facts& facts)
     case Format::csv:
         return summary_csv(settings.catalogue, facts);
     default:
-        return summary_text(facts);
+        return summary_text(facts) + index_trouble(settings.catalogue, facts);
     }
 }
 
