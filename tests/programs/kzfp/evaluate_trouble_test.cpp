@@ -43,6 +43,16 @@ TEST_F(Evaluate, SaysThatThereIsNoMusic)
     EXPECT_TRUE(contains(result.err, "there is no music to evaluate with; name sound files or"));
 }
 
+TEST_F(Evaluate, RefusesSeedsThatAreNoWholeNumbers)
+{
+    for (const std::string seed : {"-1", "1.5", "18446744073709551616", "one", "1 "}) {
+        const ProcessResult result = evaluate({"--seed=" + seed});
+        EXPECT_EQ(2, result.status) << seed;
+        EXPECT_TRUE(contains(result.err, "'" + seed + "' is not a whole number from 0 to 2^64 - 1"))
+            << result.err;
+    }
+}
+
 TEST_F(Evaluate, LeavesSilentTracksOut)
 {
     const ScratchDirectory scratch;

@@ -176,6 +176,26 @@ TEST_F(Match, InputSaysWhatStandardInputHolds)
     }
 }
 
+TEST_F(Match, InputThatIsNamedSoundIsReadAsSound)
+{
+    const std::vector<std::string> words = {"match", "-f", "json", "--input", "sound", catalogue()};
+    const auto matched = [&words](const std::string& input, const ProcessSetup& setup = {}) {
+        std::vector<std::string> arguments = words;
+        arguments.push_back(input);
+        return kzfp(arguments, setup);
+    };
+    for (const ProcessResult& result :
+         {matched(path_of(2)), matched("-", fed_with(contents(path_of(2))))}) {
+        ASSERT_EQ(0, result.status) << result.err;
+        EXPECT_EQ(path_of(2), json::parse(result.out)["matches"][0]["source"]);
+    }
+    const std::string values =
+        scratch_->write("values.txt", output_of({"-f", "values", path_of(2)}));
+    const ProcessResult result = matched(values);
+    EXPECT_EQ(1, result.status);
+    EXPECT_TRUE(contains(result.err, "headerless audio needs --raw")) << result.err;
+}
+
 TEST_F(Match, PlansGiveTheSameAnswer)
 {
     const json measured = match({"--start", "3", "--length", "10", path_of(5)});

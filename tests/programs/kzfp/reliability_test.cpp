@@ -232,6 +232,40 @@ TEST_F(KzfpReliability, ACatalogueOfANewerVersionIsRefused)
     EXPECT_EQ(bytes, contents(catalogue_));
 }
 
+TEST_F(KzfpReliability, AFifoInAFolderIsPassedOver)
+{
+    const std::string music = make_music("m", 1, 1);
+    ASSERT_EQ(0, mkfifo((music + "/0.wav").c_str(), 0666)); // would keep a reader waiting for ever
+    EXPECT_EQ("added " + music + "/1.wav\n1 added; 1 file passed over that is not sound\n",
+              output_of({"add", catalogue_, music}));
+}
+
+TEST_F(KzfpReliability, FoldersThatMayNotBeReadAreReported)
+{
+    const std::string music = make_music("m", 1, 1);
+    const std::string secret = make_music("m/secret", 2, 1);
+    fs::permissions(scratch_.path(), fs::perms::all);
+    fs::permissions(secret, fs::perms::none);
+    for (const std::string command : {"add", "duplicates", "evaluate"}) {
+        std::vector<std::string> arguments = {command, music};
+        if (command == "add") {
+            arguments.insert(arguments.begin() + 1, catalogue_);
+        }
+        Running running(arguments, out_, err_, {.without_rights = true});
+        const ProcessResult result = finish(running);
+        if (result.status == Running::kMayNotRun) {
+            fs::permissions(secret, fs::perms::owner_all);
+            GTEST_SKIP() << "the program may not be run without rights from where it is";
+        }
+        EXPECT_EQ(1, result.status) << command;
+        EXPECT_TRUE(
+            contains(result.err, secret + ": the folder cannot be read (Permission denied)"))
+            << command << ": " << result.err;
+    }
+    fs::permissions(secret, fs::perms::owner_all);
+    EXPECT_EQ(std::set<std::string>{music + "/1.wav"}, sources()) << "the rest was added";
+}
+
 TEST_F(KzfpReliability, FilesOfNoUseGetASentenceEach)
 {
     const std::string good = scratch_.write("m/good.wav", wav(piece(1, 4)));

@@ -1,6 +1,10 @@
 #include "running.hpp"
 
+#include <chrono>
 #include <csignal>
+#include <filesystem>
+#include <system_error>
+#include <thread>
 #include <utility>
 
 #include <fcntl.h>
@@ -55,6 +59,24 @@ Running::~Running()
 }
 
 void Running::send(int signal) const { ::kill(process_, signal); }
+
+bool Running::wait_until_open(const std::string& path) const
+{
+    namespace fs = std::filesystem;
+    const std::string folder = "/proc/" + std::to_string(process_) + "/fd";
+    for (int i = 0; i < 20'000; ++i) {
+        std::error_code error;
+        for (fs::directory_iterator it(folder, error); !error && it != fs::directory_iterator();
+             it.increment(error)) {
+            std::error_code gone;
+            if (fs::read_symlink(it->path(), gone) == path) {
+                return true;
+            }
+        }
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+    return false;
+}
 
 int Running::wait()
 {

@@ -30,6 +30,9 @@ public:
 
     void send(int signal) const;
 
+    /// Waits until it has a file open; false when that takes too long.
+    bool wait_until_open(const std::string& path) const;
+
     /// The exit status; 128 + n when signal n ended it.
     int wait();
 

@@ -67,6 +67,26 @@ TEST(KzfpEvery, TimesAreThoseOfTheWholeFile)
     EXPECT_EQ(30u, json::parse(lines[1])["values"].size());
 }
 
+TEST(KzfpEvery, HeaderlessSoundBeginsAtTheStart)
+{
+    const std::string file = clip("music-22050-mono.u8");
+    const std::vector<std::string> raw = {"--raw", "22050,1,u8", "--format", "values"};
+    const auto run_from = [&raw](const std::string& start, const std::string& input,
+                                 std::vector<std::string> more) {
+        more.insert(more.end(), raw.begin(), raw.end());
+        more.insert(more.end(), {"--start", start, input});
+        const ProcessResult result = kzfp(
+            more, input == "-" ? fed_with(contents(clip("music-22050-mono.u8"))) : ProcessSetup());
+        EXPECT_EQ(0, result.status) << result.err;
+        return result.out;
+    };
+    const std::string windows = run_from("2.5", file, {"--every", "1.5"});
+    EXPECT_EQ("2.5 " + run_from("2.5", file, {}) + "4 " + run_from("4", file, {}) + "5.5 " +
+                  run_from("5.5", file, {}),
+              windows);
+    EXPECT_EQ(windows, run_from("2.5", "-", {"--every", "1.5"}));
+}
+
 TEST(KzfpEvery, SilentWindowsHaveTheirLineToo)
 {
     const auto lines = lines_of(output_of({"--every", "3", "--format", "json", kLate}));

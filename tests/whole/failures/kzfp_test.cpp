@@ -88,6 +88,38 @@ protected:
         }
     }
 
+    /// A database takes thousands of allocations: each third of the first ones fails, then one of
+    /// every `step`. `prepare()` is called before each run.
+    template <class Prepare>
+    void for_some_failures(const std::vector<std::string>& arguments, int step,
+                           Prepare prepare) const
+    {
+        const ProcessResult whole = run_without_failure(arguments);
+        ASSERT_EQ(0, whole.status) << whole.err;
+        for (int nth = 1;; nth += nth < 40 ? 3 : step) {
+            prepare();
+            const std::string setting = "KZ_FAIL_ALLOCATION=" + std::to_string(nth);
+            const auto result = run_with_failure(arguments, setting, nth % 2 == 0);
+            if (!result) {
+                EXPECT_GT(nth, 200);
+                break;
+            }
+            if (result->status == 0) {
+                EXPECT_EQ(whole.out, result->out) << setting;
+            } else {
+                EXPECT_EQ(1, result->status) << setting;
+                EXPECT_NE("", result->err) << setting;
+            }
+        }
+    }
+
+    std::string write_music(double seconds) const
+    {
+        const std::string samples = bytes_of(tune(kRate, 1, seconds));
+        return scratch_.write("music.wav",
+                              wav_header(static_cast<uint32_t>(samples.size())) + samples);
+    }
+
     ScratchDirectory scratch_;
     ProcessSetup setup_;
 
@@ -136,9 +168,7 @@ TEST_F(FailingSystem, AnyAllocationMayFailForHeaderlessSamples)
 
 TEST_F(FailingSystem, AnyAllocationMayFailOnTheRoadOfASoundFile)
 {
-    const std::string samples = bytes_of(tune(kRate, 1, 15));
-    const std::string file =
-        scratch_.write("music.wav", wav_header(static_cast<uint32_t>(samples.size())) + samples);
+    const std::string file = write_music(15);
     for_every_failure("ALLOCATION", {"--algorithm", "float", "--format", "json", file},
                       expect_same_or_error_line);
 }
@@ -157,44 +187,35 @@ TEST_F(FailingSystem, AnyAllocationMayFailInTheDiscCommand)
                       });
 }
 
-// A database takes thousands: each of the first, then one of every so many.
 TEST_F(FailingSystem, AllocationsMayFailWhileMusicIsAdded)
 {
-    const std::string samples = bytes_of(tune(kRate, 1, 8));
-    const std::string file =
-        scratch_.write("music.wav", wav_header(static_cast<uint32_t>(samples.size())) + samples);
+    const std::string file = write_music(8);
     const std::string catalogue = scratch_.path("c.kzc");
-    const std::vector<std::string> add = {"add", "-j", "1", catalogue, file};
-    const std::vector<std::string> match = {"match", "-j", "1", "--no-speeds", catalogue, file};
-    for (const auto& arguments : {add, match}) {
-        const ProcessResult whole = run_without_failure(arguments);
-        ASSERT_EQ(0, whole.status) << whole.err;
-        for (int nth = 1;; nth += nth < 40 ? 3 : 211) {
-            if (arguments == add) {
-                std::filesystem::remove(catalogue);
-            }
-            const std::string setting = "KZ_FAIL_ALLOCATION=" + std::to_string(nth);
-            const auto result = run_with_failure(arguments, setting, nth % 2 == 0);
-            if (!result) {
-                EXPECT_GT(nth, 200);
-                break;
-            }
-            if (result->status == 0) {
-                EXPECT_EQ(whole.out, result->out) << setting;
-            } else {
-                EXPECT_EQ(1, result->status) << setting;
-                EXPECT_NE("", result->err) << setting;
-            }
-        }
-    }
+    for_some_failures({"add", "-j", "1", catalogue, file}, 211,
+                      [&catalogue] { std::filesystem::remove(catalogue); });
+}
+
+TEST_F(FailingSystem, AllocationsMayFailWhileMusicIsMatched)
+{
+    const std::string file = write_music(8);
+    const std::string catalogue = scratch_.path("c.kzc");
+    ASSERT_EQ(0, run_without_failure({"add", "-q", catalogue, file}).status);
+    for_some_failures({"match", "-j", "1", "--no-speeds", catalogue, file}, 211, [] {});
+}
+
+TEST_F(FailingSystem, AllocationsMayFailWhileAStreamIsHeard)
+{
+    const std::string file = write_music(8);
+    const std::string catalogue = scratch_.path("c.kzc");
+    ASSERT_EQ(0, run_without_failure({"add", "-q", catalogue, file}).status);
+    for_some_failures({"monitor", "-f", "json", "--no-speeds", catalogue, file}, 463, [] {});
 }
 
 TEST_F(FailingSystem, AnyReadMayFail)
 {
     const std::string samples = bytes_of(tune(kRate, 1, 15));
     const std::string raw = scratch_.write("music.raw", samples);
-    const std::string wav =
-        scratch_.write("music.wav", wav_header(static_cast<uint32_t>(samples.size())) + samples);
+    const std::string wav = write_music(15);
     for_every_failure("READ", {"--raw", "8000,1,s16", raw}, expect_same_or_complaint);
     for_every_failure("READ", {wav}, expect_same_or_complaint);
     setup_.input_file = wav;
