@@ -4,12 +4,12 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstdio>
 #include <deque>
 #include <memory>
 #include <span>
 #include <utility>
 
+#include "kzfp/output/printed.hpp"
 #include "kzsdk/stream/stream.h"
 
 namespace kzfp {
@@ -28,13 +28,6 @@ void check(const char* step, kz_status status)
     if (status != KZ_OK) {
         fail(step, status);
     }
-}
-
-std::string printed(const char* format, double number)
-{
-    char text[64];
-    std::snprintf(text, sizeof text, format, number);
-    return text;
 }
 
 std::string tenths(double seconds) { return printed("%.1f s", std::floor(seconds * 10) / 10); }

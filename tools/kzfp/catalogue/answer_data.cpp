@@ -1,11 +1,11 @@
 // Answers for programs: JSON Lines and comma-separated values.
 
 #include <cmath>
-#include <cstdio>
 
 #include "kzfp/catalogue/answer.hpp"
 #include "kzfp/output/csv.hpp"
 #include "kzfp/output/json_object.hpp"
+#include "kzfp/output/printed.hpp"
 
 namespace kzfp {
 
@@ -66,12 +66,7 @@ JsonObject gaps_of(const Answer& answer)
     return list;
 }
 
-std::string number_field(double number)
-{
-    char text[64];
-    std::snprintf(text, sizeof text, "%.4f", rounded(number));
-    return text;
-}
+std::string number_field(double number) { return printed("%.4f", rounded(number)); }
 
 /// Everything about a file that is the same on all of its lines of CSV comes first.
 std::string csv_row(const Answer& answer, const char* result, const FoundTrack* found,

@@ -4,19 +4,13 @@
 #include <cstdio>
 
 #include "kzfp/catalogue/answer.hpp"
+#include "kzfp/output/printed.hpp"
 #include "kzfp/output/style.hpp"
 #include "kzfp/output/write.hpp"
 
 namespace kzfp {
 
 namespace {
-
-std::string printed(const char* format, double number)
-{
-    char text[64];
-    std::snprintf(text, sizeof text, format, number);
-    return text;
-}
 
 /// ", 3.9 % faster"; nothing for less than the numbers are good for.
 std::string percent_text(double factor, const char* more, const char* less)

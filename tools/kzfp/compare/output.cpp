@@ -4,10 +4,10 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstdio>
 
 #include "kzfp/output/csv.hpp"
 #include "kzfp/output/json_object.hpp"
+#include "kzfp/output/printed.hpp"
 #include "kzfp/output/style.hpp"
 #include "kzfp/output/write.hpp"
 
@@ -16,13 +16,6 @@ namespace kzfp {
 namespace {
 
 double rounded(double number) { return std::round(number * 1e4) / 1e4; }
-
-std::string printed(const char* format, double number)
-{
-    char text[64];
-    std::snprintf(text, sizeof text, format, number);
-    return text;
-}
 
 bool agrees(const Comparison& comparison)
 {

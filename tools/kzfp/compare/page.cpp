@@ -4,21 +4,14 @@
 #include "kzfp/compare/page.hpp"
 
 #include <algorithm>
-#include <cstdio>
 #include <utility>
 
+#include "kzfp/output/printed.hpp"
 #include "kzfp/pages/gather.hpp"
 
 namespace kzfp {
 
 namespace {
-
-std::string printed(const char* format, double number)
-{
-    char text[64];
-    std::snprintf(text, sizeof text, format, number);
-    return text;
-}
 
 std::vector<report::Column> columns()
 {

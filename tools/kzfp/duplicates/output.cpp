@@ -1,13 +1,15 @@
 #include "kzfp/duplicates/output.hpp"
 
-#include <array>
+#include <algorithm>
 #include <cmath>
-#include <cstdio>
+#include <string>
+#include <utility>
 #include <vector>
 
 #include "kzfp/catalogue/answer.hpp"
 #include "kzfp/output/csv.hpp"
 #include "kzfp/output/json_object.hpp"
+#include "kzfp/output/printed.hpp"
 #include "kzfp/output/write.hpp"
 
 namespace kzfp {
@@ -53,9 +55,7 @@ double round_to(double number, int digits)
 
 std::string rounded(double number, int digits)
 {
-    std::array<char, 64> text{};
-    std::snprintf(text.data(), text.size(), "%.*f", digits, round_to(number, digits));
-    return text.data();
+    return printed("%.*f", digits, round_to(number, digits));
 }
 
 /// "lossless, 44100 Hz, 2 channels, 912 kbit/s, up to 20.5 kHz"

@@ -1,18 +1,12 @@
 #include "kzfp/evaluate/notes.hpp"
 
 #include <algorithm>
-#include <cstdio>
+
+#include "kzfp/output/printed.hpp"
 
 namespace kzfp::evaluate {
 
 namespace {
-
-std::string printed(const char* format, double number)
-{
-    char text[64];
-    std::snprintf(text, sizeof text, format, number);
-    return text;
-}
 
 std::string about_strangers(const Tally& all)
 {

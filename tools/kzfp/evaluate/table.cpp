@@ -5,9 +5,9 @@
 
 #include <algorithm>
 #include <array>
-#include <cstdio>
 
 #include "kzfp/evaluate/notes.hpp"
+#include "kzfp/output/printed.hpp"
 #include "kzfp/output/write.hpp"
 
 namespace kzfp::evaluate {
@@ -15,13 +15,6 @@ namespace kzfp::evaluate {
 namespace {
 
 constexpr size_t kMostPairs = 20; ///< more are counted, not named
-
-std::string printed(const char* format, double number)
-{
-    char text[64];
-    std::snprintf(text, sizeof text, format, number);
-    return text;
-}
 
 /// A cell at the right of a column.
 std::string cell(const std::string& text, size_t width)

@@ -9,6 +9,7 @@
 #include "kzfp/catalogue/answer.hpp"
 #include "kzfp/monitor/members.hpp"
 #include "kzfp/output/csv.hpp"
+#include "kzfp/output/printed.hpp"
 #include "kzfp/output/write.hpp"
 
 namespace kzfp {
@@ -22,12 +23,7 @@ std::optional<std::string> to_text(const char* text)
     return text == nullptr ? std::nullopt : std::optional<std::string>(text);
 }
 
-std::string number_text(double number)
-{
-    char text[64];
-    std::snprintf(text, sizeof text, "%.3f", number);
-    return text;
-}
+std::string number_text(double number) { return printed("%.3f", number); }
 
 const char* stage_text(uint32_t stage)
 {

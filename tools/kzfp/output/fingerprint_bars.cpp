@@ -5,9 +5,9 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
-#include <cstdio>
 #include <span>
 
+#include "kzfp/output/printed.hpp"
 #include "kzfp/output/style.hpp"
 #include "kzfp/output/text.hpp"
 #include "kzfp/output/write.hpp"
@@ -24,14 +24,6 @@ constexpr std::array<int, kBands + 1> kEdges = {0,   100,  200,  300,  400,  510
                                                 920, 1080, 1270, 1480, 1720, 2000, 2320, 2700};
 
 using Values = std::span<const int16_t>;
-
-template <class... Numbers>
-std::string printed(const char* format, Numbers... numbers)
-{
-    char text[96];
-    std::snprintf(text, sizeof text, format, numbers...);
-    return text;
-}
 
 /// A single band that holds everything wraps to -32768.
 double share(int16_t value)

@@ -10,6 +10,7 @@
 #include <unistd.h>
 
 #include "kzfp/output/json_object.hpp"
+#include "kzfp/output/printed.hpp"
 #include "kzfp/output/write.hpp"
 
 namespace kzfp {
@@ -37,13 +38,6 @@ std::string cut(const std::string& text, size_t columns)
         }
     }
     return text.substr(0, end);
-}
-
-std::string printed(const char* format, double number)
-{
-    char text[64];
-    std::snprintf(text, sizeof text, format, number);
-    return text;
 }
 
 /// "0:07", "12:30" or "1:02:03".
