@@ -2,9 +2,10 @@
 
 #include <algorithm>
 #include <cmath>
-#include <complex>
 #include <numbers>
 #include <vector>
+
+#include "kzfp/fourier.hpp"
 
 namespace kzfp {
 
@@ -19,42 +20,13 @@ constexpr double kStep = 250;        ///< hertz
 constexpr double kBelowStrongest = 1e-7;
 constexpr double kBelowFullScale = 1e-10;
 
-using Complex = std::complex<double>;
-
-/// The discrete Fourier transform, in place, of a power of two.
-void transform(std::vector<Complex>& values)
-{
-    const size_t count = values.size();
-    for (size_t i = 1, j = 0; i < count; ++i) {
-        size_t bit = count / 2;
-        for (; (j & bit) != 0; bit /= 2) {
-            j ^= bit;
-        }
-        j ^= bit;
-        if (i < j) {
-            std::swap(values[i], values[j]);
-        }
-    }
-    for (size_t size = 2; size <= count; size *= 2) {
-        const Complex turn = std::polar(1.0, -2 * std::numbers::pi / static_cast<double>(size));
-        for (size_t begin = 0; begin < count; begin += size) {
-            Complex factor = 1;
-            for (size_t i = begin; i < begin + size / 2; ++i, factor *= turn) {
-                const Complex lower = values[i];
-                const Complex upper = factor * values[i + size / 2];
-                values[i] = lower + upper;
-                values[i + size / 2] = lower - upper;
-            }
-        }
-    }
-}
-
 /// The power of each step of frequency, 1 for a full sine, on average over the moments.
 std::vector<double> powers_of(std::span<const float> samples, uint32_t rate)
 {
     const uint32_t highest = rate / 2;
     std::vector<double> powers(static_cast<size_t>(highest / kStep) + 1);
-    std::vector<Complex> frame(kLength);
+    const FourierTransform transform(kLength, FourierTransform::Direction::forward);
+    Spectrum frame(kLength);
     size_t moments = 0;
     for (size_t at = 0; at + kLength <= samples.size(); at += kHop, ++moments) {
         for (size_t i = 0; i < kLength; ++i) {

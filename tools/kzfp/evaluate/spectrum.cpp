@@ -1,65 +1,17 @@
-// A plain transform of powers of two: clips are short, and nothing here is looked up in a hurry.
-
 #include "kzfp/evaluate/spectrum.hpp"
 
 #include <algorithm>
 #include <bit>
 #include <cmath>
-#include <complex>
-#include <numbers>
-#include <utility>
+
+#include "kzfp/fourier.hpp"
 
 namespace kzfp::evaluate {
 
 namespace {
 
-using Spectrum = std::vector<std::complex<double>>;
-
 constexpr double kNoiseFrom = 20;
 constexpr double kNoiseTo = 11025;
-
-/// Without the care for infinities that the operator takes.
-std::complex<double> product(std::complex<double> a, std::complex<double> b)
-{
-    return {a.real() * b.real() - a.imag() * b.imag(), a.real() * b.imag() + a.imag() * b.real()};
-}
-
-void reverse_bits(Spectrum& values)
-{
-    for (size_t i = 1, j = 0; i < values.size(); ++i) {
-        size_t bit = values.size() / 2;
-        for (; (j & bit) != 0; bit /= 2) {
-            j ^= bit;
-        }
-        j ^= bit;
-        if (i < j) {
-            std::swap(values[i], values[j]);
-        }
-    }
-}
-
-/// The transform of Cooley and Tukey (1965) in place, without a factor. The inverse has a positive
-/// sign.
-void transform(Spectrum& values, double sign)
-{
-    reverse_bits(values);
-    Spectrum roots(values.size() / 2);
-    for (size_t i = 0; i < roots.size(); ++i) {
-        const double angle =
-            2 * std::numbers::pi * static_cast<double>(i) / static_cast<double>(values.size());
-        roots[i] = {std::cos(angle), sign * std::sin(angle)};
-    }
-    for (size_t half = 1; half < values.size(); half *= 2) {
-        const size_t step = values.size() / (2 * half);
-        for (size_t begin = 0; begin < values.size(); begin += 2 * half) {
-            for (size_t i = 0; i < half; ++i) {
-                const auto other = product(roots[i * step], values[begin + half + i]);
-                values[begin + half + i] = values[begin + i] - other;
-                values[begin + i] += other;
-            }
-        }
-    }
-}
 
 Spectrum spectrum_of(const std::vector<float>& samples, size_t size)
 {
@@ -67,7 +19,7 @@ Spectrum spectrum_of(const std::vector<float>& samples, size_t size)
     for (size_t i = 0; i < samples.size(); ++i) {
         values[i] = samples[i];
     }
-    transform(values, -1);
+    FourierTransform(size, FourierTransform::Direction::forward)(values);
     return values;
 }
 
@@ -78,7 +30,7 @@ double hertz_of(size_t i, size_t size, double rate)
 
 std::vector<float> sound_of(Spectrum& values, size_t count)
 {
-    transform(values, 1);
+    FourierTransform(values.size(), FourierTransform::Direction::inverse)(values);
     std::vector<float> samples(count);
     for (size_t i = 0; i < count; ++i) {
         samples[i] = static_cast<float>(values[i].real() / static_cast<double>(values.size()));
