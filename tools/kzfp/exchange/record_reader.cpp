@@ -4,7 +4,7 @@
 
 #include <string_view>
 
-#include "kzfp/exchange/encoding.hpp"
+#include "kzfp/output/encoding.hpp"
 #include "kzfp/output/json_object.hpp"
 
 namespace kzfp {

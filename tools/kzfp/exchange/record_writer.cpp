@@ -5,7 +5,7 @@
 #include <utility>
 
 #include "kzfp/catalogue/tracks.hpp"
-#include "kzfp/exchange/encoding.hpp"
+#include "kzfp/output/encoding.hpp"
 #include "kzfp/output/json_object.hpp"
 
 namespace kzfp {

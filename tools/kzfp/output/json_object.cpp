@@ -2,6 +2,8 @@
 
 #include "kzfp/output/json_object.hpp"
 
+#include "kzfp/output/encoding.hpp"
+
 namespace kzfp {
 
 namespace {
@@ -14,18 +16,6 @@ bool is_utf8(const std::string& text)
     } catch (const nlohmann::json::type_error&) {
         return false;
     }
-}
-
-std::string hexadecimal(const std::string& bytes)
-{
-    constexpr std::string_view kDigits = "0123456789abcdef";
-    std::string text;
-    for (const char c : bytes) {
-        const auto byte = static_cast<unsigned char>(c);
-        text += kDigits[byte / 16];
-        text += kDigits[byte % 16];
-    }
-    return text;
 }
 
 } // namespace
@@ -41,7 +31,7 @@ void set_path(JsonObject& object, const std::string& member, const std::string& 
 {
     object[member] = path;
     if (!is_utf8(path)) {
-        object[member + "_bytes"] = hexadecimal(path);
+        object[member + "_bytes"] = to_hexadecimal(path);
     }
 }
 

@@ -1,6 +1,6 @@
 // Nettle has the encodings; here they are given strings.
 
-#include "kzfp/exchange/encoding.hpp"
+#include "kzfp/output/encoding.hpp"
 
 #include <cstdint>
 
