@@ -3,11 +3,8 @@
 #include <array>
 #include <optional>
 #include <string>
-#include <vector>
 
-#include "kzfp/catalogue/guarded.hpp"
-#include "kzfp/command_line/common_options.hpp"
-#include "kzfp/command_line/output_options.hpp"
+#include "kzfp/catalogue/with_others.hpp"
 #include "kzfp/exchange/importer.hpp"
 #include "kzfp/output/csv.hpp"
 #include "kzfp/output/json_object.hpp"
@@ -22,13 +19,12 @@ constexpr const char* kDescription =
     "none, with their tags and sources. Tracks that are there already are not added again, so an\n"
     "interrupted run is simply repeated.";
 
-constexpr FormatChoice kFormats[] = {kHumanFormat, kJsonFormat, kCsvFormat};
+constexpr const char* kFooter =
+    "Exit: 0 all tracks are there; 1 a file or a line of one could not be used (one\n"
+    "      line each on standard error), the others are there; 2 wrong usage;\n"
+    "      130 interrupted: what was imported is kept.";
 
-struct ImportSettings {
-    std::string catalogue;
-    std::vector<std::string> files;
-    OutputOptions output;
-};
+constexpr FormatChoice kFormats[] = {kHumanFormat, kJsonFormat, kCsvFormat};
 
 std::string line_of(const std::string& file, const Imported& imported, const std::string& error,
                     Format format)
@@ -124,14 +120,14 @@ private:
     Importer importer_;
 };
 
-ExitStatus import_all(const ImportSettings& settings)
+ExitStatus import_all(const OthersSettings& settings)
 {
     const Catalogue catalogue = open_catalogue(settings.catalogue, KZCAT_ACCESS_CREATE);
     if (settings.output.format == Format::csv) {
         write_output("file,added,known,refused,error\n");
     }
     const ExitStatus status =
-        for_each_until_interrupted(settings.files, [&](const std::string& file) {
+        for_each_until_interrupted(settings.others, [&](const std::string& file) {
             return Import(*catalogue, file, settings.output).run(settings.catalogue);
         });
     if (interrupted()) {
@@ -145,22 +141,13 @@ ExitStatus import_all(const ImportSettings& settings)
 
 ExitStatus run_import(const Arguments& arguments)
 {
-    Parser parser(kDescription, program_name(arguments));
-    parser.footer("Exit: 0 all tracks are there; 1 a file or a line of one could not be used (one\n"
-                  "      line each on standard error), the others are there; 2 wrong usage;\n"
-                  "      130 interrupted: what was imported is kept.");
-    ImportSettings settings;
-    add_catalogue_option(parser, settings.catalogue);
-    parser.add_option("FILE", settings.files, "Exported catalogues; - is standard input")
-        ->required()
-        ->type_name("");
-    add_output_options(parser, kFormats, settings.output);
-    if (const auto status = parse(parser, arguments)) {
-        return *status;
-    }
-    watch_for_interruption();
-    return guarded(settings.catalogue, settings.output, settings.files, OutputFile::Mode::live,
-                   [&settings] { return import_all(settings); });
+    return run_with_others(arguments,
+                           {.description = kDescription,
+                            .footer = kFooter,
+                            .name = "FILE",
+                            .help = "Exported catalogues; - is standard input",
+                            .formats = kFormats},
+                           import_all);
 }
 
 } // namespace kzfp

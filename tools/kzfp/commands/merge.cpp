@@ -2,13 +2,10 @@
 
 #include <array>
 #include <string>
-#include <vector>
 
-#include "kzfp/catalogue/guarded.hpp"
 #include "kzfp/catalogue/tracks.hpp"
 #include "kzfp/catalogue/watched.hpp"
-#include "kzfp/command_line/common_options.hpp"
-#include "kzfp/command_line/output_options.hpp"
+#include "kzfp/catalogue/with_others.hpp"
 #include "kzfp/output/csv.hpp"
 #include "kzfp/output/json_object.hpp"
 
@@ -20,13 +17,11 @@ constexpr const char* kDescription =
     "Adds all tracks of the OTHER catalogues to CATALOGUE, which is made when there is none, with\n"
     "their tags and sources. Tracks that are there already are not added again.";
 
-constexpr FormatChoice kFormats[] = {kHumanFormat, kJsonFormat, kCsvFormat};
+constexpr const char* kFooter =
+    "Exit: 0 all are merged; 1 one could not be, or not as a whole; 2 wrong usage;\n"
+    "      130 interrupted: what was merged is kept, and the command can be repeated.";
 
-struct MergeSettings {
-    std::string catalogue;
-    std::vector<std::string> others;
-    OutputOptions output;
-};
+constexpr FormatChoice kFormats[] = {kHumanFormat, kJsonFormat, kCsvFormat};
 
 std::string damage_text(uint64_t tracks)
 {
@@ -88,7 +83,7 @@ bool merge_one(kzcat_catalogue& catalogue, const std::string& path, const Output
     return merged.tracks_damaged == 0;
 }
 
-ExitStatus merge_all(const MergeSettings& settings)
+ExitStatus merge_all(const OthersSettings& settings)
 {
     const Catalogue catalogue = open_catalogue(settings.catalogue, KZCAT_ACCESS_CREATE);
     if (settings.output.format == Format::csv) {
@@ -103,22 +98,13 @@ ExitStatus merge_all(const MergeSettings& settings)
 
 ExitStatus run_merge(const Arguments& arguments)
 {
-    Parser parser(kDescription, program_name(arguments));
-    parser.footer(
-        "Exit: 0 all are merged; 1 one could not be, or not as a whole; 2 wrong usage;\n"
-        "      130 interrupted: what was merged is kept, and the command can be repeated.");
-    MergeSettings settings;
-    add_catalogue_option(parser, settings.catalogue);
-    parser.add_option("OTHER", settings.others, "Catalogues, which are only read")
-        ->required()
-        ->type_name("");
-    add_output_options(parser, kFormats, settings.output);
-    if (const auto status = parse(parser, arguments)) {
-        return *status;
-    }
-    watch_for_interruption();
-    return guarded(settings.catalogue, settings.output, settings.others, OutputFile::Mode::live,
-                   [&settings] { return merge_all(settings); });
+    return run_with_others(arguments,
+                           {.description = kDescription,
+                            .footer = kFooter,
+                            .name = "OTHER",
+                            .help = "Catalogues, which are only read",
+                            .formats = kFormats},
+                           merge_all);
 }
 
 } // namespace kzfp
