@@ -3,9 +3,9 @@
 
 packaging/sbom.py [BUILD_DIRECTORY]     build/release if not given; prints to standard output
 
-Read from the built files, not from what the build asked for: the libraries that they name, and those
-that these name in turn, each by the Debian package that it came in. Headers that leave no name behind
-are in INCLUDED. Nothing in it depends on when or where it is made.
+Read from the built files, not from what the build asked for: the libraries that they name, those that
+kzfp opens when it needs them, and those that these name in turn, each by the Debian package that it
+came in. Headers that leave no name behind are in INCLUDED. Nothing in it depends on when or where it is made.
 """
 import functools
 import hashlib
@@ -48,6 +48,19 @@ def output(*command):
 def needed(file):
     """The libraries that a file names: ["libm.so.6", ...]"""
     return re.findall(r"\(NEEDED\).*\[(.*)\]", output("readelf", "-d", str(file)))
+
+
+def opened(file):
+    """The libraries whose names a program has among its texts, to open them: ["libavutil.so.57", ...]"""
+    texts = re.findall(rb"(?<=\0)lib[a-z0-9_+-]+\.so\.[0-9]+(?=\0)", file.read_bytes())
+    return sorted({text.decode() for text in texts} - set(needed(file)))
+
+
+@functools.cache
+def places_of_all():
+    """Where the loader finds every library that is installed."""
+    lines = output("/sbin/ldconfig", "-p").splitlines()[1:]
+    return dict(re.findall(r"^\s*(\S+) .* => (/\S+)$", "\n".join(reversed(lines)), re.MULTILINE))
 
 
 def places_of(file):
@@ -124,6 +137,16 @@ class List:
                 self.seen.add(places[soname])
                 self.add_linked(places[soname], below, places)
 
+    def add_opened(self, file, ref):
+        for soname in opened(file):
+            if soname not in places_of_all():
+                sys.exit(f"sbom: {ref} opens {soname}, which is not installed here; install its package")
+            place = places_of_all()[soname]
+            package = package_of(place)
+            self.expect_licence(ref, package)
+            self.links[ref].add(self.add(package))
+            self.add_linked(place, self.packages[package]["bom-ref"], places_of(place))
+
     def add_included(self, ref):
         for package in INCLUDED.get(ref, []):
             self.expect_licence(ref, package)
@@ -150,6 +173,7 @@ def main():
     for ref, file in (("libkzsdk", library), ("libkzcat", catalogue), ("kzfp", program)):
         found.add_linked(file, ref, places_of(file))
         found.add_included(ref)
+    found.add_opened(program, "kzfp")
     found.links["kzfp"] |= {"libkzsdk", "libkzcat"}  # their static forms
     document = {
         "bomFormat": "CycloneDX",

@@ -4,35 +4,17 @@
 #include "audio/ffmpeg_decoder.hpp"
 
 #include <cstring>
-#include <mutex>
 #include <new>
 #include <string_view>
 
 #include "audio/file_source.hpp"
 
-extern "C" {
-#include <libavutil/mem.h>
-}
-
 namespace audio {
 
 namespace {
 
-constexpr size_t kLargestBlock = size_t{256} << 20; ///< bytes that a file can make FFmpeg allocate
 constexpr const char* kProtocols = "http,https,httpproxy,tls,tcp,udp,rtp,srtp,rtmp,rtmps,rtmpt,"
                                    "rtmpts,mmsh,mmst,ftp,srt,hls,crypto";
-
-/// FFmpeg's own lines name no file, and would stand between the program's; what matters of them
-/// comes back as errors.
-void set_up()
-{
-    static std::once_flag once;
-    std::call_once(once, [] {
-        av_log_set_level(AV_LOG_QUIET);
-        av_max_alloc(kLargestBlock);
-        avformat_network_init();
-    });
-}
 
 /// Files may refer to others; none of these is opened.
 int refuse_to_open(AVFormatContext*, AVIOContext**, const char*, int, AVDictionary**)
@@ -78,17 +60,19 @@ struct Options {
     Options() = default;
     Options(const Options&) = delete;
     Options& operator=(const Options&) = delete;
-    ~Options() { av_dict_free(&entries); }
-    void set(const char* name, const char* value) { av_dict_set(&entries, name, value, 0); }
+    ~Options() { ffmpeg().av_dict_free(&entries); }
+    void set(const char* name, const char* value)
+    {
+        ffmpeg().av_dict_set(&entries, name, value, 0);
+    }
 };
 
 } // namespace
 
 FfmpegDecoder::FfmpegDecoder(std::unique_ptr<FfmpegInput> input) : input_(std::move(input))
 {
-    set_up();
     io_ = make_io(*input_);
-    auto* const container = avformat_alloc_context();
+    auto* const container = ffmpeg().avformat_alloc_context();
     if (container == nullptr) {
         throw std::bad_alloc();
     }
@@ -100,8 +84,7 @@ FfmpegDecoder::FfmpegDecoder(std::unique_ptr<FfmpegInput> input) : input_(std::m
 
 FfmpegDecoder::FfmpegDecoder(const std::string& url, const AVIOInterruptCB& interrupt)
 {
-    set_up();
-    auto* const container = avformat_alloc_context();
+    auto* const container = ffmpeg().avformat_alloc_context();
     if (container == nullptr) {
         throw std::bad_alloc();
     }
@@ -119,7 +102,7 @@ FfmpegDecoder::FfmpegDecoder(const std::string& url, const AVIOInterruptCB& inte
 /// Takes the container, which FFmpeg frees when it cannot open it.
 void FfmpegDecoder::open(AVFormatContext* container, const char* url, AVDictionary** options)
 {
-    const int error = avformat_open_input(&container, url, nullptr, options);
+    const int error = ffmpeg().avformat_open_input(&container, url, nullptr, options);
     if (error == AVERROR(ENOMEM)) {
         throw std::bad_alloc();
     }
@@ -130,8 +113,8 @@ void FfmpegDecoder::open(AVFormatContext* container, const char* url, AVDictiona
         throw NotRecognised(ffmpeg_error_text(error));
     }
     container_.reset(container);
-    packet_ = made<Packet>(av_packet_alloc());
-    frame_ = made<Frame>(av_frame_alloc());
+    packet_ = made<Packet>(ffmpeg().av_packet_alloc());
+    frame_ = made<Frame>(ffmpeg().av_frame_alloc());
     choose_stream();
     open_codec();
 }
@@ -141,7 +124,7 @@ void FfmpegDecoder::choose_stream()
 {
     int found = first_sound(*container_);
     if (found < 0 || !is_known(*container_->streams[found]->codecpar)) {
-        const int error = avformat_find_stream_info(container_.get(), nullptr);
+        const int error = ffmpeg().avformat_find_stream_info(container_.get(), nullptr);
         if (input_ && !input_->trouble().empty()) {
             throw FileError(input_->trouble());
         }
@@ -158,17 +141,17 @@ void FfmpegDecoder::choose_stream()
 void FfmpegDecoder::open_codec()
 {
     const AVCodecParameters& sound = *stream().codecpar;
-    const AVCodec* const codec = avcodec_find_decoder(sound.codec_id);
+    const AVCodec* const codec = ffmpeg().avcodec_find_decoder(sound.codec_id);
     if (codec == nullptr) {
         throw FileError(std::string("holds sound that FFmpeg cannot decode (") +
-                        avcodec_get_name(sound.codec_id) + "); convert it to WAV or FLAC");
+                        ffmpeg().avcodec_get_name(sound.codec_id) + "); convert it to WAV or FLAC");
     }
-    codec_ = made<CodecContext>(avcodec_alloc_context3(codec));
-    int error = avcodec_parameters_to_context(codec_.get(), &sound);
+    codec_ = made<CodecContext>(ffmpeg().avcodec_alloc_context3(codec));
+    int error = ffmpeg().avcodec_parameters_to_context(codec_.get(), &sound);
     if (error >= 0) {
         codec_->pkt_timebase = stream().time_base;
         codec_->thread_count = 1; // files are worked on in parallel instead
-        error = avcodec_open2(codec_.get(), codec, nullptr);
+        error = ffmpeg().avcodec_open2(codec_.get(), codec, nullptr);
     }
     if (error < 0) {
         throw FileError(std::string("holds sound that cannot be decoded (") + codec->name + ": " +
@@ -179,7 +162,7 @@ void FfmpegDecoder::open_codec()
 const AVFrame* FfmpegDecoder::next()
 {
     for (;;) {
-        const int result = avcodec_receive_frame(codec_.get(), frame_.get());
+        const int result = ffmpeg().avcodec_receive_frame(codec_.get(), frame_.get());
         if (result == 0) {
             damaged_ += frame_->decode_error_flags != 0 ? 1U : 0U;
             if (frame_->nb_samples > 0 && frame_->ch_layout.nb_channels > 0) {
@@ -200,15 +183,15 @@ const AVFrame* FfmpegDecoder::next()
 bool FfmpegDecoder::feed()
 {
     for (;;) {
-        const int error = av_read_frame(container_.get(), packet_.get());
+        const int error = ffmpeg().av_read_frame(container_.get(), packet_.get());
         if (error < 0) {
             end(error);
-            return avcodec_send_packet(codec_.get(), nullptr) >= 0;
+            return ffmpeg().avcodec_send_packet(codec_.get(), nullptr) >= 0;
         }
         const bool is_ours = static_cast<size_t>(packet_->stream_index) == stream_;
         const bool is_whole = (packet_->flags & AV_PKT_FLAG_CORRUPT) == 0;
-        const int sent = is_ours ? avcodec_send_packet(codec_.get(), packet_.get()) : 0;
-        av_packet_unref(packet_.get());
+        const int sent = is_ours ? ffmpeg().avcodec_send_packet(codec_.get(), packet_.get()) : 0;
+        ffmpeg().av_packet_unref(packet_.get());
         if (is_ours) {
             damaged_ += sent < 0 || !is_whole ? 1U : 0U;
             return true;
@@ -240,16 +223,16 @@ bool FfmpegDecoder::go_before(int64_t origin, double seconds)
 {
     const auto before = static_cast<int64_t>(seconds / av_q2d(stream().time_base));
     const int64_t target = origin + before;
-    const int error = avformat_seek_file(container_.get(), static_cast<int>(stream_), INT64_MIN,
-                                         target, target, 0);
-    avcodec_flush_buffers(codec_.get());
+    const int error = ffmpeg().avformat_seek_file(container_.get(), static_cast<int>(stream_),
+                                                  INT64_MIN, target, target, 0);
+    ffmpeg().avcodec_flush_buffers(codec_.get());
     ended_ = false;
     return error >= 0;
 }
 
 int64_t FfmpegDecoder::samples_between(int64_t origin, int64_t stamp, uint32_t rate) const
 {
-    return av_rescale_q(stamp - origin, stream().time_base, {1, static_cast<int>(rate)});
+    return ffmpeg().av_rescale_q(stamp - origin, stream().time_base, {1, static_cast<int>(rate)});
 }
 
 } // namespace audio

@@ -220,7 +220,8 @@ std::optional<double> FfmpegFile::duration() const
     if (container.nb_streams == 1 && container.duration > 0) {
         return static_cast<double>(container.duration) / AV_TIME_BASE;
     }
-    const AVDictionaryEntry* const tag = av_dict_get(stream.metadata, "DURATION", nullptr, 0);
+    const AVDictionaryEntry* const tag =
+        ffmpeg().av_dict_get(stream.metadata, "DURATION", nullptr, 0);
     return tag == nullptr ? std::nullopt : to_duration(tag->value);
 }
 
@@ -235,7 +236,7 @@ std::vector<Tag> FfmpegFile::tags() const
         const AVDictionaryEntry* entry = nullptr;
         for (const AVDictionary* entries :
              {decoder_->stream().metadata, decoder_->container().metadata}) {
-            entry = entry != nullptr ? entry : av_dict_get(entries, key, nullptr, 0);
+            entry = entry != nullptr ? entry : ffmpeg().av_dict_get(entries, key, nullptr, 0);
         }
         const bool is_new = std::ranges::find(tags, name, &Tag::name) == tags.end();
         if (entry != nullptr && *entry->value != 0 && is_new) {
@@ -281,6 +282,8 @@ std::unique_ptr<FileSource> open_with_ffmpeg(int file, const AcceptsRate& accept
 {
     try {
         return std::make_unique<FfmpegFile>(file, accepts_rate, floats);
+    } catch (const LibraryError& error) {
+        throw NotRecognised(not_recognised_text() + "; " + error.what());
     } catch (const NotRecognised&) {
         throw NotRecognised(is_mp4(file) ? "is an MP4 file without its index, probably because it "
                                            "was cut off; copy or record it again"
@@ -290,8 +293,12 @@ std::unique_ptr<FileSource> open_with_ffmpeg(int file, const AcceptsRate& accept
 
 std::string ffmpeg_version()
 {
-    const std::string version = av_version_info();
-    return "FFmpeg " + version.substr(0, version.find('-'));
+    try {
+        const std::string version = ffmpeg().av_version_info();
+        return "FFmpeg " + version.substr(0, version.find('-'));
+    } catch (const LibraryError&) {
+        return {};
+    }
 }
 
 } // namespace audio

@@ -34,7 +34,7 @@ int64_t seek_input(void* input, int64_t offset, int whence) noexcept
 std::string ffmpeg_error_text(int error)
 {
     char text[AV_ERROR_MAX_STRING_SIZE] = {};
-    av_strerror(error, text, sizeof text);
+    ffmpeg().av_strerror(error, text, sizeof text);
     return text;
 }
 
@@ -100,13 +100,14 @@ int FfmpegPipeInput::read(std::span<uint8_t> bytes)
 
 IoContext make_io(FfmpegInput& input)
 {
-    auto* const buffer = static_cast<uint8_t*>(av_malloc(kBuffer));
+    auto* const buffer = static_cast<uint8_t*>(ffmpeg().av_malloc(kBuffer));
     AVIOContext* const io =
-        buffer == nullptr ? nullptr
-                          : avio_alloc_context(buffer, kBuffer, 0, &input, read_input, nullptr,
-                                               input.can_seek() ? seek_input : nullptr);
+        buffer == nullptr
+            ? nullptr
+            : ffmpeg().avio_alloc_context(buffer, kBuffer, 0, &input, read_input, nullptr,
+                                          input.can_seek() ? seek_input : nullptr);
     if (io == nullptr) {
-        av_free(buffer);
+        ffmpeg().av_free(buffer);
         throw std::bad_alloc();
     }
     return IoContext(io);

@@ -5,11 +5,8 @@
 #include <cstdint>
 #include <span>
 
+#include "audio/ffmpeg_library.hpp"
 #include "audio/samples.hpp"
-
-extern "C" {
-#include <libavutil/samplefmt.h>
-}
 
 namespace audio {
 
@@ -17,7 +14,7 @@ namespace {
 
 AVSampleFormat packed_form(const AVFrame& frame)
 {
-    return av_get_packed_sample_fmt(static_cast<AVSampleFormat>(frame.format));
+    return ffmpeg().av_get_packed_sample_fmt(static_cast<AVSampleFormat>(frame.format));
 }
 
 /// Decoded to no more than 16 bits.
@@ -44,7 +41,8 @@ void interleave(const AVFrame& frame, To* to, Convert convert)
 {
     const auto channels = static_cast<size_t>(frame.ch_layout.nb_channels);
     const auto count = static_cast<size_t>(frame.nb_samples);
-    const bool apart = av_sample_fmt_is_planar(static_cast<AVSampleFormat>(frame.format)) != 0;
+    const bool apart =
+        ffmpeg().av_sample_fmt_is_planar(static_cast<AVSampleFormat>(frame.format)) != 0;
     for (size_t c = 0; c < channels; ++c) {
         const auto* from =
             reinterpret_cast<const From*>(frame.extended_data[apart ? c : 0]) + (apart ? 0 : c);

@@ -47,14 +47,14 @@ std::string not_recognised_text();
 std::unique_ptr<FileSource> open_file_source(int file, const AcceptsRate& accepts_rate,
                                              bool floats);
 
-/// The same with FFmpeg alone. Throws NotRecognised in a build without it.
+/// The same with FFmpeg alone. Throws NotRecognised where it is not there.
 std::unique_ptr<FileSource> open_with_ffmpeg(int file, const AcceptsRate& accepts_rate,
                                              bool floats);
 
 /// What this build reads sound with: "libsndfile 1.2.0, FFmpeg 5.1.9".
 std::string readers();
 
-/// "FFmpeg 5.1.9"; empty in a build without it.
+/// "FFmpeg 5.1.9"; empty in a build without it, and where its libraries are not installed.
 std::string ffmpeg_version();
 
 } // namespace audio
