@@ -1,0 +1,1 @@
+// Nothing: the headers that tests share are precompiled for this file.
