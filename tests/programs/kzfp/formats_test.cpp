@@ -276,6 +276,31 @@ TEST(KzfpDamaged, WhatIsNoSoundGetsTheCure)
     }
 }
 
+/// A machine that lacks FFmpeg's libraries, or PortAudio's.
+ProcessSetup without(const std::string& libraries)
+{
+    ProcessSetup setup;
+    setup.environment = {"LD_PRELOAD=" KZFP_MISSING_LIBRARIES, "MISSING_LIBRARIES=" + libraries};
+    return setup;
+}
+
+TEST_F(KzfpFormats, MissingLibrariesAreNamedWithTheirCure)
+{
+    const ProcessResult result = kzfp({clip("music.m4a")}, without("libavcodec"));
+    EXPECT_EQ(1, result.status);
+    EXPECT_TRUE(contains(result.err, "FFmpeg's libraries cannot be opened")) << result.err;
+    EXPECT_TRUE(contains(result.err, "install them (Debian: libavformat")) << result.err;
+}
+
+TEST_F(KzfpFormats, WaveFilesNeedNoFurtherLibraries)
+{
+    const ProcessResult result = kzfp({kMusic}, without("lib"));
+    EXPECT_EQ("", result.err);
+    EXPECT_EQ(output_of({kMusic}), result.out);
+    const std::string version = kzfp({"--version"}, without("libav")).out;
+    EXPECT_FALSE(contains(version, "FFmpeg")) << version;
+}
+
 TEST(KzfpVersion, NamesWhatItReadsWith)
 {
     const std::string version = output_of({"--version"});
