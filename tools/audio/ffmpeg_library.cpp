@@ -25,9 +25,9 @@ try {
     static const Ffmpeg library;
     return library;
 } catch (const LibraryError& error) {
-    throw LibraryError(
-        "FFmpeg's libraries cannot be opened (" + std::string(error.what()) +
-        "); install them (Debian: libavformat" AV_STRINGIFY(LIBAVFORMAT_VERSION_MAJOR) ")");
+    throw LibraryError("FFmpeg's libraries cannot be opened (" + std::string(error.what()) +
+                       "); install them (Debian: libavformat" +
+                       std::to_string(LIBAVFORMAT_VERSION_MAJOR) + ")");
 }
 
 } // namespace audio

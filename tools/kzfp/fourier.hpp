@@ -16,8 +16,8 @@ inline std::complex<double> product(std::complex<double> a, std::complex<double>
     return {a.real() * b.real() - a.imag() * b.imag(), a.real() * b.imag() + a.imag() * b.real()};
 }
 
-/// The transform of Cooley and Tukey (1965) of one size, without a factor: there and back multiplies
-/// by the size.
+/// The transform of Cooley and Tukey (1965) of one size, without a factor: there and back
+/// multiplies by the size.
 class FourierTransform {
 public:
     enum class Direction { forward, inverse };
