@@ -1,9 +1,9 @@
 #!/bin/sh
 # Installs what is missing to build and test the library on Debian 12.
 #
-#   scripts/setup.sh [build] [catalogue] [java] [tools] [test] [clips] [bench] [lint] [clang]
-#                    [fuzz] [coverage] [arch] [wide]
-#                                 default: all of them but the last four
+#   scripts/setup.sh [build] [catalogue] [postgresql] [java] [tools] [test] [clips] [bench] [lint]
+#                    [clang] [fuzz] [coverage] [arch] [wide]
+#                                 default: all of them but the last three
 #
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
 set -eu
@@ -13,6 +13,8 @@ packages_of() {
     # Also a jni.h, for the library's Java front.
     build) echo "g++ cmake ninja-build make android-libnativehelper-dev" ;;
     catalogue) echo "libsqlite3-dev nettle-dev pkg-config sqlite3" ;; # keeping and hashing; a second reader for tests
+    # The client library, a server for the tests, and what its extensions are built with.
+    postgresql) echo "libpq-dev postgresql-15 postgresql-client-15 postgresql-server-dev-15" ;;
     # FFmpeg's libraries read what libsndfile does not, PortAudio listens to microphones.
     tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev libavformat-dev libavcodec-dev portaudio19-dev libpng-dev" ;;
     test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso python3 zsh fish libexpat1-dev libpng-dev chromium-headless-shell" ;;
@@ -41,7 +43,7 @@ installed() {
     [ "$(dpkg-query -W -f '${db:Status-Status}' "$1" 2>/dev/null || true)" = installed ]
 }
 
-[ $# -gt 0 ] || set -- build catalogue java tools test clips bench lint clang fuzz
+[ $# -gt 0 ] || set -- build catalogue postgresql java tools test clips bench lint clang fuzz
 
 wanted=
 for group in "$@"; do
