@@ -1,0 +1,113 @@
+-- Where each part of a code occurs, on the server that has the tracks; applied after the store's
+-- schema, whose table trail (shard, track, codes) it extends, in schema kzcat. The functions kz_...
+-- come with the extension kzmatch.
+
+-- One row for each value of a part of codes and each segment, a segment being some thousand tracks
+-- that were posted together. Their codes are counted in units of eight, each track beginning one.
+CREATE TABLE kzcat.posting (
+    shard integer NOT NULL,
+    list integer NOT NULL,      -- 65536 * part + value; -1: the segment's tracks, each as its id and
+                                -- its number of codes, 8 bytes each, the highest first;
+                                -- -2 - part: where each value's words begin among all of the part
+    segment integer NOT NULL,
+    words bytea NOT NULL,       -- units that have the value: distances of 2 bytes, the lowest first;
+                                -- 65535 goes that far without a unit there
+    PRIMARY KEY (list, segment)
+) WITH (toast_tuple_target = 8160);
+ALTER TABLE kzcat.posting ALTER COLUMN words SET STORAGE EXTERNAL;
+
+-- Which segment has a track; none yet: it is in the tail, which look-ups scan.
+CREATE TABLE kzcat.posted (
+    track bigint PRIMARY KEY REFERENCES kzcat.trail (track) ON DELETE CASCADE,
+    codes bigint NOT NULL,
+    segment integer
+);
+CREATE INDEX posted_tail ON kzcat.posted (track) WHERE segment IS NULL;
+CREATE INDEX posted_segment ON kzcat.posted (segment) WHERE segment IS NOT NULL;
+
+CREATE FUNCTION kzcat.note_tail() RETURNS trigger LANGUAGE plpgsql AS $$
+BEGIN
+    INSERT INTO kzcat.posted (track, codes) VALUES (NEW.track, octet_length(NEW.codes) / 8);
+    RETURN NULL;
+END $$;
+CREATE TRIGGER trail_tail AFTER INSERT ON kzcat.trail
+    FOR EACH ROW EXECUTE FUNCTION kzcat.note_tail();
+
+CREATE VIEW kzcat.tail AS
+    SELECT trail.shard, trail.track, trail.codes
+    FROM kzcat.trail JOIN kzcat.posted USING (track)
+    WHERE posted.segment IS NULL;
+
+-- Writes the postings of some tracks as one segment. Their rows are held until the end: a track that
+-- went meanwhile would move the units of all behind it.
+CREATE FUNCTION kzcat.write_segment(number integer, tracks bigint[]) RETURNS void
+LANGUAGE plpgsql AS $$
+DECLARE
+    place integer;
+    built bytea;
+    kept bigint[];
+BEGIN
+    SELECT array_agg(track) INTO kept FROM (
+        SELECT track FROM kzcat.trail WHERE track = ANY (tracks) FOR KEY SHARE) held;
+    SELECT min(shard) INTO place FROM kzcat.trail WHERE track = ANY (kept);
+    IF place IS NULL THEN
+        RETURN;
+    END IF;
+    INSERT INTO kzcat.posting (shard, list, segment, words)
+    SELECT place, -1, number,
+           string_agg(int8send(track) || int8send(octet_length(codes) / 8), ''::bytea ORDER BY track)
+    FROM kzcat.trail WHERE track = ANY (kept);
+    FOR part IN 0..3 LOOP
+        SELECT kz_table(part, codes ORDER BY track) INTO built
+        FROM kzcat.trail WHERE track = ANY (kept);
+        INSERT INTO kzcat.posting (shard, list, segment, words)
+        SELECT place, l.list, number, l.words FROM kz_lists(part, built) l;
+    END LOOP;
+    UPDATE kzcat.posted SET segment = number WHERE track = ANY (kept);
+END $$;
+
+-- Posts the tail when it has `least` codes or more, together with segments that are not much larger
+-- than it: so few segments stay, and rows stay long. Returns the number of tracks that were posted.
+CREATE FUNCTION kzcat.post(least bigint) RETURNS bigint LANGUAGE plpgsql AS $$
+DECLARE
+    most CONSTANT bigint := 16777216; -- codes of a segment; a single track may have more
+    waiting bigint;
+    joined integer[];
+    tracks bigint[];
+    done bigint := 0;
+BEGIN
+    IF NOT pg_try_advisory_xact_lock(hashtextextended('kzcat.post', 0)) THEN
+        RETURN 0; -- another session is at it
+    END IF;
+    DELETE FROM kzcat.posting p WHERE NOT EXISTS (
+        SELECT FROM kzcat.posted WHERE posted.segment = p.segment); -- all its tracks were removed
+    LOOP
+        SELECT coalesce(sum(codes), 0) INTO waiting FROM kzcat.posted WHERE segment IS NULL;
+        EXIT WHEN waiting < greatest(least, 1);
+        SELECT coalesce(array_agg(segment), '{}') INTO joined FROM (
+            SELECT segment, size, sum(size) OVER (ORDER BY size, segment) AS together
+            FROM (SELECT segment, sum(codes) AS size FROM kzcat.posted
+                  WHERE segment IS NOT NULL GROUP BY segment) sizes) sums
+        WHERE together + waiting <= most AND size <= 2 * (together - size + waiting);
+        SELECT array_agg(track) INTO tracks FROM (
+            SELECT track, codes, sum(codes) OVER (ORDER BY segment NULLS FIRST, track) AS together
+            FROM kzcat.posted WHERE segment IS NULL OR segment = ANY (joined)) chosen
+        WHERE together <= most OR together = codes;
+        DELETE FROM kzcat.posting WHERE segment = ANY (joined);
+        PERFORM kzcat.write_segment(
+            (SELECT coalesce(max(segment), 0) + 1 FROM kzcat.posting WHERE list = -1), tracks);
+        done := done + cardinality(tracks);
+    END LOOP;
+    RETURN done;
+END $$;
+
+-- A row that is put here asks for kzcat.post(least): so it can be asked for through a coordinator,
+-- too. Nothing is kept.
+CREATE TABLE kzcat.posting_request (shard integer NOT NULL, least bigint NOT NULL);
+CREATE FUNCTION kzcat.answer_request() RETURNS trigger LANGUAGE plpgsql AS $$
+BEGIN
+    PERFORM kzcat.post(NEW.least);
+    RETURN NULL;
+END $$;
+CREATE TRIGGER posting_requested BEFORE INSERT ON kzcat.posting_request
+    FOR EACH ROW EXECUTE FUNCTION kzcat.answer_request();
