@@ -7,6 +7,7 @@
 #include <span>
 #include <vector>
 
+#include "catalogue/index/diagonals.hpp"
 #include "catalogue/index/parts.hpp"
 #include "catalogue/index/ranking.hpp"
 
@@ -15,7 +16,6 @@ namespace kzcat {
 /// What a search needs room for; one search at a time may use it.
 struct SearchScratch {
     std::vector<uint8_t> hits; ///< of each diagonal
-    std::vector<uint8_t> most; ///< in each block of diagonals
 };
 
 /// Searches tracks whose parts are in tables. All that it refers to has to outlive it.
@@ -31,11 +31,10 @@ public:
 
 private:
     void rank(const Ranking& ranking, int64_t diagonal, std::vector<RankedPlace>& places) const;
-    size_t track_of(int64_t unit) const;
 
     std::span<const Code> codes_;
     std::span<const TrackSpan> tracks_;
-    std::vector<uint32_t> first_units_; ///< of each track, and behind the last
+    TrackUnits units_;
     PartTables tables_;
     uint64_t budget_;
 };

@@ -17,6 +17,9 @@ constexpr uint32_t kMaxCost = 64 * kBit;
 constexpr uint32_t kFlippedBits = 5;
 constexpr uint32_t kFlips = 1U << kFlippedBits;
 
+/// Lists of average length that one look-up reads when nothing else is asked.
+constexpr uint32_t kUsualLists = 4096;
+
 /// The cost of a bit of this strength being wrong rather than right.
 constexpr uint32_t flip_cost(uint32_t strength) { return 3 * strength / 4; }
 
@@ -84,7 +87,7 @@ struct Offer {
 
 class Offers {
 public:
-    explicit Offers(const PartTables& tables) : tables_(tables) {}
+    explicit Offers(const ListLengths& lengths) : lengths_(lengths) {}
 
     void add(const QueryPart& query, uint32_t part, uint32_t code)
     {
@@ -121,7 +124,7 @@ public:
 private:
     void add(const PartProbe& probe, uint32_t cost)
     {
-        const uint64_t words = tables_[probe.part].list(probe.value).size() / 2;
+        const uint64_t words = lengths_.words(probe.part, probe.value);
         cost += length_cost(words);
         if (words > 0 && cost < kMaxCost) {
             offers_.push_back({probe, cost});
@@ -129,7 +132,7 @@ private:
         }
     }
 
-    const PartTables& tables_;
+    const ListLengths& lengths_;
     std::vector<Offer> offers_;
     std::array<uint64_t, kMaxCost> words_{};
 };
@@ -142,12 +145,35 @@ BitStrengths strengths_of(const Sequence& sequence, size_t code)
     return sequence.strengths.empty() ? unknown : sequence.strengths[code];
 }
 
+class TableLengths final : public ListLengths {
+public:
+    explicit TableLengths(const PartTables& tables) : tables_(tables) {}
+    uint64_t words(uint32_t part, uint32_t value) const override
+    {
+        return tables_[part].list(value).size() / 2;
+    }
+
+private:
+    const PartTables& tables_;
+};
+
 } // namespace
+
+uint64_t probe_budget(uint64_t words, uint32_t lists)
+{
+    return (words / (kParts * kPartValues) + 1) * (lists == 0 ? kUsualLists : lists);
+}
 
 std::vector<PartProbe> choose_probes(const Reading& reading, const PartTables& tables,
                                      uint64_t budget)
 {
-    Offers offers(tables);
+    return choose_probes(reading, TableLengths(tables), budget);
+}
+
+std::vector<PartProbe> choose_probes(const Reading& reading, const ListLengths& lengths,
+                                     uint64_t budget)
+{
+    Offers offers(lengths);
     for (const auto& sequence : reading.sequences) {
         for (size_t code = 0; code < sequence.codes.size(); ++code) {
             const BitStrengths strengths = strengths_of(sequence, code);

@@ -25,36 +25,41 @@ uint64_t random_at(uint64_t index)
 /// An even share of 0 .. below - 1: the remainder's unevenness, below / 2^64, does not matter.
 uint64_t place_at(uint64_t index, uint64_t below) { return random_at(index) % below; }
 
-/// The tracks of a corpus, numbered through, with the number of codes before each.
-struct TrackList {
-    std::vector<std::span<const Code>> tracks;
-    std::vector<uint64_t> before;
-    uint64_t codes = 0;
-
-    explicit TrackList(const Corpus& corpus)
-    {
-        for (const Segment& segment : corpus.segments) {
-            for (const TrackSpan& track : segment.tracks) {
-                tracks.push_back(segment.of(track));
-                before.push_back(codes);
-                codes += track.count;
-            }
-        }
-    }
-
-    /// The run that begins at a code, or earlier where the track ends too soon.
-    std::span<const Code> run_at(uint64_t code) const
-    {
-        const auto next = std::upper_bound(before.begin(), before.end(), code);
-        const auto track = static_cast<size_t>(next - before.begin()) - 1;
-        const uint64_t count = tracks[track].size();
-        const uint64_t length = std::min(count, kRunLength);
-        const uint64_t begin = std::min(code - before[track], count - length);
-        return tracks[track].subspan(static_cast<size_t>(begin), static_cast<size_t>(length));
-    }
-};
+/// The run that begins at a code, or earlier where the track ends too soon; `before` counts the
+/// codes before each track.
+PopulationRun run_at(uint64_t code, std::span<const uint64_t> counts,
+                     std::span<const uint64_t> before)
+{
+    const auto next = std::upper_bound(before.begin(), before.end(), code);
+    const auto track = static_cast<size_t>(next - before.begin()) - 1;
+    const uint64_t length = std::min(counts[track], kRunLength);
+    return {.track = track,
+            .first = std::min(code - before[track], counts[track] - length),
+            .count = length};
+}
 
 } // namespace
+
+std::vector<PopulationRun> choose_runs(std::span<const uint64_t> counts)
+{
+    std::vector<uint64_t> before;
+    uint64_t codes = 0;
+    for (const uint64_t count : counts) {
+        before.push_back(codes);
+        codes += count;
+    }
+    std::vector<PopulationRun> runs;
+    if (codes <= kRuns * kRunLength) {
+        for (size_t track = 0; track < counts.size(); ++track) {
+            runs.push_back({.track = track, .first = 0, .count = counts[track]});
+        }
+    } else {
+        for (size_t i = 0; i < kRuns; ++i) {
+            runs.push_back(run_at(place_at(i, codes), counts, before));
+        }
+    }
+    return runs;
+}
 
 void Population::add_run(std::span<const Code> codes)
 {
@@ -63,26 +68,33 @@ void Population::add_run(std::span<const Code> codes)
     codes_.insert(codes_.end(), codes.begin(), codes.end());
 }
 
-Population choose_population(const Corpus& catalogue)
+Population::Population(std::span<const std::span<const Code>> runs)
 {
-    Population population;
     const std::span<const Code> background = background_codes();
     const size_t piece = background.size() / kBackgroundPieces;
     for (size_t i = 0; i < kBackgroundPieces; ++i) {
-        population.add_run(background.subspan(i * piece, piece));
+        add_run(background.subspan(i * piece, piece));
     }
-    const TrackList list(catalogue);
-    if (list.codes <= kRuns * kRunLength) {
-        for (const auto track : list.tracks) {
-            population.add_run(track);
-        }
-    } else {
-        for (size_t i = 0; i < kRuns; ++i) {
-            population.add_run(list.run_at(place_at(i, list.codes)));
+    std::ranges::for_each(runs, [this](const auto run) { add_run(run); });
+    corpus_.segments = {{.codes = codes_, .tracks = runs_}};
+}
+
+Population choose_population(const Corpus& catalogue)
+{
+    std::vector<std::span<const Code>> tracks;
+    std::vector<uint64_t> counts;
+    for (const Segment& segment : catalogue.segments) {
+        for (const TrackSpan& track : segment.tracks) {
+            tracks.push_back(segment.of(track));
+            counts.push_back(track.count);
         }
     }
-    population.corpus_.segments = {{.codes = population.codes_, .tracks = population.runs_}};
-    return population;
+    std::vector<std::span<const Code>> runs;
+    for (const PopulationRun& run : choose_runs(counts)) {
+        runs.push_back(tracks[run.track].subspan(static_cast<size_t>(run.first),
+                                                 static_cast<size_t>(run.count)));
+    }
+    return Population(runs);
 }
 
 } // namespace kzcat

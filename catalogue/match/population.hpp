@@ -21,6 +21,8 @@ constexpr size_t kBackgroundPieces = 8;
 class Population {
 public:
     Population() = default;
+    /// The background codes, and these.
+    explicit Population(std::span<const std::span<const Code>> runs);
     Population(const Population&) = delete; // the corpus points into the codes
     Population& operator=(const Population&) = delete;
     Population(Population&&) = default;
@@ -30,13 +32,22 @@ public:
     const Corpus& corpus() const { return corpus_; }
 
 private:
-    friend Population choose_population(const Corpus& catalogue);
     void add_run(std::span<const Code> codes);
 
     std::vector<Code> codes_;
     std::vector<TrackSpan> runs_;
     Corpus corpus_;
 };
+
+/// Where codes of a population are taken from: of the track with this number, from `first` on.
+struct PopulationRun {
+    size_t track = 0;
+    uint64_t first = 0;
+    uint64_t count = 0;
+};
+
+/// The runs of a catalogue whose tracks have so many codes each, in the order of their ids.
+std::vector<PopulationRun> choose_runs(std::span<const uint64_t> counts);
 
 /// The background codes and, of the catalogue, runs at pseudo-random places that depend on the
 /// number of its codes only; all of its codes when they are few. Equal catalogues have equal

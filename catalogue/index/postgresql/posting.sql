@@ -1,6 +1,6 @@
 -- Where each part of a code occurs, on the server that has the tracks; applied after the store's
 -- schema, whose table trail (shard, track, codes) it extends, in schema kzcat. The functions kz_...
--- come with the extension kzmatch.
+-- come with the extension kzmatch, in the same schema.
 
 -- One row for each value of a part of codes and each segment, a segment being some thousand tracks
 -- that were posted together. Their codes are counted in units of eight, each track beginning one.
@@ -58,10 +58,10 @@ BEGIN
            string_agg(int8send(track) || int8send(octet_length(codes) / 8), ''::bytea ORDER BY track)
     FROM kzcat.trail WHERE track = ANY (kept);
     FOR part IN 0..3 LOOP
-        SELECT kz_table(part, codes ORDER BY track) INTO built
+        SELECT kzcat.kz_table(part, codes ORDER BY track) INTO built
         FROM kzcat.trail WHERE track = ANY (kept);
         INSERT INTO kzcat.posting (shard, list, segment, words)
-        SELECT place, l.list, number, l.words FROM kz_lists(part, built) l;
+        SELECT place, l.list, number, l.words FROM kzcat.kz_lists(part, built) l;
     END LOOP;
     UPDATE kzcat.posted SET segment = number WHERE track = ANY (kept);
 END $$;
