@@ -16,7 +16,7 @@
 #include <utility>
 
 #include "catalogue/store/rules.hpp"
-#include "catalogue/store/sqlite/row_sum.hpp"
+#include "catalogue/store/row_sum.hpp"
 #include "catalogue/store/sqlite/schema.hpp"
 
 namespace kzcat::sqlite {

@@ -1,5 +1,5 @@
 -- What a catalogue file of format 1 contains. docs/catalogue_file.md explains it.
--- Every crc is a CRC-32C over the row's other values, as catalogue/store/sqlite/row_sum.hpp states.
+-- Every crc is a CRC-32C over the row's other values, as catalogue/store/row_sum.hpp states.
 
 -- One row: what the catalogue is.
 CREATE TABLE catalogue (

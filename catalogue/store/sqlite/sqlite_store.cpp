@@ -10,7 +10,7 @@
 #include "catalogue/store/hash.hpp"
 #include "catalogue/store/rules.hpp"
 #include "catalogue/store/sqlite/opening.hpp"
-#include "catalogue/store/sqlite/row_sum.hpp"
+#include "catalogue/store/row_sum.hpp"
 #include "catalogue/store/sqlite/rows.hpp"
 #include "catalogue/store/sqlite/verification.hpp"
 

@@ -8,7 +8,7 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
-#include "catalogue/store/sqlite/row_sum.hpp"
+#include "catalogue/store/row_sum.hpp"
 #include "tests/catalogue/store/files.hpp"
 
 namespace kzcat::test {

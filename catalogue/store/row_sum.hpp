@@ -13,7 +13,7 @@
 #include "catalogue/store/little_endian.hpp"
 #include "catalogue/store/store.hpp"
 
-namespace kzcat::sqlite {
+namespace kzcat {
 
 /// CRC-32C over values in turn: of a number its 8 bytes, the lowest first; of a text or blob the
 /// number of its bytes as such a number, and the bytes; of NULL the number -1 alone.
@@ -71,4 +71,4 @@ inline int64_t source_sum(int64_t track, const Source& source)
     return sum.add(int64_t{-1}).value();
 }
 
-} // namespace kzcat::sqlite
+} // namespace kzcat
