@@ -4,6 +4,7 @@
 
 #include "catalogue/handles.hpp"
 #include "catalogue/store/memory/memory_store.hpp"
+#include "catalogue/store/postgresql/postgres_store.hpp"
 #include "catalogue/store/sqlite/sqlite_store.hpp"
 
 namespace {
@@ -48,7 +49,7 @@ IndexOptions to_index_options(const char* path, const kzcat_settings& settings)
     require(settings.index_file <= 1 && settings.fall_back <= 1,
             "index_file and fall_back are 0 or 1");
     IndexOptions options;
-    if (path != nullptr && settings.index_file == 1) {
+    if (path != nullptr && settings.index_file == 1 && !is_server_address(path)) {
         options.path = std::string(path) + ".idx";
     }
     options.fall_back = settings.fall_back == 1;
@@ -65,6 +66,9 @@ std::unique_ptr<Store> open_store(const char* path, uint32_t access)
         require(access == KZCAT_ACCESS_CREATE, "a catalogue in memory is empty at first; open it "
                                                "with KZCAT_ACCESS_CREATE");
         return make_memory_store();
+    }
+    if (is_server_address(path)) {
+        return open_postgres_store(path, to_access(access));
     }
     return open_sqlite_store(path, to_access(access));
 }

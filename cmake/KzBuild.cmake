@@ -138,16 +138,17 @@ function(kz_compile_quickly target)
   endif()
 endfunction()
 
-# kz_test(<file>_test [ROOMS <room>...] [LIBS <target>...] [SOURCES <file>...] [FIXTURE <name>])
+# kz_test(<file>_test [ROOMS <room>...] [LIBS <target>...] [SOURCES <file>...] [FIXTURE <name>]
+#         [TOGETHER])
 #
 # Builds <file>_test.cpp of this folder over its room's objects and everything below, with the
 # allocator wrapped so that tests can count blocks and make the n-th allocation fail, and registers
 # each of its test cases with CTest. The room is the one that the folder mirrors, unless ROOMS names
 # others: tests/library/<room> for kzsdk's, tests/catalogue/<room> for the catalogue's. The target
 # is <room>_<file>_test, with kzcat_ before it for the catalogue's. FIXTURE names what has to be set
-# up first.
+# up first. TOGETHER registers the whole program as one test: for those that start what all share.
 function(kz_test file)
-  cmake_parse_arguments(PARSE_ARGV 1 test "" "FIXTURE" "ROOMS;LIBS;SOURCES")
+  cmake_parse_arguments(PARSE_ARGV 1 test "TOGETHER" "FIXTURE" "ROOMS;LIBS;SOURCES")
   kz_mirrored_room(room target)
   string(APPEND target "_${file}")
   if(NOT test_ROOMS)
@@ -159,7 +160,12 @@ function(kz_test file)
   add_executable(${target} ${file}.cpp ${test_SOURCES})
   kz_compile_quickly(${target})
   target_link_libraries(${target} PRIVATE kz_settings ${objects} kz_test_support ${test_LIBS})
-  kz_register_test(${target} ${test_FIXTURE})
+  if(test_TOGETHER)
+    add_test(NAME ${target} COMMAND ${target})
+    set_tests_properties(${target} PROPERTIES TIMEOUT 600)
+  else()
+    kz_register_test(${target} ${test_FIXTURE})
+  endif()
   if(target MATCHES "^kzcat_")
     add_dependencies(catalogue_tests ${target})
     file(STRINGS ${file}.cpp starts_threads REGEX "#include <(thread|future|pthread.h)>")

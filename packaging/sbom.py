@@ -26,6 +26,7 @@ LICENCES = {
     "libnettle8": "LGPL-3.0-or-later OR GPL-2.0-or-later",
     "libsndfile1": "LGPL-2.1-or-later",
     "libsqlite3-0": "blessing",
+    "libpq5": "PostgreSQL",
     "libsoxr0": "LGPL-2.1-or-later",
     "libpng16-16": "libpng-2.0",
     "libportaudio2": "MIT",

@@ -66,9 +66,9 @@ BEGIN
     UPDATE kzcat.posted SET segment = number WHERE track = ANY (kept);
 END $$;
 
--- Posts the tail when it has `least` codes or more, together with segments that are not much larger
+-- Posts the tail when it has `threshold` codes or more, together with segments that are not much larger
 -- than it: so few segments stay, and rows stay long. Returns the number of tracks that were posted.
-CREATE FUNCTION kzcat.post(least bigint) RETURNS bigint LANGUAGE plpgsql AS $$
+CREATE FUNCTION kzcat.post(threshold bigint) RETURNS bigint LANGUAGE plpgsql AS $$
 DECLARE
     most CONSTANT bigint := 16777216; -- codes of a segment; a single track may have more
     waiting bigint;
@@ -83,7 +83,7 @@ BEGIN
         SELECT FROM kzcat.posted WHERE posted.segment = p.segment); -- all its tracks were removed
     LOOP
         SELECT coalesce(sum(codes), 0) INTO waiting FROM kzcat.posted WHERE segment IS NULL;
-        EXIT WHEN waiting < greatest(least, 1);
+        EXIT WHEN waiting < greatest(threshold, 1);
         SELECT coalesce(array_agg(segment), '{}') INTO joined FROM (
             SELECT segment, size, sum(size) OVER (ORDER BY size, segment) AS together
             FROM (SELECT segment, sum(codes) AS size FROM kzcat.posted

@@ -69,6 +69,9 @@ expect_stop(no_sqlite "needs SQLite 3.40 or later" libsqlite3-dev -DKZ_BUILD_CAT
 configure(no_database "${ROOT}" ${alone} ${no_sqlite} -DKZ_BUILD_CATALOGUE=ON -DKZ_SQLITE=OFF)
 expect_setting(no_database KZ_SQLITE OFF)
 
+configure(no_server "${ROOT}" ${alone} -DKZ_BUILD_CATALOGUE=ON -DKZ_POSTGRESQL=OFF)
+expect_setting(no_server KZ_POSTGRESQL OFF)
+
 configure(no_catalogue "${ROOT}" -DKZ_BUILD_TESTS=OFF -DKZ_BUILD_TOOLS=ON -DKZ_BUILD_CATALOGUE=OFF)
 expect_stop(no_catalogue "uses the catalogue" -DKZ_BUILD_CATALOGUE=ON -DKZ_BUILD_TOOLS=OFF)
 

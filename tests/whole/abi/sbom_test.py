@@ -33,15 +33,16 @@ class Sbom(unittest.TestCase):
     def test_the_catalogue_needs_the_library_and_its_packages(self):
         self.assertEqual(
             self.depends["libkzcat"],
-            ["deb:libc6", "deb:libgcc-s1", "deb:libnettle8", "deb:libsqlite3-0", "deb:libstdc++6", "libkzsdk"])
+            ["deb:libc6", "deb:libgcc-s1", "deb:libnettle8", "deb:libpq5", "deb:libsqlite3-0", "deb:libstdc++6",
+             "libkzsdk"])
 
     def test_the_program_needs_the_libraries_and_its_packages(self):
         self.assertEqual(
             self.depends["kzfp"],
             ["deb:libavcodec59", "deb:libavformat59", "deb:libavutil57", "deb:libc6", "deb:libcli11-dev",
-             "deb:libgcc-s1", "deb:libnettle8", "deb:libpng16-16", "deb:libportaudio2", "deb:libsndfile1",
-             "deb:libsoxr0", "deb:libsqlite3-0", "deb:libstdc++6", "deb:nlohmann-json3-dev", "libkzcat",
-             "libkzsdk"])
+             "deb:libgcc-s1", "deb:libnettle8", "deb:libpng16-16", "deb:libportaudio2", "deb:libpq5",
+             "deb:libsndfile1", "deb:libsoxr0", "deb:libsqlite3-0", "deb:libstdc++6", "deb:nlohmann-json3-dev",
+             "libkzcat", "libkzsdk"])
 
     def test_names_nothing_that_is_not_described(self):
         described = {c["bom-ref"] for c in self.list["components"]} | {"libkzsdk"}

@@ -1,0 +1,1 @@
+-- What the catalogue's own database keeps of work to be done, beside catalogue.sql.

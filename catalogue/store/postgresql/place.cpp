@@ -1,0 +1,61 @@
+// Addresses are taken apart by their text alone, so that a wrong one is shown without its password
+// too.
+
+#include "catalogue/store/postgresql/place.hpp"
+
+#include <algorithm>
+
+namespace kzcat {
+
+namespace {
+
+constexpr std::string_view kSchemes[] = {"postgres://", "postgresql://"};
+constexpr std::string_view kHidden = "***";
+
+/// Where what follows the scheme begins; 0 when there is none.
+size_t after_scheme(std::string_view path)
+{
+    for (const std::string_view scheme : kSchemes) {
+        if (path.starts_with(scheme)) {
+            return scheme.size();
+        }
+    }
+    return 0;
+}
+
+/// USER:PASSWORD@: up to the last @, since a password may have been written with one in it.
+void hide_in_authority(std::string& text, size_t begin)
+{
+    const size_t end = text.rfind('@');
+    const size_t colon = text.find(':', begin);
+    if (end != std::string::npos && colon < end) {
+        text.replace(colon + 1, end - colon - 1, kHidden);
+    }
+}
+
+/// ?password=...&sslpassword=...
+void hide_in_options(std::string& text)
+{
+    constexpr std::string_view kKey = "password=";
+    for (size_t at = text.find(kKey); at != std::string::npos; at = text.find(kKey, at)) {
+        at += kKey.size();
+        const size_t end = std::min(text.find('&', at), text.size());
+        text.replace(at, end - at, kHidden);
+    }
+}
+
+} // namespace
+
+bool is_server_address(std::string_view path) { return after_scheme(path) != 0; }
+
+std::string shown_place(std::string_view path)
+{
+    std::string text(path);
+    if (is_server_address(path)) {
+        hide_in_options(text);
+        hide_in_authority(text, after_scheme(path));
+    }
+    return text;
+}
+
+} // namespace kzcat
