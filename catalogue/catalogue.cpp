@@ -106,7 +106,7 @@ void Catalogue::bring_index_up_to_date()
 {
     {
         const std::shared_lock lock(index_mutex_);
-        if (index_ != nullptr && index_change_ == last_change()) {
+        if (index_ != nullptr && !index_->is_due() && index_change_ == last_change()) {
             return;
         }
     }
@@ -115,20 +115,26 @@ void Catalogue::bring_index_up_to_date()
     const int64_t change = last_change();
     if (index_ == nullptr) {
         index_ = with_store([this](Store& store) { return open_index(store, options_); });
-    } else if (index_change_ != change) {
+    } else if (index_change_ != change || index_->is_due()) {
         with_store([this](Store& store) { index_->refresh(store); });
     }
     index_change_ = change;
 }
 
-MatchAnswer Catalogue::recognise(const QueryBands& query, const MatchOptions& options)
+Recognised Catalogue::recognise(const QueryBands& query, const MatchOptions& options)
 {
-    return with_index([&](Index& index) { return kzcat::recognise(query, index, options); });
+    return with_index([&](Index& index) -> Recognised {
+        auto answer = kzcat::recognise(query, index, options);
+        return {std::move(answer), index.coverage()};
+    });
 }
 
-MatchAnswer Catalogue::recognise(const Trail& query, const MatchOptions& options)
+Recognised Catalogue::recognise(const Trail& query, const MatchOptions& options)
 {
-    return with_index([&](Index& index) { return kzcat::recognise(query, index, options); });
+    return with_index([&](Index& index) -> Recognised {
+        auto answer = kzcat::recognise(query, index, options);
+        return {std::move(answer), index.coverage()};
+    });
 }
 
 std::vector<Added> Catalogue::add(std::span<const NewTrack> tracks)

@@ -26,6 +26,11 @@ struct Merged {
     uint64_t tracks_damaged = 0; ///< left out
 };
 
+/// What was recognised, and from how many of the servers that have tracks.
+struct Recognised : MatchAnswer {
+    ShardCoverage shards;
+};
+
 /// Called with tracks done and in all; stops the work by returning false.
 using Progress = std::function<bool(uint64_t, uint64_t)>;
 
@@ -56,8 +61,8 @@ public:
 
     std::vector<Added> add(std::span<const NewTrack> tracks);
 
-    MatchAnswer recognise(const QueryBands& query, const MatchOptions& options);
-    MatchAnswer recognise(const Trail& query, const MatchOptions& options);
+    Recognised recognise(const QueryBands& query, const MatchOptions& options);
+    Recognised recognise(const Trail& query, const MatchOptions& options);
 
     /// By the tracks that were stored with what answers documents.
     DocumentAnswer recognise(const DocumentValues& query, size_t candidates);

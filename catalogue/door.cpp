@@ -46,10 +46,14 @@ IndexOptions to_index_options(const char* path, const kzcat_settings& settings)
     require(all_zero(settings.reserved),
             "a reserved field of the settings is not 0; fill them with "
             "kzcat_initialize_settings()");
-    require(settings.index_file <= 1 && settings.fall_back <= 1,
-            "index_file and fall_back are 0 or 1");
+    require(settings.index_file <= 1 && settings.fall_back <= 1 && settings.partial <= 1,
+            "index_file, fall_back and partial are 0 or 1");
     IndexOptions options;
-    if (path != nullptr && settings.index_file == 1 && !is_server_address(path)) {
+    if (path != nullptr && is_server_address(path)) {
+        options.server = path;
+        options.partial = settings.partial == 1;
+        options.write = settings.index_file == 1;
+    } else if (path != nullptr && settings.index_file == 1) {
         options.path = std::string(path) + ".idx";
     }
     options.fall_back = settings.fall_back == 1;

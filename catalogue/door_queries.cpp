@@ -122,18 +122,21 @@ void look_up(Catalogue& catalogue, const kzcat_query& query, const MatchOptions&
 {
     if (const auto* values = std::get_if<DocumentValues>(&query.content)) {
         result.summary.by = KZCAT_BY_DOCUMENT;
+        result.summary.shards = result.summary.shards_answered = 1;
         fill(result, catalogue, catalogue.recognise(*values, options.candidates), candidates);
         return;
     }
     result.summary.by = KZCAT_BY_TRAIL;
     const auto* bands = std::get_if<QueryBands>(&query.content);
+    const Recognised answer = bands != nullptr
+                                  ? catalogue.recognise(*bands, options)
+                                  : catalogue.recognise(std::get<Trail>(query.content), options);
+    result.summary.shards = answer.shards.of;
+    result.summary.shards_answered = answer.shards.answered;
     result.summary.clip_seconds = bands != nullptr
                                       ? static_cast<double>(bands->samples) / kWorkingRate
                                       : std::get<Trail>(query.content).seconds();
-    fill(result, catalogue,
-         bands != nullptr ? catalogue.recognise(*bands, options)
-                          : catalogue.recognise(std::get<Trail>(query.content), options),
-         candidates);
+    fill(result, catalogue, answer, candidates);
 }
 
 /// A record with pointers to the texts beside it.

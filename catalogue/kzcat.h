@@ -202,7 +202,10 @@ typedef struct kzcat_settings {
     uint32_t fall_back;    /**< 1 (at first): scan when the table of parts finds nothing */
     uint32_t index_from;   /**< codes from which on the index file is made; 0 (at first): as many as
                                 it takes to be worth it, some 4 million or 3000 tracks */
-    uint32_t reserved[12]; /**< 0 */
+    uint32_t partial;      /**< 0 (at first): recognising fails when a server that has some of the
+                                tracks gives no answer. 1: those that do are enough, and
+                                kzcat_summary says how many */
+    uint32_t reserved[11]; /**< 0 */
 } kzcat_settings;
 
 /**
@@ -797,7 +800,10 @@ typedef struct kzcat_summary {
     double clip_seconds;      /**< of the clip; 0 for a document, which does not say */
     uint32_t left_out;        /**< tracks that were not looked through because what is stored of
                                    them is damaged: kzcat_verify() says which; 0 at best */
-    uint32_t reserved[5];     /**< 0 */
+    uint32_t shards;          /**< servers that have tracks of the catalogue; 1 for a file */
+    uint32_t shards_answered; /**< how many of them the answer is from; fewer than all only when
+                                   the catalogue was opened with `partial` */
+    uint32_t reserved[3];     /**< 0 */
 } kzcat_summary;
 
 /** A track in which a clip was found. */

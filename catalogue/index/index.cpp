@@ -9,6 +9,7 @@
 #include <utility>
 
 #include "catalogue/index/measure.hpp"
+#include "catalogue/index/postgresql/postgres_index.hpp"
 #include "catalogue/index/searches.hpp"
 
 namespace kzcat {
@@ -189,6 +190,11 @@ private:
 
 std::unique_ptr<Index> open_index(Store& store, const IndexOptions& options)
 {
+    if (!options.server.empty()) {
+        if (auto index = open_postgres_index(store, options)) {
+            return index;
+        }
+    }
     return std::make_unique<StoreIndex>(store, options);
 }
 

@@ -47,6 +47,15 @@ struct IndexOptions {
     /// Lists of parts that a look-up may read, counted in lists of average length: twice as many
     /// take twice as long, and find more that is buried in noise. 0 takes the usual number.
     uint32_t lists = 0;
+    std::string server = {}; ///< address of the server that has the catalogue; empty: a file
+    /// Answer from those servers that can be reached, when some cannot: see Index::coverage().
+    bool partial = false;
+};
+
+/// Of how many servers that have tracks how many answered.
+struct ShardCoverage {
+    uint32_t answered = 1;
+    uint32_t of = 1;
 };
 
 /// A searcher over all tracks of a store as they were when it was opened or last refreshed. Find
@@ -55,6 +64,13 @@ struct IndexOptions {
 class Index : public Searcher {
 public:
     virtual IndexFacts facts() const = 0;
+
+    /// Fewer than all only where partial answers are wanted.
+    virtual ShardCoverage coverage() const { return {}; }
+
+    /// Whether refresh() should be called though nothing has changed: a server that gave no answer
+    /// may be back.
+    virtual bool is_due() const { return false; }
 
     /// Takes in what has changed in the store since. What throws has changed nothing.
     virtual void refresh(Store& store) = 0;

@@ -48,8 +48,7 @@ public:
             return std::bit_cast<double>(get<uint64_t>());
         } else {
             using Unsigned = std::make_unsigned_t<Number>;
-            return static_cast<Number>(
-                get_little_endian<Unsigned>(next(sizeof(Number)).data()));
+            return static_cast<Number>(get_little_endian<Unsigned>(next(sizeof(Number)).data()));
         }
     }
 
@@ -179,9 +178,8 @@ CountQuery count_query(const Reading& reading, std::span<const PartProbe> probes
         query.length = std::max(query.length, static_cast<uint32_t>(sequence.codes.size()));
     }
     std::vector<PartProbe> sorted(probes.begin(), probes.end());
-    std::ranges::stable_sort(sorted, {}, [](const PartProbe& probe) {
-        return list_number(probe.part, probe.value);
-    });
+    std::ranges::stable_sort(
+        sorted, {}, [](const PartProbe& probe) { return list_number(probe.part, probe.value); });
     for (const PartProbe& probe : sorted) {
         const int32_t list = list_number(probe.part, probe.value);
         const auto at = static_cast<uint32_t>(query.codes.size());
@@ -226,9 +224,9 @@ CountQuery to_count_query(std::span<const std::byte> bytes)
     }
     query.codes = reader.get_all<uint16_t>(codes);
     reader.expect_end();
-    const bool fits = query.length <= kMostProbes &&
-                      std::ranges::all_of(query.codes,
-                                          [&](uint16_t code) { return code < query.length; });
+    const bool fits =
+        query.length <= kMostProbes &&
+        std::ranges::all_of(query.codes, [&](uint16_t code) { return code < query.length; });
     if (!fits || !std::ranges::is_sorted(query.lists, {}, &CountQuery::List::list)) {
         throw ShardBytesError("codes lie beyond the sequence, or lists are out of order");
     }

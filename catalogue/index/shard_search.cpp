@@ -69,8 +69,7 @@ void HitCounter::add(int32_t segment, int32_t list, std::span<const std::byte> w
         own.hits.resize(std::max(own.hits.size(), size));
         return;
     }
-    const auto found =
-        std::ranges::lower_bound(query_.lists, list, {}, &CountQuery::List::list);
+    const auto found = std::ranges::lower_bound(query_.lists, list, {}, &CountQuery::List::list);
     if (found != query_.lists.end() && found->list == list) {
         count(own, *found, words);
     }

@@ -1,0 +1,300 @@
+/// @file
+/// The statements of look-ups. Grouping by the shard is what lets a coordinator have each server do
+/// its share: the tables are partitioned by it.
+
+#include "catalogue/index/postgresql/lookups.hpp"
+
+#include <algorithm>
+#include <iterator>
+#include <utility>
+
+namespace kzcat::postgresql {
+
+namespace {
+
+/// Without the first, whole tables would travel; with the second, statements with thousands of
+/// values are not planned anew each time.
+constexpr const char* kSession = "SET enable_partitionwise_aggregate = on; "
+                                 "SET plan_cache_mode = force_generic_plan; SET jit = off";
+
+template <class Value, class Read>
+std::vector<Value> joined(const Rows& rows, Read read)
+{
+    std::vector<Value> all;
+    for (int row = 0; row < rows.count(); ++row) {
+        if (!rows.is_null(row, 1)) {
+            const auto some = read(rows.bytes(row, 1));
+            all.insert(all.end(), some.begin(), some.end());
+        }
+    }
+    return all;
+}
+
+std::vector<RankedPlace> joined_places(const Rows& rows)
+{
+    return joined<RankedPlace>(rows, [](Bytes bytes) { return to_places(bytes); });
+}
+
+std::string listed(const std::vector<int64_t>& numbers)
+{
+    std::string text;
+    for (const int64_t number : numbers) {
+        text += (text.empty() ? "" : ", ") + std::to_string(number);
+    }
+    return text;
+}
+
+} // namespace
+
+Sessions::Sessions(std::string address, ConnectionOptions options)
+    : address_(std::move(address)), options_(std::move(options))
+{
+}
+
+std::unique_ptr<Connection> Sessions::take()
+{
+    {
+        const std::scoped_lock lock(mutex_);
+        if (!free_.empty()) {
+            auto session = std::move(free_.back());
+            free_.pop_back();
+            return session;
+        }
+    }
+    auto session = std::make_unique<Connection>(address_, options_);
+    session->execute(kSession);
+    return session;
+}
+
+void Sessions::give_back(std::unique_ptr<Connection> session)
+{
+    const std::scoped_lock lock(mutex_);
+    free_.push_back(std::move(session));
+}
+
+void SummedLengths::add(uint32_t part, Bytes starts)
+{
+    if (starts.size() != 4 * (size_t{kPartValues} + 1)) {
+        throw ShardBytesError("the starts of lists have another size than they must have");
+    }
+    for (uint32_t value = 0; value < kPartValues; ++value) {
+        const auto begin = get_little_endian<uint32_t>(starts.data() + size_t{4} * value);
+        const auto end = get_little_endian<uint32_t>(starts.data() + size_t{4} * value + 4);
+        const uint64_t length = end > begin ? end - begin : 0;
+        lengths_[size_t{part} * kPartValues + value] += length;
+        total_ += length;
+    }
+}
+
+Lookups::Lookups(std::string address, ConnectionOptions options, bool partial)
+    : sessions_(std::move(address), std::move(options)), partial_(partial)
+{
+}
+
+void Lookups::refresh()
+{
+    const auto read = [](Connection& session) {
+        std::vector<int64_t> shards;
+        const Rows rows = session.query("SELECT number FROM shard ORDER BY number");
+        for (int row = 0; row < rows.count(); ++row) {
+            shards.push_back(rows.integer(row, 0));
+        }
+        if (session.query("SELECT to_regclass('kzcat.posting')::text").is_null(0, 0)) {
+            throw StoreError(StoreError::Kind::cannot_open,
+                             session.name() +
+                                 ": the catalogue's shards cannot be searched through this server "
+                                 "yet; let its administrator run kzcat-shards for it");
+        }
+        return shards;
+    };
+    shards_ = sessions_.with(read);
+    const std::scoped_lock lock(mutex_);
+    missing_.clear();
+}
+
+ShardCoverage Lookups::coverage() const
+{
+    const std::scoped_lock lock(mutex_);
+    const size_t of = std::max<size_t>(shards_.size(), 1);
+    return {.answered = static_cast<uint32_t>(of - missing_.size()),
+            .of = static_cast<uint32_t>(of)};
+}
+
+/// What leaves out the servers that do not answer. They are named in the text of a statement: only
+/// then does the planner drop them.
+std::string Lookups::where() const
+{
+    const std::scoped_lock lock(mutex_);
+    return missing_.empty() ? " true" : " shard NOT IN (" + listed(missing_) + ")";
+}
+
+/// Why a shard does not answer; none when it does.
+std::optional<std::string> Lookups::refusal_of(int64_t shard)
+{
+    try {
+        sessions_.with([shard](Connection& session) {
+            return session.query_once(
+                "SELECT 1 FROM kzcat.trail WHERE shard = " + std::to_string(shard) + " LIMIT 1");
+        });
+        return std::nullopt;
+    } catch (const StoreError& error) {
+        return error.what();
+    }
+}
+
+/// After a statement has failed: finds out which servers are the reason, and goes on when none is
+/// any more, or a partial answer is wanted and some are left.
+void Lookups::look_for_servers(const StoreError& error)
+{
+    if (error.kind() != StoreError::Kind::failed || shards_.empty()) {
+        throw error;
+    }
+    std::vector<int64_t> missing;
+    std::string why;
+    for (const int64_t shard : shards_) {
+        if (const auto refusal = refusal_of(shard)) {
+            why = missing.empty() ? *refusal : why;
+            missing.push_back(shard);
+        }
+    }
+    if (!missing.empty() && (!partial_ || missing.size() == shards_.size())) {
+        throw StoreError(StoreError::Kind::failed,
+                         (missing.size() == 1 ? "shard " : "shards ") + listed(missing) + " of " +
+                             std::to_string(shards_.size()) + " gave no answer (" + why +
+                             "); start what is down, or accept answers from the others with "
+                             "--partial");
+    }
+    // Those that were missing stay so until refresh(): an answer in the making may lack them.
+    const std::scoped_lock lock(mutex_);
+    std::ranges::copy_if(missing, std::back_inserter(missing_), [this](int64_t shard) {
+        return std::ranges::find(missing_, shard) == missing_.end();
+    });
+}
+
+Rows Lookups::ask(const Ask& ask)
+{
+    const auto attempt = [&] {
+        return sessions_.with([&](Connection& session) { return ask(session, where()); });
+    };
+    try {
+        return attempt();
+    } catch (const StoreError& error) {
+        look_for_servers(error);
+    }
+    return attempt();
+}
+
+std::vector<RankedPlace> Lookups::places(const char* function, const char* table,
+                                         const ShardBytes& query)
+{
+    const auto statement = [&](Connection& session, const std::string& where) {
+        return session.query_once(std::string("SELECT shard, kzcat.") + function +
+                                      "(track, codes, $1) FROM kzcat." + table + " WHERE" + where +
+                                      " GROUP BY shard",
+                                  Bytes(query));
+    };
+    return joined_places(ask(statement));
+}
+
+std::vector<RankedPlace> Lookups::scan(const ShardBytes& query)
+{
+    return places("kz_scan", "trail", query);
+}
+
+std::vector<RankedPlace> Lookups::scan_tail(const ShardBytes& query)
+{
+    return places("kz_scan", "tail", query);
+}
+
+std::vector<Look> Lookups::count(const CountQuery& query)
+{
+    std::vector<int64_t> lists = {kTracksList};
+    for (const auto& list : query.lists) {
+        lists.push_back(list.list);
+    }
+    const ShardBytes bytes = to_bytes(query);
+    const auto statement = [&](Connection& session, const std::string& where) {
+        if (where == " true") {
+            return session.query("SELECT shard, kzcat.kz_count(segment, list, words, $2) "
+                                 "FROM kzcat.posting WHERE list = ANY ($1) GROUP BY shard",
+                                 std::span<const int64_t>(lists), Bytes(bytes));
+        }
+        return session.query_once("SELECT shard, kzcat.kz_count(segment, list, words, $2) "
+                                  "FROM kzcat.posting WHERE list = ANY ($1) AND" +
+                                      where + " GROUP BY shard",
+                                  std::span<const int64_t>(lists), Bytes(bytes));
+    };
+    return joined<Look>(ask(statement), [](Bytes row) { return to_looks(row); });
+}
+
+std::vector<RankedPlace> Lookups::rank(const std::vector<int64_t>& tracks, const ShardBytes& query)
+{
+    const auto statement = [&](Connection& session, const std::string& where) {
+        if (where == " true") {
+            return session.query("SELECT shard, kzcat.kz_rank(track, codes, $2) FROM kzcat.trail "
+                                 "WHERE track = ANY ($1) GROUP BY shard",
+                                 std::span<const int64_t>(tracks), Bytes(query));
+        }
+        return session.query_once("SELECT shard, kzcat.kz_rank(track, codes, $2) FROM kzcat.trail "
+                                  "WHERE track = ANY ($1) AND" +
+                                      where + " GROUP BY shard",
+                                  std::span<const int64_t>(tracks), Bytes(query));
+    };
+    return joined_places(ask(statement));
+}
+
+void Lookups::fetch_codes(const std::vector<int64_t>& tracks,
+                          const std::function<void(int64_t, std::vector<Code>)>& take)
+{
+    const Rows rows = ask([&](Connection& session, const std::string& where) {
+        return session.query_once(
+            "SELECT track, codes FROM kzcat.trail WHERE track = ANY ($1) AND" + where,
+            std::span<const int64_t>(tracks));
+    });
+    for (int row = 0; row < rows.count(); ++row) {
+        std::vector<Code> codes;
+        get_little_endian(rows.bytes(row, 1), codes);
+        take(rows.integer(row, 0), std::move(codes));
+    }
+}
+
+SummedLengths Lookups::lengths()
+{
+    const Rows rows = ask([](Connection& session, const std::string& where) {
+        return session.query_once(
+            "SELECT list, words FROM kzcat.posting WHERE list BETWEEN -5 AND -2 AND" + where);
+    });
+    SummedLengths lengths;
+    for (int row = 0; row < rows.count(); ++row) {
+        lengths.add(static_cast<uint32_t>(-2 - rows.integer(row, 0)), rows.bytes(row, 1));
+    }
+    return lengths;
+}
+
+uint64_t Lookups::tail_tracks()
+{
+    const Rows rows = ask([](Connection& session, const std::string& where) {
+        return session.query_once("SELECT shard, count(*) FROM kzcat.tail WHERE" + where +
+                                  " GROUP BY shard");
+    });
+    uint64_t tracks = 0;
+    for (int row = 0; row < rows.count(); ++row) {
+        tracks += static_cast<uint64_t>(rows.integer(row, 1));
+    }
+    return tracks;
+}
+
+void Lookups::request_posting(uint64_t least)
+{
+    const std::vector<int64_t> places = shards_.empty() ? std::vector<int64_t>{0} : shards_;
+    sessions_.with([&](Connection& session) {
+        for (const int64_t shard : places) {
+            session.query(
+                "INSERT INTO kzcat.posting_request (shard, least) VALUES ($1::bigint, $2)", shard,
+                static_cast<int64_t>(least));
+        }
+        return true;
+    });
+}
+
+} // namespace kzcat::postgresql
