@@ -1,6 +1,5 @@
 /// @file
-/// The statements of look-ups. Grouping by the shard is what lets a coordinator have each server do
-/// its share: the tables are partitioned by it.
+/// The statements of look-ups.
 
 #include "catalogue/index/postgresql/lookups.hpp"
 
@@ -11,11 +10,6 @@
 namespace kzcat::postgresql {
 
 namespace {
-
-/// Without the first, whole tables would travel; with the second, statements with thousands of
-/// values are not planned anew each time.
-constexpr const char* kSession = "SET enable_partitionwise_aggregate = on; "
-                                 "SET plan_cache_mode = force_generic_plan; SET jit = off";
 
 template <class Value, class Read>
 std::vector<Value> joined(const Rows& rows, Read read)
@@ -35,6 +29,8 @@ std::vector<RankedPlace> joined_places(const Rows& rows)
     return joined<RankedPlace>(rows, [](Bytes bytes) { return to_places(bytes); });
 }
 
+constexpr const char* kEverywhere = " true";
+
 std::string listed(const std::vector<int64_t>& numbers)
 {
     std::string text;
@@ -46,10 +42,14 @@ std::string listed(const std::vector<int64_t>& numbers)
 
 } // namespace
 
-Sessions::Sessions(std::string address, ConnectionOptions options)
-    : address_(std::move(address)), options_(std::move(options))
-{
-}
+const char* const kSearchSession = "SET enable_partitionwise_aggregate = on; "
+                                   "SET plan_cache_mode = force_generic_plan; SET jit = off";
+
+const char* const kCountStatement = "SELECT shard, kzcat.kz_count(segment, list, words, $2) "
+                                    "FROM kzcat.posting WHERE list = ANY ($1) GROUP BY shard";
+
+const char* const kRankStatement = "SELECT shard, kzcat.kz_rank(track, codes, $2) "
+                                   "FROM kzcat.trail WHERE track = ANY ($1) GROUP BY shard";
 
 std::unique_ptr<Connection> Sessions::take()
 {
@@ -61,8 +61,8 @@ std::unique_ptr<Connection> Sessions::take()
             return session;
         }
     }
-    auto session = std::make_unique<Connection>(address_, options_);
-    session->execute(kSession);
+    auto session = std::make_unique<Connection>(address_);
+    session->execute(kSearchSession);
     return session;
 }
 
@@ -86,8 +86,8 @@ void SummedLengths::add(uint32_t part, Bytes starts)
     }
 }
 
-Lookups::Lookups(std::string address, ConnectionOptions options, bool partial)
-    : sessions_(std::move(address), std::move(options)), partial_(partial)
+Lookups::Lookups(std::string address, bool partial)
+    : sessions_(std::move(address)), partial_(partial)
 {
 }
 
@@ -125,7 +125,7 @@ ShardCoverage Lookups::coverage() const
 std::string Lookups::where() const
 {
     const std::scoped_lock lock(mutex_);
-    return missing_.empty() ? " true" : " shard NOT IN (" + listed(missing_) + ")";
+    return missing_.empty() ? kEverywhere : " shard NOT IN (" + listed(missing_) + ")";
 }
 
 /// Why a shard does not answer; none when it does.
@@ -206,41 +206,30 @@ std::vector<RankedPlace> Lookups::scan_tail(const ShardBytes& query)
     return places("kz_scan", "tail", query);
 }
 
+/// A statement of look-ups, which a server compiles once, or another for the servers that are left.
+Rows Lookups::ask(const char* statement, std::span<const int64_t> numbers, Bytes query)
+{
+    return ask([&](Connection& session, const std::string& where) {
+        if (where == kEverywhere) {
+            return session.query(statement, numbers, query);
+        }
+        std::string narrowed = statement;
+        narrowed.insert(narrowed.find(" GROUP BY"), " AND" + where);
+        return session.query_once(narrowed, numbers, query);
+    });
+}
+
 std::vector<Look> Lookups::count(const CountQuery& query)
 {
     std::vector<int64_t> lists = {kTracksList};
-    for (const auto& list : query.lists) {
-        lists.push_back(list.list);
-    }
-    const ShardBytes bytes = to_bytes(query);
-    const auto statement = [&](Connection& session, const std::string& where) {
-        if (where == " true") {
-            return session.query("SELECT shard, kzcat.kz_count(segment, list, words, $2) "
-                                 "FROM kzcat.posting WHERE list = ANY ($1) GROUP BY shard",
-                                 std::span<const int64_t>(lists), Bytes(bytes));
-        }
-        return session.query_once("SELECT shard, kzcat.kz_count(segment, list, words, $2) "
-                                  "FROM kzcat.posting WHERE list = ANY ($1) AND" +
-                                      where + " GROUP BY shard",
-                                  std::span<const int64_t>(lists), Bytes(bytes));
-    };
-    return joined<Look>(ask(statement), [](Bytes row) { return to_looks(row); });
+    std::ranges::transform(query.lists, std::back_inserter(lists), &CountQuery::List::list);
+    return joined<Look>(ask(kCountStatement, lists, to_bytes(query)),
+                        [](Bytes row) { return to_looks(row); });
 }
 
 std::vector<RankedPlace> Lookups::rank(const std::vector<int64_t>& tracks, const ShardBytes& query)
 {
-    const auto statement = [&](Connection& session, const std::string& where) {
-        if (where == " true") {
-            return session.query("SELECT shard, kzcat.kz_rank(track, codes, $2) FROM kzcat.trail "
-                                 "WHERE track = ANY ($1) GROUP BY shard",
-                                 std::span<const int64_t>(tracks), Bytes(query));
-        }
-        return session.query_once("SELECT shard, kzcat.kz_rank(track, codes, $2) FROM kzcat.trail "
-                                  "WHERE track = ANY ($1) AND" +
-                                      where + " GROUP BY shard",
-                                  std::span<const int64_t>(tracks), Bytes(query));
-    };
-    return joined_places(ask(statement));
+    return joined_places(ask(kRankStatement, tracks, query));
 }
 
 void Lookups::fetch_codes(const std::vector<int64_t>& tracks,
@@ -287,14 +276,23 @@ uint64_t Lookups::tail_tracks()
 void Lookups::request_posting(uint64_t least)
 {
     const std::vector<int64_t> places = shards_.empty() ? std::vector<int64_t>{0} : shards_;
-    sessions_.with([&](Connection& session) {
-        for (const int64_t shard : places) {
+    const auto request = [&](Connection& session) {
+        const Rows rights = session.query("SELECT has_table_privilege('kzcat.posting_request', "
+                                          "'INSERT') AND NOT pg_is_in_recovery()");
+        for (size_t i = 0; rights.boolean(0, 0) && i < places.size(); ++i) {
             session.query(
-                "INSERT INTO kzcat.posting_request (shard, least) VALUES ($1::bigint, $2)", shard,
-                static_cast<int64_t>(least));
+                "INSERT INTO kzcat.posting_request (shard, least) VALUES ($1::bigint, $2)",
+                places[i], static_cast<int64_t>(least));
         }
         return true;
-    });
+    };
+    try {
+        sessions_.with(request);
+    } catch (const StoreError& error) {
+        if (error.kind() != StoreError::Kind::read_only) { // a shard's standby, for one
+            throw;
+        }
+    }
 }
 
 } // namespace kzcat::postgresql

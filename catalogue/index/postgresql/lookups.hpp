@@ -8,6 +8,7 @@
 #include <mutex>
 #include <optional>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "catalogue/index/index.hpp"
@@ -17,10 +18,19 @@
 
 namespace kzcat::postgresql {
 
+/// What a session begins with: without the first, whole tables would travel to a coordinator; with
+/// the second, statements with thousands of values are not planned anew each time.
+extern const char* const kSearchSession;
+
+/// Grouping by the shard is what lets a coordinator have each server do its share: the tables are
+/// partitioned by it.
+extern const char* const kCountStatement; ///< of the lists $1, by the query $2
+extern const char* const kRankStatement;  ///< of the tracks $1, by the query $2
+
 /// Sessions with one server: as many as have ever been in use at once.
 class Sessions {
 public:
-    explicit Sessions(std::string address, ConnectionOptions options);
+    explicit Sessions(std::string address) : address_(std::move(address)) {}
 
     /// Gives `use` a session to which it has sole access.
     template <class Use>
@@ -37,7 +47,6 @@ private:
     void give_back(std::unique_ptr<Connection> session);
 
     std::string address_;
-    ConnectionOptions options_;
     std::mutex mutex_;
     std::vector<std::unique_ptr<Connection>> free_;
 };
@@ -63,7 +72,7 @@ private:
 /// Several threads may look up at once.
 class Lookups {
 public:
-    Lookups(std::string address, ConnectionOptions options, bool partial);
+    Lookups(std::string address, bool partial);
 
     /// Looks which servers have tracks, and whether they can be searched. Throws StoreError, which
     /// names a cure.
@@ -84,7 +93,7 @@ public:
 
     SummedLengths lengths();
     uint64_t tail_tracks();
-    /// Has tails of so many codes posted.
+    /// Has tails of so many codes posted, where the user may ask for it.
     void request_posting(uint64_t least);
 
     Sessions& sessions() { return sessions_; }
@@ -92,6 +101,7 @@ public:
 private:
     using Ask = std::function<Rows(Connection&, const std::string& where)>;
     Rows ask(const Ask& ask);
+    Rows ask(const char* statement, std::span<const int64_t> numbers, Bytes query);
     std::string where() const;
     std::optional<std::string> refusal_of(int64_t shard);
     void look_for_servers(const StoreError& error);

@@ -32,8 +32,8 @@ std::vector<Candidate> candidates_of(std::vector<RankedPlace> places, size_t lim
 /// threads at once.
 class Servers {
 public:
-    Servers(const IndexOptions& options, bool read_only)
-        : lookups(options.server, {.read_only = read_only}, options.partial), lists(options.lists)
+    explicit Servers(const IndexOptions& options)
+        : lookups(options.server, options.partial), lists(options.lists)
     {
     }
 
@@ -125,9 +125,8 @@ private:
 
 class PostgresIndex final : public Index {
 public:
-    PostgresIndex(Store& store, const IndexOptions& options, bool read_only)
-        : options_(options), can_write_(options.write && !read_only), servers_(options, read_only),
-          everything_(servers_)
+    PostgresIndex(Store& store, const IndexOptions& options)
+        : options_(options), servers_(options), everything_(servers_)
     {
         take_in(store);
     }
@@ -198,7 +197,7 @@ private:
         servers_.cache.clear();
         servers_.tail_tracks = servers_.lookups.tail_tracks();
         const ShardCoverage coverage = servers_.lookups.coverage();
-        if (can_write_ && servers_.tail_tracks > 0 && coverage.answered == coverage.of &&
+        if (options_.write && servers_.tail_tracks > 0 && coverage.answered == coverage.of &&
             servers_.code_count >= options_.write_from) {
             // What is less than a tenth of all is scanned.
             servers_.lookups.request_posting(
@@ -206,7 +205,7 @@ private:
             servers_.tail_tracks = servers_.lookups.tail_tracks();
         }
         servers_.lengths = servers_.lookups.lengths();
-        servers_.population = chosen_population(servers_.lookups, can_write_);
+        servers_.population = chosen_population(servers_.lookups, options_.write);
     }
 
     using Clock = std::chrono::steady_clock;
@@ -215,7 +214,6 @@ private:
 
     Clock::time_point taken_in_;
     IndexOptions options_;
-    bool can_write_;
     Servers servers_;
     Everything everything_;
 };
@@ -232,7 +230,7 @@ std::unique_ptr<Index> open_postgres_index(Store& store, const IndexOptions& opt
 {
     Connection& session = connection_of(store);
     if (has_extension(session)) {
-        return std::make_unique<PostgresIndex>(store, options, session.options().read_only);
+        return std::make_unique<PostgresIndex>(store, options);
     }
     if (store.code_count() < options.write_from) {
         return nullptr;

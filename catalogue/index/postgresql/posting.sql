@@ -102,9 +102,10 @@ BEGIN
 END $$;
 
 -- A row that is put here asks for kzcat.post(least): so it can be asked for through a coordinator,
--- too. Nothing is kept.
+-- too, and by users who may not write to the other tables. Nothing is kept.
 CREATE TABLE kzcat.posting_request (shard integer NOT NULL, least bigint NOT NULL);
-CREATE FUNCTION kzcat.answer_request() RETURNS trigger LANGUAGE plpgsql AS $$
+CREATE FUNCTION kzcat.answer_request() RETURNS trigger LANGUAGE plpgsql
+SECURITY DEFINER SET search_path = pg_catalog AS $$
 BEGIN
     PERFORM kzcat.post(NEW.least);
     RETURN NULL;

@@ -3,11 +3,10 @@
 
 #include <algorithm>
 #include <memory>
-#include <random>
 
 #include <gtest/gtest.h>
 
-#include "catalogue/index/corpora.hpp"
+#include "catalogue/index/clips.hpp"
 #include "catalogue/index/fleet.hpp"
 #include "catalogue/index/index.hpp"
 #include "catalogue/index/scratch_folder.hpp"
@@ -18,61 +17,13 @@
 namespace kzcat {
 namespace {
 
+using test::add;
+using test::clip_of;
+using test::codes_of;
 using test::Fleet;
 using test::ScratchFolder;
 
-constexpr uint64_t kTracks = 150;
-
-std::vector<Code> codes_of(uint64_t number)
-{
-    return test::random_codes(number, 150 + number * 37 % 300);
-}
-
-std::vector<NewTrack> new_tracks(uint64_t first, uint64_t count)
-{
-    std::vector<NewTrack> tracks;
-    for (uint64_t number = first; number < first + count; ++number) {
-        NewTrack& track = tracks.emplace_back();
-        track.trail.codes = codes_of(number);
-        track.trail.samples = track.trail.codes.size() * kCodeHop;
-        track.source.uri = "track " + std::to_string(number);
-    }
-    return tracks;
-}
-
-std::vector<int64_t> add(Store& store, uint64_t first, uint64_t count)
-{
-    std::vector<int64_t> ids;
-    for (const Added& added : store.add(new_tracks(first, count))) {
-        ids.push_back(added.track);
-    }
-    return ids;
-}
-
-/// A clip of a track: 70 codes from place 50 on, in each code of which some bits are wrong.
-Reading clip_of(uint64_t number, int wrong)
-{
-    std::mt19937_64 random(number);
-    const auto codes = codes_of(number);
-    Reading reading;
-    reading.sequences.resize(kPhases);
-    for (auto& sequence : reading.sequences) {
-        for (size_t i = 50; i < 120; ++i) {
-            BitStrengths strengths;
-            strengths.fill(60);
-            Code code = codes[i];
-            for (int turned = 0; turned < wrong; ++turned) {
-                const auto bit = static_cast<size_t>(random() % kPairs);
-                code ^= Code{1} << bit;
-                strengths[bit] = static_cast<uint8_t>(random() % 40);
-            }
-            sequence.codes.push_back(code);
-            sequence.masks.push_back(~Code{0});
-            sequence.strengths.push_back(strengths);
-        }
-    }
-    return reading;
-}
+constexpr uint64_t kTracks = 80;
 
 using Places = std::vector<std::tuple<int64_t, uint32_t, int64_t>>;
 
@@ -118,12 +69,22 @@ std::vector<Code> all_codes(const Corpus& corpus)
 struct OneServer {
     kz::test::PostgresServer server;
     std::string url() const { return server.url(); }
+    std::string reader_url() const { return test::reader_of(server); }
 };
 
 /// A coordinator of two shards.
 struct TwoShards {
     Fleet fleet;
     std::string url() const { return fleet.coordinator.url(); }
+    std::string reader_url() const
+    {
+        const std::string reader = test::reader_of(fleet.coordinator);
+        fleet.coordinator.sql("CREATE USER MAPPING FOR reader SERVER kzcat_shard_1 OPTIONS (user "
+                              "'postgres', password_required 'false');"
+                              "CREATE USER MAPPING FOR reader SERVER kzcat_shard_2 OPTIONS (user "
+                              "'postgres', password_required 'false')");
+        return reader;
+    }
 };
 
 template <class Servers>
@@ -244,12 +205,12 @@ TYPED_TEST(EveryServer, PostsTogetherWhatCameInPieces)
 {
     std::vector<int64_t> more;
     for (uint64_t round = 0; round < 2; ++round) {
-        const auto some = add(*this->store_, 2001 + 50 * round, 50);
+        const auto some = add(*this->store_, 2001 + 30 * round, 30);
         more.insert(more.end(), some.begin(), some.end());
         EXPECT_EQ(0U, open_index(*this->store_, this->options())->facts().tail_tracks);
     }
     const auto index = open_index(*this->store_, this->options());
-    EXPECT_EQ(more[60], index->find(clip_of(2061, 8), 5).at(0).track);
+    EXPECT_EQ(more[40], index->find(clip_of(2041, 8), 5).at(0).track);
     EXPECT_EQ(this->ids_[20], index->find(clip_of(21, 8), 5).at(0).track);
     for (const int64_t track : more) {
         this->store_->remove(track);
@@ -269,8 +230,10 @@ TYPED_TEST(EveryServer, OffersAScanForWhatPartsDoNotFind)
 TYPED_TEST(EveryServer, IsReadByWhoMayNotWrite)
 {
     add(*this->store_, 3001, 1);
-    const auto reader = open_postgres_store(this->url(), Access::read);
-    const auto index = open_index(*reader, this->options());
+    IndexOptions options = this->options();
+    options.server = this->servers_->reader_url();
+    const auto reader = open_postgres_store(options.server, Access::read);
+    const auto index = open_index(*reader, options);
     EXPECT_LE(1U, index->facts().tail_tracks);
     EXPECT_EQ(this->ids_[20], index->find(clip_of(21, 8), 5).at(0).track);
 }

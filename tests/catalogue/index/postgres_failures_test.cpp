@@ -1,0 +1,258 @@
+// What becomes of look-ups when servers die, and what a coordinator leaves to its shards.
+
+#include <functional>
+#include <iterator>
+#include <memory>
+#include <regex>
+
+#include <gtest/gtest.h>
+
+#include "catalogue/index/clips.hpp"
+#include "catalogue/index/fleet.hpp"
+#include "catalogue/index/index.hpp"
+#include "catalogue/index/postgresql/lookups.hpp"
+#include "catalogue/store/postgresql/postgres_store.hpp"
+
+namespace kzcat {
+namespace {
+
+using test::add;
+using test::clip_of;
+using test::Fleet;
+
+constexpr uint64_t kTracks = 60;
+
+IndexOptions options_for(const std::string& url, bool partial = false)
+{
+    IndexOptions options;
+    options.write_from = 1;
+    options.server = url;
+    options.partial = partial;
+    return options;
+}
+
+/// The track that a clip is found in; 0 when it is in none.
+int64_t found(Index& index, uint64_t number)
+{
+    const auto places = index.find(clip_of(number, 8), 3);
+    return places.empty() || places.front().position != 50 ? 0 : places.front().track;
+}
+
+size_t occurrences(const std::string& text, const std::string& pattern)
+{
+    const std::regex expression(pattern);
+    return static_cast<size_t>(
+        std::distance(std::sregex_iterator(text.begin(), text.end(), expression), {}));
+}
+
+class Shards : public testing::Test {
+protected:
+    static void SetUpTestSuite()
+    {
+        if (!kz::test::postgres_obstacle().empty()) {
+            return;
+        }
+        fleet_ = std::make_unique<Fleet>();
+        store_ = open_postgres_store(url(), Access::create);
+        ids_ = add(*store_, 1, kTracks);
+        open_index(*store_, options_for(url())); // which posts them
+    }
+    static void TearDownTestSuite()
+    {
+        store_.reset();
+        fleet_.reset();
+    }
+    void SetUp() override
+    {
+        if (!kz::test::postgres_obstacle().empty()) {
+            GTEST_SKIP() << kz::test::postgres_obstacle();
+        }
+    }
+    void TearDown() override
+    {
+        if (fleet_ != nullptr && !fleet_->two.is_running()) {
+            fleet_->two.start();
+        }
+    }
+
+    static std::string url() { return fleet_->coordinator.url(); }
+
+    /// Whether a track lies on the second shard.
+    static bool is_on_two(int64_t track)
+    {
+        return fleet_->coordinator.sql("SELECT shard FROM kzcat.track WHERE id = " +
+                                       std::to_string(track)) == "2\n";
+    }
+
+    static std::string plan_of(const std::string& statement, const std::string& values,
+                               const std::string& session = postgresql::kSearchSession)
+    {
+        return fleet_->coordinator.sql(
+            session + "; PREPARE lookup (bigint[], bytea) AS " + statement +
+            "; EXPLAIN (VERBOSE, COSTS OFF) EXECUTE lookup (" + values + ")");
+    }
+
+    /// What a call fails with.
+    static std::string failure(const std::function<void()>& act)
+    {
+        try {
+            act();
+            return "nothing failed";
+        } catch (const StoreError& error) {
+            return error.what();
+        }
+    }
+
+    static inline std::unique_ptr<Fleet> fleet_;
+    static inline std::unique_ptr<Store> store_;
+    static inline std::vector<int64_t> ids_;
+};
+
+TEST_F(Shards, CountAndRankOnTheirOwnAndAtOnce)
+{
+    const std::string count = plan_of(postgresql::kCountStatement, "'{1,2}', ''");
+    EXPECT_EQ(2U, occurrences(count, "Async Foreign Scan")) << count;
+    EXPECT_EQ(2U, occurrences(count, "Remote SQL: SELECT shard, kzcat.kz_count\\(.* FROM "
+                                     "kzcat.posting WHERE .*list = ANY .*GROUP BY 1"))
+        << count;
+    const std::string rank = plan_of(postgresql::kRankStatement, "'{1,2}', ''");
+    EXPECT_EQ(2U, occurrences(rank, "Async Foreign Scan")) << rank;
+    EXPECT_EQ(2U, occurrences(rank, "Remote SQL: SELECT shard, kzcat.kz_rank\\(.* FROM kzcat.trail "
+                                    "WHERE .*track = ANY .*GROUP BY 1"))
+        << rank;
+}
+
+TEST_F(Shards, SendWholeTablesUnlessGroupedByShard)
+{
+    // Each of these is what the statements and the session are made to avoid.
+    const std::string off = plan_of(postgresql::kCountStatement, "'{1,2}', ''",
+                                    "SET enable_partitionwise_aggregate = off");
+    EXPECT_EQ(0U, occurrences(off, "Remote SQL: .*kz_count")) << off;
+    const std::string ungrouped =
+        plan_of("SELECT kzcat.kz_count(segment, list, words, $2) FROM kzcat.posting "
+                "WHERE list = ANY ($1)",
+                "'{1,2}', ''");
+    EXPECT_EQ(0U, occurrences(ungrouped, "Remote SQL: .*kz_count")) << ungrouped;
+    // The installer has the database switch it on for who connects by other means.
+    EXPECT_EQ("on\n", fleet_->coordinator.sql("SHOW enable_partitionwise_aggregate"));
+}
+
+TEST_F(Shards, ThatDieAreNamedAndMissedUntilTheyAreBack)
+{
+    const auto index = open_index(*store_, options_for(url()));
+    EXPECT_EQ(ids_[4], found(*index, 5));
+    fleet_->two.kill9();
+    for (uint64_t number = 1; number <= 3; ++number) {
+        const std::string text = failure([&] { found(*index, number); });
+        EXPECT_NE(std::string::npos, text.find("shard 2 of 2 gave no answer")) << text;
+        EXPECT_NE(std::string::npos, text.find("--partial")) << text;
+    }
+    fleet_->two.start();
+    for (uint64_t number = 1; number <= kTracks; number += 5) {
+        EXPECT_EQ(ids_[number - 1], found(*index, number));
+    }
+    EXPECT_EQ(2U, index->coverage().answered);
+}
+
+TEST_F(Shards, ThatAreLeftAnswerWhenThatIsEnough)
+{
+    auto index = open_index(*store_, options_for(url(), true));
+    EXPECT_EQ(2U, index->coverage().answered);
+    fleet_->two.kill9();
+    size_t missed = 0;
+    for (uint64_t number = 1; number <= kTracks; number += 5) {
+        const bool is_lost = is_on_two(ids_[number - 1]);
+        EXPECT_EQ(is_lost ? 0 : ids_[number - 1], found(*index, number)) << number;
+        missed += is_lost;
+    }
+    EXPECT_LT(0U, missed);
+    EXPECT_EQ(1U, index->coverage().answered);
+    EXPECT_EQ(2U, index->coverage().of);
+    // One that is opened meanwhile.
+    EXPECT_EQ(1U, open_index(*store_, options_for(url(), true))->coverage().answered);
+    fleet_->two.start();
+    index->refresh(*store_);
+    EXPECT_EQ(2U, index->coverage().answered);
+    EXPECT_EQ(ids_[10], found(*index, 11));
+}
+
+TEST_F(Shards, AllOfThemDeadAnswerNothing)
+{
+    const auto index = open_index(*store_, options_for(url(), true));
+    fleet_->one.kill9();
+    fleet_->two.kill9();
+    const std::string text = failure([&] { found(*index, 1); });
+    EXPECT_NE(std::string::npos, text.find("shards 1, 2 of 2 gave no answer")) << text;
+    fleet_->one.start();
+}
+
+TEST_F(Shards, WithoutTheExtensionAreRefusedWithTheCure)
+{
+    fleet_->one.sql("ALTER EXTENSION kzmatch SET SCHEMA public");
+    const auto index = open_index(*store_, options_for(url()));
+    EXPECT_NE("nothing failed", failure([&] { found(*index, 1); }));
+    fleet_->one.sql("ALTER EXTENSION kzmatch SET SCHEMA kzcat");
+    EXPECT_EQ(ids_[4], found(*index, 5));
+}
+
+class Extension : public testing::Test {};
+
+TEST_F(Extension, MissingOnTheServerIsNamedWithItsCure)
+{
+    if (!kz::test::postgres_obstacle().empty()) {
+        GTEST_SKIP() << kz::test::postgres_obstacle();
+    }
+    const kz::test::PostgresServer server;
+    const auto store = open_postgres_store(server.url(), Access::create);
+    const auto ids = add(*store, 1, 10);
+    server.sql("DROP EXTENSION kzmatch");
+    try {
+        open_index(*store, options_for(server.url()));
+        FAIL() << "nothing failed";
+    } catch (const StoreError& error) {
+        const std::string text = error.what();
+        EXPECT_NE(std::string::npos, text.find("CREATE EXTENSION kzmatch SCHEMA kzcat")) << text;
+    }
+    // A few tracks are searched in memory.
+    IndexOptions options = options_for(server.url());
+    options.write_from = 1'000'000;
+    EXPECT_EQ(ids[4], found(*open_index(*store, options), 5));
+}
+
+class Standby : public testing::Test {};
+
+TEST_F(Standby, TakesOverAfterOneLookUpAtMost)
+{
+    if (!kz::test::postgres_obstacle().empty()) {
+        GTEST_SKIP() << kz::test::postgres_obstacle();
+    }
+    const kz::test::PostgresServer coordinator;
+    kz::test::PostgresServer shard;
+    const auto standby = kz::test::PostgresServer::standby_of(shard);
+    // Adding goes to whichever may be written, looking up to whichever answers.
+    test::attach_shards(coordinator.url(),
+                        {"host=" + shard.host() + "," + standby->host() + " port=" +
+                         std::to_string(shard.port()) + "," + std::to_string(standby->port()) +
+                         " dbname=postgres user=postgres target_session_attrs=any"});
+    const auto store = open_postgres_store(coordinator.url(), Access::create);
+    const auto ids = add(*store, 1, 20);
+    const auto index = open_index(*store, options_for(coordinator.url()));
+    test::await_replay(shard, *standby);
+    int failed = 0;
+    for (int i = 0; i < 60; ++i) {
+        if (i == 20) {
+            shard.kill9();
+        }
+        const auto number = static_cast<uint64_t>(i % 20) + 1;
+        try {
+            EXPECT_EQ(ids[number - 1], found(*index, number)) << i;
+        } catch (const StoreError&) {
+            ++failed;
+        }
+    }
+    EXPECT_GE(1, failed);
+    EXPECT_EQ(1U, index->coverage().answered);
+}
+
+} // namespace
+} // namespace kzcat
