@@ -8,15 +8,6 @@ namespace {
 
 using namespace kzcat;
 
-NewTrack to_new_track(const kzcat_new_track& track)
-{
-    require_codes(track.trail);
-    return {.trail = track.trail->trail,
-            .document_bands = track.trail->document_bands,
-            .tags = to_tags(track.tags, track.tag_count),
-            .source = to_source(track.source)};
-}
-
 [[noreturn]] void fail_not_found(const std::string& what)
 {
     throw Failure(KZCAT_ERROR_NOT_FOUND, what + " is in the catalogue; list what there is");
@@ -106,6 +97,15 @@ void kzcat::require_codes(const kzcat_trail* trail)
                       "a trail is empty, since its sound is shorter than a second; pass longer "
                       "sound");
     }
+}
+
+NewTrack kzcat::to_new_track(const kzcat_new_track& track)
+{
+    require_codes(track.trail);
+    return {.trail = track.trail->trail,
+            .document_bands = track.trail->document_bands,
+            .tags = to_tags(track.tags, track.tag_count),
+            .source = to_source(track.source)};
 }
 
 kzcat_status kzcat_add(kzcat_catalogue* catalogue, const kzcat_new_track* tracks, uint64_t count,

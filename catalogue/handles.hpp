@@ -16,6 +16,7 @@
 #include "catalogue/failure.hpp"
 #include "catalogue/model/extractor.hpp"
 #include "catalogue/monitor/monitor.hpp"
+#include "catalogue/store/postgresql/jobs.hpp"
 #include "kzcat.h"
 
 struct kzcat_catalogue {
@@ -82,6 +83,12 @@ struct kzcat_monitor {
     kzcat_names names;        ///< of the track that was heard last
 };
 
+struct kzcat_jobs {
+    std::unique_ptr<kzcat::Jobs> whole;
+    kzcat::Job taken;         ///< the caller has its text
+    kzcat::FailedJob visited; ///< and those of this one
+};
+
 namespace kzcat {
 
 /// Reads the names of a track from its tags; empty ones when there is no such track.
@@ -145,6 +152,7 @@ SoundFormat to_sound_format(const kzcat_format* format);
 Source to_source(const kzcat_source& source);
 std::vector<Tag> to_tags(const kzcat_tag* tags, uint64_t count);
 void require_codes(const kzcat_trail* trail);
+NewTrack to_new_track(const kzcat_new_track& track);
 
 /// Reports on a format that an extractor refuses, by the status for that.
 template <class Make>

@@ -1033,6 +1033,158 @@ KZ_API kzcat_status kzcat_monitor_next_event(kzcat_monitor* monitor,
  */
 KZ_API kzcat_status kzcat_monitor_free(kzcat_monitor** monitor_ref) KZ_NOEXCEPT;
 
+/* ---- Jobs ------------------------------------------------------------------------------------ */
+
+/**
+ * Files that are to become tracks, in a table that any number of workers on any number of machines
+ * take them from: each becomes a track once, whichever worker ends without warning. The table lies
+ * in the database of a catalogue on a PostgreSQL server. Opaque; one thread at a time, and one job
+ * at a time: a worker has as many handles as it works on files at once.
+ */
+typedef struct kzcat_jobs kzcat_jobs;
+
+/** A job that a worker has. */
+typedef struct kzcat_job {
+    int64_t job;      /**< its id, above 0 */
+    const char* uri;  /**< of the file, as it was added; the handle's own, and valid until the next
+                          call with the handle */
+    uint32_t attempt; /**< 1 for the first one */
+    uint32_t reserved[5]; /**< 0 */
+} kzcat_job;
+
+/** How many jobs there are. */
+typedef struct kzcat_job_counts {
+    uint64_t waiting; /**< for a worker */
+    uint64_t running;
+    uint64_t lost; /**< of those running: their workers have gone, and the next ones take them */
+    uint64_t done;
+    uint64_t failed;      /**< for good; see kzcat_jobs_retry() */
+    uint64_t done_lately; /**< within the last minute */
+    uint32_t reserved[8]; /**< 0 */
+} kzcat_job_counts;
+
+/** A job that has failed for good. Texts are the handle's own, and valid until the next call with
+    the handle. */
+typedef struct kzcat_failed_job {
+    int64_t job;
+    const char* uri;
+    const char* error;  /**< why the last attempt failed */
+    const char* worker; /**< who tried last */
+    uint32_t attempts;
+    uint32_t reserved[5]; /**< 0 */
+} kzcat_failed_job;
+
+/**
+ * Opens the jobs of a catalogue on a PostgreSQL server.
+ *
+ * @param url     Of the catalogue: postgresql://HOST/DATABASE.
+ * @param access  KZCAT_ACCESS_READ to look at jobs, KZCAT_ACCESS_WRITE to work on them, and
+ *                KZCAT_ACCESS_CREATE to make the catalogue when there is none.
+ * @param[out] out_jobs  Closed by the caller with kzcat_jobs_close(); null on failure.
+ * @return As kzcat_open() does.
+ */
+KZ_API kzcat_status kzcat_jobs_open(const char* url, uint32_t access,
+                                    kzcat_jobs** out_jobs) KZ_NOEXCEPT;
+
+/**
+ * Closes the handle and sets the caller's pointer to null. Another worker may then take a job that
+ * was taken and not ended.
+ *
+ * @return 0, also when *jobs_ref is null; KZCAT_ERROR_INVALID_ARGUMENT when @p jobs_ref is null.
+ */
+KZ_API kzcat_status kzcat_jobs_close(kzcat_jobs** jobs_ref) KZ_NOEXCEPT;
+
+/**
+ * Adds files to be worked on, all of them or none. A file that was added before is passed over.
+ *
+ * @param uris   @p count paths, as the workers are to find them; read only during the call.
+ * @param again  1: files that are done, or have failed, are to be worked on again; else 0.
+ * @param[out] out_added  How many files there are to do now because of this call; may be null.
+ * @return 0; KZCAT_ERROR_INVALID_ARGUMENT, KZCAT_ERROR_READ_ONLY, KZCAT_ERROR_BUSY,
+ *         KZCAT_ERROR_FULL, KZCAT_ERROR_MEMORY or KZCAT_ERROR_FAILED.
+ */
+KZ_API kzcat_status kzcat_jobs_add(kzcat_jobs* jobs, const char* const* uris, uint64_t count,
+                                   uint8_t again, uint64_t* out_added) KZ_NOEXCEPT;
+
+/**
+ * Takes the next job, in the order in which they were added; those that become free again come
+ * behind the others. Nobody else gets it until it is ended with this handle, or the handle's
+ * connection ends.
+ *
+ * @param worker    Who takes it, for people: "host:process".
+ * @param attempts  Jobs that were tried so often have failed for good; 1 .. 1000.
+ * @param[out] out_job    The job; cleared when there is none.
+ * @param[out] out_are_left  Whether there are jobs that are not ended, this one among them; may be
+ *                        null. 1 with KZCAT_ERROR_NOT_FOUND: other workers have them, and may lose
+ *                        them.
+ * @return 0; KZCAT_ERROR_NOT_FOUND when there is no job that can be taken now;
+ *         KZCAT_ERROR_INVALID_ARGUMENT, also when the handle's last job is not ended;
+ *         KZCAT_ERROR_READ_ONLY, KZCAT_ERROR_BUSY, KZCAT_ERROR_FULL, KZCAT_ERROR_MEMORY or
+ *         KZCAT_ERROR_FAILED.
+ */
+KZ_API kzcat_status kzcat_jobs_take(kzcat_jobs* jobs, const char* worker, uint32_t attempts,
+                                    kzcat_job* out_job, uint8_t* out_are_left) KZ_NOEXCEPT;
+
+/**
+ * Ends the job that was taken, because its file is a track now. A track that is passed is added to
+ * the catalogue of the same database, by the rules of kzcat_add(), and both are kept or neither is.
+ *
+ * @param track     To be added; null when nothing is.
+ * @param known     Without @p track: the id of the track that the file is one of already, in
+ *                  whatever catalogue; 0 for none. It is only noted.
+ * @param[out] out_added  What became of @p track; cleared without one. May be null.
+ * @return 0; as kzcat_add() does. After a failure nothing was kept, and the job is still to be ended
+ *         with kzcat_jobs_fail() or kzcat_jobs_give_back().
+ */
+KZ_API kzcat_status kzcat_jobs_finish(kzcat_jobs* jobs, const kzcat_new_track* track, int64_t known,
+                                      kzcat_added* out_added) KZ_NOEXCEPT;
+
+/**
+ * Ends the job that was taken, because it failed.
+ *
+ * @param reason    For people; UTF-8.
+ * @param attempts  The job waits for another attempt unless it was tried so often; 1 .. 1000.
+ * @param[out] out_for_good  1 when it has failed for good; may be null.
+ * @return 0; KZCAT_ERROR_INVALID_ARGUMENT, also when no job was taken; KZCAT_ERROR_BUSY,
+ *         KZCAT_ERROR_FULL, KZCAT_ERROR_MEMORY or KZCAT_ERROR_FAILED.
+ */
+KZ_API kzcat_status kzcat_jobs_fail(kzcat_jobs* jobs, const char* reason, uint32_t attempts,
+                                    uint8_t* out_for_good) KZ_NOEXCEPT;
+
+/**
+ * Lets others have the job that was taken, as if it had not been.
+ *
+ * @return As kzcat_jobs_fail() does.
+ */
+KZ_API kzcat_status kzcat_jobs_give_back(kzcat_jobs* jobs) KZ_NOEXCEPT;
+
+/**
+ * Counts the jobs. Takes a time that grows with their number: a second for some million.
+ *
+ * @return 0; KZCAT_ERROR_INVALID_ARGUMENT, KZCAT_ERROR_MEMORY or KZCAT_ERROR_FAILED.
+ */
+KZ_API kzcat_status kzcat_jobs_get_counts(kzcat_jobs* jobs,
+                                          kzcat_job_counts* out_counts) KZ_NOEXCEPT;
+
+/**
+ * Gives the job with the lowest id above @p after that has failed for good.
+ *
+ * @param[out] out_job  Cleared on failure.
+ * @return 0; KZCAT_ERROR_NOT_FOUND when there is none; KZCAT_ERROR_INVALID_ARGUMENT,
+ *         KZCAT_ERROR_MEMORY or KZCAT_ERROR_FAILED.
+ */
+KZ_API kzcat_status kzcat_jobs_get_next_failed(kzcat_jobs* jobs, int64_t after,
+                                               kzcat_failed_job* out_job) KZ_NOEXCEPT;
+
+/**
+ * Lets all jobs that have failed for good be tried as if they were new.
+ *
+ * @param[out] out_count  How many there were; may be null.
+ * @return 0; KZCAT_ERROR_INVALID_ARGUMENT, KZCAT_ERROR_READ_ONLY, KZCAT_ERROR_BUSY,
+ *         KZCAT_ERROR_MEMORY or KZCAT_ERROR_FAILED.
+ */
+KZ_API kzcat_status kzcat_jobs_retry(kzcat_jobs* jobs, uint64_t* out_count) KZ_NOEXCEPT;
+
 /* ---- Care ------------------------------------------------------------------------------------ */
 
 /**
