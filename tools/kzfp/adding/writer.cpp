@@ -18,6 +18,43 @@ constexpr auto kLongestWait = std::chrono::seconds(2);
 
 } // namespace
 
+NewTracks::NewTracks(std::span<Arrival* const> arrivals) : tags_(arrivals.size())
+{
+    for (size_t i = 0; i < arrivals.size(); ++i) {
+        for (const audio::Tag& tag : arrivals[i]->recording.tags) {
+            tags_[i].push_back({.name = tag.name.c_str(), .value = tag.value.c_str()});
+        }
+        tracks_.push_back({.trail = arrivals[i]->recording.trail.get(),
+                           .source = source_of(*arrivals[i]),
+                           .tags = tags_[i].data(),
+                           .tag_count = tags_[i].size()});
+    }
+}
+
+void note_added(Arrival& arrival, const kzcat_added& added)
+{
+    arrival.track = added.track;
+    arrival.outcome = added.is_new != 0 ? Outcome::added : Outcome::known;
+}
+
+bool move_source(kzcat_catalogue& catalogue, const Arrival& arrival)
+{
+    const kzcat_source source = source_of(arrival);
+    if (!was_found(kzcat_add_source(&catalogue, arrival.track, &source))) {
+        return false;
+    }
+    const auto track = found<Track>(kzcat_get_track, &catalogue, arrival.track);
+    const auto sources = track ? sources_of(track) : std::vector<kzcat_source>();
+    for (const kzcat_source& other : sources) {
+        const bool same_bytes = other.hash != nullptr &&
+                                std::equal(arrival.hash->begin(), arrival.hash->end(), other.hash);
+        if (other.uri != arrival.path && same_bytes && is_gone(other.uri)) {
+            was_found(kzcat_remove_source(&catalogue, other.uri));
+        }
+    }
+    return true;
+}
+
 Writer::Writer(kzcat_catalogue& catalogue, const Reader& reader, const OutputOptions& output,
                size_t files)
     : catalogue_(catalogue), reader_(reader), format_(output.format),
@@ -88,22 +125,11 @@ bool Writer::add_together(std::span<Arrival* const> arrivals)
 
 void Writer::add(std::span<Arrival* const> arrivals)
 {
-    std::vector<std::vector<kzcat_tag>> tags(arrivals.size());
-    std::vector<kzcat_new_track> tracks;
+    const NewTracks tracks(arrivals);
+    std::vector<kzcat_added> added(arrivals.size());
+    check(kzcat_add(&catalogue_, tracks.all().data(), added.size(), added.data()));
     for (size_t i = 0; i < arrivals.size(); ++i) {
-        for (const audio::Tag& tag : arrivals[i]->recording.tags) {
-            tags[i].push_back({.name = tag.name.c_str(), .value = tag.value.c_str()});
-        }
-        tracks.push_back({.trail = arrivals[i]->recording.trail.get(),
-                          .source = source_of(*arrivals[i]),
-                          .tags = tags[i].data(),
-                          .tag_count = tags[i].size()});
-    }
-    std::vector<kzcat_added> added(tracks.size());
-    check(kzcat_add(&catalogue_, tracks.data(), tracks.size(), added.data()));
-    for (size_t i = 0; i < arrivals.size(); ++i) {
-        arrivals[i]->track = added[i].track;
-        arrivals[i]->outcome = added[i].is_new != 0 ? Outcome::added : Outcome::known;
+        note_added(*arrivals[i], added[i]);
     }
 }
 
@@ -112,30 +138,10 @@ void Writer::add(std::span<Arrival* const> arrivals)
 void Writer::move_sources()
 {
     for (Arrival& arrival : waiting_) {
-        while (arrival.outcome == Outcome::moved && !move_source(arrival)) {
+        while (arrival.outcome == Outcome::moved && !move_source(catalogue_, arrival)) {
             arrival = reader_.read({.path = arrival.path, .trouble = {}});
         }
     }
-}
-
-/// The same bytes at another path; false when their track is gone. Where they were before is
-/// forgotten when it is certain that nothing is there any more.
-bool Writer::move_source(const Arrival& arrival)
-{
-    const kzcat_source source = source_of(arrival);
-    if (!was_found(kzcat_add_source(&catalogue_, arrival.track, &source))) {
-        return false;
-    }
-    const auto track = found<Track>(kzcat_get_track, &catalogue_, arrival.track);
-    const auto sources = track ? sources_of(track) : std::vector<kzcat_source>();
-    for (const kzcat_source& other : sources) {
-        const bool same_bytes = other.hash != nullptr &&
-                                std::equal(arrival.hash->begin(), arrival.hash->end(), other.hash);
-        if (other.uri != arrival.path && same_bytes && is_gone(other.uri)) {
-            was_found(kzcat_remove_source(&catalogue_, other.uri));
-        }
-    }
-    return true;
 }
 
 void Writer::report(const Arrival& arrival)

@@ -15,6 +15,25 @@
 
 namespace kzfp {
 
+/// Arrivals as the library takes them; valid as long as these are.
+class NewTracks {
+public:
+    explicit NewTracks(std::span<Arrival* const> arrivals);
+
+    const std::vector<kzcat_new_track>& all() const { return tracks_; }
+
+private:
+    std::vector<std::vector<kzcat_tag>> tags_;
+    std::vector<kzcat_new_track> tracks_;
+};
+
+/// Notes what became of an arrival that was added.
+void note_added(Arrival& arrival, const kzcat_added& added);
+
+/// Gives the track of an arrival that was moved its new path; false when the track has gone since.
+/// Where the bytes were before is forgotten when it is certain that nothing is there any more.
+bool move_source(kzcat_catalogue& catalogue, const Arrival& arrival);
+
 class Writer {
 public:
     /// `files` are expected. What is passed outlives the object.
@@ -38,7 +57,6 @@ private:
     bool add_together(std::span<Arrival* const> arrivals);
     void add(std::span<Arrival* const> arrivals);
     void move_sources();
-    bool move_source(const Arrival& arrival);
     void report(const Arrival& arrival);
 
     kzcat_catalogue& catalogue_;

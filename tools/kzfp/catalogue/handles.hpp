@@ -65,6 +65,7 @@ using Track = std::unique_ptr<kzcat_track, FreeHandle<kzcat_track_free>>;
 using Query = std::unique_ptr<kzcat_query, FreeHandle<kzcat_query_free>>;
 using Result = std::unique_ptr<kzcat_result, FreeHandle<kzcat_result_free>>;
 using Monitor = std::unique_ptr<kzcat_monitor, FreeHandle<kzcat_monitor_free>>;
+using Jobs = std::unique_ptr<kzcat_jobs, FreeHandle<kzcat_jobs_close>>;
 
 /// Makes a handle by a call whose last argument is the place for it: made<Trail>(read, a, b).
 template <class Owner, class Make, class... Arguments>

@@ -26,6 +26,8 @@ ExitStatus run_verify(const Arguments& arguments);
 ExitStatus run_merge(const Arguments& arguments);
 ExitStatus run_export(const Arguments& arguments);
 ExitStatus run_import(const Arguments& arguments);
+ExitStatus run_jobs(const Arguments& arguments);
+ExitStatus run_worker(const Arguments& arguments);
 ExitStatus run_disc(const Arguments& arguments);
 ExitStatus run_completions(const Arguments& arguments);
 ExitStatus run_help(const Arguments& arguments);
@@ -49,6 +51,8 @@ constexpr Command kCommands[] = {
     {"export", "Writes the tracks of a catalogue as text, for a backup", run_export,
      Purpose::catalogues},
     {"import", "Adds the tracks of exported catalogues to one", run_import, Purpose::catalogues},
+    {"jobs", "Manages the files that workers are to fingerprint", run_jobs, Purpose::catalogues},
+    {"worker", "Fingerprints files that a server has jobs for", run_worker, Purpose::catalogues},
     {"disc", "Reports what is on a Blu-ray disc or a DVD", run_disc, Purpose::program},
     {"completions", "Prints what a shell needs to complete command lines", run_completions,
      Purpose::program},
