@@ -71,7 +71,7 @@ man_pages() {
 
 # It takes functions that are called by name for unreachable.
 shell_scripts() {
-    shellcheck --external-sources --exclude=SC2317 run .ci/run scripts/*.sh packaging/*.sh fuzz/*.sh evaluation/*.sh
+    shellcheck --external-sources --exclude=SC2317 run .ci/run scripts/*.sh packaging/*.sh fuzz/*.sh evaluation/*.sh contrib/slurm/*.sbatch
 }
 
 python_scripts() {
