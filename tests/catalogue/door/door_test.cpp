@@ -365,6 +365,9 @@ TEST(DoorCatalogue, SettingsHaveToBeInRange)
     settings.index_file = 2;
     EXPECT_EQ(KZCAT_ERROR_INVALID_ARGUMENT, status());
     kzcat_initialize_settings(&settings);
+    settings.partial = 2;
+    EXPECT_EQ(KZCAT_ERROR_INVALID_ARGUMENT, status());
+    kzcat_initialize_settings(&settings);
     settings.reserved[10] = 1;
     EXPECT_EQ(KZCAT_ERROR_INVALID_ARGUMENT, status());
 }

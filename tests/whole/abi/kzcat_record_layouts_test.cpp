@@ -61,6 +61,7 @@ TEST(CatalogueRecordLayout, OfSettings)
         FIELD(Record, index_file),
         FIELD(Record, fall_back),
         FIELD(Record, index_from),
+        FIELD(Record, partial),
         FIELD(Record, reserved),
     });
     EXPECT_EQ(64U, sizeof(Record));
@@ -236,6 +237,8 @@ TEST(CatalogueRecordLayout, OfSummaries)
         FIELD(Record, runner_up),
         FIELD(Record, clip_seconds),
         FIELD(Record, left_out),
+        FIELD(Record, shards),
+        FIELD(Record, shards_answered),
         FIELD(Record, reserved),
     });
     EXPECT_EQ(64U, sizeof(Record));
