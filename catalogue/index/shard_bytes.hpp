@@ -6,9 +6,9 @@
 #include <cstddef>
 #include <cstdint>
 #include <span>
-#include <stdexcept>
 #include <vector>
 
+#include "catalogue/index/byte_streams.hpp"
 #include "catalogue/index/probes.hpp"
 #include "catalogue/index/ranking.hpp"
 #include "catalogue/match/scan_passes.hpp"
@@ -16,11 +16,6 @@
 namespace kzcat {
 
 using ShardBytes = std::vector<std::byte>;
-
-/// Bytes that are not what they should be.
-struct ShardBytesError : std::runtime_error {
-    using std::runtime_error::runtime_error;
-};
 
 /// A list of postings: 65536 * part + value.
 constexpr int32_t list_number(uint32_t part, uint32_t value)

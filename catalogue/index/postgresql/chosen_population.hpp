@@ -3,6 +3,7 @@
 #pragma once
 
 #include "catalogue/index/postgresql/lookups.hpp"
+#include "catalogue/match/population.hpp"
 
 namespace kzcat::postgresql {
 

@@ -42,49 +42,11 @@ std::string listed(const std::vector<int64_t>& numbers)
 
 } // namespace
 
-const char* const kSearchSession = "SET enable_partitionwise_aggregate = on; "
-                                   "SET plan_cache_mode = force_generic_plan; SET jit = off";
-
 const char* const kCountStatement = "SELECT shard, kzcat.kz_count(segment, list, words, $2) "
                                     "FROM kzcat.posting WHERE list = ANY ($1) GROUP BY shard";
 
 const char* const kRankStatement = "SELECT shard, kzcat.kz_rank(track, codes, $2) "
                                    "FROM kzcat.trail WHERE track = ANY ($1) GROUP BY shard";
-
-std::unique_ptr<Connection> Sessions::take()
-{
-    {
-        const std::scoped_lock lock(mutex_);
-        if (!free_.empty()) {
-            auto session = std::move(free_.back());
-            free_.pop_back();
-            return session;
-        }
-    }
-    auto session = std::make_unique<Connection>(address_);
-    session->execute(kSearchSession);
-    return session;
-}
-
-void Sessions::give_back(std::unique_ptr<Connection> session)
-{
-    const std::scoped_lock lock(mutex_);
-    free_.push_back(std::move(session));
-}
-
-void SummedLengths::add(uint32_t part, Bytes starts)
-{
-    if (starts.size() != 4 * (size_t{kPartValues} + 1)) {
-        throw ShardBytesError("the starts of lists have another size than they must have");
-    }
-    for (uint32_t value = 0; value < kPartValues; ++value) {
-        const auto begin = get_little_endian<uint32_t>(starts.data() + size_t{4} * value);
-        const auto end = get_little_endian<uint32_t>(starts.data() + size_t{4} * value + 4);
-        const uint64_t length = end > begin ? end - begin : 0;
-        lengths_[size_t{part} * kPartValues + value] += length;
-        total_ += length;
-    }
-}
 
 Lookups::Lookups(std::string address, bool partial)
     : sessions_(std::move(address)), partial_(partial)
@@ -149,6 +111,8 @@ void Lookups::look_for_servers(const StoreError& error)
     if (error.kind() != StoreError::Kind::failed || shards_.empty()) {
         throw error;
     }
+    // When the coordinator itself is gone, this says so.
+    sessions_.with([](Connection& session) { return session.query_once("SELECT 1"); });
     std::vector<int64_t> missing;
     std::string why;
     for (const int64_t shard : shards_) {
@@ -206,6 +170,24 @@ std::vector<RankedPlace> Lookups::scan_tail(const ShardBytes& query)
     return places("kz_scan", "tail", query);
 }
 
+/// Those that the catalogue has: a shard may have codes of tracks that are just being added, or were
+/// just removed.
+std::vector<int64_t> Lookups::known(const std::vector<int64_t>& tracks)
+{
+    if (shards_.empty()) {
+        return tracks;
+    }
+    return sessions_.with([&](Connection& session) {
+        const Rows rows = session.query("SELECT id FROM kzcat.track WHERE id = ANY ($1)",
+                                        std::span<const int64_t>(tracks));
+        std::vector<int64_t> known;
+        for (int row = 0; row < rows.count(); ++row) {
+            known.push_back(rows.integer(row, 0));
+        }
+        return known;
+    });
+}
+
 /// A statement of look-ups, which a server compiles once, or another for the servers that are left.
 Rows Lookups::ask(const char* statement, std::span<const int64_t> numbers, Bytes query)
 {
@@ -235,10 +217,11 @@ std::vector<RankedPlace> Lookups::rank(const std::vector<int64_t>& tracks, const
 void Lookups::fetch_codes(const std::vector<int64_t>& tracks,
                           const std::function<void(int64_t, std::vector<Code>)>& take)
 {
+    const std::vector<int64_t> wanted = known(tracks);
     const Rows rows = ask([&](Connection& session, const std::string& where) {
         return session.query_once(
             "SELECT track, codes FROM kzcat.trail WHERE track = ANY ($1) AND" + where,
-            std::span<const int64_t>(tracks));
+            std::span<const int64_t>(wanted));
     });
     for (int row = 0; row < rows.count(); ++row) {
         std::vector<Code> codes;

@@ -4,70 +4,21 @@
 #pragma once
 
 #include <functional>
-#include <memory>
 #include <mutex>
 #include <optional>
 #include <string>
-#include <utility>
 #include <vector>
 
 #include "catalogue/index/index.hpp"
+#include "catalogue/index/postgresql/sessions.hpp"
 #include "catalogue/index/shard_bytes.hpp"
-#include "catalogue/match/population.hpp"
-#include "catalogue/store/postgresql/connection.hpp"
 
 namespace kzcat::postgresql {
-
-/// What a session begins with: without the first, whole tables would travel to a coordinator; with
-/// the second, statements with thousands of values are not planned anew each time.
-extern const char* const kSearchSession;
 
 /// Grouping by the shard is what lets a coordinator have each server do its share: the tables are
 /// partitioned by it.
 extern const char* const kCountStatement; ///< of the lists $1, by the query $2
 extern const char* const kRankStatement;  ///< of the tracks $1, by the query $2
-
-/// Sessions with one server: as many as have ever been in use at once.
-class Sessions {
-public:
-    explicit Sessions(std::string address) : address_(std::move(address)) {}
-
-    /// Gives `use` a session to which it has sole access.
-    template <class Use>
-    auto with(Use use)
-    {
-        auto session = take();
-        auto result = use(*session);
-        give_back(std::move(session)); // one that has failed is closed instead
-        return result;
-    }
-
-private:
-    std::unique_ptr<Connection> take();
-    void give_back(std::unique_ptr<Connection> session);
-
-    std::string address_;
-    std::mutex mutex_;
-    std::vector<std::unique_ptr<Connection>> free_;
-};
-
-/// The lengths of all lists, of all segments and servers together.
-class SummedLengths final : public ListLengths {
-public:
-    SummedLengths() : lengths_(size_t{kParts} * kPartValues) {}
-    uint64_t words(uint32_t part, uint32_t value) const override
-    {
-        return lengths_[size_t{part} * kPartValues + value];
-    }
-    uint64_t total() const { return total_; }
-
-    /// The starts of a part's lists in one segment.
-    void add(uint32_t part, Bytes starts);
-
-private:
-    std::vector<uint64_t> lengths_;
-    uint64_t total_ = 0;
-};
 
 /// Several threads may look up at once.
 class Lookups {
@@ -102,6 +53,7 @@ private:
     using Ask = std::function<Rows(Connection&, const std::string& where)>;
     Rows ask(const Ask& ask);
     Rows ask(const char* statement, std::span<const int64_t> numbers, Bytes query);
+    std::vector<int64_t> known(const std::vector<int64_t>& tracks);
     std::string where() const;
     std::optional<std::string> refusal_of(int64_t shard);
     void look_for_servers(const StoreError& error);
