@@ -69,6 +69,8 @@ Answer look_up(kzcat_catalogue& catalogue, const kzcat_query& query, const std::
             .runner_up = summary.runner_up,
             .seconds = summary.clip_seconds,
             .left_out = summary.left_out,
+            .shards = summary.shards,
+            .shards_answered = summary.shards_answered,
             .line = 0};
 }
 

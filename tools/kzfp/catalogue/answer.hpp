@@ -39,7 +39,9 @@ struct Answer {
     double runner_up = 0;
     double seconds = 0;    ///< of the clip; 0 when that is not known
     uint32_t left_out = 0; ///< tracks that are damaged and were not looked through
-    size_t line = 0;       ///< of the file, which holds a clip on each line; otherwise 0
+    uint32_t shards = 1;   ///< servers that have tracks
+    uint32_t shards_answered = 1;
+    size_t line = 0; ///< of the file, which holds a clip on each line; otherwise 0
 };
 
 /// How clips are looked up and which of it is shown.

@@ -135,6 +135,9 @@ std::string to_json(const Answer& answer, const Lookup& lookup)
     if (answer.left_out != 0) {
         object["left_out"] = answer.left_out;
     }
+    if (answer.shards > 1) {
+        object["shards"] = {{"answered", answer.shards_answered}, {"of", answer.shards}};
+    }
     return to_line(object);
 }
 

@@ -32,7 +32,7 @@ constexpr const char* kDescription =
 
 constexpr const char* kFooter =
     "Exit: 0 every file was looked up, whatever came of it; 1 a file could not be, or tracks of\n"
-    "the catalogue are damaged and were left out; 2 wrong usage; 130 interrupted.";
+    "the catalogue are damaged or out of reach and were left out; 2 wrong usage; 130 interrupted.";
 
 constexpr FormatChoice kFormats[] = {kHumanFormat, kJsonFormat, kCsvFormat};
 
@@ -51,6 +51,7 @@ struct MatchSettings {
     Lookup lookup;
     bool no_speeds = false;
     uint32_t plan = KZCAT_PLAN_MEASURED;
+    bool partial = false;
     size_t jobs = 1;
     std::string report;
 };
@@ -69,6 +70,10 @@ void add_lookup_options(Parser& parser, MatchSettings& settings)
                     "Look for the clip only at its own speed, tempo and pitch");
     add_choice(parser, "--input", "KIND", "a kind of input", kClipKinds, settings.kind);
     add_choice(parser, "--plan", "PLAN", "a plan", kPlans, settings.plan);
+    parser.add_flag(
+        "--partial", settings.partial,
+        "Of a catalogue on several servers: answer from those that can be reached, and\n"
+        "say how many these are");
 }
 
 void add_options(Parser& parser, MatchSettings& settings)
@@ -111,6 +116,7 @@ Catalogue open(const MatchSettings& settings)
     kzcat_settings wanted;
     check(kzcat_initialize_settings(&wanted));
     wanted.plan = settings.plan;
+    wanted.partial = settings.partial ? 1 : 0;
     return made<Catalogue>(kzcat_open, settings.catalogue.c_str(), uint32_t{KZCAT_ACCESS_READ},
                            static_cast<const kzcat_settings*>(&wanted));
 }
@@ -155,6 +161,14 @@ private:
                 write_message(std::string(name).append(": ").append(complaint));
             }
         }
+        if (answer.shards_answered < answer.shards && !is_partial_) {
+            is_partial_ = true;
+            status_ = some_file_failed;
+            write_message(settings_.catalogue + ": only " + std::to_string(answer.shards_answered) +
+                          " of " + std::to_string(answer.shards) +
+                          " servers answered, and tracks of the others were not looked through; "
+                          "start these and look up again");
+        }
         if (answer.left_out > 0 && !complained_) {
             complained_ = true;
             status_ = some_file_failed;
@@ -182,6 +196,7 @@ private:
     Progress progress_;
     size_t done_ = 0;
     bool complained_ = false;
+    bool is_partial_ = false;
     ExitStatus status_ = all_done;
 };
 
