@@ -278,4 +278,43 @@ TEST(CatalogueRecordLayout, OfMergeCounts)
     EXPECT_EQ(32U, sizeof(Record));
 }
 
+TEST(CatalogueRecordLayout, OfJobs)
+{
+    using Record = kzcat_job;
+    expect_layout<Record>({
+        FIELD(Record, job),
+        FIELD(Record, uri),
+        FIELD(Record, attempt),
+        FIELD(Record, reserved),
+    });
+}
+
+TEST(CatalogueRecordLayout, OfJobCounts)
+{
+    using Record = kzcat_job_counts;
+    expect_layout<Record>({
+        FIELD(Record, waiting),
+        FIELD(Record, running),
+        FIELD(Record, lost),
+        FIELD(Record, done),
+        FIELD(Record, failed),
+        FIELD(Record, done_lately),
+        FIELD(Record, reserved),
+    });
+    EXPECT_EQ(80U, sizeof(Record));
+}
+
+TEST(CatalogueRecordLayout, OfFailedJobs)
+{
+    using Record = kzcat_failed_job;
+    expect_layout<Record>({
+        FIELD(Record, job),
+        FIELD(Record, uri),
+        FIELD(Record, error),
+        FIELD(Record, worker),
+        FIELD(Record, attempts),
+        FIELD(Record, reserved),
+    });
+}
+
 } // namespace
