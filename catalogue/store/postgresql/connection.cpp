@@ -9,6 +9,8 @@
 #include <new>
 #include <utility>
 
+#include <poll.h>
+
 #include "catalogue/store/postgresql/failures.hpp"
 #include "catalogue/store/postgresql/place.hpp"
 
@@ -51,6 +53,16 @@ uint64_t number_from(const char* bytes, int count)
         number = (number << 8U) | static_cast<unsigned char>(bytes[i]);
     }
     return number;
+}
+
+/// Sees what a server has sent that ended the session: first why, then the end.
+void look_for_end(PGconn* connection)
+{
+    pollfd socket = {.fd = PQsocket(connection), .events = POLLIN, .revents = 0};
+    for (int i = 0; i < 2 && socket.fd >= 0 && ::poll(&socket, 1, 0) > 0; ++i) {
+        PQconsumeInput(connection);
+        socket.fd = PQsocket(connection);
+    }
 }
 
 } // namespace
@@ -108,13 +120,20 @@ Connection::Connection(std::string address, ConnectionOptions options)
     connect();
 }
 
-// What stands before the address is overridden by it, and what stands after it overrides it.
+// What stands before the address is overridden by it, and what stands after it overrides it. Of
+// several hosts the first that may be written serves a writer.
 void Connection::connect()
 {
-    constexpr std::array<const char*, 6> kNames = {
-        "connect_timeout", "fallback_application_name", "user", "password", "dbname", nullptr};
-    const std::array<const char*, 6> values = {
-        "10", "kzcat", options_.user.c_str(), options_.password.c_str(), address_.c_str(), nullptr};
+    constexpr std::array<const char*, 7> kNames = {
+        "connect_timeout", "fallback_application_name", "user", "password",
+        "dbname",          "target_session_attrs",      nullptr};
+    const std::array<const char*, 7> values = {"10",
+                                               "kzcat",
+                                               options_.user.c_str(),
+                                               options_.password.c_str(),
+                                               address_.c_str(),
+                                               options_.read_only ? "" : "read-write",
+                                               nullptr};
     compiled_.clear();
     connection_.reset(PQconnectdbParams(kNames.data(), values.data(), 1));
     if (connection_ == nullptr) {
@@ -139,11 +158,10 @@ void Connection::configure()
     checked(PQexec(handle(), session.c_str()));
 }
 
-// A server that has ended the session has sent that: it is seen before a statement goes there.
 void Connection::ensure_connected()
 {
     if (!in_transaction()) {
-        PQconsumeInput(handle());
+        look_for_end(handle());
         if (PQstatus(handle()) != CONNECTION_OK) {
             connect();
         }
@@ -154,7 +172,7 @@ Rows Connection::checked(PGresult* result)
 {
     Rows rows(result);
     const ExecStatusType status = PQresultStatus(result);
-    if (status == PGRES_TUPLES_OK || status == PGRES_COMMAND_OK) {
+    if (status == PGRES_TUPLES_OK || status == PGRES_COMMAND_OK || status == PGRES_EMPTY_QUERY) {
         return rows;
     }
     const char* state = result == nullptr ? nullptr : PQresultErrorField(result, PG_DIAG_SQLSTATE);

@@ -59,9 +59,11 @@ constexpr Refusal kRefusals[] = {
      "the server is a standby, which may only be read; name the one that may be written", true},
 };
 
-/// libpq's texts have several lines, and end with one.
+/// libpq's texts have several lines, and end with one; their guesses are left out.
 std::string in_one_line(std::string_view text)
 {
+    text = text.substr(0, text.find("\n\tIs the server running"));
+    text = text.substr(0, text.find("\n\tThis probably means"));
     std::string line;
     for (const char character : text) {
         if (character == '\n' || character == '\t') {

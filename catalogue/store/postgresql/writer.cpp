@@ -11,6 +11,7 @@
 #include "catalogue/store/postgresql/writer.hpp"
 
 #include <algorithm>
+#include <deque>
 
 #include "catalogue/model/crc32c.hpp"
 #include "catalogue/store/hash.hpp"
@@ -34,13 +35,49 @@ Bytes stored(std::span<const Number> numbers, std::vector<std::byte>& room)
     }
 }
 
-void write_trail(Connection& connection, int64_t shard, int64_t track, const Trail& trail)
-{
-    std::vector<std::byte> room;
-    const Bytes bytes = stored(std::span(trail.codes), room);
-    connection.query("INSERT INTO trail (shard, track, crc, codes) VALUES ($1::bigint, $2, $3, $4)",
-                     shard, track, int64_t{crc32c(bytes)}, bytes);
-}
+/// Trails on their way to one shard, which receives them in one statement.
+class Trails {
+public:
+    Trails(Connection& connection, int64_t shard) : connection_(connection), shard_(shard) {}
+
+    void add(int64_t track, const Trail& trail)
+    {
+        const Bytes bytes = stored(std::span(trail.codes), rooms_.emplace_back());
+        tracks_.push_back(track);
+        sums_.push_back(int64_t{crc32c(bytes)});
+        codes_.push_back(bytes);
+        waiting_ += bytes.size();
+        if (waiting_ >= kMostWaiting) {
+            write();
+        }
+    }
+
+    void write()
+    {
+        if (!tracks_.empty()) {
+            connection_.query("INSERT INTO trail (shard, track, crc, codes) SELECT $1::bigint, * "
+                              "FROM unnest($2::bigint[], $3::bigint[], $4::bytea[])",
+                              shard_, std::span<const int64_t>(tracks_),
+                              std::span<const int64_t>(sums_), std::span<const Bytes>(codes_));
+        }
+        tracks_.clear();
+        sums_.clear();
+        codes_.clear();
+        rooms_.clear();
+        waiting_ = 0;
+    }
+
+private:
+    static constexpr size_t kMostWaiting = size_t{1} << 24; ///< bytes
+
+    Connection& connection_;
+    int64_t shard_;
+    std::vector<int64_t> tracks_;
+    std::vector<int64_t> sums_;
+    std::vector<Bytes> codes_;
+    std::deque<std::vector<std::byte>> rooms_;
+    size_t waiting_ = 0;
+};
 
 /// Those that an interrupted writer has left are replaced.
 void write_bands(Connection& connection, int64_t track, const DocumentBands& bands)
@@ -108,7 +145,7 @@ Added Writer::add(const NewTrack& track)
     Added added{.track = id, .is_new = !known, .has_source = true};
     const int64_t owner = track.source.uri.empty() ? 0 : owner_of(track.source.uri);
     if (!track.yields || owner == 0) {
-        give(id, track.source);
+        give(id, track.source, owner);
     } else {
         added.has_source = owner == id;
     }
@@ -186,10 +223,14 @@ int64_t Writer::owner_of(std::string_view uri)
 
 void Writer::give(int64_t track, const Source& source)
 {
+    give(track, source, owner_of(source.uri));
+}
+
+void Writer::give(int64_t track, const Source& source, int64_t owner)
+{
     if (source.uri.empty()) {
         return;
     }
-    const int64_t owner = owner_of(source.uri);
     if (owner == track) {
         update_source(track, source);
         return;
@@ -274,14 +315,16 @@ void Writer::write_codes()
         Connection& connection = shards_.at(shard);
         Transaction transaction(connection, Transaction::Kind::write);
         connection.query(kTakeTurn);
+        Trails trails(connection, shard);
         for (const Codes& codes : all) {
             if (codes.trail != nullptr) {
-                write_trail(connection, shard, codes.track, *codes.trail);
+                trails.add(codes.track, *codes.trail);
             }
             if (!codes.bands->empty()) {
                 write_bands(connection, codes.track, *codes.bands);
             }
         }
+        trails.write();
         transaction.commit(); // for shard 0 a part of the caller's, which commits it
     }
     retract();

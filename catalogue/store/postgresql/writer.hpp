@@ -52,6 +52,7 @@ private:
     int64_t insert(const NewTrack& track, const ContentKey& key);
     void enrich(const TrackRow& known, const NewTrack& track);
     void insert_tags(int64_t track, std::span<const Tag> tags);
+    void give(int64_t track, const Source& source, int64_t owner);
     void insert_source(int64_t track, const Source& source);
     void update_source(int64_t track, const Source& source);
     int64_t owner_of(std::string_view uri);

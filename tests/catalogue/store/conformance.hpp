@@ -23,6 +23,13 @@ namespace {
 template <class Place>
 class EveryStore : public ::testing::Test {
 protected:
+    void SetUp() override
+    {
+        if (place_.store == nullptr) {
+            GTEST_SKIP() << "no server can be started here";
+        }
+    }
+
     Store& store() { return *place_.store; }
 
     TrackInfo info(int64_t track) { return store().find_track(track).value(); }

@@ -1,7 +1,9 @@
 // Databases for tests of stores on PostgreSQL: one server a test program, whose databases are used
-// again by the next test.
+// again by later tests, if the catalogues in them were not spoilt.
 #pragma once
 
+#include <algorithm>
+#include <map>
 #include <memory>
 #include <string>
 #include <vector>
@@ -23,15 +25,21 @@ class Databases {
 public:
     explicit Databases(size_t count)
     {
-        while (urls_.size() < count) {
-            urls_.push_back(take());
-            postgresql::Connection(urls_.back()).execute("DROP SCHEMA IF EXISTS kzcat CASCADE");
-        }
-        if (count > 1) {
-            name_shards();
+        auto& left = used()[count];
+        if (left.empty()) {
+            while (urls_.size() < count) {
+                urls_.push_back(server().new_database());
+            }
+            if (count > 1) {
+                name_shards();
+            }
+        } else {
+            urls_ = left.back();
+            left.pop_back();
+            std::ranges::for_each(urls_, empty);
         }
     }
-    ~Databases() { free().insert(free().end(), urls_.begin(), urls_.end()); }
+    ~Databases() { used()[urls_.size()].push_back(urls_); }
     Databases(const Databases&) = delete;
     Databases& operator=(const Databases&) = delete;
 
@@ -39,20 +47,30 @@ public:
     const std::string& shard(size_t number) const { return urls_.at(number); }
 
 private:
-    static std::vector<std::string>& free()
+    /// Sets of databases that no test uses now, by their number.
+    static std::map<size_t, std::vector<std::vector<std::string>>>& used()
     {
-        static std::vector<std::string> urls;
-        return urls;
+        static std::map<size_t, std::vector<std::vector<std::string>>> sets;
+        return sets;
     }
 
-    static std::string take()
+    /// Leaves the tables, which take long to make, and what the catalogue is.
+    static void empty(const std::string& url)
     {
-        if (free().empty()) {
-            return server().new_database();
-        }
-        std::string url = free().back();
-        free().pop_back();
-        return url;
+        postgresql::Connection(url).execute(R"(
+            SET session_replication_role = replica;
+            DO $$
+            DECLARE
+                name text;
+            BEGIN
+                FOR name IN SELECT tablename FROM pg_tables WHERE schemaname = 'kzcat'
+                    AND tablename NOT IN ('catalogue', 'node', 'shard') LOOP
+                    EXECUTE format('DELETE FROM kzcat.%I', name);
+                END LOOP;
+                FOR name IN SELECT sequencename FROM pg_sequences WHERE schemaname = 'kzcat' LOOP
+                    EXECUTE format('ALTER SEQUENCE kzcat.%I RESTART', name);
+                END LOOP;
+            END $$)");
     }
 
     void name_shards() const
