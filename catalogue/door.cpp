@@ -160,6 +160,25 @@ kzcat_status kzcat_open(const char* path, uint32_t access, const kzcat_settings*
     });
 }
 
+uint8_t kzcat_is_server_address(const char* path) noexcept
+{
+    return path != nullptr && is_server_address(path) ? 1 : 0;
+}
+
+kzcat_status kzcat_show_path(const char* path, char* text, uint64_t capacity,
+                             uint64_t* out_size) noexcept
+{
+    return guarded([=] {
+        require(out_size != nullptr, "the place for the size is null; pass one");
+        *out_size = 0;
+        require(path != nullptr, "the path is null; pass one");
+        require(text != nullptr || capacity == 0,
+                "the text is null; pass room, or a capacity of 0 to learn the size");
+        const std::string shown = shown_place(path);
+        copy_out(std::span(shown.c_str(), shown.size() + 1), text, capacity, out_size);
+    });
+}
+
 kzcat_status kzcat_close(kzcat_catalogue** catalogue_ref) noexcept
 {
     return free_handle(catalogue_ref);

@@ -13,6 +13,7 @@
 #include <unistd.h>
 
 #include "audio/decoder_messages.hpp"
+#include "kzfp/catalogue/addresses.hpp"
 #include "kzfp/commands/table.hpp"
 #include "kzfp/output/write.hpp"
 
@@ -69,6 +70,7 @@ int main(int argc, char** argv)
     std::signal(SIGXFSZ, SIG_IGN); // so does a limit on the size of files
     audio::silence_decoders();
     try {
+        hide_passwords(argc, argv);
         return run_command(argc, argv);
     } catch (const OutputError& error) {
         if (!error.reader_left) { // a closed pipe needs no message: its reader has seen enough

@@ -8,6 +8,7 @@
 #include <string>
 
 #include "kzcat.h"
+#include "kzfp/catalogue/addresses.hpp"
 
 namespace kzfp {
 
@@ -85,10 +86,17 @@ Owner found(Find find, Arguments... arguments)
     return Owner(handle);
 }
 
-inline Catalogue open_catalogue(const std::string& path, uint32_t access)
+/// `path` is as the command line has it. `settings` are null for what is usual.
+inline Catalogue open_catalogue(const std::string& path, uint32_t access,
+                                const kzcat_settings* settings = nullptr)
 {
-    return made<Catalogue>(kzcat_open, path.c_str(), access,
-                           static_cast<const kzcat_settings*>(nullptr));
+    return made<Catalogue>(kzcat_open, address_of(path).c_str(), access, settings);
+}
+
+/// Opens the jobs at an address as the command line has it.
+inline Jobs open_jobs(const std::string& address, uint32_t access)
+{
+    return made<Jobs>(kzcat_jobs_open, address_of(address).c_str(), access);
 }
 
 } // namespace kzfp

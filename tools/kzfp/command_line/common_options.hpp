@@ -14,7 +14,7 @@ namespace kzfp {
 /// The catalogue that a command is about. `path` outlives the parsing.
 inline void add_catalogue_option(Parser& parser, std::string& path)
 {
-    parser.add_option("CATALOGUE", path, "The catalogue's file, such as music.kzc")
+    parser.add_option("CATALOGUE", path, "The catalogue: a file such as music.kzc, or a database,\npostgresql://USER@HOST/DATABASE")
         ->required()
         ->type_name("");
 }

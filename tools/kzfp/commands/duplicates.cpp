@@ -63,10 +63,11 @@ void add_options(Parser& parser, DuplicatesSettings& settings)
     });
 }
 
-/// Whether a path is that of a catalogue, which SQLite keeps.
+/// Whether a path is that of a catalogue: a file that SQLite keeps, or on a server.
 bool is_catalogue(const std::string& path)
 {
-    return beginning_of(path, 16).starts_with("SQLite format 3");
+    return kzcat_is_server_address(path.c_str()) == 1 ||
+           beginning_of(path, 16).starts_with("SQLite format 3");
 }
 
 /// Where relative paths of the script begin.

@@ -32,10 +32,7 @@ struct JobsSettings {
     bool failed = false;
 };
 
-Jobs open(const JobsSettings& settings, uint32_t access)
-{
-    return made<Jobs>(kzcat_jobs_open, settings.url.c_str(), access);
-}
+Jobs open(const JobsSettings& settings, uint32_t access) { return open_jobs(settings.url, access); }
 
 void write_count(const JobsSettings& settings, const char* member, uint64_t count,
                  const std::string& text)

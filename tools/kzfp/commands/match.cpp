@@ -117,8 +117,7 @@ Catalogue open(const MatchSettings& settings)
     check(kzcat_initialize_settings(&wanted));
     wanted.plan = settings.plan;
     wanted.partial = settings.partial ? 1 : 0;
-    return made<Catalogue>(kzcat_open, settings.catalogue.c_str(), uint32_t{KZCAT_ACCESS_READ},
-                           static_cast<const kzcat_settings*>(&wanted));
+    return open_catalogue(settings.catalogue, KZCAT_ACCESS_READ, &wanted);
 }
 
 /// Writes the answers in turn, and what is wrong with them as messages.

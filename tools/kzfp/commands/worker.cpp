@@ -59,8 +59,7 @@ void run_workers(const WorkerSettings& settings, kzcat_catalogue& catalogue, Des
 ExitStatus work(const WorkerSettings& settings)
 {
     // Whatever is wrong with the addresses is reported at once.
-    const Jobs jobs =
-        made<Jobs>(kzcat_jobs_open, settings.jobs.c_str(), uint32_t{KZCAT_ACCESS_WRITE});
+    const Jobs jobs = open_jobs(settings.jobs, KZCAT_ACCESS_WRITE);
     const Catalogue catalogue = open_catalogue(settings.catalogue, KZCAT_ACCESS_CREATE);
     const kzcat_job_counts counts = counts_of(*jobs);
     Desk desk(settings.output, static_cast<size_t>(counts.waiting + counts.running));

@@ -38,8 +38,7 @@ Catalogue open_with(const std::string& path, const Opening& opening)
     settings.plan = opening.plan;
     settings.fall_back = opening.fall_back ? 1 : 0;
     settings.index_from = opening.index_from;
-    return made<Catalogue>(kzcat_open, path.c_str(), uint32_t{KZCAT_ACCESS_READ},
-                           static_cast<const kzcat_settings*>(&settings));
+    return open_catalogue(path, KZCAT_ACCESS_READ, &settings);
 }
 
 uint32_t usual_plan(Plan plan)

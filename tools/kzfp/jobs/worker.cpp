@@ -73,7 +73,7 @@ void Worker::run()
 bool Worker::take_turn()
 {
     if (!jobs_) {
-        jobs_ = made<Jobs>(kzcat_jobs_open, settings_.jobs.c_str(), uint32_t{KZCAT_ACCESS_WRITE});
+        jobs_ = open_jobs(settings_.jobs, KZCAT_ACCESS_WRITE);
     }
     kzcat_job job;
     uint8_t are_left = 0;
