@@ -19,6 +19,9 @@ foreach(header IN LISTS public_headers ITEMS "${PROJECT_SOURCE_DIR}/kzsdk/kzsdk.
   install(FILES "${header}" DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}/${place}")
 endforeach()
 
+# The header for C++, beside the one in C that includes all.
+install(FILES "${PROJECT_SOURCE_DIR}/kzsdk/kzsdk.hpp" DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}/kzsdk")
+
 # kz_install_package(<name> <version> <export set>...): what find_package(<name>) reads.
 function(kz_install_package name version)
   set(package_dir "${CMAKE_INSTALL_LIBDIR}/cmake/${name}")
@@ -67,7 +70,8 @@ if(KZ_BUILD_KZCAT)
     TARGETS kzcat_static
     EXPORT kzcatStaticTargets
     ARCHIVE DESTINATION "${CMAKE_INSTALL_LIBDIR}")
-  install(FILES "${PROJECT_SOURCE_DIR}/catalogue/kzcat.h" DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}")
+  install(FILES "${PROJECT_SOURCE_DIR}/catalogue/kzcat.h" "${PROJECT_SOURCE_DIR}/catalogue/kzcat.hpp"
+          DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}")
   kz_install_package(kzcat ${KZCAT_VERSION} kzcatTargets kzcatStaticTargets)
   set(KZ_PC_LIBPQ "")
   if(KZ_HAS_POSTGRESQL)
@@ -75,9 +79,8 @@ if(KZ_BUILD_KZCAT)
   endif()
   configure_file("${PROJECT_SOURCE_DIR}/packaging/kzcat.pc.in" "${PROJECT_BINARY_DIR}/kzcat.pc" @ONLY)
   install(FILES "${PROJECT_BINARY_DIR}/kzcat.pc" DESTINATION "${pkgconfig_dir}")
-  install(FILES "${PROJECT_SOURCE_DIR}/examples/recognise.c"
+  install(FILES "${PROJECT_SOURCE_DIR}/examples/recognise.c" "${PROJECT_SOURCE_DIR}/examples/recognise.cpp"
           DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples")
-  install(FILES "${PROJECT_SOURCE_DIR}/examples/recognise.c" DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples")
 endif()
 
 install(FILES "${PROJECT_SOURCE_DIR}/LICENSE" DESTINATION "${CMAKE_INSTALL_DOCDIR}")

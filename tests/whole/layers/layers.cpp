@@ -86,16 +86,23 @@ bool is_of_the_cxx_library(const std::string& what)
 
 bool is_header(const std::string& file) { return file.ends_with(".h"); }
 
+/// The headers for C++, which are installed beside those in C and use all of C++.
+bool is_header_for_cxx(const std::string& file)
+{
+    return file == "kzsdk/kzsdk.hpp" || file == "catalogue/kzcat.hpp";
+}
+
 /// The folders that are written by the library's rules.
 bool is_of_a_library(const std::string& file)
 {
     return is_below(file, "kzsdk") || is_below(file, "catalogue");
 }
 
-/// How a file is included: by its path, but for the one header that is installed in no folder.
+/// How a file is included: by its path, but for the headers that are installed in no folder.
 std::string spelling_of(const std::string& file)
 {
-    return file == "catalogue/kzcat.h" ? "kzcat.h" : file;
+    const bool of_the_catalogue = file == "catalogue/kzcat.h" || file == "catalogue/kzcat.hpp";
+    return of_the_catalogue ? fs::path(file).filename().string() : file;
 }
 
 /// Reports each include that the rule forbids. The rule is given the include and its target.
@@ -223,7 +230,8 @@ Complaints undeclared_folders(const Plan& plan, const Tree& tree)
 {
     Complaints found;
     for (const auto& file : tree.files) {
-        const bool in_a_room = file == "kzsdk/kzsdk.h" || !room_of(file, plan).empty();
+        const bool in_a_room =
+            file == "kzsdk/kzsdk.h" || is_header_for_cxx(file) || !room_of(file, plan).empty();
         if (place_of(file, plan.houses).empty() || (is_of_a_library(file) && !in_a_room)) {
             found.push_back(file);
         }
@@ -241,7 +249,7 @@ Complaints folders_seeing_too_much(const Plan& plan, const Tree& tree)
         }
         const auto& house = plan.houses.at(from);
         return house.inside.contains(to) || house.sees.contains(to) ||
-               (house.public_of.contains(to) && is_header(target));
+               (house.public_of.contains(to) && (is_header(target) || is_header_for_cxx(target)));
     });
 }
 
@@ -315,6 +323,9 @@ Complaints public_headers_not_declared(const Plan& plan, const Tree& tree)
 Complaints foreign_headers(const Tree& tree)
 {
     return complaints_of(tree, [](const Include& include, const std::string& target) {
+        if (is_header_for_cxx(include.file) && !include.quoted) {
+            return is_of_the_cxx_library(include.what);
+        }
         return !is_of_a_library(include.file) ||
                (include.quoted ? is_of_the_tree(include, target) : is_at_hand(include));
     });

@@ -61,11 +61,11 @@ Complaints folders_seeing_too_much(const Plan& plan, const Tree& tree);
 Complaints rooms_including_upwards(const Plan& plan, const Tree& tree);
 /// A room that has a door is included through it.
 Complaints ways_around_doors(const Plan& plan, const Tree& tree);
-/// One spelling serves in the tree and once installed: from the root, but "kzcat.h" alone.
+/// One spelling serves in the tree and once installed: from the root, but "kzcat.h" and kzcat.hpp.
 Complaints includes_not_from_the_root(const Tree& tree);
 /// A private header is not installed, so a public one that includes it does not compile for users.
 Complaints private_headers_in_public_ones(const Tree& tree);
-/// A .h is public, and the build installs it; nothing else is.
+/// A .h is public, and the build installs it; nothing else is, but the two headers for C++.
 Complaints public_headers_not_declared(const Plan& plan, const Tree& tree);
 /// kzsdk uses the C library and headers that bring in no C++ run-time library; the catalogue all of
 /// the C++ library but what prints. A few rooms use the system, the processor or a database.

@@ -16,6 +16,7 @@ layers::Plan made_up_plan()
     std::istringstream lines(
         "house kzsdk public= sees= inside=\n"
         "house catalogue public=kzsdk sees= inside=\n"
+        "house examples public=kzsdk,catalogue sees= inside=\n"
         "house tools/kzfp public=kzsdk,catalogue sees= inside=\n"
         "house bench public= sees=kzsdk inside=\n"
         "house tests public= sees= inside=kzsdk\n"
@@ -37,6 +38,7 @@ layers::Tree made_up_tree()
         layers::read_includes(name, in, tree);
     };
     file("kzsdk/kzsdk.h", "#include \"kzsdk/high/high.h\"\n");
+    file("kzsdk/kzsdk.hpp", "#include \"kzsdk/high/high.h\"\n#include <vector>\n");
     file("kzsdk/low/low.h", "#include <stdint.h>\n");
     file("kzsdk/low/low.cpp", "#include \"kzsdk/low/low.h\"\n#include <span>\n");
     file("kzsdk/loops/door.hpp", "#include \"kzsdk/low/low.h\"\n");
@@ -45,6 +47,8 @@ layers::Tree made_up_tree()
     file("kzsdk/high/more.h", "");
     file("kzsdk/high/high.cpp", "#include \"kzsdk/loops/door.hpp\"\n");
     file("catalogue/kzcat.h", "");
+    file("catalogue/kzcat.hpp", "#include \"kzcat.h\"\n#include \"kzsdk/kzsdk.hpp\"\n");
+    file("examples/example.cpp", "#include \"kzcat.hpp\"\n#include \"kzsdk/kzsdk.hpp\"\n");
     file("catalogue/plain/plain.cpp", "#include \"kzsdk/high/high.h\"\n#include <vector>\n");
     file("catalogue/plain/plain.hpp", "#include <string>\n");
     file("catalogue/index.cpp",
@@ -204,6 +208,20 @@ TEST(LayerRules, RefuseContainersAndStrangers)
         EXPECT_EQ(Complaints{"kzsdk/high/high.cpp:1 includes " + what},
                   layers::foreign_headers(tree));
     }
+}
+
+TEST(LayerRules, RefuseStrangersInTheHeadersForCxx)
+{
+    for (const std::string what : {"sndfile.h", "unistd.h", "sqlite3.h"}) {
+        const auto tree = tree_with("kzsdk/kzsdk.hpp", "<" + what + ">");
+        EXPECT_EQ(Complaints{"kzsdk/kzsdk.hpp:1 includes " + what}, layers::foreign_headers(tree));
+    }
+    const auto inward = tree_with("catalogue/kzcat.hpp", "\"kzsdk/loops/door.hpp\"");
+    EXPECT_EQ(Complaints{"catalogue/kzcat.hpp:1 includes kzsdk/loops/door.hpp"},
+              layers::folders_seeing_too_much(made_up_plan(), inward));
+    const auto upwards = tree_with("kzsdk/low/low.cpp", "\"kzsdk/kzsdk.hpp\"");
+    EXPECT_EQ(Complaints{"kzsdk/low/low.cpp:1 includes kzsdk/kzsdk.hpp"},
+              layers::rooms_including_upwards(made_up_plan(), upwards));
 }
 
 TEST(LayerRules, LetTheCatalogueUseTheCxxLibraryOnly)

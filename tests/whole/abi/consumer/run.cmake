@@ -68,6 +68,15 @@ endfunction()
 expect_the_same(kzsdk "${EXAMPLES}/fingerprint_tune.c" "COUNT=\"30\"[^>]*>([0-9]+ )+[0-9]+</FP_BLOCK>")
 if(CATALOGUE)
   expect_the_same(kzcat "${EXAMPLES}/recognise.c" "^Second tune, from second 17[.]0 on$")
+  # The headers for C++ are installed too.
+  output_of(flags pkg-config --cflags --libs kzcat)
+  separate_arguments(flags UNIX_COMMAND "${flags}")
+  run("${CXX_COMPILER}" -std=c++17 "${EXAMPLES}/recognise.cpp" ${flags} "-Wl,-rpath,${prefix}/${LIBDIR}" -o
+      "${WORK_DIR}/with_headers_for_cxx")
+  output_of(found "${WORK_DIR}/with_headers_for_cxx")
+  if(NOT found STREQUAL "Second tune, from second 17.0 on")
+    message(FATAL_ERROR "kzcat.hpp: not what was expected:\n${found}")
+  endif()
 endif()
 
 if(EXISTS "${prefix}/bin/kzfp")
