@@ -2,8 +2,8 @@
 # Installs what is missing to build and test the library on Debian 12.
 #
 #   scripts/setup.sh [build] [catalogue] [postgresql] [java] [tools] [test] [clips] [bench] [lint]
-#                    [clang] [fuzz] [coverage] [arch] [wide]
-#                                 default: all of them but the last three
+#                    [clang] [fuzz] [coverage] [arch] [debian] [wide]
+#                                 default: all of them but the last four
 #
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
 set -eu
@@ -31,6 +31,8 @@ packages_of() {
     coverage) echo "llvm-14" ;; # what counts
     # Cross compilers, and what runs their programs.
     arch) echo "g++-aarch64-linux-gnu g++-arm-linux-gnueabihf g++-arm-linux-gnueabi g++-s390x-linux-gnu g++-i686-linux-gnu qemu-user" ;;
+    # What builds and checks the packages, and a bare system to install them in.
+    debian) echo "debhelper dh-python lintian debootstrap fakeroot" ;;
     wide) echo "libboost-dev" ;; # 128-bit numbers for tests on processors whose compilers have none
     *)
         echo "setup: no such group: $1" >&2
