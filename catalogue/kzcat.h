@@ -1158,8 +1158,8 @@ KZ_API kzcat_status kzcat_jobs_take(kzcat_jobs* jobs, const char* worker, uint32
  * @param known     Without @p track: the id of the track that the file is one of already, in
  *                  whatever catalogue; 0 for none. It is only noted.
  * @param[out] out_added  What became of @p track; cleared without one. May be null.
- * @return 0; as kzcat_add() does. After a failure nothing was kept, and the job is still to be ended
- *         with kzcat_jobs_fail() or kzcat_jobs_give_back().
+ * @return 0; as kzcat_add() does. After a failure nothing was kept, and the job is still to be
+ *         ended with kzcat_jobs_fail() or kzcat_jobs_give_back().
  */
 KZ_API kzcat_status kzcat_jobs_finish(kzcat_jobs* jobs, const kzcat_new_track* track, int64_t known,
                                       kzcat_added* out_added) KZ_NOEXCEPT;

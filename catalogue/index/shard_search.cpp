@@ -133,8 +133,9 @@ Ranker::Ranker(std::span<const std::byte> reading)
 
 std::span<const Look> Ranker::looks_of(int64_t track) const
 {
-    const auto own = std::ranges::equal_range(query_.looks, track, {}, &Look::track);
-    return {own.begin(), own.end()};
+    const auto first = std::ranges::lower_bound(query_.looks, track, {}, &Look::track);
+    const auto last = std::ranges::upper_bound(query_.looks, track, {}, &Look::track);
+    return {first, last};
 }
 
 std::vector<Ranker::Range> Ranker::ranges(int64_t track, uint64_t count) const

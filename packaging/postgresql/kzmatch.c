@@ -30,22 +30,16 @@ KZM_FUNCTION(kz_save);
 KZM_FUNCTION(kz_result);
 KZM_FUNCTION(kz_lists);
 
-static pg_attribute_noreturn() void
-complain(const char* error)
+static pg_attribute_noreturn() void complain(const char* error)
 {
     ereport(ERROR, (errcode(ERRCODE_INVALID_PARAMETER_VALUE), errmsg("kzmatch: %s", error),
                     errhint("The catalogue's client and this extension must be of one version.")));
 }
 
-static void
-free_state(void* state)
-{
-    kzm_free((kzm_state*)state);
-}
+static void free_state(void* state) { kzm_free((kzm_state*)state); }
 
 /* The state goes with the memory of the aggregate, also when the query is given up. */
-static kzm_state*
-keep(kzm_state* state, MemoryContext context, const char* error)
+static kzm_state* keep(kzm_state* state, MemoryContext context, const char* error)
 {
     MemoryContextCallback* callback;
     if (state == NULL)
@@ -61,8 +55,7 @@ keep(kzm_state* state, MemoryContext context, const char* error)
     return state;
 }
 
-static MemoryContext
-aggregate_context(FunctionCallInfo fcinfo)
+static MemoryContext aggregate_context(FunctionCallInfo fcinfo)
 {
     MemoryContext context;
     if (!AggCheckCallContext(fcinfo, &context))
@@ -71,8 +64,7 @@ aggregate_context(FunctionCallInfo fcinfo)
 }
 
 /* The state so far; made from the query, argument `query`, at the first row. */
-static kzm_state*
-state_of(FunctionCallInfo fcinfo, enum kzm_kind kind, int query)
+static kzm_state* state_of(FunctionCallInfo fcinfo, enum kzm_kind kind, int query)
 {
     char error[KZM_ERROR_BYTES];
     MemoryContext context = aggregate_context(fcinfo);
@@ -86,8 +78,7 @@ state_of(FunctionCallInfo fcinfo, enum kzm_kind kind, int query)
                 error);
 }
 
-static bytea*
-to_bytea(const void* bytes, size_t count)
+static bytea* to_bytea(const void* bytes, size_t count)
 {
     bytea* result;
     if (count > MaxAllocSize - VARHDRSZ)
@@ -99,8 +90,7 @@ to_bytea(const void* bytes, size_t count)
 }
 
 /* kz_count_step(state, segment, list, words, query) */
-Datum
-kz_count_step(PG_FUNCTION_ARGS)
+Datum kz_count_step(PG_FUNCTION_ARGS)
 {
     char error[KZM_ERROR_BYTES];
     kzm_state* state = state_of(fcinfo, KZM_COUNT, 4);
@@ -114,8 +104,7 @@ kz_count_step(PG_FUNCTION_ARGS)
     PG_RETURN_POINTER(state);
 }
 
-static void
-add_codes(kzm_state* state, int64 track, bytea* codes)
+static void add_codes(kzm_state* state, int64 track, bytea* codes)
 {
     char error[KZM_ERROR_BYTES];
     if (!kzm_track(state, track, VARDATA_ANY(codes), VARSIZE_ANY_EXHDR(codes) / 8, error))
@@ -125,8 +114,7 @@ add_codes(kzm_state* state, int64 track, bytea* codes)
 /* Reading a slice of a long value costs about as much as a third of it. */
 #define KZM_MOST_SLICES 3
 
-static void
-read_slices(const kzm_state* state, Datum stored, size_t ranges, bytea* codes)
+static void read_slices(const kzm_state* state, Datum stored, size_t ranges, bytea* codes)
 {
     for (size_t i = 0; i < ranges; ++i) {
         uint64_t begin;
@@ -140,8 +128,7 @@ read_slices(const kzm_state* state, Datum stored, size_t ranges, bytea* codes)
 }
 
 /* kz_rank_step(state, track, codes, query) */
-Datum
-kz_rank_step(PG_FUNCTION_ARGS)
+Datum kz_rank_step(PG_FUNCTION_ARGS)
 {
     char error[KZM_ERROR_BYTES];
     kzm_state* state = state_of(fcinfo, KZM_RANK, 3);
@@ -167,8 +154,7 @@ kz_rank_step(PG_FUNCTION_ARGS)
 }
 
 /* kz_scan_step(state, track, codes, query) */
-Datum
-kz_scan_step(PG_FUNCTION_ARGS)
+Datum kz_scan_step(PG_FUNCTION_ARGS)
 {
     kzm_state* state = state_of(fcinfo, KZM_SCAN, 3);
     if (!PG_ARGISNULL(1) && !PG_ARGISNULL(2)) {
@@ -180,8 +166,7 @@ kz_scan_step(PG_FUNCTION_ARGS)
 }
 
 /* kz_table_step(state, part, codes), in the order of the tracks */
-Datum
-kz_table_step(PG_FUNCTION_ARGS)
+Datum kz_table_step(PG_FUNCTION_ARGS)
 {
     char error[KZM_ERROR_BYTES];
     MemoryContext context = aggregate_context(fcinfo);
@@ -197,8 +182,7 @@ kz_table_step(PG_FUNCTION_ARGS)
 }
 
 /* Of kz_rank and kz_scan: joins what two processes have found. */
-Datum
-kz_rank_combine(PG_FUNCTION_ARGS)
+Datum kz_rank_combine(PG_FUNCTION_ARGS)
 {
     char error[KZM_ERROR_BYTES];
     MemoryContext context = aggregate_context(fcinfo);
@@ -216,30 +200,20 @@ kz_rank_combine(PG_FUNCTION_ARGS)
     PG_RETURN_POINTER(one);
 }
 
-static Datum
-load(FunctionCallInfo fcinfo, enum kzm_kind kind)
+static Datum load(FunctionCallInfo fcinfo, enum kzm_kind kind)
 {
     char error[KZM_ERROR_BYTES];
     MemoryContext context = aggregate_context(fcinfo);
     bytea* bytes = PG_GETARG_BYTEA_PP(0);
-    PG_RETURN_POINTER(keep(
-        kzm_load(kind, VARDATA_ANY(bytes), VARSIZE_ANY_EXHDR(bytes), error), context, error));
+    PG_RETURN_POINTER(
+        keep(kzm_load(kind, VARDATA_ANY(bytes), VARSIZE_ANY_EXHDR(bytes), error), context, error));
 }
 
-Datum
-kz_rank_load(PG_FUNCTION_ARGS)
-{
-    return load(fcinfo, KZM_RANK);
-}
+Datum kz_rank_load(PG_FUNCTION_ARGS) { return load(fcinfo, KZM_RANK); }
 
-Datum
-kz_scan_load(PG_FUNCTION_ARGS)
-{
-    return load(fcinfo, KZM_SCAN);
-}
+Datum kz_scan_load(PG_FUNCTION_ARGS) { return load(fcinfo, KZM_SCAN); }
 
-Datum
-kz_save(PG_FUNCTION_ARGS)
+Datum kz_save(PG_FUNCTION_ARGS)
 {
     char error[KZM_ERROR_BYTES];
     const void* bytes;
@@ -250,8 +224,7 @@ kz_save(PG_FUNCTION_ARGS)
     PG_RETURN_BYTEA_P(to_bytea(bytes, count));
 }
 
-Datum
-kz_result(PG_FUNCTION_ARGS)
+Datum kz_result(PG_FUNCTION_ARGS)
 {
     char error[KZM_ERROR_BYTES];
     const void* bytes;
@@ -264,8 +237,7 @@ kz_result(PG_FUNCTION_ARGS)
     PG_RETURN_BYTEA_P(to_bytea(bytes, count));
 }
 
-static void
-put_list(ReturnSetInfo* result, int32 list, const char* words, size_t bytes)
+static void put_list(ReturnSetInfo* result, int32 list, const char* words, size_t bytes)
 {
     bool nulls[2] = {false, false};
     bytea* value = to_bytea(words, bytes);
@@ -277,8 +249,7 @@ put_list(ReturnSetInfo* result, int32 list, const char* words, size_t bytes)
 }
 
 /* kz_lists(part, table): the rows of postings that a table gives. */
-Datum
-kz_lists(PG_FUNCTION_ARGS)
+Datum kz_lists(PG_FUNCTION_ARGS)
 {
     int32 part = PG_GETARG_INT32(0);
     bytea* table = PG_GETARG_BYTEA_PP(1);
@@ -293,8 +264,8 @@ kz_lists(PG_FUNCTION_ARGS)
     for (uint32_t value = 0; kzm_list(bytes, count, value, &begin, &end); ++value) {
         CHECK_FOR_INTERRUPTS();
         if (end > begin)
-            put_list((ReturnSetInfo*)fcinfo->resultinfo, part * 65536 + (int32)value,
-                     bytes + begin, end - begin);
+            put_list((ReturnSetInfo*)fcinfo->resultinfo, part * 65536 + (int32)value, bytes + begin,
+                     end - begin);
     }
     return (Datum)0;
 }

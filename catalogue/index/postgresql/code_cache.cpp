@@ -4,7 +4,6 @@
 #include "catalogue/index/postgresql/code_cache.hpp"
 
 #include <array>
-#include <utility>
 
 namespace kzcat::postgresql {
 
@@ -22,7 +21,7 @@ SharedCodes CodeCache::find(int64_t track)
     return found == codes_.end() ? nullptr : found->second;
 }
 
-void CodeCache::put(int64_t track, SharedCodes codes)
+void CodeCache::put(int64_t track, const SharedCodes& codes)
 {
     const std::scoped_lock lock(mutex_);
     if (count_ > kMostCodes) {
@@ -30,7 +29,7 @@ void CodeCache::put(int64_t track, SharedCodes codes)
         count_ = 0;
     }
     const uint64_t added = codes->size();
-    count_ += codes_.try_emplace(track, std::move(codes)).second ? added : 0;
+    count_ += codes_.try_emplace(track, codes).second ? added : 0;
 }
 
 void CodeCache::clear()

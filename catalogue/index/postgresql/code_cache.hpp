@@ -1,5 +1,5 @@
 /// @file
-/// Codes of tracks that were fetched from a server, for as long as they are likely to be used again.
+/// Codes of tracks that were fetched from a server, kept while they are likely to be used again.
 #pragma once
 
 #include <cstdint>
@@ -20,7 +20,7 @@ class CodeCache {
 public:
     /// Null when they are not here.
     SharedCodes find(int64_t track);
-    void put(int64_t track, SharedCodes codes);
+    void put(int64_t track, const SharedCodes& codes);
     void clear();
 
 private:

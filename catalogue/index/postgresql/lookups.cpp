@@ -170,8 +170,8 @@ std::vector<RankedPlace> Lookups::scan_tail(const ShardBytes& query)
     return places("kz_scan", "tail", query);
 }
 
-/// Those that the catalogue has: a shard may have codes of tracks that are just being added, or were
-/// just removed.
+/// Those that the catalogue has: a shard may have codes of tracks that are just being added, or
+/// were just removed.
 std::vector<int64_t> Lookups::known(const std::vector<int64_t>& tracks)
 {
     if (shards_.empty()) {

@@ -1,5 +1,5 @@
 /// @file
-/// Stands in for finding on PostgreSQL servers in builds without it: no store of these opens either.
+/// Stands in for finding on PostgreSQL servers in builds without it, where no store of these opens.
 
 #include "catalogue/index/postgresql/postgres_index.hpp"
 

@@ -119,8 +119,8 @@ private:
     int depth_ = 0;                               ///< transactions within each other
 };
 
-/// Undone unless it was committed. One within another is a part of that: only the outer one commits,
-/// and it must not when the inner one has failed.
+/// Undone unless it was committed. One within another is a part of that: only the outer one
+/// commits, and it must not when the inner one has failed.
 class Transaction {
 public:
     enum class Kind {

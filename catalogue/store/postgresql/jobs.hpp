@@ -48,8 +48,9 @@ public:
     virtual uint64_t add(std::span<const std::string> uris, bool again) = 0;
 
     /// Takes the next job that was tried fewer than `attempts` times, in the order in which they
-    /// were added; those that become free again come behind the others. None when nobody can take one now: a job whose last worker went without a result, or
-    /// that failed elsewhere, at this number of attempts, has then failed for good.
+    /// were added; those that become free again come behind the others. None when nobody can take
+    /// one now: a job whose last worker went without a result, or that failed elsewhere, at this
+    /// number of attempts, has then failed for good.
     virtual std::optional<Job> take(const std::string& worker, uint32_t attempts) = 0;
 
     /// Whether there are jobs that have neither succeeded nor failed for good.

@@ -1,5 +1,5 @@
-// Checksums and keys cover what is in the rows, the log of changes is played back, and codes that no
-// track has are looked for. The structure of the tables is the server's own concern.
+// Checksums and keys cover what is in the rows, the log of changes is played back, and codes that
+// no track has are looked for. The structure of the tables is the server's own concern.
 
 #include "catalogue/store/postgresql/verification.hpp"
 

@@ -1,9 +1,9 @@
 // In which order the databases of a catalogue are written:
 //
-//   1. the catalogue's own: `pending` names the new tracks    (committed at once, by a second session)
-//   2. each shard: their codes                                (committed)
+//   1. the catalogue's own: `pending` names the new tracks  (committed at once by a second session)
+//   2. each shard: their codes                              (committed)
 //   3. the catalogue's own: rows of tracks, and `pending` no longer names the new ones, but those
-//      that were removed                                      (committed: the only moment that counts)
+//      that were removed                                    (committed; only this moment counts)
 //   4. each shard: codes of what was removed goes; `pending` no longer names it
 //
 // Whatever ends this early leaves codes on shards at most, and `pending` names all of them.

@@ -35,7 +35,7 @@ public:
     bool remove(int64_t track);
     bool remove_source(std::string_view uri);
 
-    /// Writes the codes of what was added. The tracks that were passed to add() must be there still.
+    /// Writes the codes of what was added. The tracks passed to add() must still be there.
     void write_codes();
 
     /// To be called once the transaction is committed. Removes the codes of what was removed; what

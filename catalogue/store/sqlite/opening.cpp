@@ -15,8 +15,8 @@
 #include <tuple>
 #include <utility>
 
-#include "catalogue/store/rules.hpp"
 #include "catalogue/store/row_sum.hpp"
+#include "catalogue/store/rules.hpp"
 #include "catalogue/store/sqlite/schema.hpp"
 
 namespace kzcat::sqlite {

@@ -8,9 +8,9 @@
 #include <utility>
 
 #include "catalogue/store/hash.hpp"
+#include "catalogue/store/row_sum.hpp"
 #include "catalogue/store/rules.hpp"
 #include "catalogue/store/sqlite/opening.hpp"
-#include "catalogue/store/row_sum.hpp"
 #include "catalogue/store/sqlite/rows.hpp"
 #include "catalogue/store/sqlite/verification.hpp"
 

@@ -9,8 +9,8 @@
 #include <string>
 
 #include "catalogue/store/hash.hpp"
-#include "catalogue/store/sqlite/opening.hpp"
 #include "catalogue/store/row_sum.hpp"
+#include "catalogue/store/sqlite/opening.hpp"
 #include "catalogue/store/sqlite/rows.hpp"
 
 namespace kzcat::sqlite {

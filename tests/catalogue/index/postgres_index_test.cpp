@@ -38,9 +38,9 @@ Places places(const std::vector<Candidate>& candidates)
 
 Places first_of(Places places) { return {places.begin(), places.begin() + !places.empty()}; }
 
-/// The first five places at which the whole clip lies in its track. A clip that overhangs an end is
-/// compared in part with the track that happens to be next, in a first pass that strangers may fail:
-/// and tracks on servers have other neighbours.
+/// The first five places at which the whole clip lies in its track. A clip that overhangs an end
+/// is compared in part with the track that happens to be next, in a first pass that strangers may
+/// fail: and tracks on servers have other neighbours.
 Places within(const std::vector<Candidate>& candidates)
 {
     Places all;

@@ -1,6 +1,6 @@
-// What every store promises, whatever it keeps its tracks in. Included once by a test program, which
-// has defined kzcat::test::Places: types with a member `store`, each object of which is an empty
-// catalogue of its own.
+// What every store promises, whatever it keeps its tracks in. Included once by a test program,
+// which has defined kzcat::test::Places: types with a member `store`, each object of which is an
+// empty catalogue of its own.
 #pragma once
 
 #include <algorithm>

@@ -41,8 +41,8 @@ FileState state_of(const std::string& path);
 bool is_gone(const std::string& path);
 
 /// Throws audio::FileError when a path is a catalogue that is open, or a file that SQLite keeps
-/// beside it. A program that closes one of these gives up all locks that it holds on it. A catalogue
-/// on a server has no such files.
+/// beside it. A program that closes one of these gives up all locks that it holds on it. A
+/// catalogue on a server has no such files.
 void check_is_not_of(const std::string& catalogue, const std::string& path);
 
 using FileHash = std::array<uint8_t, KZCAT_HASH_SIZE>;

@@ -14,7 +14,10 @@ namespace kzfp {
 /// The catalogue that a command is about. `path` outlives the parsing.
 inline void add_catalogue_option(Parser& parser, std::string& path)
 {
-    parser.add_option("CATALOGUE", path, "The catalogue: a file such as music.kzc, or a database,\npostgresql://USER@HOST/DATABASE")
+    parser
+        .add_option("CATALOGUE", path,
+                    "The catalogue: a file such as music.kzc, or a "
+                    "database,\npostgresql://USER@HOST/DATABASE")
         ->required()
         ->type_name("");
 }
