@@ -45,7 +45,19 @@ struct Options {
     size_t look_ups = 50;
     size_t kills = 150;
     uint32_t lists = 0;
+    uint32_t buffers = 1024;
 };
+
+/// Servers as they are meant to be run: what is committed is on disk, and what is looked up stays in
+/// memory.
+kz::test::PostgresSetup server_setup(const Options& options)
+{
+    kz::test::PostgresSetup setup;
+    setup.settings = {"fsync = on", "full_page_writes = on", "autovacuum = on",
+                      "shared_buffers = " + std::to_string(options.buffers) + "MB",
+                      "max_wal_size = 4GB"};
+    return setup;
+}
 
 double seconds_of(const std::function<void()>& work)
 {
@@ -206,10 +218,11 @@ void print(const char* name, const Survived& survived)
 void study_shards(const Options& options, const PseudoCatalogue& catalogue,
                   const std::vector<Reading>& readings, const Answers& file)
 {
-    const PostgresServer coordinator;
-    const PostgresServer one;
-    PostgresServer two;
-    const auto standby = PostgresServer::standby_of(two);
+    const auto setup = server_setup(options);
+    const PostgresServer coordinator(setup);
+    const PostgresServer one(setup);
+    PostgresServer two(setup);
+    const auto standby = PostgresServer::standby_of(two, setup);
     const std::string second =
         "host=" + two.host() + "," + standby->host() + " port=" + std::to_string(two.port()) + "," +
         std::to_string(standby->port()) + " dbname=postgres user=postgres target_session_attrs=any";
@@ -248,7 +261,7 @@ void study(const Options& options)
                 catalogue.tracks.size());
     print("file", file, file);
     {
-        const PostgresServer server;
+        const PostgresServer server(server_setup(options));
         std::unique_ptr<Store> store;
         const auto index = filled("one server", server.url(), options, catalogue, store);
         print("one server", look_up_all(*index, readings), file);
@@ -270,6 +283,7 @@ Options parsed(CLI::App& app, int count, char** arguments)
     app.add_option("--look-ups", options.look_ups, "that are timed");
     app.add_option("--kills", options.kills, "look-ups during which a shard is killed");
     app.add_option("--lists", options.lists, "that a look-up reads; 0: the usual number");
+    app.add_option("--buffers", options.buffers, "shared_buffers of each server, in MB");
     app.parse(count, arguments);
     return options;
 }
