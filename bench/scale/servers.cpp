@@ -48,8 +48,8 @@ struct Options {
     uint32_t buffers = 1024;
 };
 
-/// Servers as they are meant to be run: what is committed is on disk, and what is looked up stays in
-/// memory.
+/// Servers as they are meant to be run: what is committed is on disk, and what is looked up stays
+/// in memory.
 kz::test::PostgresSetup server_setup(const Options& options)
 {
     kz::test::PostgresSetup setup;

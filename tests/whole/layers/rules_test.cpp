@@ -241,6 +241,14 @@ TEST(LayerRules, LetOneRoomAloneMeetTheDatabase)
               layers::foreign_headers(tree_with("catalogue/plain/plain.cpp", "<sqlite3.h>")));
 }
 
+TEST(LayerRules, LetOneFolderAloneMeetServers)
+{
+    const std::string inside = "catalogue/store/postgresql/file.cpp";
+    EXPECT_EQ(Complaints{}, layers::foreign_headers(tree_with(inside, "<libpq-fe.h>")));
+    EXPECT_EQ(Complaints{"catalogue/store/file.cpp:1 includes libpq-fe.h"},
+              layers::foreign_headers(tree_with("catalogue/store/file.cpp", "<libpq-fe.h>")));
+}
+
 TEST(LayerRules, RefuseAFileThatIsNotThere)
 {
     const auto tree = tree_with("kzsdk/high/high.cpp", "\"generated.hpp\"");

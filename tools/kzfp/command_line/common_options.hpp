@@ -16,8 +16,8 @@ inline void add_catalogue_option(Parser& parser, std::string& path)
 {
     parser
         .add_option("CATALOGUE", path,
-                    "The catalogue: a file such as music.kzc, or a "
-                    "database,\npostgresql://USER@HOST/DATABASE")
+                    "The catalogue: a file such as music.kzc, or a database,\n"
+                    "postgresql://USER@HOST/DATABASE")
         ->required()
         ->type_name("");
 }
