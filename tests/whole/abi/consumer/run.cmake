@@ -4,8 +4,9 @@
 #   cmake -D BUILD_DIR= -D WORK_DIR= -D EXAMPLES= -D C_COMPILER= -D CXX_COMPILER= -D GENERATOR=
 #         -D LIBDIR= -D CATALOGUE= -D POSTGRESQL= -P run.cmake
 #
-# CATALOGUE is ON where that library was built, POSTGRESQL where it knows servers: libpq has no archive
-# that a whole program could be linked with, so that only the libraries of the project are archives.
+# CATALOGUE is ON where that library was built, POSTGRESQL where it knows servers: libpq has no
+# archive that a whole program could be linked with, so that only the libraries of the project are
+# archives.
 cmake_minimum_required(VERSION 3.22)
 
 function(run)
