@@ -14,49 +14,51 @@ using Kind = StoreError::Kind;
 
 struct Refusal {
     std::string_view sign; ///< what libpq's text has in it
-    Kind kind;
     std::string_view sentence;
+    Kind kind;
     bool quoted; ///< libpq's text is of use
 };
 
 constexpr Refusal kRefusals[] = {
-    {"password authentication failed", Kind::cannot_open,
+    {"password authentication failed",
      "the server refused the user's password; correct it in the address, in PGPASSWORD or in "
      "~/.pgpass",
-     false},
-    {"no password supplied", Kind::cannot_open,
+     Kind::cannot_open, false},
+    {"no password supplied",
      "the server wants a password; put it into ~/.pgpass or PGPASSWORD, or into the address as "
      "USER:PASSWORD@HOST",
-     false},
-    {"no pg_hba.conf entry", Kind::cannot_open,
+     Kind::cannot_open, false},
+    {"no pg_hba.conf entry",
      "the server lets this user in from nowhere near here; let its administrator add a line to "
      "pg_hba.conf",
-     true},
-    {"authentication failed", Kind::cannot_open,
+     Kind::cannot_open, true},
+    {"authentication failed",
      "the server does not take this program for that user; name the user in the address, or let "
      "the server's administrator add a line to pg_hba.conf",
-     true},
-    {"role \"", Kind::cannot_open,
+     Kind::cannot_open, true},
+    {"role \"",
      "the server has no such user; name one in the address as USER@HOST, or create it with "
      "createuser",
-     true},
-    {"database \"", Kind::cannot_open,
+     Kind::cannot_open, true},
+    {"database \"",
      "the server has no such database; create it with createdb, or correct the name in the address",
-     true},
-    {"too many clients", Kind::busy,
+     Kind::cannot_open, true},
+    {"too many clients",
      "the server has all the connections that it allows; try again later, or raise its "
      "max_connections",
-     false},
-    {"connection slots are reserved", Kind::busy,
+     Kind::busy, false},
+    {"connection slots are reserved",
      "the server has all the connections that it allows; try again later, or raise its "
      "max_connections",
-     false},
-    {"is starting up", Kind::busy, "the server is starting; try again in a moment", false},
-    {"is shutting down", Kind::busy, "the server is stopping; try again when it runs again", false},
-    {"session is read-only", Kind::read_only,
-     "the server is a standby, or allows reading only; name the one that may be written", true},
-    {"is in hot standby mode", Kind::read_only,
-     "the server is a standby, which may only be read; name the one that may be written", true},
+     Kind::busy, false},
+    {"is starting up", "the server is starting; try again in a moment", Kind::busy, false},
+    {"is shutting down", "the server is stopping; try again when it runs again", Kind::busy, false},
+    {"session is read-only",
+     "the server is a standby, or allows reading only; name the one that may be written",
+     Kind::read_only, true},
+    {"is in hot standby mode",
+     "the server is a standby, which may only be read; name the one that may be written",
+     Kind::read_only, true},
 };
 
 /// libpq's texts have several lines, and end with one; their guesses are left out.

@@ -217,7 +217,7 @@ bool PostgresJobs::fail(const std::string& reason, uint32_t attempts)
         "UPDATE job SET state = $3, error = $4, finished = clock_timestamp() "
         "WHERE id = $1 AND attempt = $2 AND state = 'running'",
         taken_.id, taken_.attempt, std::string_view(for_good ? "failed" : "waiting"),
-        std::string_view(reason));
+        std::string_view{reason});
     commit(transaction);
     taken_ = {};
     return for_good && rows.affected() == 1; // else another has it by now
