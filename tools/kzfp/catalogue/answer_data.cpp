@@ -135,7 +135,7 @@ std::string to_json(const Answer& answer, const Lookup& lookup)
     if (answer.left_out != 0) {
         object["left_out"] = answer.left_out;
     }
-    if (answer.shards > 1) {
+    if (answer.shards_answered < answer.shards) {
         object["shards"] = {{"answered", answer.shards_answered}, {"of", answer.shards}};
     }
     return to_line(object);
