@@ -160,6 +160,7 @@ const std::map<std::string, Names> kOfRooms = {
     {"kzsdk/jni",
      {"android/log.h", "ctime", "jni.h", "pthread.h", "sys/resource.h", "unistd.h",
       "utils/AndroidThreads.h"}},
+    {"kzsdk/jnistream", {"jni.h"}},
 };
 
 /// A quoted include must bring in a library's file; kzsdk rests on nothing but itself.
