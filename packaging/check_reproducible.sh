@@ -1,7 +1,7 @@
 #!/bin/sh
 # Builds what is shipped twice, from copies of the tree in two folders whose names differ in length,
 # with another locale, time zone, file mode mask and number of jobs, and compares byte for byte: the
-# libraries, kzfp, and kzsdk.jar.
+# libraries, kzfp, and the jars.
 #
 #   packaging/check_reproducible.sh
 #   packaging/check_reproducible.sh <build-directory>    builds once, compares with this build
@@ -13,8 +13,8 @@ cd "$(dirname "$0")/.."
 
 jobs=${JOBS:-$(getconf _NPROCESSORS_ONLN)}
 files="kzsdk/libkzsdk.so.1.0.0 kzsdk/libkzsdk.a catalogue/libkzcat.so.1.0.0 catalogue/libkzcat.a
-    bindings/java/kzsdk.jar"
-targets="kzsdk_shared kzsdk_static kzcat_shared kzcat_static kzsdk_jar"
+    bindings/java/kzsdk.jar bindings/java/native/libkzcat_java.so bindings/java/kzsdk-desktop.jar"
+targets="kzsdk_shared kzsdk_static kzcat_shared kzcat_static kzsdk_jar kzsdk_desktop_jar"
 if [ "${PROGRAM:-yes}" != no ]; then
     files="$files tools/kzfp/kzfp"
     targets="$targets kzfp"

@@ -29,8 +29,8 @@ import java.util.concurrent.Executors;
  * <p>Close an object when it is not needed any more; one that is forgotten keeps its thread and the
  * last audio until it is garbage-collected. An object with a request under way is not collected.
  *
- * <p>The native library is looked for as {@code System.loadLibrary("kzsdk")} does, or loaded from
- * the file that the system property {@code kzsdk.library} names.
+ * <p>The native library is looked for as {@code System.loadLibrary("kzsdk")} does, and else taken
+ * out of the jar; or loaded from the file that the system property {@code kzsdk.library} names.
  */
 public final class Fingerprint implements AutoCloseable {
     private static final int SUCCEEDED = 0;
@@ -45,15 +45,6 @@ public final class Fingerprint implements AutoCloseable {
         thread.setDaemon(true);
         return thread;
     });
-
-    static {
-        String file = System.getProperty("kzsdk.library");
-        if (file != null) {
-            System.load(file);
-        } else {
-            System.loadLibrary("kzsdk");
-        }
-    }
 
     /** Receives the result of every request. */
     public interface Listener {
@@ -90,8 +81,10 @@ public final class Fingerprint implements AutoCloseable {
      * Starts the thread.
      *
      * @throws IllegalStateException when there is no memory or no thread
+     * @throws UnsatisfiedLinkError when the native library is not found
      */
     public Fingerprint() {
+        NativeLibrary.loadSdk();
         int code = native_setup(new WeakReference<>(this));
         if (code != SUCCEEDED) {
             throw new IllegalStateException("The fingerprint thread could not be started (" + code + ")");

@@ -1,0 +1,96 @@
+package com.orvanta.android.kzsdk;
+
+import java.io.File;
+import java.util.HashMap;
+import java.util.Map;
+
+/**
+ * Finds and loads the native libraries, each once: the file that a system property names, else what
+ * {@code System.loadLibrary} finds, else the copy inside the jar.
+ */
+final class NativeLibrary {
+    /** What failed before fails again, with the same reason. */
+    private static final Map<String, UnsatisfiedLinkError> OUTCOMES = new HashMap<>();
+
+    private NativeLibrary() {}
+
+    /** Loads {@code libkzsdk}; {@code -Dkzsdk.library} names its file. */
+    static void loadSdk() {
+        load("kzsdk", "kzsdk.library");
+    }
+
+    /** Loads what a {@link Catalogue} needs; {@code -Dkzcat.library} names the file. */
+    static void loadCatalogue() {
+        loadSdk();
+        load("kzcat_java", "kzcat.library");
+    }
+
+    private static synchronized void load(String name, String property) {
+        if (!OUTCOMES.containsKey(name)) {
+            OUTCOMES.put(name, outcome(name, property));
+        }
+        UnsatisfiedLinkError failure = OUTCOMES.get(name);
+        if (failure != null) {
+            UnsatisfiedLinkError again = new UnsatisfiedLinkError(failure.getMessage());
+            again.initCause(failure.getCause());
+            throw again;
+        }
+    }
+
+    /** Null when it is loaded now. */
+    private static UnsatisfiedLinkError outcome(String name, String property) {
+        try {
+            String file = System.getProperty(property);
+            if (file != null) {
+                loadNamed(file, property);
+            } else {
+                loadFound(name, property);
+            }
+            return null;
+        } catch (UnsatisfiedLinkError failure) {
+            return failure;
+        }
+    }
+
+    private static void loadNamed(String file, String property) {
+        try {
+            System.load(new File(file).getAbsolutePath());
+        } catch (UnsatisfiedLinkError refused) {
+            throw failure("-D" + property + "=" + file + " names a file that cannot be loaded: "
+                    + refused.getMessage(), refused);
+        }
+    }
+
+    private static void loadFound(String name, String property) {
+        try {
+            System.loadLibrary(name);
+        } catch (UnsatisfiedLinkError notFound) {
+            if (isAndroid() || !BundledLibrary.load(name)) {
+                throw failure(advice(name, property, notFound), notFound);
+            }
+        }
+    }
+
+    /** What the system says first: it may be that a library was found which needs another one. */
+    private static String advice(String name, String property, Throwable notFound) {
+        String file = System.mapLibraryName(name);
+        String start = "The native library " + file + " cannot be loaded: " + notFound.getMessage();
+        if (isAndroid()) {
+            return start + ". The app's package must hold it for this processor: add kzsdk.aar, which "
+                    + "has no catalogue";
+        }
+        return start + ". The jar has none for " + BundledLibrary.platform()
+                + ". Install the library, take kzsdk-desktop.jar, or name the file: -D" + property
+                + "=/path/" + file;
+    }
+
+    static UnsatisfiedLinkError failure(String message, Throwable cause) {
+        UnsatisfiedLinkError error = new UnsatisfiedLinkError(message);
+        error.initCause(cause);
+        return error;
+    }
+
+    private static boolean isAndroid() {
+        return "The Android Project".equals(System.getProperty("java.specification.vendor"));
+    }
+}
