@@ -254,5 +254,26 @@ TEST_F(Standby, TakesOverAfterOneLookUpAtMost)
     EXPECT_EQ(1U, index->coverage().answered);
 }
 
+TEST(PostgresShards, KeepTheirNumbers)
+{
+    if (!kz::test::postgres_obstacle().empty()) {
+        GTEST_SKIP() << kz::test::postgres_obstacle();
+    }
+    const test::Fleet fleet;
+    const std::string address = fleet.coordinator.url();
+    const std::string one = test::shard_address(fleet.one);
+    const std::string two = test::shard_address(fleet.two);
+    EXPECT_NO_THROW(test::attach_shards(address, {one, two}));
+    try {
+        test::attach_shards(address, {two});
+        ADD_FAILURE() << "the second shard was taken for the first";
+    } catch (const std::runtime_error& error) {
+        EXPECT_NE(std::string::npos,
+                  std::string(error.what()).find("name all shards in their order"))
+            << error.what();
+    }
+    EXPECT_EQ("2\n", fleet.coordinator.sql("SELECT count(*) FROM kzcat.shard"));
+}
+
 } // namespace
 } // namespace kzcat
