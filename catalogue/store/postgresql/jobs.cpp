@@ -1,7 +1,8 @@
-// Taking a job is two transactions. The first one counts the attempt, so that a file that ends its
-// workers is not tried for ever. The second one holds the row locked until the job ends. Between
-// them the row is free for an instant: others let it be as long as the server's process that took
-// it exists, or for a minute, and should one take it all the same the number of the attempt shows.
+// Taking a job is two transactions. The first one counts the attempt, so that a file that crashes
+// its workers is not tried for ever. The second one holds the row locked until the job ends.
+// Between them the row is free for an instant: others let it be as long as the server's process
+// that took it exists, or for a minute, and should one take it all the same the number of the
+// attempt shows.
 
 #include "catalogue/store/postgresql/jobs.hpp"
 

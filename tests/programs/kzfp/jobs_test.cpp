@@ -104,6 +104,13 @@ protected:
         return lines_of(output_of({"jobs", "status", url_, "--format", "json"})).at(0);
     }
 
+    /// What psql prints for statements in the test's database.
+    std::string sql(const std::string& statements) const
+    {
+        const size_t name = url_.find("test_");
+        return server().sql(statements, url_.substr(name, url_.find('?') - name));
+    }
+
     void await(const std::string& member, int count) const
     {
         while (status().at(member) != count) { // CTest's limit of time ends a failure
@@ -132,7 +139,7 @@ protected:
     std::string url_;
 };
 
-TEST_F(KzfpJobs, WhatIsPutDownBecomesTracks)
+TEST_F(KzfpJobs, QueuedFilesBecomeTracks)
 {
     write_piece("music/a.wav", 1);
     write_piece("music/b/c.wav", 2);
@@ -196,9 +203,7 @@ TEST_F(KzfpJobs, AKilledWorkersJobIsDoneByAnotherOnce)
     for (const std::string& file : files) {
         EXPECT_EQ(1, tracks.count(file) == 1 ? tracks.at(file) : 0) << file;
     }
-    const size_t name = url_.find("test_");
-    EXPECT_EQ("t\n", server().sql("SELECT attempt > 1 FROM kzcat.job ORDER BY id LIMIT 1",
-                                  url_.substr(name, url_.find('?') - name)));
+    EXPECT_EQ("t\n", sql("SELECT attempt > 1 FROM kzcat.job ORDER BY id LIMIT 1"));
 }
 
 TEST_F(KzfpJobs, TwoWorkersDoTwoHundredJobsOnce)
@@ -302,6 +307,22 @@ TEST_F(KzfpJobs, WorkGoesOnWhenTheServerComesBack)
     await("done", 2);
     EXPECT_EQ(130, worker.signal_and_wait(SIGINT)) << worker.log();
     EXPECT_EQ(2u, tracks_by_file().size());
+}
+
+TEST_F(KzfpJobs, AServersFailureIsNoAttemptOfTheFile)
+{
+    output_of({"jobs", "add", url_, write_piece("1.wav", 1)});
+    sql("CREATE FUNCTION kzcat.refuse() RETURNS trigger LANGUAGE plpgsql AS "
+        "$$ BEGIN RAISE EXCEPTION 'no space' USING ERRCODE = 'disk_full'; END $$; "
+        "CREATE TRIGGER refuse BEFORE INSERT ON kzcat.track FOR EACH ROW "
+        "EXECUTE FUNCTION kzcat.refuse()");
+    RunningWorker worker(url_, {"-j", "1", "--attempts", "1"});
+    while (!contains(worker.log(), "trying again")) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(20));
+    }
+    sql("DROP TRIGGER refuse ON kzcat.track");
+    EXPECT_EQ(0, worker.wait()) << worker.log();
+    EXPECT_EQ(1, status()["done"]) << worker.log();
 }
 
 TEST_F(KzfpJobs, TracksCanGoIntoAnotherCatalogue)

@@ -84,7 +84,7 @@ private:
     uint64_t named_ = 0;
 };
 
-/// The files to put down; those that were named and are not there are reported and left out. Those
+/// The files to queue; those that were named and are not there are reported and left out. Those
 /// of a list need not be on this machine.
 std::vector<std::string> files_to_add(const JobsSettings& settings, ExitStatus& status)
 {
@@ -159,7 +159,7 @@ ExitStatus retry(const JobsSettings& settings)
 using Action = ExitStatus (*)(const JobsSettings&);
 
 constexpr Choice<Action> kActions[] = {
-    {"add", add, "puts down files, and the sound files below folders, for workers"},
+    {"add", add, "queues files, and the sound files below folders, for workers"},
     {"status", status, "how many wait, run, are done and have failed"},
     {"retry", retry, "has those that failed for good tried again"},
 };

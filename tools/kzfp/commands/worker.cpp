@@ -17,7 +17,7 @@ namespace kzfp {
 namespace {
 
 constexpr const char* kDescription =
-    "Fingerprints the files that 'kzfp jobs add' put down, beside any number of other workers on\n"
+    "Fingerprints the files that 'kzfp jobs add' queued, beside any number of other workers on\n"
     "this machine and others: each file becomes a track once, whichever worker ends without\n"
     "warning. Ends when no job is left.";
 
@@ -29,13 +29,13 @@ constexpr const char* kFooter =
 constexpr FormatChoice kFormats[] = {kHumanFormat, kJsonFormat, kCsvFormat};
 
 /// Runs the workers, and throws on what one of them has thrown, once all have ended.
-void run_workers(const WorkerSettings& settings, kzcat_catalogue& catalogue, Desk& desk)
+void run_workers(const WorkerSettings& settings, kzcat_catalogue& catalogue, Reporter& reporter)
 {
     std::vector<std::exception_ptr> troubles(settings.threads);
     std::vector<std::thread> threads;
     const auto run = [&](size_t i) {
         try {
-            Worker(settings, catalogue, desk).run();
+            Worker(settings, catalogue, reporter).run();
         } catch (...) {
             troubles[i] = std::current_exception();
         }
@@ -62,17 +62,17 @@ ExitStatus work(const WorkerSettings& settings)
     const Jobs jobs = open_jobs(settings.jobs, KZCAT_ACCESS_WRITE);
     const Catalogue catalogue = open_catalogue(settings.catalogue, KZCAT_ACCESS_CREATE);
     const kzcat_job_counts counts = counts_of(*jobs);
-    Desk desk(settings.output, static_cast<size_t>(counts.waiting + counts.running));
-    run_workers(settings, *catalogue, desk);
+    Reporter reporter(settings.output, static_cast<size_t>(counts.waiting + counts.running));
+    run_workers(settings, *catalogue, reporter);
     if (settings.output.format == Format::human) {
-        write_output(desk.summary() + '\n');
+        write_output(reporter.summary() + '\n');
     }
     if (interrupted()) {
         write_message("interrupted: what was at hand is done; the rest is left to others");
         return interrupted_by_user;
     }
-    return desk.count(Outcome::failed) == 0 && desk.threads_ended() == 0 ? all_done
-                                                                         : some_file_failed;
+    return reporter.count(Outcome::failed) == 0 && reporter.threads_ended() == 0 ? all_done
+                                                                                 : some_file_failed;
 }
 
 } // namespace

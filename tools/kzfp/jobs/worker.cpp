@@ -48,8 +48,8 @@ bool is_about_the_file(const CatalogueError& error)
 
 } // namespace
 
-Worker::Worker(const WorkerSettings& settings, kzcat_catalogue& catalogue, Desk& desk)
-    : settings_(settings), catalogue_(catalogue), desk_(desk),
+Worker::Worker(const WorkerSettings& settings, kzcat_catalogue& catalogue, Reporter& reporter)
+    : settings_(settings), catalogue_(catalogue), reporter_(reporter),
       reader_(catalogue, settings.catalogue, settings.sound, settings.documents),
       name_(worker_name())
 {
@@ -63,9 +63,11 @@ void Worker::run()
             go_on = take_turn();
             silent_since_.reset();
         } catch (const CatalogueError& error) {
-            jobs_.reset(); // what was taken is another's to take
-            go_on = bears(error);
+            go_on = outlasts(error);
         }
+    }
+    if (holding_) { // as far as the server lets it
+        kzcat_jobs_give_back(jobs_.get());
     }
 }
 
@@ -75,11 +77,17 @@ bool Worker::take_turn()
     if (!jobs_) {
         jobs_ = open_jobs(settings_.jobs, KZCAT_ACCESS_WRITE);
     }
+    if (holding_) { // the server's failure is no attempt of the file
+        check(kzcat_jobs_give_back(jobs_.get()));
+        holding_ = false;
+    }
     kzcat_job job;
     uint8_t are_left = 0;
     if (was_found(
             kzcat_jobs_take(jobs_.get(), name_.c_str(), settings_.attempts, &job, &are_left))) {
+        holding_ = true;
         work_on(job);
+        holding_ = false;
         return true;
     }
     if (are_left != 0 || settings_.wait) { // others may lose theirs
@@ -100,7 +108,7 @@ void Worker::work_on(const kzcat_job& job)
     } else if (arrival.outcome == Outcome::failed) {
         fail(arrival, number);
     } else {
-        desk_.report(arrival);
+        reporter_.report(arrival);
     }
 }
 
@@ -149,21 +157,21 @@ void Worker::fail(const Arrival& arrival, uint32_t attempt)
     check(kzcat_jobs_fail(jobs_.get(), audio::to_utf8(arrival.error).c_str(), settings_.attempts,
                           &for_good));
     if (for_good != 0) {
-        desk_.report(arrival);
+        reporter_.report(arrival);
     } else {
-        desk_.report_postponed(arrival, attempt, settings_.attempts);
+        reporter_.report_postponed(arrival, attempt, settings_.attempts);
     }
 }
 
 /// Whether to go on after a failure of the server; rests before.
-bool Worker::bears(const CatalogueError& error)
+bool Worker::outlasts(const CatalogueError& error)
 {
     const auto now = std::chrono::steady_clock::now();
     if (!silent_since_) {
         silent_since_ = now;
-        desk_.say(std::string(error.what()) + "; trying again for a minute");
+        reporter_.say(std::string(error.what()) + "; trying again for a minute");
     } else if (now - *silent_since_ > kLongestSilence) {
-        desk_.report_end(error.what());
+        reporter_.report_end(error.what());
         return false;
     }
     rest(kPausesForJobs);

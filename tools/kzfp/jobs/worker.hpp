@@ -8,7 +8,7 @@
 #include <string>
 
 #include "kzfp/adding/reader.hpp"
-#include "kzfp/jobs/desk.hpp"
+#include "kzfp/jobs/reporter.hpp"
 
 namespace kzfp {
 
@@ -27,7 +27,7 @@ struct WorkerSettings {
 class Worker {
 public:
     /// `catalogue` may be used by others at the same time. What is passed outlives the object.
-    Worker(const WorkerSettings& settings, kzcat_catalogue& catalogue, Desk& desk);
+    Worker(const WorkerSettings& settings, kzcat_catalogue& catalogue, Reporter& reporter);
 
     /// Returns when no job is left, also at other workers, or the user wants an end. A server that
     /// does not answer is given a minute to come back.
@@ -39,14 +39,15 @@ private:
     Arrival attempt(const std::string& path);
     void end(Arrival& arrival);
     void fail(const Arrival& arrival, uint32_t attempt);
-    bool bears(const CatalogueError& error);
+    bool outlasts(const CatalogueError& error);
 
     const WorkerSettings& settings_;
     kzcat_catalogue& catalogue_;
-    Desk& desk_;
+    Reporter& reporter_;
     Reader reader_;
     Jobs jobs_;
-    std::string name_; ///< in the table of jobs
+    bool holding_ = false; ///< a job was taken and not ended
+    std::string name_;     ///< in the table of jobs
     /// Since when the server does not answer; nothing while it does.
     std::optional<std::chrono::steady_clock::time_point> silent_since_;
 };
