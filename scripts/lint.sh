@@ -71,11 +71,13 @@ man_pages() {
 
 # It takes functions that are called by name for unreachable.
 shell_scripts() {
-    shellcheck --external-sources --exclude=SC2317 run .ci/run scripts/*.sh packaging/*.sh fuzz/*.sh evaluation/*.sh contrib/slurm/*.sbatch
+    shellcheck --external-sources --exclude=SC2317 run .ci/run scripts/*.sh packaging/*.sh fuzz/*.sh evaluation/*.sh \
+        tests/bindings/python/*.sh contrib/slurm/*.sbatch
 }
 
 python_scripts() {
-    for script in bench/*.py evaluation/*.py fuzz/*.py packaging/*.py scripts/*.py; do
+    for script in bench/*.py bindings/python/*.py bindings/python/kzsdk/*.py evaluation/*.py examples/python/*.py \
+        fuzz/*.py packaging/*.py scripts/*.py tests/bindings/python/*.py; do
         python3 -c 'import ast, sys; ast.parse(open(sys.argv[1]).read(), sys.argv[1])' "$script" || return 1
     done
 }

@@ -1,8 +1,8 @@
 #!/bin/sh
 # Installs what is missing to build and test the library on Debian 12.
 #
-#   scripts/setup.sh [build] [catalogue] [postgresql] [java] [tools] [test] [clips] [bench] [lint]
-#                    [clang] [fuzz] [coverage] [arch] [debian] [wide]
+#   scripts/setup.sh [build] [catalogue] [postgresql] [java] [python] [tools] [test] [clips] [bench]
+#                    [lint] [clang] [fuzz] [coverage] [arch] [debian] [wide]
 #                                 default: all of them but the last four
 #
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
@@ -20,6 +20,8 @@ packages_of() {
     test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso python3 zsh fish libexpat1-dev libpng-dev chromium-headless-shell" ;;
     # The Java front and its tests; Android's log and threads as a desktop has them.
     java) echo "default-jdk-headless junit4 android-liblog-dev android-libutils-dev" ;;
+    # The package, what tests it, and what its example and its other reader of files want.
+    python) echo "python3-cffi python3-setuptools python3-wheel python3-build python3-venv python3-pytest python3-numpy python3-soundfile python3-matplotlib" ;;
     clips) echo "sox libsox-fmt-all espeak-ng ffmpeg" ;; # the demo's music, and the tests' clips
     # Tools that count instructions and print tables, and the peers, each of which may be missing.
     bench) echo "valgrind python3 pkg-config libcli11-dev nlohmann-json3-dev libchromaprint-dev libfftw3-dev libswresample-dev libavutil-dev libsoxr-dev libspeexdsp-dev libpugixml-dev libtinyxml2-dev libxml2-dev" ;;
@@ -45,7 +47,7 @@ installed() {
     [ "$(dpkg-query -W -f '${db:Status-Status}' "$1" 2>/dev/null || true)" = installed ]
 }
 
-[ $# -gt 0 ] || set -- build catalogue postgresql java tools test clips bench lint clang fuzz
+[ $# -gt 0 ] || set -- build catalogue postgresql java python tools test clips bench lint clang fuzz
 
 wanted=
 for group in "$@"; do
