@@ -3,9 +3,10 @@
 
 packaging/sbom.py [BUILD_DIRECTORY]     build/release if not given; prints to standard output
 
-Read from the built files, not from what the build asked for: the libraries that they name, those that
-kzfp opens when it needs them, and those that these name in turn, each by the Debian package that it
-came in. Headers that leave no name behind are in INCLUDED. Nothing in it depends on when or where it is made.
+Read from the built files, not from what the build asked for: the libraries that they name, those
+that kzfp opens when it needs them, and those that these name in turn, each by the Debian package
+that it came in. Headers that leave no name behind are in INCLUDED. Nothing in it depends on when or
+where it is made.
 """
 import functools
 import hashlib
