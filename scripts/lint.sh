@@ -66,12 +66,14 @@ other_analyser() {
 }
 
 man_pages() {
-    find tools docs -name '*.[1-8]' -print0 | xargs -0 -r mandoc -T lint -W warning
+    find tools docs packaging -name '*.[1-8]' -print0 | xargs -0 -r mandoc -T lint -W warning
 }
 
 # It takes functions that are called by name for unreachable.
 shell_scripts() {
+    # shellcheck disable=SC2046 # the names are meant to be split
     shellcheck --external-sources --exclude=SC2317 run .ci/run scripts/*.sh packaging/*.sh fuzz/*.sh evaluation/*.sh \
+        packaging/postgresql/kzcat-shards $(grep -l '^#!/bin/sh' packaging/debian/tests/*) \
         tests/bindings/python/*.sh contrib/slurm/*.sbatch
 }
 
