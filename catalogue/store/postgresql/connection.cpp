@@ -65,6 +65,13 @@ void look_for_end(PGconn* connection)
     }
 }
 
+/// Whether a session can be used for the next call. One whose transaction could not be ended, since
+/// memory was short, cannot: what was begun there goes with it.
+bool is_ready(PGconn* connection)
+{
+    return PQstatus(connection) == CONNECTION_OK && PQtransactionStatus(connection) == PQTRANS_IDLE;
+}
+
 } // namespace
 
 int64_t Rows::affected() const
@@ -162,7 +169,7 @@ void Connection::ensure_connected()
 {
     if (!in_transaction()) {
         look_for_end(handle());
-        if (PQstatus(handle()) != CONNECTION_OK) {
+        if (!is_ready(handle())) {
             connect();
         }
     }
@@ -197,7 +204,7 @@ const std::string& Connection::compiled(const char* sql, const Parameters& param
     if (is_new) {
         try {
             std::string statement = "s";
-            statement += std::to_string(compiled_.size());
+            statement += std::to_string(++compilations_);
             checked(PQprepare(handle(), statement.c_str(), sql, parameters.count(),
                               parameters.types()));
             place->second = statement;

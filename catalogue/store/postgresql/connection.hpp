@@ -66,7 +66,7 @@ private:
 /// A session on a server, whose tables are those of the schema kzcat. One thread at a time.
 ///
 /// When the connection is lost the call that meets this fails; the next one connects again, unless
-/// a transaction was open.
+/// a transaction was open. So it does when memory was too short to end a transaction.
 class Connection {
 public:
     /// `address` is a URL or "host=... dbname=...". Throws StoreError.
@@ -116,7 +116,8 @@ private:
     ConnectionOptions options_;
     std::unique_ptr<PGconn, Finish> connection_;
     std::map<const char*, std::string> compiled_; ///< names, by the address of the text
-    int depth_ = 0;                               ///< transactions within each other
+    uint64_t compilations_ = 0; ///< the server may have compiled what the client could not note
+    int depth_ = 0;             ///< transactions within each other
 };
 
 /// Undone unless it was committed. One within another is a part of that: only the outer one
