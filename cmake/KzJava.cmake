@@ -7,12 +7,14 @@
 #                part of another build
 #   KZ_JAVA      build kzsdk.jar, the front's Java side. Needs a JDK. Default: OFF; the presets have
 #                it ON
+#   KZ_KOTLIN    build kzsdk-kotlin.jar, Kotlin's extensions. Needs kotlinc. Default: OFF
 #   KZ_PLATFORM  what the front logs to and starts threads with: see
 #                kzsdk/jni/platform/platform.hpp. Default: portable, which needs nothing and so
 #                loads anywhere; ndk when building for Android
 #   KZ_SMALL_MAP export only the extraction interface, start-up and what Java needs. Default: OFF
 option(KZ_JNI "Build the front that a Java VM loads" ${PROJECT_IS_TOP_LEVEL})
 option(KZ_JAVA "Build kzsdk.jar, the front's Java side" OFF)
+option(KZ_KOTLIN "Build kzsdk-kotlin.jar, Kotlin's extensions" OFF)
 option(KZ_SMALL_MAP "Export only the extraction interface, start-up and JNI_OnLoad" OFF)
 
 find_package(Java 1.8 COMPONENTS Development Runtime QUIET)
@@ -97,6 +99,16 @@ if(KZ_JAVA AND NOT (Java_JAVAC_EXECUTABLE AND Java_JAR_EXECUTABLE))
                       "jar: -DKZ_JAVA=OFF")
 endif()
 
+if(KZ_KOTLIN)
+  find_program(KZ_KOTLINC kotlinc)
+  # Kotlin before 1.8 has a part of its library in a jar of its own.
+  find_file(KZ_KOTLIN_LIBRARY kotlin-stdlib-jdk7.jar PATHS /usr/share/java)
+  if(NOT KZ_JAVA OR NOT KZ_KOTLINC)
+    message(FATAL_ERROR "KZ_KOTLIN, which builds kzsdk-kotlin.jar, needs kotlinc (Debian: kotlin) and -DKZ_JAVA=ON; "
+                        "-DKZ_KOTLIN=OFF does without")
+  endif()
+endif()
+
 # A jar contains when each class was written, unless the tool (of JDK 17 and later) is given a date.
 set(KZ_JAR_DATE "")
 if(KZ_JAVA)
@@ -143,6 +155,27 @@ function(kz_jar target)
             ${jar_FLAGS} ${classpath} -d "${classes}" ${jar_SOURCES}
     COMMAND "${Java_JAR_EXECUTABLE}" ${pack} -C "${classes}" .
     DEPENDS ${jar_SOURCES} ${jar_CLASSPATH} ${jar_MANIFEST}
+    COMMENT "Packing ${jar_OUTPUT}"
+    VERBATIM)
+  add_custom_target(${target} ALL DEPENDS "${output}")
+  set_target_properties(${target} PROPERTIES KZ_JAR "${output}")
+endfunction()
+
+# kz_kotlin_jar(<target> OUTPUT <name> SOURCES <files> CLASSPATH <jars>)
+#
+# The same for Kotlin. Its compiler packs by itself, with the time of day.
+function(kz_kotlin_jar target)
+  cmake_parse_arguments(PARSE_ARGV 1 jar "" "OUTPUT" "SOURCES;CLASSPATH")
+  set(output "${CMAKE_CURRENT_BINARY_DIR}/${jar_OUTPUT}")
+  set(classpath ${jar_CLASSPATH})
+  if(KZ_KOTLIN_LIBRARY)
+    list(APPEND classpath "${KZ_KOTLIN_LIBRARY}")
+  endif()
+  string(JOIN ":" classpath ${classpath})
+  add_custom_command(
+    OUTPUT "${output}"
+    COMMAND "${KZ_KOTLINC}" -Werror -no-reflect -jvm-target 1.8 -cp "${classpath}" -d "${output}" ${jar_SOURCES}
+    DEPENDS ${jar_SOURCES} ${jar_CLASSPATH}
     COMMENT "Packing ${jar_OUTPUT}"
     VERBATIM)
   add_custom_target(${target} ALL DEPENDS "${output}")

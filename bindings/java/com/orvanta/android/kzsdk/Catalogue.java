@@ -2,14 +2,11 @@ package com.orvanta.android.kzsdk;
 
 import java.io.File;
 import java.io.IOException;
-import java.io.InputStream;
-import java.nio.ByteBuffer;
 import java.util.ArrayList;
 import java.util.Collections;
 import java.util.Iterator;
 import java.util.List;
 import java.util.Map;
-import java.util.NoSuchElementException;
 import java.util.Objects;
 import java.util.concurrent.CompletableFuture;
 import java.util.concurrent.CompletionException;
@@ -44,7 +41,6 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
     private static final int READ = 1;
     private static final int WRITE = 2;
     private static final int CREATE = 3;
-    private static final int PIECE = 1 << 16;
 
     private static final Executor WORKERS =
             Executors.newFixedThreadPool(Runtime.getRuntime().availableProcessors(), task -> {
@@ -52,67 +48,6 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
                 thread.setDaemon(true);
                 return thread;
             });
-
-    /** What became of a track that was to be added. */
-    public static final class Added {
-        private final long[] numbers;
-
-        private Added(long[] numbers) {
-            this.numbers = numbers;
-        }
-
-        /**
-         * Returns the track's id.
-         *
-         * @return above 0
-         */
-        public long track() {
-            return numbers[0];
-        }
-
-        /**
-         * Returns whether the catalogue did not have this recording before.
-         *
-         * @return false when the track that has it got one source more
-         */
-        public boolean isNew() {
-            return numbers[1] != 0;
-        }
-    }
-
-    /** Something that is wrong in a catalogue. */
-    public static final class Fault {
-        private final long track;
-        private final String text;
-
-        private Fault(long track, String text) {
-            this.track = track;
-            this.text = text;
-        }
-
-        /**
-         * Returns the track's id.
-         *
-         * @return 0 when no single track is concerned
-         */
-        public long track() {
-            return track;
-        }
-
-        /**
-         * Returns what is wrong.
-         *
-         * @return a sentence
-         */
-        public String text() {
-            return text;
-        }
-
-        @Override
-        public String toString() {
-            return text;
-        }
-    }
 
     private final NativeHandle handle;
 
@@ -196,7 +131,7 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
      * @return what became of it; it is on disk
      * @throws IOException when the file cannot be read
      */
-    public Added add(File file) throws IOException {
+    public AddedTrack add(File file) throws IOException {
         long[] about = {file.length(), file.lastModified() * 1000000};
         return add(Sound.file(file), file.getPath(), Collections.emptyMap(), about);
     }
@@ -211,11 +146,11 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
      * @return what became of it; it is on disk
      * @throws IOException when a file cannot be read
      */
-    public Added add(Sound sound, String source, Map<String, String> tags) throws IOException {
+    public AddedTrack add(Sound sound, String source, Map<String, String> tags) throws IOException {
         return add(sound, source, tags, new long[] {-1, -1});
     }
 
-    private Added add(Sound sound, String source, Map<String, String> tags, long[] about)
+    private AddedTrack add(Sound sound, String source, Map<String, String> tags, long[] about)
             throws IOException {
         byte[] place = Texts.bytes(source, "source");
         byte[][] words = new byte[2 * tags.size()][];
@@ -225,45 +160,15 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
             words[count++] = Texts.bytes(tag.getValue(), "value of a tag");
         }
         call(catalogue -> null); // a catalogue that is closed fails before the work, not after it
-        long trail = trailOf(sound);
+        long trail = NativeSound.trailOf(sound);
         try {
             return call(catalogue -> {
                 long[] out = new long[2];
                 NativeCatalogue.add(catalogue, trail, place, about, words, out);
-                return new Added(out);
+                return new AddedTrack(out);
             });
         } finally {
             NativeCatalogue.freeTrail(trail);
-        }
-    }
-
-    private static long trailOf(Sound sound) throws IOException {
-        SoundFormat format = sound.format();
-        long builder = NativeCatalogue.createBuilder(
-                format.code(), format.sampleRate(), format.channels(), false);
-        try {
-            feed(sound, (bytes, count) -> NativeCatalogue.feedBuilder(builder, bytes, count));
-            return NativeCatalogue.finishBuilder(builder);
-        } finally {
-            NativeCatalogue.freeBuilder(builder);
-        }
-    }
-
-    /** Takes the bytes at the start of a direct buffer. */
-    private interface Feeding {
-        void feed(ByteBuffer bytes, int count);
-    }
-
-    private static void feed(Sound sound, Feeding feeding) throws IOException {
-        int frame = sound.format().frameSize();
-        byte[] piece = new byte[Math.max(1, PIECE / frame) * frame]; // whole frames
-        ByteBuffer direct = ByteBuffer.allocateDirect(piece.length);
-        try (InputStream in = sound.open()) {
-            for (int count; (count = in.read(piece, 0, piece.length)) > 0;) {
-                direct.clear();
-                direct.put(piece, 0, count);
-                feeding.feed(direct, count);
-            }
         }
     }
 
@@ -288,17 +193,8 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
      */
     public Recognition match(Sound clip, MatchOptions options) throws IOException {
         Objects.requireNonNull(options, "options");
-        SoundFormat format = clip.format();
         call(catalogue -> null);
-        long query =
-                NativeCatalogue.createQuery(format.code(), format.sampleRate(), format.channels());
-        try {
-            feed(clip, (bytes, count) -> NativeCatalogue.feedQuery(query, bytes, count));
-            NativeCatalogue.finishQuery(query);
-            return recognise(query, options);
-        } finally {
-            NativeCatalogue.freeQuery(query);
-        }
+        return recognise(NativeSound.queryOf(clip), options);
     }
 
     /**
@@ -310,37 +206,18 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
      */
     public Recognition match(QueryDocument document) {
         call(catalogue -> null);
-        long query = NativeCatalogue.createQueryFromDocument(Texts.bytes(document.text(), "document"));
+        byte[] text = Texts.bytes(document.text(), "document");
+        return recognise(NativeCatalogue.createQueryFromDocument(text), MatchOptions.USUAL);
+    }
+
+    /** Frees the query. */
+    private Recognition recognise(long query, MatchOptions options) {
         try {
-            return recognise(query, MatchOptions.USUAL);
+            return Recognition.taken(call(catalogue -> NativeCatalogue.recognise(catalogue, query,
+                    options.speeds() ? 1 : 0, options.candidates(), options.passages() ? 1 : 0)));
         } finally {
             NativeCatalogue.freeQuery(query);
         }
-    }
-
-    private Recognition recognise(long query, MatchOptions options) {
-        long result = call(catalogue -> NativeCatalogue.recognise(catalogue, query,
-                options.speeds() ? 1 : 0, options.candidates(), options.passages() ? 1 : 0));
-        try {
-            long[] integers = new long[4];
-            double[] reals = new double[2];
-            NativeCatalogue.summary(result, integers, reals);
-            return new Recognition(integers, reals, matches(result, false, integers[1]),
-                    matches(result, true, integers[2]));
-        } finally {
-            NativeCatalogue.freeResult(result);
-        }
-    }
-
-    private static List<Match> matches(long result, boolean candidates, long count) {
-        List<Match> matches = new ArrayList<>();
-        for (long place = 0; place < count; ++place) {
-            long[] integers = new long[3];
-            double[] reals = new double[8];
-            byte[][] texts = NativeCatalogue.match(result, candidates, place, integers, reals);
-            matches.add(new Match(integers, reals, texts));
-        }
-        return matches;
     }
 
     /** Work that may read a file. */
@@ -387,7 +264,7 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
      * @param tags "title", "artist" and so on
      * @return a future of what becomes of it; cancelling it stops nothing
      */
-    public CompletableFuture<Added> addAsync(Sound sound, String source, Map<String, String> tags) {
+    public CompletableFuture<AddedTrack> addAsync(Sound sound, String source, Map<String, String> tags) {
         return later(() -> add(sound, source, tags));
     }
 
@@ -398,7 +275,7 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
      * @return null when there is none
      */
     public Track track(long id) {
-        return call(catalogue -> taken(NativeCatalogue.getTrack(catalogue, id)));
+        return call(catalogue -> Track.taken(NativeCatalogue.getTrack(catalogue, id)));
     }
 
     /**
@@ -409,20 +286,7 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
      */
     public Track find(String source) {
         byte[] bytes = Texts.bytes(source, "source");
-        return call(catalogue -> taken(NativeCatalogue.findSource(catalogue, bytes)));
-    }
-
-    private static Track taken(long track) {
-        if (track == 0) {
-            return null;
-        }
-        try {
-            long[] integers = new long[5];
-            byte[][] texts = NativeCatalogue.track(track, integers);
-            return new Track(integers, texts);
-        } finally {
-            NativeCatalogue.freeTrack(track);
-        }
+        return call(catalogue -> Track.taken(NativeCatalogue.findSource(catalogue, bytes)));
     }
 
     /**
@@ -433,40 +297,12 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
      */
     @Override
     public Iterator<Track> iterator() {
-        return new Iterator<Track>() {
-            private Track next;
-            private long last;
-            private boolean removable;
+        return new TrackIterator(this);
+    }
 
-            @Override
-            public boolean hasNext() {
-                if (next == null) {
-                    next = call(catalogue -> taken(NativeCatalogue.nextTrack(catalogue, last)));
-                }
-                return next != null;
-            }
-
-            @Override
-            public Track next() {
-                if (!hasNext()) {
-                    throw new NoSuchElementException("There are no more tracks");
-                }
-                Track track = next;
-                next = null;
-                last = track.id();
-                removable = true;
-                return track;
-            }
-
-            @Override
-            public void remove() {
-                if (!removable) {
-                    throw new IllegalStateException("There is no track to remove: call next() first");
-                }
-                Catalogue.this.remove(last);
-                removable = false;
-            }
-        };
+    /** The first track with an id above this; null when there is none. */
+    Track trackAfter(long id) {
+        return call(catalogue -> Track.taken(NativeCatalogue.nextTrack(catalogue, id)));
     }
 
     /**
@@ -499,13 +335,13 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
      *
      * @return what is wrong; empty when nothing is
      */
-    public List<Fault> verify() {
+    public List<CatalogueFault> verify() {
         return call(catalogue -> {
             long[][] tracks = new long[1][];
             byte[][] texts = NativeCatalogue.verify(catalogue, tracks);
-            List<Fault> faults = new ArrayList<>();
+            List<CatalogueFault> faults = new ArrayList<>();
             for (int i = 0; i < texts.length; ++i) {
-                faults.add(new Fault(tracks[0][i], Texts.of(texts[i])));
+                faults.add(new CatalogueFault(tracks[0][i], Texts.of(texts[i])));
             }
             return faults;
         });
@@ -516,7 +352,7 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
      *
      * @return a future of what is wrong; cancelling it stops nothing
      */
-    public CompletableFuture<List<Fault>> verifyAsync() {
+    public CompletableFuture<List<CatalogueFault>> verifyAsync() {
         return later(this::verify);
     }
 

@@ -1,5 +1,6 @@
 package com.orvanta.android.kzsdk;
 
+import java.util.ArrayList;
 import java.util.Collections;
 import java.util.Iterator;
 import java.util.List;
@@ -23,11 +24,35 @@ public final class Recognition implements Iterable<Match> {
     private final List<Match> matches;
     private final List<Match> candidates;
 
-    Recognition(long[] integers, double[] reals, List<Match> matches, List<Match> candidates) {
+    private Recognition(long[] integers, double[] reals, List<Match> matches, List<Match> candidates) {
         this.integers = integers;
         this.reals = reals;
         this.matches = Collections.unmodifiableList(matches);
         this.candidates = Collections.unmodifiableList(candidates);
+    }
+
+    /** Reads and frees a native result. */
+    static Recognition taken(long result) {
+        try {
+            long[] integers = new long[4];
+            double[] reals = new double[2];
+            NativeCatalogue.summary(result, integers, reals);
+            return new Recognition(integers, reals, matches(result, false, integers[1]),
+                    matches(result, true, integers[2]));
+        } finally {
+            NativeCatalogue.freeResult(result);
+        }
+    }
+
+    private static List<Match> matches(long result, boolean candidates, long count) {
+        List<Match> matches = new ArrayList<>();
+        for (long place = 0; place < count; ++place) {
+            long[] integers = new long[3];
+            double[] reals = new double[8];
+            byte[][] texts = NativeCatalogue.match(result, candidates, place, integers, reals);
+            matches.add(new Match(integers, reals, texts));
+        }
+        return matches;
     }
 
     /**

@@ -39,106 +39,6 @@ public final class StreamingFingerprint implements AutoCloseable {
         }
     }
 
-    /** Why a fingerprint is not complete. */
-    public enum Phase {
-        /** It is complete. */
-        COMPLETE,
-        /** No whole frame has come yet. */
-        NOTHING_FED,
-        /** All that was analysed is silence. */
-        SILENT,
-        /** More sound is needed. */
-        TOO_SHORT,
-        /** Memory was short, and the stream cannot go on. */
-        FAILED
-    }
-
-    /** How far a stream is. Immutable. */
-    public static final class Progress {
-        private final long[] numbers;
-
-        private Progress(long[] numbers) {
-            this.numbers = numbers;
-        }
-
-        /**
-         * Returns what the fingerprint lacks.
-         *
-         * @return {@link Phase#COMPLETE} when it lacks nothing
-         */
-        public Phase phase() {
-            return Phase.values()[(int) numbers[3]];
-        }
-
-        /**
-         * Returns how much of the fingerprint is made.
-         *
-         * @return 0 to 100
-         */
-        public int percent() {
-            return (int) numbers[4];
-        }
-
-        /**
-         * Returns how much was taken.
-         *
-         * @return whole frames
-         */
-        public long frames() {
-            return numbers[0];
-        }
-
-        /**
-         * Returns the leading silence that was skipped.
-         *
-         * @return milliseconds
-         */
-        public long silenceMillis() {
-            return numbers[1];
-        }
-
-        /**
-         * Returns the sound that was taken after leading silence.
-         *
-         * @return milliseconds
-         */
-        public long soundMillis() {
-            return numbers[2];
-        }
-
-        /**
-         * Returns the sound that is missing.
-         *
-         * @return milliseconds; 0 when the fingerprint is complete
-         */
-        public int missingMillis() {
-            return (int) numbers[5];
-        }
-
-        /**
-         * Returns where the fingerprint starts.
-         *
-         * @return milliseconds from the start of the stream
-         */
-        public long startMillis() {
-            return numbers[6];
-        }
-
-        /**
-         * Returns how much sound the fingerprint describes.
-         *
-         * @return milliseconds
-         */
-        public long durationMillis() {
-            return numbers[7];
-        }
-
-        @Override
-        public String toString() {
-            return phase() + ", " + percent() + " %, " + missingMillis() + " ms missing";
-        }
-    }
-
     private static final int PIECE = 1 << 16;
 
     private final SoundFormat format;
@@ -355,7 +255,7 @@ public final class StreamingFingerprint implements AutoCloseable {
         }
     }
 
-    private static String lack(Progress progress) {
+    private static String lack(StreamProgress progress) {
         switch (progress.phase()) {
             case NOTHING_FED:
                 return "No sound was fed";
@@ -373,12 +273,12 @@ public final class StreamingFingerprint implements AutoCloseable {
      * @return a copy of the numbers
      * @throws IllegalStateException when the object is closed
      */
-    public synchronized Progress progress() {
+    public synchronized StreamProgress progress() {
         long stream = handle.enter();
         try {
             long[] out = new long[8];
             Statuses.check(NativeStream.state(stream, out));
-            return new Progress(out);
+            return new StreamProgress(out);
         } finally {
             handle.leave();
         }

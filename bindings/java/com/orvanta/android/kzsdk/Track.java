@@ -13,7 +13,7 @@ public final class Track {
     private final List<String> sources = new ArrayList<>();
     private final Map<String, String> tags = new LinkedHashMap<>();
 
-    Track(long[] integers, byte[][] texts) {
+    private Track(long[] integers, byte[][] texts) {
         this.integers = integers;
         int sourceCount = (int) integers[4];
         for (int i = 0; i < sourceCount; ++i) {
@@ -21,6 +21,20 @@ public final class Track {
         }
         for (int i = sourceCount; i < texts.length; i += 2) {
             tags.put(Texts.of(texts[i]), Texts.of(texts[i + 1]));
+        }
+    }
+
+    /** Reads and frees a native record; null for none. */
+    static Track taken(long track) {
+        if (track == 0) {
+            return null;
+        }
+        try {
+            long[] integers = new long[5];
+            byte[][] texts = NativeCatalogue.track(track, integers);
+            return new Track(integers, texts);
+        } finally {
+            NativeCatalogue.freeTrack(track);
         }
     }
 

@@ -76,14 +76,14 @@ public class StreamingFingerprintTest {
     @Test
     public void progressGrowsUntilTheFingerprintIsComplete() {
         try (StreamingFingerprint stream = new StreamingFingerprint(MONO)) {
-            assertEquals(StreamingFingerprint.Phase.NOTHING_FED, stream.progress().phase());
+            assertEquals(StreamProgress.Phase.NOTHING_FED, stream.progress().phase());
             int percent = 0;
             int missing = Integer.MAX_VALUE;
             boolean complete = false;
             for (int done = 0; !complete; done += 22050) {
                 assertEquals(done / 2, stream.progress().frames());
                 complete = stream.feed(MUSIC, done, Math.min(22050, MUSIC.length - done));
-                StreamingFingerprint.Progress progress = stream.progress();
+                StreamProgress progress = stream.progress();
                 assertTrue(progress.percent() >= percent);
                 assertTrue(progress.missingMillis() < missing);
                 percent = progress.percent();
@@ -91,7 +91,7 @@ public class StreamingFingerprintTest {
             }
             assertEquals(100, percent);
             assertEquals(0, missing);
-            assertEquals(StreamingFingerprint.Phase.COMPLETE, stream.progress().phase());
+            assertEquals(StreamProgress.Phase.COMPLETE, stream.progress().phase());
             assertTrue("more sound is ignored", stream.feed(MUSIC, 0, MUSIC.length));
         }
     }

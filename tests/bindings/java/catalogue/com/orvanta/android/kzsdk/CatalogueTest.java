@@ -50,7 +50,7 @@ public class CatalogueTest {
     private static Catalogue ofThreeTunes() throws IOException {
         Catalogue catalogue = Catalogue.inMemory();
         for (int tune = 1; tune <= 3; ++tune) {
-            Catalogue.Added added = catalogue.add(
+            AddedTrack added = catalogue.add(
                     Tunes.sound(tune, 0, 40), "tune " + tune, title("Tune number " + tune));
             assertEquals(tune, added.track());
             assertTrue(added.isNew());
@@ -166,7 +166,7 @@ public class CatalogueTest {
     @Test
     public void theSameRecordingIsOneTrack() throws Exception {
         try (Catalogue music = ofThreeTunes()) {
-            Catalogue.Added again =
+            AddedTrack again =
                     music.add(Tunes.sound(2, 0, 40), "copy of 2", Collections.emptyMap());
             assertFalse(again.isNew());
             assertEquals(2, again.track());
@@ -240,7 +240,7 @@ public class CatalogueTest {
             }
         }
         try (Catalogue music = Catalogue.open(path)) {
-            List<Catalogue.Fault> faults = music.verify();
+            List<CatalogueFault> faults = music.verify();
             assertFalse(faults.isEmpty());
             assertFalse(faults.get(0).text().isEmpty());
         } catch (CatalogueException damaged) {
