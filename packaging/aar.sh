@@ -21,6 +21,9 @@ for abi in arm64-v8a armeabi-v7a x86_64 x86; do
     libraries="$libraries;$abi=build/android-$abi/kzsdk/libkzsdk.so"
 done
 
+# The tools' folder is named after the machine that builds.
+readelf=$(echo "$ANDROID_NDK_HOME"/toolchains/llvm/prebuilt/*/bin/llvm-readelf)
+
 cmake -D JAR=build/jar/bindings/java/kzsdk.jar -D "LIBRARIES=${libraries#;}" -D "VERSION=$version" -D "NDK=$ndk" \
-    -D WORK_DIR=build/aar -D OUT=build/kzsdk.aar -P packaging/aar.cmake
+    -D "READELF=$readelf" -D WORK_DIR=build/aar -D OUT=build/kzsdk.aar -P packaging/aar.cmake
 echo "aar: build/kzsdk.aar"

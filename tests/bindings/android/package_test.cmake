@@ -15,7 +15,7 @@ endfunction()
 set(aar "${WORK_DIR}/not_for_devices.aar")
 file(MAKE_DIRECTORY "${WORK_DIR}")
 output_of(ignored "${CMAKE_COMMAND}" -D "JAR=${JAR}" -D "LIBRARIES=x86_64=${LIBRARY}" -D
-          "VERSION=${VERSION}" -D NDK=27 -D "WORK_DIR=${WORK_DIR}/scratch" -D "OUT=${aar}" -P
+          "VERSION=${VERSION}" -D NDK=27 -D "READELF=${READELF}" -D "WORK_DIR=${WORK_DIR}/scratch" -D "OUT=${aar}" -P
           "${ROOT}/packaging/aar.cmake")
 
 set(tree "${WORK_DIR}/unpacked")
@@ -98,3 +98,17 @@ string(REGEX MATCHALL "LOAD [^\n]*" loads "${segments}")
 foreach(load IN LISTS loads)
   expect("${load}" "0x4000 *$" "alignment")
 endforeach()
+
+# A library that does not is not packed.
+file(WRITE "${WORK_DIR}/small_pages.c" "int kz_small_pages(void) { return 1; }\n")
+set(small "${WORK_DIR}/small_pages.so")
+output_of(ignored "${CC}" -shared -fPIC -nostdlib -Wl,-z,max-page-size=4096 -o "${small}" "${WORK_DIR}/small_pages.c")
+execute_process(
+  COMMAND "${CMAKE_COMMAND}" -D "JAR=${JAR}" -D "LIBRARIES=x86_64=${small}" -D "VERSION=${VERSION}" -D NDK=27 -D
+          "READELF=${READELF}" -D "WORK_DIR=${WORK_DIR}/scratch" -D "OUT=${WORK_DIR}/small_pages.aar" -P
+          "${ROOT}/packaging/aar.cmake"
+  RESULT_VARIABLE result ERROR_VARIABLE error)
+if(result EQUAL 0 OR EXISTS "${WORK_DIR}/small_pages.aar")
+  message(SEND_ERROR "A library for pages of 4 KiB was packed")
+endif()
+expect("${error}" "max-page-size=16384" "reason")

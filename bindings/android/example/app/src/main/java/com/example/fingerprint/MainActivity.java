@@ -1,29 +1,20 @@
 package com.example.fingerprint;
 
 import android.Manifest;
-import android.annotation.SuppressLint;
 import android.app.Activity;
 import android.content.pm.PackageManager;
-import android.media.AudioFormat;
-import android.media.AudioRecord;
-import android.media.MediaRecorder;
 import android.os.Bundle;
 import android.widget.Button;
 import android.widget.LinearLayout;
 import android.widget.TextView;
-import com.orvanta.android.kzsdk.AudioDescription;
-import com.orvanta.android.kzsdk.Fingerprint;
-import com.orvanta.android.kzsdk.FingerprintException;
 import com.orvanta.android.kzsdk.QueryDocument;
+import com.orvanta.android.kzsdk.StreamProgress;
 
-/** Records 15 seconds and shows their fingerprint. */
-public final class MainActivity extends Activity implements Fingerprint.Listener {
-    private static final int RATE = 44100;
-    private static final int SECONDS = 15;
-
-    private Fingerprint fingerprint;
+/** Listens until there is a fingerprint, and shows it. */
+public final class MainActivity extends Activity implements MicrophoneFeeder.Listener {
     private Button button;
     private TextView result;
+    private MicrophoneFeeder microphone;
 
     @Override
     protected void onCreate(Bundle state) {
@@ -38,15 +29,20 @@ public final class MainActivity extends Activity implements Fingerprint.Listener
         layout.addView(button);
         layout.addView(result);
         setContentView(layout);
-
-        fingerprint = new Fingerprint();
-        fingerprint.setListener(this, this::runOnUiThread);
     }
 
     @Override
-    protected void onDestroy() {
-        fingerprint.close();
-        super.onDestroy();
+    protected void onStop() {
+        stop(); // Android would record silence from now on
+        super.onStop();
+    }
+
+    private void stop() {
+        if (microphone != null) {
+            microphone.close();
+            microphone = null;
+        }
+        button.setEnabled(true);
     }
 
     private void listen() {
@@ -57,53 +53,29 @@ public final class MainActivity extends Activity implements Fingerprint.Listener
         }
         button.setEnabled(false);
         result.setText("Listening ...");
-        new Thread(this::recordAndAsk, "recorder").start();
-    }
-
-    private void recordAndAsk() {
-        try {
-            byte[] audio = record();
-            fingerprint.generate(AudioDescription.pcm16(RATE, 1), audio);
-        } catch (IllegalStateException refused) { // closed meanwhile, or no microphone
-            runOnUiThread(() -> show(refused.getMessage()));
-        }
-    }
-
-    @SuppressLint("MissingPermission") // listen() has asked for it
-    private static byte[] record() {
-        byte[] audio = new byte[2 * RATE * SECONDS];
-        int least = AudioRecord.getMinBufferSize(
-                RATE, AudioFormat.CHANNEL_IN_MONO, AudioFormat.ENCODING_PCM_16BIT);
-        AudioRecord recorder = new AudioRecord(MediaRecorder.AudioSource.MIC, RATE,
-                AudioFormat.CHANNEL_IN_MONO, AudioFormat.ENCODING_PCM_16BIT, 4 * least);
-        try {
-            recorder.startRecording();
-            int filled = 0;
-            while (filled < audio.length) {
-                int count = recorder.read(audio, filled, audio.length - filled);
-                if (count <= 0) {
-                    throw new IllegalStateException("The microphone failed (" + count + ")");
-                }
-                filled += count;
-            }
-        } finally {
-            recorder.release();
-        }
-        return audio;
+        microphone = new MicrophoneFeeder(this, this::runOnUiThread, this);
+        microphone.start();
     }
 
     @Override
-    public void onFingerprint(Fingerprint source, QueryDocument document) {
-        show(document.text());
+    public void onProgress(StreamProgress progress) {
+        result.setText("Listening ... " + progress.percent() + " %");
     }
 
     @Override
-    public void onFailure(Fingerprint source, FingerprintException reason) {
-        show(reason.getMessage());
+    public void onSilenced(boolean silenced) {
+        result.setText(silenced ? "Another app has the microphone ..." : "Listening ...");
     }
 
-    private void show(String text) {
-        button.setEnabled(true);
-        result.setText(text);
+    @Override
+    public void onFingerprint(QueryDocument document) {
+        result.setText(document.text());
+        stop();
+    }
+
+    @Override
+    public void onFailure(String reason) {
+        result.setText(reason);
+        stop();
     }
 }

@@ -1,0 +1,6 @@
+package android.annotation;
+
+/** As far as the example uses it. */
+public @interface SuppressLint {
+    String[] value();
+}

@@ -1,0 +1,4 @@
+package android.os;
+
+/** As far as the example uses it. */
+public final class Bundle {}
