@@ -47,15 +47,19 @@ def output(*command):
                           env={**os.environ, "LC_ALL": "C"}).stdout
 
 
+def dynamic(file, kind):
+    return re.findall(rf"\({kind}\).*\[(.*)\]", output("readelf", "-d", str(file)))
+
+
 def needed(file):
     """The libraries that a file names: ["libm.so.6", ...]"""
-    return re.findall(r"\(NEEDED\).*\[(.*)\]", output("readelf", "-d", str(file)))
+    return dynamic(file, "NEEDED")
 
 
 def opened(file):
     """The libraries whose names a program has among its texts, to open them: ["libavutil.so.57", ...]"""
     texts = re.findall(rb"(?<=\0)lib[a-z0-9_+-]+\.so\.[0-9]+(?=\0)", file.read_bytes())
-    return sorted({text.decode() for text in texts} - set(needed(file)))
+    return sorted({text.decode() for text in texts} - set(needed(file)) - set(dynamic(file, "SONAME")))
 
 
 @functools.cache
@@ -71,20 +75,32 @@ def places_of(file):
 
 
 @functools.cache
+def packages_of_all():
+    """The Debian package of every shared library: asked for at once, since each question takes half
+    a second."""
+    lines = re.findall(r"^([^:,\s]+)[^/]*: (/.*)$", output("dpkg-query", "-S", "*.so*"), re.MULTILINE)
+    return {place: package for package, place in lines}
+
+
 def package_of(place):
     """The Debian package that a file came in. It may list the file by its name from before /usr was
     merged."""
     place = os.path.realpath(place)
     for name in (place, place.removeprefix("/usr")):
-        found = subprocess.run(["dpkg-query", "-S", name], capture_output=True, text=True)
-        if found.returncode == 0:
-            return found.stdout.split(":")[0]
+        if name in packages_of_all():
+            return packages_of_all()[name]
     sys.exit(f"sbom: no Debian package holds {place}; build with Debian's own libraries")
 
 
+@functools.cache
+def versions_of_all():
+    """Version and architecture of every package."""
+    lines = output("dpkg-query", "-W", "-f", "${Package} ${Version} ${Architecture}\n").splitlines()
+    return {line.split()[0]: line.split()[1:] for line in reversed(lines) if len(line.split()) == 3}
+
+
 def packaged(package):
-    version, architecture = output(
-        "dpkg-query", "-W", "-f", "${Version} ${Architecture}\n", package).splitlines()[0].split()
+    version, architecture = versions_of_all()[package]
     component = {
         "type": "library",
         "bom-ref": f"deb:{package}",
@@ -175,6 +191,7 @@ def main():
     for ref, file in (("libkzsdk", library), ("libkzcat", catalogue), ("kzfp", program)):
         found.add_linked(file, ref, places_of(file))
         found.add_included(ref)
+    found.add_opened(catalogue, "libkzcat")
     found.add_opened(program, "kzfp")
     found.links["kzfp"] |= {"libkzsdk", "libkzcat"}  # their static forms
     document = {
