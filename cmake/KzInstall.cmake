@@ -73,11 +73,6 @@ if(KZ_BUILD_KZCAT)
   install(FILES "${PROJECT_SOURCE_DIR}/catalogue/kzcat.h" "${PROJECT_SOURCE_DIR}/catalogue/kzcat.hpp"
           DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}")
   kz_install_package(kzcat ${KZCAT_VERSION} kzcatTargets kzcatStaticTargets)
-  set(KZ_PC_LIBPQ "")
-  if(KZ_HAS_POSTGRESQL)
-    # Not its package: Debian's lists archives of Kerberos that no package has.
-    set(KZ_PC_LIBPQ " -lpq")
-  endif()
   configure_file("${PROJECT_SOURCE_DIR}/packaging/kzcat.pc.in" "${PROJECT_BINARY_DIR}/kzcat.pc" @ONLY)
   install(FILES "${PROJECT_BINARY_DIR}/kzcat.pc" DESTINATION "${pkgconfig_dir}")
   install(FILES "${PROJECT_SOURCE_DIR}/examples/recognise.c" "${PROJECT_SOURCE_DIR}/examples/recognise.cpp"

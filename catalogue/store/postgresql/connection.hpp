@@ -12,8 +12,7 @@
 #include <string_view>
 #include <vector>
 
-#include <libpq-fe.h>
-
+#include "catalogue/store/postgresql/libpq.hpp"
 #include "catalogue/store/postgresql/parameters.hpp"
 #include "catalogue/store/store.hpp"
 

@@ -224,6 +224,17 @@ TEST_F(KzfpServer, EachRefusalIsOneLine)
     }
 }
 
+TEST_F(KzfpServer, WithoutPostgresLibraryItsPackageIsNamed)
+{
+    scratch_.write("libraries/libpq.so.5", "none");
+    ProcessSetup setup;
+    setup.environment = {"LD_LIBRARY_PATH=" + scratch_.path("libraries")};
+    const ProcessResult result = kzfp({"list", url_}, setup);
+    EXPECT_EQ(1, result.status);
+    EXPECT_EQ(1, std::ranges::count(result.err, '\n')) << result.err;
+    EXPECT_TRUE(contains(result.err, "install it (Debian: libpq5)")) << result.err;
+}
+
 TEST_F(KzfpServer, ResultsMayBeNamedLikeADatabase)
 {
     fill(url_);

@@ -154,7 +154,7 @@ const std::map<std::string, Names> kOfRooms = {
     {"catalogue/match", kVectors},
     {"catalogue/index", kMappedFiles},
     {"catalogue/store", {"nettle/sha2.h", "sqlite3.h"}},
-    {"catalogue/store/postgresql", {"libpq-fe.h", "poll.h"}},
+    {"catalogue/store/postgresql", {"dlfcn.h", "libpq-fe.h", "poll.h"}},
     {"kzsdk/kernels", {"arm_neon.h", "immintrin.h", "smmintrin.h"}},
     {"kzsdk/disc", {"dirent.h", "fcntl.h", "sys/stat.h", "unistd.h"}},
     {"kzsdk/jni",

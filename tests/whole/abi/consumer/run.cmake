@@ -2,11 +2,9 @@
 # every way that is offered, and compares what the programs print.
 #
 #   cmake -D BUILD_DIR= -D WORK_DIR= -D EXAMPLES= -D C_COMPILER= -D CXX_COMPILER= -D GENERATOR=
-#         -D LIBDIR= -D CATALOGUE= -D POSTGRESQL= -P run.cmake
+#         -D LIBDIR= -D CATALOGUE= -P run.cmake
 #
-# CATALOGUE is ON where that library was built, POSTGRESQL where it knows servers: libpq has no
-# archive that a whole program could be linked with, so that only the libraries of the project are
-# archives.
+# CATALOGUE is ON where that library was built.
 cmake_minimum_required(VERSION 3.22)
 
 function(run)
@@ -44,12 +42,7 @@ function(build_programs package language source)
   run("${compiler}" "${source}" ${flags} "-Wl,-rpath,${prefix}/${LIBDIR}" -o "${build}/with_pkgconfig")
   output_of(flags pkg-config --static --cflags --libs ${package})
   separate_arguments(flags UNIX_COMMAND "${flags}")
-  set(static -static)
-  if(package STREQUAL "kzcat" AND POSTGRESQL)
-    set(static "")
-    list(TRANSFORM flags REPLACE "^-l(kzcat|kzsdk)$" "-l:lib\\1.a")
-  endif()
-  run("${compiler}" ${static} "${source}" ${flags} -o "${build}/with_pkgconfig_static")
+  run("${compiler}" -static "${source}" ${flags} -o "${build}/with_pkgconfig_static")
 endfunction()
 
 # expect_the_same(<package> <source> <pattern>): programs of a source in C, which is C++ as well,
