@@ -35,7 +35,7 @@ packages_of() {
     # Cross compilers, and what runs their programs.
     arch) echo "g++-aarch64-linux-gnu g++-arm-linux-gnueabihf g++-arm-linux-gnueabi g++-s390x-linux-gnu g++-i686-linux-gnu qemu-user" ;;
     # What builds and checks the packages, and a bare system to install them in.
-    debian) echo "debhelper dh-python lintian debootstrap fakeroot" ;;
+    debian) echo "build-essential debhelper dh-python lintian debootstrap" ;;
     wide) echo "libboost-dev" ;; # 128-bit numbers for tests on processors whose compilers have none
     *)
         echo "setup: no such group: $1" >&2
