@@ -136,6 +136,23 @@ def test_fingerprints_are_looked_up_by_their_documents(tune):
             catalogue.match(clip, rate=RATE)
 
 
+def test_other_speeds_are_looked_for_when_wanted(catalogue, tune):
+    clip, rate = tune[RATE * 11:RATE * 23], RATE * 95 // 100
+    (match,) = catalogue.match(clip, rate=rate)
+    assert match.speed == pytest.approx(0.95, abs=0.002)
+    assert catalogue.match(clip, rate=rate, speeds=False) == []
+
+
+def test_passages_are_told_apart_when_wanted(catalogue, tune):
+    noise = sounds.noise(RATE, 40, 1, 5)
+    other = catalogue.add(noise, rate=RATE, title="Noise")
+    mixed = tune[RATE * 2:RATE * 20] + noise[RATE * 5:RATE * 25]
+    found = catalogue.match(mixed, rate=RATE, passages=True)
+    assert [match.track for match in found] == [1, other.track]
+    assert found[1].clip_begin == pytest.approx(18, abs=2)
+    assert len(catalogue.match(mixed, rate=RATE)) < 2
+
+
 def test_a_stranger_gives_no_match_but_candidates(catalogue):
     noise = sounds.noise(RATE, 12, 0, 4)
     answer = catalogue.recognise(noise, rate=RATE, candidates=1)

@@ -44,6 +44,17 @@ def test_documents_are_the_golden_ones(golden, rate, channels, format, name, alg
     assert sounds.digest(document + "\n") == expected
 
 
+@pytest.mark.parametrize("line", [
+    "fixed 8000 1 s16 noise", "float 8000 1 s16 noise", "fixed 11025 1 s16 noise",
+    "float 11025 1 s16 noise", "float 12345 1 s16 music"])
+def test_arrays_have_the_golden_documents(golden, line):
+    algorithm, rate, _, _, piece = line.split()
+    rate = int(rate)
+    sound = sounds.noise(rate, 15, 1, rate + 1) if piece == "noise" else sounds.melody(rate, 1, 15)
+    document = kzsdk.fingerprint(sound, rate=rate, algorithm=algorithm).document
+    assert sounds.digest(document + "\n") == golden[line]
+
+
 @pytest.mark.parametrize("rate, channels, dtype, name", [
     (11025, 3, numpy.float64, "f64"), (8000, 2, numpy.uint8, "linear8")])
 def test_wide_samples_have_the_golden_documents(golden, rate, channels, dtype, name):

@@ -1,12 +1,16 @@
 """Threads: calls beside each other, handles closed meanwhile, and the interpreter's lock."""
 
+import gc
 import sys
 import threading
+import time
 
 import pytest
 import sounds
 
 import kzsdk
+from kzsdk._handle import Handle
+from kzsdk._interface import ffi
 
 RATE = 8000
 ROUNDS = 20
@@ -46,6 +50,77 @@ def until_closed(begun, work):
         except kzsdk.ClosedError:
             pass
     return loop
+
+
+class Counted:
+    """A handle without a library, which counts how often it is freed."""
+
+    def __init__(self, shared):
+        self.freed = []
+        self._free = ffi.callback("kzcat_status(kzcat_catalogue**)", self._take)
+        address = ffi.cast("kzcat_catalogue*", 4096)
+        self.handle = Handle("thing", address, self._free, shared)
+
+    def _take(self, reference):
+        self.freed.append(int(ffi.cast("uintptr_t", reference[0])))
+        return 0
+
+
+@pytest.mark.parametrize("shared", [True, False])
+def test_a_handle_is_freed_by_its_last_user(shared):
+    counted = Counted(shared)
+    with counted.handle.use() as address:
+        counted.handle.close()
+        assert counted.freed == [] and int(ffi.cast("uintptr_t", address)) == 4096
+        with pytest.raises(kzsdk.ClosedError):
+            counted.handle.use().__enter__()
+        assert counted.freed == []
+    assert counted.freed == [4096]
+    counted.handle.close()
+    del counted.handle
+    gc.collect()
+    assert counted.freed == [4096]
+
+
+def test_a_handle_that_is_forgotten_is_freed():
+    counted = Counted(shared=True)
+    del counted.handle
+    gc.collect()
+    assert counted.freed == [4096]
+
+
+def test_users_of_an_exclusive_handle_take_turns():
+    counted, inside, most = Counted(shared=False), [], []
+
+    def use():
+        for _ in range(200):
+            with counted.handle.use():
+                inside.append(1)
+                most.append(len(inside))
+                time.sleep(0)
+                inside.pop()
+
+    run_all(use, use, use)
+    assert len(most) == 600 and max(most) == 1
+
+
+def test_who_waits_for_a_turn_learns_of_the_end():
+    counted, waits = Counted(shared=False), threading.Event()
+    raised = []
+
+    def wait():
+        waits.set()
+        with pytest.raises(kzsdk.ClosedError) as caught, counted.handle.use():
+            pass
+        raised.append(caught.value)
+
+    thread = threading.Thread(target=wait)
+    with counted.handle.use():
+        thread.start()
+        waits.wait()
+        counted.handle.close()
+    thread.join()
+    assert len(raised) == 1 and counted.freed == [4096]
 
 
 def test_a_stream_is_closed_while_it_is_fed(tune):
