@@ -29,7 +29,7 @@ packages_of() {
     fuzz) echo "libexpat1-dev python3" ;; # a parser to read what is rendered, and the seeds
     # The programs that degrade music, and the peer that is packaged.
     evaluation) echo "ffmpeg sox libsox-fmt-all espeak-ng libchromaprint-tools python3 python3-numpy" ;;
-    lint) echo "clang-format-14 clang-tidy-14 cppcheck mandoc shellcheck" ;;
+    lint) echo "python3-mypy clang-format-14 clang-tidy-14 cppcheck mandoc shellcheck" ;;
     clang) echo "clang-14 libclang-rt-14-dev" ;;
     coverage) echo "llvm-14" ;; # what counts
     # Cross compilers, and what runs their programs.

@@ -33,7 +33,8 @@ def fingerprint(sound: Sound, *, rate: Optional[int] = None, channels: Optional[
     Raises TooLittleSoundError, SoundFileError or ArgumentError, which say what would help.
     """
     rates = _FIXED_RATES if algorithm_number(algorithm) == 1 else None
-    named = f"{os.fsdecode(sound)}: " if _sources.is_path(sound) else ""
+    path = _sources.path_of(sound)
+    named = "" if path is None else f"{path}: "
     with _sources.open_sound(sound, rate, channels, format, rates, floats=False) as source:
         with stream_for(source.layout, algorithm) as stream:
             for piece in source.pieces():

@@ -77,7 +77,8 @@ def sound() -> Any:
 
 def text(address: Any) -> str:
     """A text of the library; what is not UTF-8 in it is shown as the system shows paths."""
-    return ffi.string(address).decode("utf-8", "surrogateescape")
+    data: bytes = ffi.string(address)
+    return data.decode("utf-8", "surrogateescape")
 
 
 def optional_text(address: Any) -> str | None:

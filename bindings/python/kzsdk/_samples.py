@@ -4,14 +4,16 @@ from __future__ import annotations
 
 import operator
 import re
-from typing import TYPE_CHECKING, Any, NamedTuple, Optional, Union
+from typing import TYPE_CHECKING, Any, NamedTuple, Optional, Tuple, Union
 
 from kzsdk import _native
 from kzsdk.errors import ArgumentError
 
 if TYPE_CHECKING:
+    import array
+
     import numpy
-    Samples = Union[bytes, bytearray, memoryview, "numpy.ndarray[Any, Any]"]
+    Samples = Union[bytes, bytearray, memoryview, "array.array[Any]", "numpy.ndarray[Any, Any]"]
 else:
     Samples = Any
 
@@ -93,7 +95,7 @@ def piece_of(sound: Any) -> Piece:
 
 
 def _view_of(sound: Any) -> memoryview:
-    dtype = getattr(sound, "dtype", None)
+    dtype: Any = getattr(sound, "dtype", None)
     if getattr(dtype, "isnative", True) is False:
         sound = sound.astype(dtype.newbyteorder("="))
     try:
@@ -105,7 +107,8 @@ def _view_of(sound: Any) -> memoryview:
             f"{type(sound).__name__} is not sound: pass a path, bytes, an array of samples, or an "
             "iterator of such pieces")
     import numpy
-    return memoryview(numpy.asarray(sound))
+    array: Any = numpy.asarray(sound)
+    return memoryview(array)
 
 
 def _piece_of_array(sound: Any) -> Piece:
@@ -116,15 +119,16 @@ def _piece_of_array(sound: Any) -> Piece:
         raise TypeError(
             f"samples of type {shown} cannot be used: convert them to int16, int32 or float32, as "
             "with samples.astype('float32'); full scale of floats is 1")
+    shape: Tuple[int, ...] = view.shape or ()
     if view.ndim not in (1, 2):
         raise ArgumentError(
-            f"samples of shape {view.shape} cannot be used: pass (frames,) or (frames, channels)")
-    channels = view.shape[1] if view.ndim == 2 else 1
+            f"samples of shape {shape} cannot be used: pass (frames,) or (frames, channels)")
+    channels = shape[1] if view.ndim == 2 else 1
     if not 1 <= channels <= _MOST_CHANNELS:
-        raise ArgumentError(f"samples of shape {view.shape} have {channels} channels: pass "
+        raise ArgumentError(f"samples of shape {shape} have {channels} channels: pass "
                             f"(frames, channels), with 1 to {_MOST_CHANNELS} of them")
     data = view if view.c_contiguous else view.tobytes()
-    return Piece(data, view.nbytes, name, channels, view.shape[0])
+    return Piece(data, view.nbytes, name, channels, shape[0])
 
 
 def _whole_number(value: Any, name: str) -> int:

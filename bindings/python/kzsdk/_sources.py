@@ -152,8 +152,9 @@ def reader() -> str:
     return f"soundfile {soundfile.__version__}"
 
 
-def is_path(sound: Any) -> bool:
-    return isinstance(sound, (str, os.PathLike))
+def path_of(sound: Any) -> Optional[str]:
+    """The path that was passed as sound; None when it is something else."""
+    return os.fsdecode(sound) if isinstance(sound, (str, os.PathLike)) else None
 
 
 def _open_file(path: str, rates: Optional[Sequence[int]], floats: bool) -> Source:
@@ -169,8 +170,8 @@ def _open_file(path: str, rates: Optional[Sequence[int]], floats: bool) -> Sourc
 def open_sound(sound: Any, rate: Any, channels: Any, format: Optional[str],
                rates: Optional[Sequence[int]] = None, floats: bool = True) -> Source:
     """Opens whatever was passed as sound. A file is converted when its rate is not in ``rates``."""
-    if is_path(sound):
-        path = os.fsdecode(sound)
+    path = path_of(sound)
+    if path is not None:
         if rate is not None or channels is not None or format is not None:
             raise ArgumentError(f"{path}: a sound file has a rate, channels and a format of its "
                                 "own: leave them out, or pass the samples of a headerless file")

@@ -75,7 +75,7 @@ class Catalogue:
         ``documents``: fingerprints are to be looked up in it too.
         """
         self._handle.check_open()
-        path = os.fsdecode(sound) if _sources.is_path(sound) else None
+        path = _sources.path_of(sound)
         own = {"title": title, "artist": artist}
         wanted = {**(tags or {}), **{name: text for name, text in own.items() if text is not None}}
         uri = source or path or wanted.get("title")
@@ -134,8 +134,9 @@ class Catalogue:
             raise ArgumentError(f"candidates={candidates} cannot be used: pass 0 to 1000")
         options.speeds, options.passages = int(speeds), int(passages)
         options.candidates = candidates
-        if _sources.is_path(sound):
-            _feeding.check_is_not_of(self._library, self._path, os.fsdecode(sound))
+        path = _sources.path_of(sound)
+        if path is not None:
+            _feeding.check_is_not_of(self._library, self._path, path)
         with _feeding.query_of(self._library, sound, rate, channels, format) as query:
             with self._handle.use() as catalogue:
                 with _feeding.result_of(self._library, catalogue, query, options) as result:

@@ -13,7 +13,7 @@ from kzsdk._handle import Handle
 from kzsdk._interface import ffi
 
 RATE = 8000
-ROUNDS = 20
+ROUNDS = 12
 
 
 @pytest.fixture(scope="module")
@@ -40,16 +40,25 @@ def run_all(*works):
         raise raised[0]
 
 
-def until_closed(begun, work):
-    """Repeats what is done until the handle is closed under it."""
-    def loop():
-        begun.wait()
+def close_under(handle, *works):
+    """Repeats all works at once, and closes what they use in the middle of that."""
+    done = threading.Semaphore(0)
+
+    def repeat(work):
         try:
             while True:
                 work()
+                done.release()
         except kzsdk.ClosedError:
             pass
-    return loop
+
+    def close():
+        for _ in works:
+            done.acquire()
+        handle.close()
+
+    run_all(*(lambda work=work: repeat(work) for work in works), close)
+    assert handle.closed
 
 
 class Counted:
@@ -126,17 +135,8 @@ def test_who_waits_for_a_turn_learns_of_the_end():
 def test_a_stream_is_closed_while_it_is_fed(tune):
     for _ in range(ROUNDS):
         stream = kzsdk.Stream(RATE)
-        begun = threading.Barrier(4)
-
-        def close():
-            begun.wait()
-            stream.close()
-
-        run_all(until_closed(begun, lambda: stream.feed(tune[:RATE])),
-                until_closed(begun, lambda: stream.state),
-                until_closed(begun, lambda: stream.progress),
-                close)
-        assert stream.closed
+        close_under(stream, lambda: stream.feed(tune[:RATE]), lambda: stream.state,
+                    lambda: stream.progress)
 
 
 def test_a_catalogue_is_closed_while_it_is_used(tune):
@@ -144,18 +144,9 @@ def test_a_catalogue_is_closed_while_it_is_used(tune):
     for _ in range(ROUNDS):
         catalogue = kzsdk.Catalogue(None)
         catalogue.add(tune, rate=RATE, title="A tune")
-        begun = threading.Barrier(5)
-
-        def close():
-            begun.wait()
-            catalogue.close()
-
-        run_all(until_closed(begun, lambda: catalogue.match(clip, rate=RATE)),
-                until_closed(begun, lambda: catalogue.add(clip, rate=RATE, title="A clip")),
-                until_closed(begun, lambda: list(catalogue)),
-                until_closed(begun, catalogue.verify),
-                close)
-        assert catalogue.closed
+        close_under(catalogue, lambda: catalogue.match(clip, rate=RATE),
+                    lambda: catalogue.add(clip, rate=RATE, title="A clip"),
+                    lambda: list(catalogue), catalogue.verify)
 
 
 def test_threads_that_match_at_once_agree(tune):
