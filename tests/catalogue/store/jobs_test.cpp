@@ -116,6 +116,50 @@ TEST_F(JobsTest, NothingIsKeptWhenTheEndIsNotReached)
     EXPECT_EQ(1u, other->counts().done);
 }
 
+TEST_F(JobsTest, NoTrackIsKeptWhenTheEndIsRefused)
+{
+    const auto jobs = open();
+    add(*jobs, {"a"});
+    jobs->take("one", kAttempts);
+    postgresql::Connection other(databases_->url());
+    other.execute("CREATE FUNCTION refuse() RETURNS trigger LANGUAGE plpgsql AS "
+                  "$$ BEGIN RAISE EXCEPTION 'no'; END $$; CREATE TRIGGER refused BEFORE UPDATE ON "
+                  "job FOR EACH ROW WHEN (NEW.state = 'done') EXECUTE FUNCTION refuse()");
+    const NewTrack track = make_track(1);
+    EXPECT_THROW(jobs->finish({&track, 1}, 0), StoreError);
+    EXPECT_TRUE(track_ids(*store()).empty());
+    other.execute("DROP TRIGGER refused ON job; DROP FUNCTION refuse()");
+}
+
+TEST_F(JobsTest, LongOnesAreHeldByTheirWorkersAlone)
+{
+    const auto jobs = open();
+    add(*jobs, {"a"});
+    postgresql::Connection other(databases_->url());
+    other.execute("CREATE FUNCTION backdate() RETURNS trigger LANGUAGE plpgsql AS $$ BEGIN "
+                  "NEW.started = NEW.started - interval '1 hour'; RETURN NEW; END $$; "
+                  "CREATE TRIGGER old BEFORE UPDATE ON job FOR EACH ROW EXECUTE FUNCTION "
+                  "backdate()");
+    jobs->take("one", kAttempts);
+    EXPECT_EQ("none", uri_of(open()->take("two", kAttempts))) << "nor waited for";
+    jobs->finish({}, 0);
+    EXPECT_EQ(1u, jobs->counts().done);
+    other.execute("DROP TRIGGER old ON job; DROP FUNCTION backdate()");
+}
+
+TEST_F(JobsTest, AreLeftToTheirSessionsForAMinute)
+{
+    const auto jobs = open();
+    add(*jobs, {"a"});
+    postgresql::Connection other(databases_->url());
+    const std::string taken = "UPDATE job SET state = 'running', attempt = 1, backend = "
+                              "pg_backend_pid(), started = clock_timestamp()";
+    other.execute(taken); // as between the two transactions of a worker
+    EXPECT_EQ("none", uri_of(jobs->take("one", kAttempts)));
+    other.execute(taken + " - interval '2 minutes'"); // the process may be another's by now
+    EXPECT_EQ("a", uri_of(jobs->take("one", kAttempts)));
+}
+
 TEST_F(JobsTest, AJobThatWasRefusedCanStillFail)
 {
     const auto jobs = open();
