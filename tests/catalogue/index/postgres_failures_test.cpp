@@ -176,6 +176,18 @@ TEST_F(Shards, ThatAreLeftAnswerWhenThatIsEnough)
     EXPECT_EQ(ids_[10], found(*index, 11));
 }
 
+TEST_F(Shards, ThatAreLeftDoNotSettleThePopulation)
+{
+    fleet_->coordinator.sql("DELETE FROM kzcat.population");
+    fleet_->two.kill9();
+    open_index(*store_, options_for(url(), true));
+    const std::string count = "SELECT count(*) FROM kzcat.population";
+    EXPECT_EQ("0\n", fleet_->coordinator.sql(count));
+    fleet_->two.start();
+    open_index(*store_, options_for(url()));
+    EXPECT_EQ("1\n", fleet_->coordinator.sql(count));
+}
+
 TEST_F(Shards, AllOfThemDeadAnswerNothing)
 {
     const auto index = open_index(*store_, options_for(url(), true));
@@ -217,6 +229,39 @@ TEST_F(Extension, MissingOnTheServerIsNamedWithItsCure)
     IndexOptions options = options_for(server.url());
     options.write_from = 1'000'000;
     EXPECT_EQ(ids[4], found(*open_index(*store, options), 5));
+}
+
+TEST_F(Extension, JoinsWhatParallelWorkersFind)
+{
+    if (!kz::test::postgres_obstacle().empty()) {
+        GTEST_SKIP() << kz::test::postgres_obstacle();
+    }
+    const kz::test::PostgresServer server;
+    const auto store = open_postgres_store(server.url(), Access::create);
+    add(*store, 1, kTracks);
+    IndexOptions options = options_for(server.url());
+    options.plan = Plan::scan;
+    const auto alone = open_index(*store, options);
+    server.sql("ALTER TABLE kzcat.trail SET (parallel_workers = 2);"
+               "ALTER DATABASE postgres SET parallel_setup_cost = 0;"
+               "ALTER DATABASE postgres SET parallel_tuple_cost = 0;"
+               "ALTER DATABASE postgres SET min_parallel_table_scan_size = 0;"
+               "ALTER DATABASE postgres SET parallel_leader_participation = off");
+    const std::string plan =
+        server.sql("EXPLAIN SELECT shard, kzcat.kz_scan(track, codes, '') FROM kzcat.trail "
+                   "GROUP BY shard");
+    EXPECT_EQ(1U, occurrences(plan, "Partial \\w*Aggregate")) << plan;
+    const auto together = open_index(*store, options);
+    for (uint64_t number = 1; number <= kTracks; number += 9) {
+        const Reading clip = clip_of(number, 8);
+        const auto expected = alone->find(clip, 10);
+        const auto found = together->find(clip, 10);
+        ASSERT_EQ(expected.size(), found.size());
+        for (size_t i = 0; i < found.size(); ++i) {
+            EXPECT_EQ(expected[i].track, found[i].track) << number;
+            EXPECT_EQ(expected[i].position, found[i].position) << number;
+        }
+    }
 }
 
 class Standby : public testing::Test {};

@@ -77,6 +77,16 @@ TEST_F(Writers, TakePartInTheCallersTransaction)
     }
 }
 
+TEST_F(Writers, KeepCodesOfTracksThatAreThere)
+{
+    const Databases databases{3};
+    const auto store = open(databases);
+    add_tracks(*store, 1, 6);
+    connection_of(*store).execute("INSERT INTO pending SELECT id, shard FROM track");
+    store->set_setting("a", "b"); // a writer, which looks for what others have left
+    EXPECT_EQ(std::vector<std::string>(), faults(*store));
+}
+
 TEST_F(Writers, MustNotCommitWhatHasFailed)
 {
     const Databases databases{1};
