@@ -1,5 +1,5 @@
 # What the libraries export depends on the options, never on what the machine has: without a jni.h,
-# a JDK or SQLite the configuration stops and names its cures.
+# a JDK, SQLite or a Python that was asked for the configuration stops and names its cures.
 #
 #   cmake -D ROOT= -D WORK_DIR= -D C_COMPILER= -D CXX_COMPILER= -D GENERATOR=
 #         -P configuration_test.cmake
@@ -74,6 +74,9 @@ expect_setting(no_server KZ_POSTGRESQL OFF)
 
 configure(no_catalogue "${ROOT}" -DKZ_BUILD_TESTS=OFF -DKZ_BUILD_TOOLS=ON -DKZ_BUILD_CATALOGUE=OFF)
 expect_stop(no_catalogue "uses the catalogue" -DKZ_BUILD_CATALOGUE=ON -DKZ_BUILD_TOOLS=OFF)
+
+configure(no_python "${ROOT}" ${alone} -DKZ_PYTHON=ON -DKZ_PYTHON_EXECUTABLE=/bin/false)
+expect_stop(no_python "no Python was found that has cffi" python3-cffi -DKZ_PYTHON=OFF)
 
 file(WRITE "${WORK_DIR}/another/CMakeLists.txt"
      "cmake_minimum_required(VERSION 3.22)\nproject(another C CXX)\nadd_subdirectory(\"${ROOT}\" kzsdk)\n")
