@@ -46,7 +46,7 @@ check() {
         x86_64* | i686*) flags=$(instruction_set "$file") ;;
         esac
         # shellcheck disable=SC2086 # the flags are meant to be split
-        clang++-14 -target "$triple" -std=c++20 -O1 -fPIC -ffp-contract=off -fno-exceptions -fno-rtti \
+        clang++-14 -target "$triple" -std=c++20 -O0 -fPIC -D_FILE_OFFSET_BITS=64 -fno-exceptions -fno-rtti \
             -fvisibility=hidden -Wall -Wextra -Wconversion -Wsign-conversion -Wshadow -Werror $flags \
             -nostdinc++ -nostdlibinc -I. -isystem /usr/include/android/nativehelper $where \
             -idirafter /usr/include/android -c -o "$folder/object.o" "$file"
