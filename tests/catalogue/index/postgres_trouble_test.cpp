@@ -1,5 +1,6 @@
-// Catalogues on servers when memory is short, the client's libraries' included, and when connections
-// end in the middle of the work: what was begun is done or not, nothing leaks, and the next call works.
+// Catalogues on servers when memory is short, the client's libraries' included, and when
+// connections end in the middle of the work: what was begun is done or not, nothing leaks, and the
+// next call works.
 
 #include <atomic>
 #include <cerrno>

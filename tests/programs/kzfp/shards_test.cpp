@@ -1,5 +1,5 @@
-// A catalogue whose tracks are spread over servers, as its users meet it: the answers are those of a
-// file, those of the servers that are left say so, and workers put each track down once.
+// A catalogue whose tracks are spread over servers, as its users meet it: the answers are those of
+// a file, those of the servers that are left say so, and workers add each track once.
 
 #include "kzfp.hpp"
 
@@ -61,8 +61,8 @@ Samples muffled(const Samples& samples)
     return low;
 }
 
-/// Which strangers come nearest is decided by hits of chance alone: by parts, other tracks of a file
-/// than of a server may be the ones that are compared.
+/// Which strangers come nearest is decided by hits of chance alone: by parts, other tracks of a
+/// file than of a server may be the ones that are compared.
 std::vector<json> without_strangers(const std::string& answers)
 {
     std::vector<json> lines = lines_of(answers);
