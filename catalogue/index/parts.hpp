@@ -62,7 +62,7 @@ using PartTables = std::array<PartTable, kParts>;
 const char* fault_of(const PartTable& table);
 
 /// Calls `visit` with each unit of a list, as long as they lie below `units`: the words of a
-/// damaged list may lead anywhere.
+/// damaged list may lead anywhere. The list has whole words.
 template <class Visit>
 void for_each_unit(std::span<const std::byte> list, uint32_t units, Visit visit)
 {

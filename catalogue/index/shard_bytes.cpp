@@ -4,6 +4,7 @@
 #include "catalogue/index/shard_bytes.hpp"
 
 #include <algorithm>
+#include <cmath>
 
 #include "catalogue/index/byte_streams.hpp"
 
@@ -75,6 +76,11 @@ PassPlan get_plan(Reader& reader)
     plan.codes = reader.get<uint32_t>();
     plan.spread.mean = reader.get<double>();
     plan.spread.deviation = reader.get<double>();
+    // A population's deviation is never smaller. Others would make agreements that have no order.
+    if (!std::isfinite(plan.spread.mean) || !(plan.spread.deviation >= 1) ||
+        std::isinf(plan.spread.deviation)) {
+        throw ShardBytesError("the spread of a plan is none that a population has");
+    }
     const bool has_limit = reader.get<uint32_t>() != 0;
     const auto limit = reader.get<uint32_t>();
     if (has_limit) {
@@ -235,9 +241,24 @@ std::vector<RankedPlace> to_places(std::span<const std::byte> bytes)
         place.place.phase = reader.get<uint32_t>();
         place.place.position = reader.get<int64_t>();
         place.agreement = reader.get<double>();
+        if (std::isnan(place.agreement)) {
+            throw ShardBytesError("an agreement is not a number");
+        }
     }
     reader.expect_end();
     return places;
+}
+
+std::vector<uint64_t> to_lengths(std::span<const std::byte> bytes)
+{
+    Reader reader(bytes);
+    auto lengths = reader.get_all<uint64_t>(kPartValues);
+    reader.expect_end();
+    // No sum of these wraps, over any number of servers.
+    if (std::ranges::any_of(lengths, [](uint64_t words) { return words >> 40U != 0; })) {
+        throw ShardBytesError("a list is longer than servers have room for");
+    }
+    return lengths;
 }
 
 std::vector<TrackSpan> to_track_spans(std::span<const std::byte> bytes)

@@ -68,6 +68,9 @@ ShardReading to_shard_reading(std::span<const std::byte> bytes);
 ShardBytes to_bytes(std::span<const RankedPlace> places);
 std::vector<RankedPlace> to_places(std::span<const std::byte> bytes);
 
+/// The lengths of a part's lists, in words.
+std::vector<uint64_t> to_lengths(std::span<const std::byte> bytes);
+
 /// The tracks of a segment as a row has them: see posting.sql.
 std::vector<TrackSpan> to_track_spans(std::span<const std::byte> bytes);
 

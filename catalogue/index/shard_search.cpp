@@ -4,6 +4,7 @@
 #include "catalogue/index/shard_search.hpp"
 
 #include <algorithm>
+#include <functional>
 #include <tuple>
 #include <utility>
 
@@ -57,6 +58,9 @@ HitCounter::HitCounter(std::span<const std::byte> query)
 
 void HitCounter::add(int32_t segment, int32_t list, std::span<const std::byte> words)
 {
+    if (words.size() % 2 != 0) {
+        throw ShardBytesError("the words of a list do not take two bytes each");
+    }
     Segment& own = segments_[segment];
     if (list == kTracksList) {
         own.tracks = to_track_spans(words);
@@ -218,6 +222,31 @@ std::vector<RankedPlace> Scanner::places() const
     auto best = places_;
     keep_best(best, query_.limit);
     return best;
+}
+
+void LengthSum::add_starts(std::span<const std::byte> starts)
+{
+    std::vector<uint32_t> begins;
+    get_little_endian(starts, begins);
+    if (starts.size() != 4 * (size_t{kPartValues} + 1) || !std::ranges::is_sorted(begins)) {
+        throw ShardBytesError("these are not the starts of a part's lists");
+    }
+    for (uint32_t value = 0; value < kPartValues; ++value) {
+        words_[value] += begins[value + 1] - begins[value];
+    }
+}
+
+void LengthSum::add(std::span<const std::byte> lengths)
+{
+    const std::vector<uint64_t> added = to_lengths(lengths);
+    std::ranges::transform(words_, added, words_.begin(), std::plus{});
+}
+
+ShardBytes LengthSum::lengths() const
+{
+    ByteWriter writer;
+    writer.put_all(std::span(words_));
+    return writer.take();
 }
 
 void PostingBuilder::add(std::span<const Code> codes)

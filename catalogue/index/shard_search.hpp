@@ -88,6 +88,21 @@ private:
     std::vector<RankedPlace> places_;
 };
 
+/// Sums the lengths of a part's lists over segments.
+class LengthSum {
+public:
+    /// The starts of a segment's lists: see PartTable. Throws ShardBytesError.
+    void add_starts(std::span<const std::byte> starts);
+    /// What lengths() gave for other segments.
+    void add(std::span<const std::byte> lengths);
+
+    /// kPartValues lengths in words, 8 bytes each.
+    ShardBytes lengths() const;
+
+private:
+    std::vector<uint64_t> words_ = std::vector<uint64_t>(kPartValues);
+};
+
 /// The postings of one part, of tracks that are added in the order of their ids.
 class PostingBuilder {
 public:

@@ -46,18 +46,19 @@ uint32_t part_in(std::span<const std::byte> query)
     return std::to_integer<uint32_t>(query[0]);
 }
 
+using Work = std::variant<HitCounter, Ranker, Scanner, PostingBuilder, LengthSum>;
+
 } // namespace
 
 struct kzm_state {
     kzm_kind kind;
     ShardBytes query;
-    std::variant<HitCounter, Ranker, Scanner, PostingBuilder> work;
+    Work work;
     std::vector<Ranker::Range> ranges;
     std::vector<Code> codes;
     ShardBytes result;
 
-    static std::variant<HitCounter, Ranker, Scanner, PostingBuilder>
-    make(kzm_kind kind, std::span<const std::byte> query)
+    static Work make(kzm_kind kind, std::span<const std::byte> query)
     {
         switch (kind) {
         case KZM_COUNT:
@@ -66,6 +67,8 @@ struct kzm_state {
             return Ranker(query);
         case KZM_SCAN:
             return Scanner(query);
+        case KZM_LENGTHS:
+            return LengthSum();
         default:
             return PostingBuilder(part_in(query));
         }
@@ -75,20 +78,25 @@ struct kzm_state {
     {
     }
 
-    ShardBytes places() const
+    /// What the aggregate has found so far, in the form in which another can take it in.
+    ShardBytes found() const
     {
+        if (const auto* sum = std::get_if<LengthSum>(&work)) {
+            return sum->lengths();
+        }
         if (const auto* ranker = std::get_if<Ranker>(&work)) {
             return to_bytes(std::span<const RankedPlace>(ranker->places()));
         }
         return to_bytes(std::span<const RankedPlace>(std::get<Scanner>(work).places()));
     }
-    void add(std::span<const std::byte> places)
+    void add(std::span<const std::byte> found)
     {
-        const auto read = to_places(places);
-        if (auto* ranker = std::get_if<Ranker>(&work)) {
-            ranker->add(read);
+        if (auto* sum = std::get_if<LengthSum>(&work)) {
+            sum->add(found);
+        } else if (auto* ranker = std::get_if<Ranker>(&work)) {
+            ranker->add(to_places(found));
         } else {
-            std::get<Scanner>(work).add(read);
+            std::get<Scanner>(work).add(to_places(found));
         }
     }
 };
@@ -138,14 +146,20 @@ bool kzm_track(kzm_state* state, int64_t track, const void* codes, uint64_t coun
     });
 }
 
+bool kzm_starts(kzm_state* state, const void* starts, size_t bytes, char* error)
+{
+    return guarded(error,
+                   [&] { std::get<LengthSum>(state->work).add_starts(span_of(starts, bytes)); });
+}
+
 bool kzm_save(kzm_state* state, const void** bytes, size_t* count, char* error)
 {
     return guarded(error, [&] {
         state->result.resize(8);
         put_little_endian(uint64_t{state->query.size()}, state->result.data());
         state->result.insert(state->result.end(), state->query.begin(), state->query.end());
-        const ShardBytes places = state->places();
-        state->result.insert(state->result.end(), places.begin(), places.end());
+        const ShardBytes found = state->found();
+        state->result.insert(state->result.end(), found.begin(), found.end());
         *bytes = state->result.data();
         *count = state->result.size();
     });
@@ -177,7 +191,7 @@ kzm_state* kzm_copy(kzm_state* state, char* error)
 
 bool kzm_join(kzm_state* state, kzm_state* other, char* error)
 {
-    return guarded(error, [&] { state->add(other->places()); });
+    return guarded(error, [&] { state->add(other->found()); });
 }
 
 bool kzm_result(kzm_state* state, const void** bytes, size_t* count, char* error)
@@ -190,7 +204,7 @@ bool kzm_result(kzm_state* state, const void** bytes, size_t* count, char* error
             state->result = std::move(table.starts);
             state->result.insert(state->result.end(), table.words.begin(), table.words.end());
         } else {
-            state->result = state->places();
+            state->result = state->found();
         }
         *bytes = state->result.data();
         *count = state->result.size();

@@ -14,10 +14,11 @@ extern "C" {
 #define KZM_ERROR_BYTES 200
 
 /* What an aggregate gathers. */
-enum kzm_kind { KZM_COUNT, KZM_RANK, KZM_SCAN, KZM_TABLE };
+enum kzm_kind { KZM_COUNT, KZM_RANK, KZM_SCAN, KZM_TABLE, KZM_LENGTHS };
 typedef struct kzm_state kzm_state;
 
-/* Null on failure. The query is copied; that of KZM_TABLE is the part's number, one byte. */
+/* Null on failure. The query is copied; that of KZM_TABLE is the part's number, one byte,
+   that of KZM_LENGTHS is empty. */
 kzm_state* kzm_create(enum kzm_kind kind, const void* query, size_t bytes, char* error);
 void kzm_free(kzm_state* state);
 
@@ -32,7 +33,10 @@ void kzm_range(const kzm_state* state, size_t number, uint64_t* begin, uint64_t*
 /* KZM_RANK, KZM_SCAN, KZM_TABLE: a track's codes, 8 bytes each. */
 bool kzm_track(kzm_state* state, int64_t track, const void* codes, uint64_t count, char* error);
 
-/* KZM_RANK, KZM_SCAN: the state as bytes, which are those of kzm_result() with the query before
+/* KZM_LENGTHS: the starts of a part's lists in one segment. */
+bool kzm_starts(kzm_state* state, const void* starts, size_t bytes, char* error);
+
+/* KZM_RANK, KZM_SCAN, KZM_LENGTHS: the state as bytes, which are those of kzm_result() with the query before
    them; and what another state has gathered. */
 bool kzm_save(kzm_state* state, const void** bytes, size_t* count, char* error);
 kzm_state* kzm_load(enum kzm_kind kind, const void* bytes, size_t count, char* error);

@@ -15,6 +15,8 @@
 
 PG_MODULE_MAGIC;
 
+#define KZM_VERSION 100 /* that of kzmatch.control: 100 for each before the point */
+
 #define KZM_FUNCTION(name)                                                                         \
     PGDLLEXPORT Datum name(PG_FUNCTION_ARGS);                                                      \
     PG_FUNCTION_INFO_V1(name)
@@ -23,12 +25,15 @@ KZM_FUNCTION(kz_count_step);
 KZM_FUNCTION(kz_rank_step);
 KZM_FUNCTION(kz_scan_step);
 KZM_FUNCTION(kz_table_step);
-KZM_FUNCTION(kz_rank_combine);
+KZM_FUNCTION(kz_lengths_step);
+KZM_FUNCTION(kz_combine);
 KZM_FUNCTION(kz_rank_load);
 KZM_FUNCTION(kz_scan_load);
+KZM_FUNCTION(kz_lengths_load);
 KZM_FUNCTION(kz_save);
 KZM_FUNCTION(kz_result);
 KZM_FUNCTION(kz_lists);
+KZM_FUNCTION(kz_version);
 
 static pg_attribute_noreturn() void complain(const char* error)
 {
@@ -181,8 +186,25 @@ Datum kz_table_step(PG_FUNCTION_ARGS)
     PG_RETURN_POINTER(state);
 }
 
-/* Of kz_rank and kz_scan: joins what two processes have found. */
-Datum kz_rank_combine(PG_FUNCTION_ARGS)
+/* kz_lengths_step(state, starts) */
+Datum kz_lengths_step(PG_FUNCTION_ARGS)
+{
+    char error[KZM_ERROR_BYTES];
+    MemoryContext context = aggregate_context(fcinfo);
+    kzm_state* state = PG_ARGISNULL(0) ? NULL : (kzm_state*)PG_GETARG_POINTER(0);
+    if (state == NULL)
+        state = keep(kzm_create(KZM_LENGTHS, "", 0, error), context, error);
+    if (!PG_ARGISNULL(1)) {
+        bytea* starts = PG_GETARG_BYTEA_PP(1);
+        if (!kzm_starts(state, VARDATA_ANY(starts), VARSIZE_ANY_EXHDR(starts), error))
+            complain(error);
+        PG_FREE_IF_COPY(starts, 1);
+    }
+    PG_RETURN_POINTER(state);
+}
+
+/* Of kz_rank, kz_scan and kz_lengths: joins what two processes have found. */
+Datum kz_combine(PG_FUNCTION_ARGS)
 {
     char error[KZM_ERROR_BYTES];
     MemoryContext context = aggregate_context(fcinfo);
@@ -213,6 +235,8 @@ Datum kz_rank_load(PG_FUNCTION_ARGS) { return load(fcinfo, KZM_RANK); }
 
 Datum kz_scan_load(PG_FUNCTION_ARGS) { return load(fcinfo, KZM_SCAN); }
 
+Datum kz_lengths_load(PG_FUNCTION_ARGS) { return load(fcinfo, KZM_LENGTHS); }
+
 Datum kz_save(PG_FUNCTION_ARGS)
 {
     char error[KZM_ERROR_BYTES];
@@ -235,6 +259,13 @@ Datum kz_result(PG_FUNCTION_ARGS)
     if (!kzm_result((kzm_state*)PG_GETARG_POINTER(0), &bytes, &count, error))
         complain(error);
     PG_RETURN_BYTEA_P(to_bytea(bytes, count));
+}
+
+/* kz_version(number): the extension's version, whatever the number is. */
+Datum kz_version(PG_FUNCTION_ARGS)
+{
+    (void)fcinfo;
+    PG_RETURN_INT32(KZM_VERSION);
 }
 
 static void put_list(ReturnSetInfo* result, int32 list, const char* words, size_t bytes)

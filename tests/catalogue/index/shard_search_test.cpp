@@ -2,6 +2,7 @@
 // all gives, and bytes that are not what they should be are refused.
 
 #include <algorithm>
+#include <limits>
 #include <random>
 
 #include <gtest/gtest.h>
@@ -200,6 +201,8 @@ TEST(ShardSearch, SurvivesAnyBytes)
     const auto query = to_bytes(count_query(clip, choose_probes(clip, Lengths(all), 2000)));
     const std::vector<Look> looks = {{.track = 4, .position = -5}, {.track = 9, .position = 48}};
     const auto reading = to_bytes(clip, kLimit, std::span<const Look>(looks));
+    const auto phases = coarse_phases(clip, choose_population(all[0].corpus.corpus()).corpus());
+    const auto plans = to_bytes(clip, kLimit, std::span<const CoarsePhase>(phases));
     const auto codes = codes_of(9);
     std::mt19937 random(3);
     const auto spoilt = [&random](ShardBytes bytes) {
@@ -223,7 +226,62 @@ TEST(ShardSearch, SurvivesAnyBytes)
             ranker.add(9, codes);
         } catch (const ShardBytesError&) {
         }
+        try {
+            Scanner scanner(spoilt(plans));
+            scanner.add(9, codes);
+            scanner.places();
+        } catch (const ShardBytesError&) {
+        }
     }
+}
+
+TEST(ShardSearch, RefusesListsOfHalfAWord)
+{
+    const auto all = shards(1);
+    HitCounter counter(
+        to_bytes(count_query(clip_of(9, 12), {{{.part = 0, .value = 2, .code = 3}}})));
+    const std::vector<std::byte> words(3);
+    EXPECT_THROW(counter.add(7, list_number(0, 2), words), ShardBytesError);
+    counter.add(7, kTracksList, all[0].directory);
+    EXPECT_THROW(counter.add(7, list_number(0, 2), words), ShardBytesError);
+    EXPECT_NO_THROW(counter.add(7, list_number(0, 2), std::span(words).first(2)));
+}
+
+TEST(ShardSearch, RefusesSpreadsThatHaveNoOrder)
+{
+    constexpr double kInfinite = std::numeric_limits<double>::infinity();
+    constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
+    const Reading clip = clip_of(9, 12);
+    const auto scanner_of = [&clip](const Spread& spread) {
+        const std::vector<CoarsePhase> phases = {{clip, 0, {.codes = 8, .spread = spread}}};
+        Scanner{to_bytes(clip, kLimit, std::span<const CoarsePhase>(phases))};
+    };
+    EXPECT_NO_THROW(scanner_of({.mean = -3, .deviation = 1}));
+    for (const Spread& spread : {Spread{0, 0}, Spread{0, -1}, Spread{0, kNone},
+                                 Spread{0, kInfinite}, Spread{kNone, 1}, Spread{-kInfinite, 1}}) {
+        EXPECT_THROW(scanner_of(spread), ShardBytesError) << spread.mean << spread.deviation;
+    }
+    const std::vector<RankedPlace> places = {{.place = {.track = 1}, .agreement = kNone}};
+    EXPECT_THROW(to_places(to_bytes(std::span<const RankedPlace>(places))), ShardBytesError);
+}
+
+TEST(ShardSearch, SumsTheLengthsOfLists)
+{
+    const auto all = shards(2);
+    LengthSum sum;
+    LengthSum other;
+    sum.add_starts(all[0].table(1).starts);
+    other.add_starts(all[1].table(1).starts);
+    sum.add(other.lengths());
+    const auto lengths = to_lengths(sum.lengths());
+    for (uint32_t value = 0; value < kPartValues; ++value) {
+        ASSERT_EQ(Lengths(all).words(1, value), lengths[value]) << value;
+    }
+    auto falling = all[0].tables[1].starts;
+    falling[3] = std::byte{255};
+    EXPECT_THROW(sum.add_starts(falling), ShardBytesError);
+    EXPECT_THROW(sum.add_starts(std::span(falling).first(8)), ShardBytesError);
+    EXPECT_THROW(sum.add(falling), ShardBytesError);
 }
 
 } // namespace
