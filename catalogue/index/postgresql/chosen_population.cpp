@@ -115,19 +115,21 @@ Runs fetch(Lookups& lookups, const Chosen& chosen)
     return runs;
 }
 
-/// Other clients choose the same; who may not write chooses each time.
-void keep_runs(Connection& session, const State& state, const Runs& runs)
+/// For other clients, which choose the same.
+void keep_runs(Sessions& sessions, const State& state, const Runs& runs)
 {
     const ShardBytes bytes = to_bytes(runs);
+    const auto keep = [&](Connection& session) {
+        return session.query(
+            "INSERT INTO kzcat.population (only_row, change, tracks, codes, runs) VALUES "
+            "(1, $1, $2, 0, $3) ON CONFLICT (only_row) DO UPDATE SET change = $1, "
+            "tracks = $2, runs = $3",
+            state.change, state.tracks, Bytes(bytes));
+    };
     try {
-        session.query("INSERT INTO kzcat.population (only_row, change, tracks, codes, runs) VALUES "
-                      "(1, $1, $2, 0, $3) ON CONFLICT (only_row) DO UPDATE SET change = $1, "
-                      "tracks = $2, runs = $3",
-                      state.change, state.tracks, Bytes(bytes));
-    } catch (const StoreError& error) {
-        if (error.kind() != StoreError::Kind::read_only) {
-            throw;
-        }
+        sessions.with(keep);
+    } catch (const StoreError&) {
+        return; // on a standby, or when the disk is full, each client chooses for itself
     }
 }
 
@@ -144,10 +146,7 @@ Population chosen_population(Lookups& lookups, bool keep)
     const Runs runs = fetch(lookups, sessions.with(choose));
     const ShardCoverage coverage = lookups.coverage();
     if (keep && coverage.answered == coverage.of) {
-        sessions.with([&](Connection& session) {
-            keep_runs(session, now, runs);
-            return true;
-        });
+        keep_runs(sessions, now, runs);
     }
     return population_of(runs);
 }

@@ -20,6 +20,9 @@ namespace {
 
 using namespace postgresql;
 
+/// Of packaging/postgresql/kzmatch.control.
+constexpr const char* kExtensionVersion = "1.0";
+
 std::vector<Candidate> candidates_of(std::vector<RankedPlace> places, size_t limit)
 {
     keep_best(places, limit);
@@ -45,6 +48,7 @@ public:
     std::vector<Candidate> by_parts(const Reading& reading, size_t limit)
     {
         std::vector<Look> looks = tail_looks(reading, limit);
+        const SummedLengths& lengths = state.lengths;
         const auto probes = choose_probes(reading, lengths, probe_budget(lengths.total(), lists));
         const auto counted = lookups.count(count_query(reading, probes));
         looks.insert(looks.end(), counted.begin(), counted.end());
@@ -70,19 +74,24 @@ public:
         return found == nullptr ? std::span<const Code>{} : hold(std::move(found));
     }
 
+    /// What is known of the catalogue beforehand.
+    struct State {
+        SummedLengths lengths;
+        Population population;
+        uint64_t code_count = 0;
+        uint64_t tracks = 0;
+        uint64_t tail_tracks = 0;
+    };
+
     Lookups lookups;
     CodeCache cache;
-    SummedLengths lengths;
-    Population population;
-    uint64_t code_count = 0;
-    uint64_t tracks = 0;
-    uint64_t tail_tracks = 0;
+    State state;
     uint32_t lists;
 
 private:
     ShardBytes scan_query(const Reading& reading, size_t limit) const
     {
-        const auto phases = coarse_phases(reading, population.corpus());
+        const auto phases = coarse_phases(reading, state.population.corpus());
         return to_bytes(reading, static_cast<uint32_t>(limit),
                         std::span<const CoarsePhase>(phases));
     }
@@ -92,7 +101,7 @@ private:
     std::vector<Look> tail_looks(const Reading& reading, size_t limit)
     {
         std::vector<Look> looks;
-        if (tail_tracks > 0) {
+        if (state.tail_tracks > 0) {
             for (const RankedPlace& found : lookups.scan_tail(scan_query(reading, limit))) {
                 looks.push_back({.track = found.place.track, .position = found.place.position});
             }
@@ -141,17 +150,17 @@ public:
         return options_.fall_back && plan() == Plan::parts ? &everything_ : nullptr;
     }
     std::span<const Code> codes(int64_t track) override { return servers_.codes(track); }
-    const Corpus& population() override { return servers_.population.corpus(); }
-    uint64_t code_count() override { return servers_.code_count; }
+    const Corpus& population() override { return servers_.state.population.corpus(); }
+    uint64_t code_count() override { return servers_.state.code_count; }
     ShardCoverage coverage() const override { return servers_.lookups.coverage(); }
 
     IndexFacts facts() const override
     {
         IndexFacts facts;
         facts.plan = plan();
-        facts.codes = servers_.code_count;
-        facts.tracks = servers_.tracks;
-        facts.tail_tracks = servers_.tail_tracks;
+        facts.codes = servers_.state.code_count;
+        facts.tracks = servers_.state.tracks;
+        facts.tail_tracks = servers_.state.tail_tracks;
         return facts;
     }
 
@@ -173,8 +182,8 @@ private:
             return servers_.by_scan(reading, limit);
         }
         std::span<const Code> codes(int64_t track) override { return servers_.codes(track); }
-        const Corpus& population() override { return servers_.population.corpus(); }
-        uint64_t code_count() override { return servers_.code_count; }
+        const Corpus& population() override { return servers_.state.population.corpus(); }
+        uint64_t code_count() override { return servers_.state.code_count; }
 
     private:
         Servers& servers_;
@@ -182,7 +191,7 @@ private:
 
     Plan plan() const
     {
-        if (servers_.lengths.total() == 0) {
+        if (servers_.state.lengths.total() == 0) {
             return Plan::scan;
         }
         return options_.plan.value_or(Plan::parts);
@@ -190,22 +199,35 @@ private:
 
     void take_in(Store& store)
     {
-        taken_in_ = Clock::now();
-        servers_.lookups.refresh();
-        servers_.code_count = store.code_count();
-        servers_.tracks = store.track_count();
-        servers_.cache.clear();
-        servers_.tail_tracks = servers_.lookups.tail_tracks();
-        const ShardCoverage coverage = servers_.lookups.coverage();
-        if (options_.write && servers_.tail_tracks > 0 && coverage.answered == coverage.of &&
-            servers_.code_count >= options_.write_from) {
-            // What is less than a tenth of all is scanned.
-            servers_.lookups.request_posting(
-                std::max<uint64_t>(servers_.code_count / 10 / coverage.of, 1));
-            servers_.tail_tracks = servers_.lookups.tail_tracks();
+        taken_in_ = Clock::now(); // also of what fails: it is tried again after a pause
+        auto before = servers_.lookups.shards();
+        try {
+            servers_.state = read_state(store);
+        } catch (...) {
+            servers_.lookups.set_shards(std::move(before));
+            throw;
         }
-        servers_.lengths = servers_.lookups.lengths();
-        servers_.population = chosen_population(servers_.lookups, options_.write);
+        servers_.cache.clear();
+    }
+
+    Servers::State read_state(Store& store)
+    {
+        Lookups& lookups = servers_.lookups;
+        lookups.refresh();
+        Servers::State state;
+        state.code_count = store.code_count();
+        state.tracks = store.track_count();
+        state.tail_tracks = lookups.tail_tracks();
+        const ShardCoverage coverage = lookups.coverage();
+        if (options_.write && state.tail_tracks > 0 && coverage.answered == coverage.of &&
+            state.code_count >= options_.write_from) {
+            // What is less than a tenth of all is scanned.
+            lookups.request_posting(std::max<uint64_t>(state.code_count / 10 / coverage.of, 1));
+            state.tail_tracks = lookups.tail_tracks();
+        }
+        state.lengths = lookups.lengths();
+        state.population = chosen_population(lookups, options_.write);
+        return state;
     }
 
     using Clock = std::chrono::steady_clock;
@@ -218,10 +240,28 @@ private:
     Everything everything_;
 };
 
-bool has_extension(Connection& session)
+/// Why the extension of the server cannot be used; empty when it can.
+std::string extension_obstacle(Connection& session)
 {
-    return !session.query("SELECT 1 FROM pg_catalog.pg_extension WHERE extname = 'kzmatch'")
-                .empty();
+    const Rows rows = session.query("SELECT extnamespace::regnamespace::text, extversion FROM "
+                                    "pg_catalog.pg_extension WHERE extname = 'kzmatch'");
+    if (rows.empty()) {
+        return "the server has no extension kzmatch, and the catalogue is too large to be searched "
+               "without; install the package postgresql-15-kzmatch there, then CREATE EXTENSION "
+               "kzmatch SCHEMA kzcat";
+    }
+    if (rows.text(0, 0) != "kzcat") {
+        return "the extension kzmatch is in the schema " + std::string(rows.text(0, 0)) +
+               ", where look-ups do not find it; run ALTER EXTENSION kzmatch SET SCHEMA kzcat";
+    }
+    if (rows.text(0, 1) != kExtensionVersion) {
+        return "the extension kzmatch is of version " + std::string(rows.text(0, 1)) +
+               " there, and this program uses version " + kExtensionVersion +
+               "; install the package postgresql-15-kzmatch of this program's version there, then "
+               "ALTER EXTENSION kzmatch UPDATE TO '" +
+               kExtensionVersion + "'";
+    }
+    return {};
 }
 
 } // namespace
@@ -229,17 +269,14 @@ bool has_extension(Connection& session)
 std::unique_ptr<Index> open_postgres_index(Store& store, const IndexOptions& options)
 {
     Connection& session = connection_of(store);
-    if (has_extension(session)) {
+    const std::string obstacle = extension_obstacle(session);
+    if (obstacle.empty()) {
         return std::make_unique<PostgresIndex>(store, options);
     }
     if (store.code_count() < options.write_from) {
         return nullptr;
     }
-    throw StoreError(StoreError::Kind::cannot_open,
-                     session.name() +
-                         ": the server has no extension kzmatch, and the catalogue is too large to "
-                         "be searched without; install the package postgresql-15-kzmatch there, "
-                         "then CREATE EXTENSION kzmatch SCHEMA kzcat");
+    throw StoreError(StoreError::Kind::cannot_open, session.name() + ": " + obstacle);
 }
 
 } // namespace kzcat

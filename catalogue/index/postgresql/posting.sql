@@ -38,74 +38,75 @@ CREATE VIEW kzcat.tail AS
     FROM kzcat.trail JOIN kzcat.posted USING (track)
     WHERE posted.segment IS NULL;
 
--- Writes the postings of some tracks as one segment. Their rows are held until the end: a track that
--- went meanwhile would move the units of all behind it.
+-- Writes the postings of some tracks as one segment. All its rows come from one statement, which sees
+-- the tracks as they were at one moment: a track that is missing from some of them would move the
+-- units of all behind it. No track is held meanwhile; one that is removed stays in the segment, as any
+-- does that is removed later.
 CREATE FUNCTION kzcat.write_segment(number integer, tracks bigint[]) RETURNS void
-LANGUAGE plpgsql AS $$
-DECLARE
-    place integer;
-    built bytea;
-    kept bigint[];
+LANGUAGE plpgsql SET search_path = pg_catalog, pg_temp AS $$
 BEGIN
-    SELECT array_agg(track) INTO kept FROM (
-        SELECT track FROM kzcat.trail WHERE track = ANY (tracks) FOR KEY SHARE) held;
-    SELECT min(shard) INTO place FROM kzcat.trail WHERE track = ANY (kept);
-    IF place IS NULL THEN
-        RETURN;
-    END IF;
     INSERT INTO kzcat.posting (shard, list, segment, words)
-    SELECT place, -1, number,
-           string_agg(int8send(track) || int8send(octet_length(codes) / 8), ''::bytea ORDER BY track)
-    FROM kzcat.trail WHERE track = ANY (kept);
-    FOR part IN 0..3 LOOP
-        SELECT kzcat.kz_table(part, codes ORDER BY track) INTO built
-        FROM kzcat.trail WHERE track = ANY (kept);
-        INSERT INTO kzcat.posting (shard, list, segment, words)
-        SELECT place, l.list, number, l.words FROM kzcat.kz_lists(part, built) l;
-    END LOOP;
-    UPDATE kzcat.posted SET segment = number WHERE track = ANY (kept);
+    SELECT min(shard), -1, number,
+           string_agg(int8send(track) || int8send(octet_length(codes) / 8),
+                      ''::pg_catalog.bytea ORDER BY track)
+    FROM kzcat.trail WHERE track = ANY (tracks) HAVING count(*) > 0
+    UNION ALL
+    SELECT built.shard, lists.list, number, lists.words
+    FROM generate_series(0, 3) AS parts (part)
+    CROSS JOIN LATERAL (
+        SELECT min(shard) AS shard, kzcat.kz_table(parts.part, codes ORDER BY track) AS words
+        FROM kzcat.trail WHERE track = ANY (tracks) HAVING count(*) > 0) AS built
+    CROSS JOIN LATERAL kzcat.kz_lists(parts.part, built.words) AS lists;
+    UPDATE kzcat.posted SET segment = number WHERE track = ANY (tracks);
 END $$;
 
 -- Posts the tail when it has `threshold` codes or more, together with segments that are not much larger
--- than it: so few segments stay, and rows stay long. Returns the number of tracks that were posted.
-CREATE FUNCTION kzcat.post(threshold bigint) RETURNS bigint LANGUAGE plpgsql AS $$
+-- than it: so few segments stay, and rows stay long. One call writes one segment, so that nobody waits
+-- for more than that; of a longer tail the rest is left to the next call. Returns the number of tracks
+-- of the segment, 0 when none was to be written.
+CREATE FUNCTION kzcat.post(threshold bigint) RETURNS bigint LANGUAGE plpgsql
+SET search_path = pg_catalog, pg_temp AS $$
 DECLARE
     most CONSTANT bigint := 16777216; -- codes of a segment; a single track may have more
     waiting bigint;
+    gone integer[];
     joined integer[];
     tracks bigint[];
-    done bigint := 0;
 BEGIN
     IF NOT pg_try_advisory_xact_lock(hashtextextended('kzcat.post', 0)) THEN
         RETURN 0; -- another session is at it
     END IF;
-    DELETE FROM kzcat.posting p WHERE NOT EXISTS (
+    SELECT coalesce(sum(codes), 0) INTO waiting FROM kzcat.posted WHERE segment IS NULL;
+    IF waiting < greatest(threshold, 1) THEN
+        RETURN 0;
+    END IF;
+    SELECT array_agg(segment) INTO gone FROM kzcat.posting p
+    WHERE list = -1 AND NOT EXISTS (
         SELECT FROM kzcat.posted WHERE posted.segment = p.segment); -- all its tracks were removed
-    LOOP
-        SELECT coalesce(sum(codes), 0) INTO waiting FROM kzcat.posted WHERE segment IS NULL;
-        EXIT WHEN waiting < greatest(threshold, 1);
-        SELECT coalesce(array_agg(segment), '{}') INTO joined FROM (
-            SELECT segment, size, sum(size) OVER (ORDER BY size, segment) AS together
-            FROM (SELECT segment, sum(codes) AS size FROM kzcat.posted
-                  WHERE segment IS NOT NULL GROUP BY segment) sizes) sums
-        WHERE together + waiting <= most AND size <= 2 * (together - size + waiting);
-        SELECT array_agg(track) INTO tracks FROM (
-            SELECT track, codes, sum(codes) OVER (ORDER BY segment NULLS FIRST, track) AS together
-            FROM kzcat.posted WHERE segment IS NULL OR segment = ANY (joined)) chosen
-        WHERE together <= most OR together = codes;
-        DELETE FROM kzcat.posting WHERE segment = ANY (joined);
-        PERFORM kzcat.write_segment(
-            (SELECT coalesce(max(segment), 0) + 1 FROM kzcat.posting WHERE list = -1), tracks);
-        done := done + cardinality(tracks);
-    END LOOP;
-    RETURN done;
+    SELECT array_agg(segment) INTO joined FROM (
+        SELECT segment, size, sum(size) OVER (ORDER BY size, segment) AS together
+        FROM (SELECT segment, sum(codes) AS size FROM kzcat.posted
+              WHERE segment IS NOT NULL GROUP BY segment) sizes) sums
+    WHERE together + waiting <= most AND size <= 2 * (together - size + waiting);
+    SELECT array_agg(track) INTO tracks FROM (
+        SELECT track, codes, sum(codes) OVER (ORDER BY segment NULLS FIRST, track) AS together
+        FROM kzcat.posted WHERE segment IS NULL OR segment = ANY (joined)) chosen
+    WHERE together <= most OR together = codes;
+    IF gone IS NOT NULL OR joined IS NOT NULL THEN -- by segment, all rows have to be read
+        DELETE FROM kzcat.posting WHERE segment = ANY (gone || joined);
+    END IF;
+    PERFORM kzcat.write_segment(
+        (SELECT coalesce(max(segment), 0) + 1 FROM kzcat.posting WHERE list = -1), tracks);
+    RETURN cardinality(tracks);
 END $$;
 
 -- A row that is put here asks for kzcat.post(least): so it can be asked for through a coordinator,
--- too, and by users who may not write to the other tables. Nothing is kept.
+-- too, and by users who may not write to the other tables. Nothing is kept. The function runs with the
+-- owner's rights: temporary types of whoever asks, which are searched first unless they are named
+-- last, must not take the place of the server's own.
 CREATE TABLE kzcat.posting_request (shard integer NOT NULL, least bigint NOT NULL);
 CREATE FUNCTION kzcat.answer_request() RETURNS trigger LANGUAGE plpgsql
-SECURITY DEFINER SET search_path = pg_catalog AS $$
+SECURITY DEFINER SET search_path = pg_catalog, pg_temp AS $$
 BEGIN
     PERFORM kzcat.post(NEW.least);
     RETURN NULL;

@@ -10,6 +10,15 @@ namespace kzcat::postgresql {
 const char* const kSearchSession = "SET enable_partitionwise_aggregate = on; "
                                    "SET plan_cache_mode = force_generic_plan; SET jit = off";
 
+std::vector<int64_t> numbers_in(const Rows& rows)
+{
+    std::vector<int64_t> numbers;
+    for (int row = 0; row < rows.count(); ++row) {
+        numbers.push_back(rows.integer(row, 0));
+    }
+    return numbers;
+}
+
 std::unique_ptr<Connection> Sessions::take()
 {
     {
@@ -31,17 +40,12 @@ void Sessions::give_back(std::unique_ptr<Connection> session)
     free_.push_back(std::move(session));
 }
 
-void SummedLengths::add(uint32_t part, Bytes starts)
+void SummedLengths::add(uint32_t part, Bytes lengths)
 {
-    if (starts.size() != 4 * (size_t{kPartValues} + 1)) {
-        throw ShardBytesError("the starts of lists have another size than they must have");
-    }
+    const std::vector<uint64_t> added = to_lengths(lengths);
     for (uint32_t value = 0; value < kPartValues; ++value) {
-        const auto begin = get_little_endian<uint32_t>(starts.data() + size_t{4} * value);
-        const auto end = get_little_endian<uint32_t>(starts.data() + size_t{4} * value + 4);
-        const uint64_t length = end > begin ? end - begin : 0;
-        lengths_[size_t{part} * kPartValues + value] += length;
-        total_ += length;
+        lengths_[size_t{part} * kPartValues + value] += added[value];
+        total_ += added[value];
     }
 }
 

@@ -17,6 +17,9 @@ namespace kzcat::postgresql {
 /// the second, statements with thousands of values are not planned anew each time.
 extern const char* const kSearchSession;
 
+/// The first column of rows.
+std::vector<int64_t> numbers_in(const Rows& rows);
+
 /// Sessions with one server: as many as have ever been in use at once.
 class Sessions {
 public:
@@ -51,8 +54,8 @@ public:
     }
     uint64_t total() const { return total_; }
 
-    /// The starts of a part's lists in one segment.
-    void add(uint32_t part, Bytes starts);
+    /// The lengths of a part's lists on one server.
+    void add(uint32_t part, Bytes lengths);
 
 private:
     std::vector<uint64_t> lengths_;

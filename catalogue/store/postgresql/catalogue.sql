@@ -83,8 +83,8 @@ CREATE FUNCTION take_turn() RETURNS void LANGUAGE sql AS $$
     SELECT pg_advisory_xact_lock(1264206657)
 $$;
 
-CREATE FUNCTION log_change() RETURNS trigger LANGUAGE plpgsql SET search_path = kzcat, pg_catalog
-AS $$
+CREATE FUNCTION log_change() RETURNS trigger LANGUAGE plpgsql
+SET search_path = kzcat, pg_catalog, pg_temp AS $$
 BEGIN
     PERFORM take_turn(); -- those that change the table by hand have not taken it
     IF TG_OP = 'INSERT' THEN

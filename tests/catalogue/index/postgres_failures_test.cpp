@@ -122,6 +122,59 @@ TEST_F(Shards, CountAndRankOnTheirOwnAndAtOnce)
         << rank;
 }
 
+TEST_F(Shards, SumTheLengthsOfListsOnTheirOwn)
+{
+    const std::string plan = plan_of(postgresql::kLengthsStatement, "'{}', ''");
+    EXPECT_EQ(2U,
+              occurrences(plan, "Remote SQL: SELECT shard, list, kzcat.kz_lengths\\(words\\) FROM "
+                                "kzcat.posting WHERE .*GROUP BY 1, 2"))
+        << plan;
+}
+
+TEST_F(Shards, WithoutForeignTablesAreNotPassedOver)
+{
+    fleet_->coordinator.sql("INSERT INTO kzcat.shard VALUES (3, 'host=nowhere')");
+    const std::string text = failure([] { open_index(*store_, options_for(url(), true)); });
+    fleet_->coordinator.sql("DELETE FROM kzcat.shard WHERE number = 3");
+    EXPECT_NE(std::string::npos, text.find("shard 3 stands in the table kzcat.shard")) << text;
+    EXPECT_NE(std::string::npos, text.find("run kzcat-shards")) << text;
+    EXPECT_NO_THROW(open_index(*store_, options_for(url())));
+}
+
+TEST_F(Shards, OfOtherCataloguesAreRefused)
+{
+    fleet_->coordinator.sql("ALTER SERVER kzcat_shard_2 OPTIONS (SET host '" + fleet_->one.host() +
+                            "', SET port '" + std::to_string(fleet_->one.port()) + "')");
+    const std::string text = failure([] { open_index(*store_, options_for(url(), true)); });
+    EXPECT_NE(std::string::npos, text.find("shard 2: the database that look-ups go to")) << text;
+    EXPECT_NE(std::string::npos, text.find("kzcat_shard_2")) << text;
+    // What the text says.
+    test::attach_shards(url(),
+                        {test::shard_address(fleet_->one), test::shard_address(fleet_->two)});
+    const auto index = open_index(*store_, options_for(url()));
+    EXPECT_EQ(ids_[4], found(*index, 5));
+    const std::string id = fleet_->two.sql("SELECT catalogue FROM kzcat.node");
+    fleet_->two.sql("UPDATE kzcat.node SET catalogue = 'another'");
+    EXPECT_NE(std::string::npos,
+              failure([&] { index->refresh(*store_); }).find("belongs to another one"));
+    fleet_->two.sql("UPDATE kzcat.node SET catalogue = '" + id.substr(0, id.size() - 1) + "'");
+}
+
+TEST_F(Shards, ThatFailARefreshLeaveTheIndexAsItWas)
+{
+    const auto index = open_index(*store_, options_for(url()));
+    const auto more = add(*store_, 1001, 2);
+    fleet_->two.kill9();
+    EXPECT_THROW(index->refresh(*store_), StoreError);
+    EXPECT_EQ(kTracks, index->facts().tracks);
+    fleet_->two.start();
+    EXPECT_EQ(ids_[4], found(*index, 5));
+    index->refresh(*store_);
+    EXPECT_EQ(kTracks + 2, index->facts().tracks);
+    store_->remove(more[0]);
+    store_->remove(more[1]);
+}
+
 TEST_F(Shards, SendWholeTablesUnlessGroupedByShard)
 {
     // Each of these is what the statements and the session are made to avoid.
@@ -200,9 +253,12 @@ TEST_F(Shards, AllOfThemDeadAnswerNothing)
 
 TEST_F(Shards, WithoutTheExtensionAreRefusedWithTheCure)
 {
-    fleet_->one.sql("ALTER EXTENSION kzmatch SET SCHEMA public");
     const auto index = open_index(*store_, options_for(url()));
-    EXPECT_NE("nothing failed", failure([&] { found(*index, 1); }));
+    fleet_->one.sql("ALTER EXTENSION kzmatch SET SCHEMA public");
+    const std::string text = failure([&] { found(*index, 1); });
+    EXPECT_NE(std::string::npos, text.find("shard 1 of 2 gave no answer")) << text;
+    EXPECT_NE(std::string::npos, text.find("kzcat.kz_version")) << text;
+    EXPECT_NE("nothing failed", failure([&] { open_index(*store_, options_for(url())); }));
     fleet_->one.sql("ALTER EXTENSION kzmatch SET SCHEMA kzcat");
     EXPECT_EQ(ids_[4], found(*index, 5));
 }
@@ -217,14 +273,22 @@ TEST_F(Extension, MissingOnTheServerIsNamedWithItsCure)
     const kz::test::PostgresServer server;
     const auto store = open_postgres_store(server.url(), Access::create);
     const auto ids = add(*store, 1, 10);
+    const auto expect_cure = [&](const std::string& cure) {
+        try {
+            open_index(*store, options_for(server.url()));
+            ADD_FAILURE() << "nothing failed";
+        } catch (const StoreError& error) {
+            const std::string text = error.what();
+            EXPECT_NE(std::string::npos, text.find(cure)) << text;
+        }
+    };
+    server.sql("ALTER EXTENSION kzmatch SET SCHEMA public");
+    expect_cure("ALTER EXTENSION kzmatch SET SCHEMA kzcat");
+    server.sql("ALTER EXTENSION kzmatch SET SCHEMA kzcat;"
+               "UPDATE pg_extension SET extversion = '0.9' WHERE extname = 'kzmatch'");
+    expect_cure("ALTER EXTENSION kzmatch UPDATE TO '1.0'");
     server.sql("DROP EXTENSION kzmatch");
-    try {
-        open_index(*store, options_for(server.url()));
-        FAIL() << "nothing failed";
-    } catch (const StoreError& error) {
-        const std::string text = error.what();
-        EXPECT_NE(std::string::npos, text.find("CREATE EXTENSION kzmatch SCHEMA kzcat")) << text;
-    }
+    expect_cure("CREATE EXTENSION kzmatch SCHEMA kzcat");
     // A few tracks are searched in memory.
     IndexOptions options = options_for(server.url());
     options.write_from = 1'000'000;
