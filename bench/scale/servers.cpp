@@ -175,9 +175,11 @@ std::unique_ptr<Index> filled(const char* name, const std::string& url, const Op
     std::unique_ptr<Index> index;
     const double posted =
         seconds_of([&] { index = open_index(*store, options_for(url, options)); });
+    const double opened =
+        seconds_of([&] { index = open_index(*store, options_for(url, options)); });
     const auto count = static_cast<double>(catalogue.tracks.size());
-    std::printf("%s: %.0f tracks a second added, %.0f posted (%.1f s)\n", name, count / added,
-                count / posted, posted);
+    std::printf("%s: %.0f tracks a second added, %.0f posted (%.1f s), opened in %.0f ms\n", name,
+                count / added, count / posted, posted, 1000 * opened);
     std::fflush(stdout);
     return index;
 }
