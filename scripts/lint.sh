@@ -50,8 +50,8 @@ tidy_sources() {
 tidy() {
     if [ ! -f "$build/compile_commands.json" ]; then
         # The analyzer does not accept all of the compiler's flags for protection.
-        cmake -S . -B "$build" -G Ninja -DCMAKE_BUILD_TYPE=Debug -DKZ_BUILD_BENCH=ON -DKZ_HARDEN=OFF \
-            -DKZ_PRECOMPILE=OFF >/dev/null || return 1
+        cmake -S . -B "$build" -G Ninja -DCMAKE_BUILD_TYPE=Debug -DKZ_JAVA=ON -DKZ_BUILD_BENCH=ON \
+            -DKZ_HARDEN=OFF -DKZ_PRECOMPILE=OFF >/dev/null || return 1
     fi
     tidy_sources |
         xargs -P "$jobs" -n 1 clang-tidy-14 -p "$build" --quiet --warnings-as-errors='*' 2>&1 |
