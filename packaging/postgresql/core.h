@@ -36,8 +36,8 @@ bool kzm_track(kzm_state* state, int64_t track, const void* codes, uint64_t coun
 /* KZM_LENGTHS: the starts of a part's lists in one segment. */
 bool kzm_starts(kzm_state* state, const void* starts, size_t bytes, char* error);
 
-/* KZM_RANK, KZM_SCAN, KZM_LENGTHS: the state as bytes, which are those of kzm_result() with the query before
-   them; and what another state has gathered. */
+/* KZM_RANK, KZM_SCAN, KZM_LENGTHS: the state as bytes, which are those of kzm_result() with the
+   query before them; and what another state has gathered. */
 bool kzm_save(kzm_state* state, const void** bytes, size_t* count, char* error);
 kzm_state* kzm_load(enum kzm_kind kind, const void* bytes, size_t count, char* error);
 kzm_state* kzm_copy(kzm_state* state, char* error);

@@ -200,8 +200,8 @@ void check_shard(Connection& connection, const std::string& catalogue, int64_t s
     if (rows.empty() || rows.text(0, 0) != catalogue || rows.integer(0, 1) != shard) {
         refuse(Kind::cannot_open, connection,
                "its database is another part of this catalogue, or belongs to another one; correct "
-               "the address in the table kzcat.shard, and run kzcat-shards with all shards in their "
-               "order, which corrects the foreign servers");
+               "the address in the table kzcat.shard, and run kzcat-shards with all shards in "
+               "their order, which corrects the foreign servers");
     }
 }
 

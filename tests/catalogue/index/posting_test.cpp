@@ -1,4 +1,5 @@
-// Posting what was added, on the server that has it: a client asks for it, and others go on meanwhile.
+// Posting what was added, on the server that has it: a client asks for it, and others go on
+// meanwhile.
 
 #include <chrono>
 #include <memory>
