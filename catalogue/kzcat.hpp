@@ -6,7 +6,7 @@
  *     auto catalogue = kz::catalogue::open("music.kzc").value();
  *     auto clip = kz::query::of(samples, 44100, 2).value();
  *     for (const kz::match& match : catalogue.recognise(clip).value().matches)
- *         std::printf("%s at %.1f s\n", match.title.c_str(), match.offset);
+ *         std::printf("%s at %.1f s\n", match.source.c_str(), match.offset);
  *
  * Samples, failures and handles are as in kzsdk/kzsdk.hpp; statuses of failures are KZCAT_ERROR_...
  * Records of the C interface that hold no text are returned as they are. What this header does not

@@ -8,7 +8,8 @@
  *     std::printf("%.1f apart\n", kz::distance(tune, copy));
  *
  * Samples are any container with data() and size(), an array, or a pointer and a count, of
- * int16_t, int32_t, float, double, or uint8_t, which is silent at 128 as in WAV files.
+ * int16_t, int32_t, float, double, or uint8_t, which is silent at 128 as in WAV files. char and
+ * std::byte may hold samples of any format.
  *
  * Failures. Every call that can fail returns a kz::result. Its value() returns the value or throws
  * a kz::error; programs that do not want exceptions test the result and read its error(). Only
@@ -174,9 +175,17 @@ constexpr uint32_t encoding_of() noexcept
     }
 }
 
+/** Whether a type is that of bytes which may hold samples of any encoding. */
+template <class Sample>
+constexpr bool is_bytes() noexcept
+{
+    return std::is_same_v<Sample, char> || std::is_same_v<Sample, std::byte>;
+}
+
 /**
  * Sound that a call reads, in the caller's memory: a container, an array, or a pointer and a
- * count. Bytes (char, unsigned char, std::byte) may hold samples of any encoding.
+ * count. Bytes (char, std::byte) may hold samples of any encoding; uint8_t, which is unsigned char,
+ * those of a byte each: linear ones or, where the format states so, A-law or mu-law.
  */
 class sound {
 public:
@@ -184,8 +193,8 @@ public:
     sound(const Sample* samples, size_t count)
         : bytes_(samples), size_(uint64_t{count} * sizeof(Sample)), encoding_(encoding_of<Sample>())
     {
-        static_assert(encoding_of<Sample>() != 0 || sizeof(Sample) == 1,
-                      "samples are int16_t, int32_t, float, double, uint8_t or bytes");
+        static_assert(encoding_of<Sample>() != 0 || is_bytes<Sample>(),
+                      "samples are int16_t, int32_t, float, double, uint8_t, char or std::byte");
     }
     template <class Container,
               class Pointer = decltype(std::data(std::declval<const Container&>()))>
@@ -200,10 +209,17 @@ public:
     /** Whether these samples, by their type, may be fed where @p encoding is expected. */
     bool fits(uint32_t encoding) const noexcept
     {
-        return encoding_ == 0 || encoding_ == KZ_STREAM_FORMAT_LINEAR8 || encoding_ == encoding;
+        return encoding_ == 0 || encoding_ == encoding ||
+               (encoding_ == KZ_STREAM_FORMAT_LINEAR8 && has_single_bytes(encoding));
     }
 
 private:
+    static bool has_single_bytes(uint32_t encoding) noexcept
+    {
+        return encoding == KZ_STREAM_FORMAT_PCM8 || encoding == KZ_STREAM_FORMAT_ALAW ||
+               encoding == KZ_STREAM_FORMAT_ULAW;
+    }
+
     const void* bytes_;
     uint64_t size_;
     uint32_t encoding_;
@@ -212,7 +228,7 @@ private:
 namespace detail {
 
 inline constexpr const char* kOtherSamples =
-    "The samples are of another type than the format states: feed those, or bytes.";
+    "The samples are of another type than the format states: feed those, or char or std::byte.";
 
 /** Frees a handle with the C call for it. */
 template <auto free>

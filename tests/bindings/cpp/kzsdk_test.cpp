@@ -97,6 +97,25 @@ TEST(CppStream, RefusesSamplesOfAnotherType)
     EXPECT_EQ(0U, stream.state()->frames);
 }
 
+TEST(CppStream, TakesSinglesForFormatsOfOneByte)
+{
+    const std::vector<uint8_t> singles(100);
+    const std::vector<char> bytes(100);
+    for (const uint32_t encoding : {KZ_STREAM_FORMAT_LINEAR8, KZ_STREAM_FORMAT_PCM8,
+                                    KZ_STREAM_FORMAT_ALAW, KZ_STREAM_FORMAT_ULAW}) {
+        auto stream = kz::stream::create({encoding, kRate, 1}).value();
+        EXPECT_TRUE(stream.feed(singles).has_value()) << encoding;
+    }
+    for (const uint32_t encoding :
+         {KZ_STREAM_FORMAT_PCM16, KZ_STREAM_FORMAT_PCM24, KZ_STREAM_FORMAT_PCM32,
+          KZ_STREAM_FORMAT_FLOAT32, KZ_STREAM_FORMAT_FLOAT64}) {
+        auto stream = kz::stream::create({encoding, kRate, 1}).value();
+        EXPECT_FALSE(stream.feed(singles).has_value()) << encoding;
+        EXPECT_TRUE(stream.feed(bytes).has_value()) << encoding;
+        EXPECT_TRUE(stream.feed(std::vector<std::byte>(100)).has_value()) << encoding;
+    }
+}
+
 TEST(CppStream, FailsOnceItWasMovedFrom)
 {
     static_assert(!std::is_copy_constructible_v<kz::stream>);
