@@ -7,7 +7,7 @@ import hashlib
 import os
 from typing import Any, Callable, Iterator, Optional, Tuple
 
-from kzsdk import _native, _samples, _sources
+from kzsdk import _open_files, _samples, _sources
 from kzsdk._interface import ffi
 from kzsdk.errors import ArgumentError, TooLittleSoundError, check_catalogue
 from kzsdk.result import Fingerprint
@@ -98,6 +98,7 @@ def found_track(library: Any, find: Callable[..., int], *arguments: Any) -> Iter
 
 def file_facts(path: str) -> Tuple[int, int, bytes]:
     """Size, time of change and SHA-256 of a regular file; of anything else that it has none."""
+    _open_files.check_is_none(path)
     if not os.path.isfile(path):
         return -1, -1, b""
     state = os.stat(path)
@@ -106,15 +107,3 @@ def file_facts(path: str) -> Tuple[int, int, bytes]:
         for block in iter(lambda: file.read(1 << 20), b""):
             digest.update(block)
     return state.st_size, state.st_mtime_ns, digest.digest()
-
-
-def check_is_not_of(library: Any, catalogue: Optional[str], path: str) -> None:
-    """A program that closes a file of a catalogue that is open gives up all locks on it."""
-    if catalogue is None or library.kzcat_is_server_address(os.fsencode(catalogue)):
-        return
-    real = os.path.realpath(catalogue)
-    for ending in ("", "-wal", "-shm", "-journal", ".idx"):
-        own = real + ending
-        same = os.path.exists(path) and os.path.exists(own) and os.path.samefile(path, own)
-        if same or os.path.realpath(path) == own:
-            raise ArgumentError(f"{path}: belongs to the catalogue itself: pass a sound file")

@@ -4,7 +4,7 @@ from __future__ import annotations
 
 import contextlib
 import threading
-from typing import Any, Callable, Iterator, Optional
+from typing import Any, Callable, Iterator, Set
 
 from kzsdk._interface import ffi
 from kzsdk.errors import ClosedError, Error
@@ -13,19 +13,24 @@ from kzsdk.errors import ClosedError, Error
 class Handle:
     """Owns a native handle and counts the calls that use it.
 
-    No native call may run while its handle is freed. close() therefore lets nobody in any more, and
-    the last call that is still running frees the handle as it leaves.
+    No native call may run while its handle is freed. close() therefore refuses new calls, and the
+    last call that is still running frees the handle as it leaves.
     """
 
-    def __init__(self, what: str, address: Any, free: Callable[[Any], Any], shared: bool) -> None:
-        """``shared``: several threads may use it at once; otherwise they take turns."""
+    def __init__(self, what: str, address: Any, free: Callable[[Any], Any], shared: bool,
+                 freed: Callable[[], object] = lambda: None) -> None:
+        """``shared``: several threads may use it at once; otherwise they take turns.
+
+        ``freed`` is called once the handle has been freed.
+        """
         self._what = what
         self._address = address
         self._free = free
-        self._guard = threading.Lock()  # of the three below
+        self._freed = freed
+        self._guard = threading.Lock()  # of what follows
         self._users = 0
         self._closed = False
-        self._visitor: Optional[int] = None
+        self._visitors: Set[int] = set()  # threads whose call may call back
         self._turn = None if shared else threading.Lock()
 
     @property
@@ -48,11 +53,14 @@ class Handle:
     def use_with_callbacks(self) -> Iterator[Any]:
         """The same for calls that call back, and must not be called with this handle again."""
         with self.use() as address:
-            self._visitor = threading.get_ident()
+            thread = threading.get_ident()
+            with self._guard:
+                self._visitors.add(thread)
             try:
                 yield address
             finally:
-                self._visitor = None
+                with self._guard:
+                    self._visitors.discard(thread)
 
     def close(self) -> None:
         with self._guard:
@@ -71,7 +79,7 @@ class Handle:
     def _enter(self) -> None:
         with self._guard:
             self.check_open()
-            if self._visitor == threading.get_ident():
+            if threading.get_ident() in self._visitors:
                 raise Error(f"a progress function must not use the {self._what} that calls it")
             self._users += 1
 
@@ -86,6 +94,7 @@ class Handle:
         address, self._address = self._address, ffi.NULL
         reference = ffi.new("void*[1]", [address])
         self._free(ffi.cast(ffi.typeof(self._free).args[0], reference))
+        self._freed()
 
     def __del__(self) -> None:
         # Of a handle whose constructor failed there is nothing to close.

@@ -1,36 +1,41 @@
 """The native libraries, found and loaded when they are first needed.
 
 Each is looked for in the folder that the environment variable KZSDK_LIBRARY_PATH names, then inside
-the package, where a wheel has them, then where the system keeps its libraries.
+the package, where a wheel has them, then where the system keeps its libraries. A named folder may
+have some of them only, but not none: that is a mistake in its name.
 """
 
 from __future__ import annotations
 
 import functools
 import os
-from typing import Any, Iterator
+from typing import Any, Optional
 
 from kzsdk._interface import ffi
 
 _OWN_FOLDER = os.path.join(os.path.dirname(os.path.abspath(__file__)), "_libraries")
+_SDK, _CAT, _SOUND = _LIBRARIES = ("libkzsdk.so.1", "libkzcat.so.1", "libkzsound.so")
 
 
-def _places(name: str) -> Iterator[str]:
-    named = os.environ.get("KZSDK_LIBRARY_PATH")
-    if named:
-        yield os.path.join(named, name)
-        return
-    own = os.path.join(_OWN_FOLDER, name)
-    if os.path.exists(own):
-        yield own
-    else:
-        yield name
+def _in_named_folder(name: str) -> Optional[str]:
+    """A library's path in the folder that the user named; None where that has no such file."""
+    folder = os.environ.get("KZSDK_LIBRARY_PATH")
+    if not folder:
+        return None
+    if not any(os.path.exists(os.path.join(folder, library)) for library in _LIBRARIES):
+        raise OSError(f"KZSDK_LIBRARY_PATH names {folder}, which has none of the libraries")
+    place = os.path.join(folder, name)
+    return place if os.path.exists(place) else None
+
+
+def _in_package(name: str) -> Optional[str]:
+    place = os.path.join(_OWN_FOLDER, name)
+    return place if os.path.exists(place) else None
 
 
 def _load(name: str, cure: str) -> Any:
-    (place,) = _places(name)
     try:
-        return ffi.dlopen(place)
+        return ffi.dlopen(_in_named_folder(name) or _in_package(name) or name)
     except OSError as error:
         raise ImportError(
             f"{name} cannot be loaded ({error}); {cure}, or name the folder that it is in with "
@@ -50,7 +55,7 @@ def _check_version(name: str, version: str, major: int, minor: int) -> None:
 @functools.lru_cache(maxsize=None)
 def sdk() -> Any:
     """libkzsdk, which makes fingerprints."""
-    library = _load("libkzsdk.so.1", "install the library (Debian: libkzsdk1)")
+    library = _load(_SDK, "install the library (Debian: libkzsdk1)")
     version = text(library.kzsdk_get_version())
     _check_version("libkzsdk", version, library.KZSDK_VERSION_MAJOR, library.KZSDK_VERSION_MINOR)
     return library
@@ -60,7 +65,7 @@ def sdk() -> Any:
 def cat() -> Any:
     """libkzcat, which keeps tracks and names clips."""
     sdk()  # which it is linked with: the one that is loaded already serves it
-    library = _load("libkzcat.so.1", "install the library (Debian: libkzcat1)")
+    library = _load(_CAT, "install the library (Debian: libkzcat1)")
     version = text(library.kzcat_get_version())
     _check_version("libkzcat", version, library.KZCAT_VERSION_MAJOR, library.KZCAT_VERSION_MINOR)
     return library
@@ -70,9 +75,20 @@ def cat() -> Any:
 def sound() -> Any:
     """libkzsound, which reads sound files; None where it is missing."""
     try:
-        return _load("libkzsound.so", "")
+        return _load(_SOUND, "")
     except ImportError:
         return None
+
+
+def sound_trouble() -> str:
+    """Why libkzsound, which is there, cannot be loaded; empty when it is missing."""
+    try:
+        place = _in_named_folder(_SOUND) or _in_package(_SOUND)
+        if place is not None:
+            ffi.dlopen(place)
+    except OSError as error:
+        return f"the reader of sound files cannot be loaded ({error})"
+    return ""
 
 
 def text(address: Any) -> str:

@@ -7,7 +7,7 @@ import os
 import warnings
 from typing import Any, Iterator, List, Optional, Sequence, Tuple
 
-from kzsdk import _native, _samples
+from kzsdk import _native, _open_files, _samples
 from kzsdk._interface import ffi
 from kzsdk._texts import path_bytes
 from kzsdk.errors import (ArgumentError, DamagedSoundWarning, SoundFileError, TooLittleSoundError,
@@ -125,14 +125,13 @@ class SoundfileFile(Source):
 class Pieces(Source):
     """Samples in memory, in one piece or in many."""
 
-    def __init__(self, pieces: Iterator[Any], rate: Any, channels: Any,
+    def __init__(self, pieces: Iterator[_samples.Piece], rate: Any, channels: Any,
                  format: Optional[str]) -> None:
         first = next(pieces, None)
         if first is None:
             raise TooLittleSoundError("the iterator gave no sound")
-        piece = _samples.piece_of(first)
-        self.layout = _samples.layout_of(piece, rate, channels, format)
-        self._rest = itertools.chain([piece], map(_samples.piece_of, pieces))
+        self.layout = _samples.layout_of(first, rate, channels, format)
+        self._rest = itertools.chain([first], pieces)
 
     def pieces(self) -> Iterator[_samples.Piece]:
         for piece in self._rest:
@@ -158,13 +157,13 @@ def path_of(sound: Any) -> Optional[str]:
 
 
 def _open_file(path: str, rates: Optional[Sequence[int]], floats: bool) -> Source:
+    _open_files.check_is_none(path)
     if _native.sound() is not None:
         return SoundFile(path, rates, floats)
     if reader():
         return SoundfileFile(path, rates)
-    raise SoundFileError(
-        f"{path}: this package was built without its reader of sound files: install the package "
-        "soundfile, or pass samples")
+    why = _native.sound_trouble() or "this package was built without its reader of sound files"
+    raise SoundFileError(f"{path}: {why}: install the package soundfile, or pass samples")
 
 
 def open_sound(sound: Any, rate: Any, channels: Any, format: Optional[str],
@@ -177,9 +176,10 @@ def open_sound(sound: Any, rate: Any, channels: Any, format: Optional[str],
                                 "own: leave them out, or pass the samples of a headerless file")
         return _open_file(path, rates, floats)
     if _samples.is_plain(sound) or _samples.is_array(sound):
-        source = Pieces(iter([sound]), rate, channels, format)
-        _samples.check_whole(_samples.piece_of(sound), source.layout)
+        piece = _samples.piece_of(sound)
+        source = Pieces(iter([piece]), rate, channels, format)
+        _samples.check_whole(piece, source.layout)
         return source
     if not hasattr(sound, "__iter__"):
         _samples.piece_of(sound)  # which says what it is not
-    return Pieces(iter(sound), rate, channels, format)
+    return Pieces(map(_samples.piece_of, sound), rate, channels, format)

@@ -5,7 +5,7 @@ from __future__ import annotations
 import os
 from typing import Any, Callable, Iterator, List, Mapping, Optional, Tuple, Union
 
-from kzsdk import _feeding, _native, _sources
+from kzsdk import _feeding, _native, _open_files, _sources
 from kzsdk._fingerprint import Sound
 from kzsdk._handle import Handle
 from kzsdk._interface import ffi
@@ -17,7 +17,7 @@ from kzsdk.tracks import Added, Answer, Fault, Match, Track, answer_of, track_of
 _ACCESS = {"read": 1, "write": 2, "create": 3}
 _PLANS = {"measured": 0, "scan": 1, "parts": 2}
 
-#: Is given the tracks done and those in all; false stops the work.
+#: Receives the tracks done and those in all; false stops the work.
 Progress = Callable[[int, int], Optional[bool]]
 
 
@@ -52,17 +52,26 @@ class Catalogue:
         """
         library = _native.cat()
         self._library = library
-        self._path = None if path is None else os.fsdecode(path)
         settings = ffi.new("kzcat_settings*")
         check_catalogue(library.kzcat_initialize_settings(settings))
         settings.plan = _number_of(_PLANS, plan, "plan")
         settings.index_file = int(index_file)
         settings.partial = int(partial)
+        number = _number_of(_ACCESS, access, "access")
+        name = ffi.NULL if path is None else path_bytes(path)
+        self._handle = self._open(name, number, settings)
+
+    def _open(self, name: Any, access: int, settings: Any) -> Handle:
         opened = ffi.new("kzcat_catalogue**")
-        name = ffi.NULL if self._path is None else path_bytes(self._path)
-        check_catalogue(library.kzcat_open(name, _number_of(_ACCESS, access, "access"), settings,
-                                           opened))
-        self._handle = Handle("catalogue", opened[0], library.kzcat_close, shared=True)
+        is_file = name != ffi.NULL and not self._library.kzcat_is_server_address(name)
+        # Noted first: no other thread may open the file as sound once it has locks.
+        forget = _open_files.register(os.fsdecode(name)) if is_file else lambda: None
+        try:
+            check_catalogue(self._library.kzcat_open(name, access, settings, opened))
+        except BaseException:
+            forget()
+            raise
+        return Handle("catalogue", opened[0], self._library.kzcat_close, shared=True, freed=forget)
 
     def add(self, sound: Sound, *, title: Optional[str] = None, artist: Optional[str] = None,
             tags: Optional[Mapping[str, str]] = None, source: Optional[str] = None,
@@ -81,8 +90,6 @@ class Catalogue:
         uri = source or path or wanted.get("title")
         if not uri:
             raise ArgumentError("samples have no name of their own: pass title= or source=")
-        if path is not None:
-            _feeding.check_is_not_of(self._library, self._path, path)
         facts = (-1, -1, b"") if path is None else _feeding.file_facts(path)
         with _sources.open_sound(sound, rate, channels, format) as opened:
             kept = [(name, text) for name, text in opened.tags if name not in wanted]
@@ -134,9 +141,6 @@ class Catalogue:
             raise ArgumentError(f"candidates={candidates} cannot be used: pass 0 to 1000")
         options.speeds, options.passages = int(speeds), int(passages)
         options.candidates = candidates
-        path = _sources.path_of(sound)
-        if path is not None:
-            _feeding.check_is_not_of(self._library, self._path, path)
         with _feeding.query_of(self._library, sound, rate, channels, format) as query:
             with self._handle.use() as catalogue:
                 with _feeding.result_of(self._library, catalogue, query, options) as result:

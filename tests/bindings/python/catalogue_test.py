@@ -4,6 +4,7 @@ import array
 import contextlib
 import hashlib
 import json
+import os
 import shutil
 import sqlite3
 import struct
@@ -233,17 +234,63 @@ def damage(path):
 def test_a_catalogue_is_not_added_to_itself(tmp_path, tune):
     path = tmp_path / "music.kzc"
     link = tmp_path / "link.wav"
+    refused = f"belongs to the catalogue {path}, which is open"
     with kzsdk.Catalogue(path) as catalogue:
         catalogue.add(tune, rate=RATE, title="A tune")
         link.symlink_to(path)
         for own in (path, link, tmp_path / "music.kzc-wal"):
-            with pytest.raises(kzsdk.ArgumentError, match="belongs to the catalogue itself"):
+            with pytest.raises(kzsdk.ArgumentError, match=refused):
                 catalogue.add(own)
-            with pytest.raises(kzsdk.ArgumentError, match="belongs to the catalogue itself"):
+            with pytest.raises(kzsdk.ArgumentError, match=refused):
                 catalogue.match(own)
         shutil.copy(path, tmp_path / "other.wav")
         with pytest.raises(kzsdk.SoundFileError, match="is not a sound file"):
             catalogue.add(tmp_path / "other.wav")
+
+
+def test_open_catalogues_are_never_opened_as_sound(tmp_path, monkeypatch):
+    """Whoever asks: the process would give up their locks."""
+    monkeypatch.chdir(tmp_path)
+    first, second = kzsdk.Catalogue("first.kzc"), kzsdk.Catalogue("second.kzc")
+    again = kzsdk.Catalogue("first.kzc")
+    os.link("first.kzc", "hard.wav")
+    monkeypatch.chdir("/")
+    for path in (tmp_path / "first.kzc", tmp_path / "hard.wav"):
+        for use in (kzsdk.fingerprint, second.add, second.match):
+            with pytest.raises(kzsdk.ArgumentError, match="first.kzc, which is open"):
+                use(path)
+    first.close()
+    with pytest.raises(kzsdk.ArgumentError, match="which is open"):
+        kzsdk.fingerprint(tmp_path / "first.kzc")
+    again.close()
+    with pytest.raises(kzsdk.SoundFileError, match="is not a sound file"):
+        kzsdk.fingerprint(tmp_path / "first.kzc")
+    second.close()
+
+
+def test_catalogues_that_did_not_open_leave_no_trace(clips, tmp_path):
+    (tmp_path / "song.flac").write_bytes((clips / "music.flac").read_bytes())
+    with pytest.raises(kzsdk.CannotOpenError):
+        kzsdk.Catalogue(tmp_path / "song.flac")
+    assert len(kzsdk.fingerprint(tmp_path / "song.flac").values) == 30
+
+
+def test_locks_outlive_attempts_to_read_the_file_as_sound(tmp_path):
+    """With its locks gone, another process would be let in beside the one that writes."""
+    path = tmp_path / "music.kzc"
+    with kzsdk.Catalogue(path):
+        before = locks_of(path)
+        with pytest.raises(kzsdk.ArgumentError):
+            kzsdk.fingerprint(path)
+        assert before and locks_of(path) == before
+
+
+def locks_of(path):
+    """This process's locks on the files of a catalogue."""
+    files = {str(file.stat().st_ino) for file in path.parent.glob(path.name + "*")}
+    lines = [line.split()[1:6] for line in open("/proc/locks", encoding="ascii")]
+    return [line for line in lines
+            if line[3] == str(os.getpid()) and line[4].rpartition(":")[2] in files]
 
 
 def test_a_closed_catalogue_says_so(tune):

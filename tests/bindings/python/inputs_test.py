@@ -8,7 +8,7 @@ import pytest
 import sounds
 
 import kzsdk
-from kzsdk import _native, _sources
+from kzsdk import _native, _samples, _sources
 
 RATE = 8000
 FRAMES = numpy.zeros(RATE, numpy.int16)
@@ -60,6 +60,19 @@ def test_pieces_must_be_alike():
     for pieces in ([FRAMES, FRAMES.astype(numpy.float32)], [FRAMES, FRAMES.reshape(-1, 2)]):
         with pytest.raises(kzsdk.ArgumentError, match="convert or reshape it"):
             kzsdk.fingerprint(pieces, rate=RATE)
+
+
+def test_samples_are_looked_at_once(monkeypatch):
+    """What is spread over memory is copied then."""
+    looked_at, piece_of = [], _samples.piece_of
+    monkeypatch.setattr(_samples, "piece_of", lambda sound: looked_at.append(1) or piece_of(sound))
+    samples = sounds.noise(RATE, 3, 1, 1)
+    spread = numpy.stack([samples, samples], axis=1)[:, 0]
+    assert not spread.flags.c_contiguous
+    with kzsdk.Catalogue(None) as catalogue:
+        added = catalogue.add(spread, rate=RATE, title="A tune")
+        assert looked_at == [1]
+        assert catalogue.add(samples, rate=RATE, title="The same") == kzsdk.Added(added.track, False)
 
 
 def test_many_channels_are_taken_when_meant():

@@ -39,6 +39,25 @@ def test_the_wheel_is_for_every_python_of_a_machine(dist):
         assert "kzsdk/" + name in names
 
 
+def test_libraries_are_not_looked_for_around_the_user(dist, tmp_path):
+    """A search path of the build tree would end in the current directory."""
+    (wheel,) = dist.glob("*.whl")
+    with zipfile.ZipFile(wheel) as archive:
+        libraries = [name for name in archive.namelist() if "_libraries/" in name]
+        archive.extractall(tmp_path, libraries)
+    assert len(libraries) == 3
+    for library in libraries:
+        assert not tags_of(tmp_path / library) & {"RPATH", "RUNPATH"}, library
+        assert "NEEDED" in tags_of(tmp_path / library)
+
+
+def tags_of(library):
+    """What the dynamic section of a library has."""
+    shown = subprocess.run(["readelf", "--dynamic", "--wide", library], capture_output=True,
+                           text=True, check=True, env=without_preloads()).stdout
+    return set(re.findall(r"\((\w+)\)", shown))
+
+
 def test_the_source_archive_has_no_libraries(dist):
     (archive,) = dist.glob("*.tar.gz")
     with tarfile.open(archive) as tar:
@@ -133,6 +152,16 @@ def test_the_page_about_python_is_right(tree, clips, tmp_path, monkeypatch):
         exec(compile(block, "docs/python.md", "exec"), names)
 
 
+def test_the_example_of_a_stream_ends_when_sound_is_short(tree, tmp_path, monkeypatch):
+    text = (tree / "docs/python.md").read_text()
+    (example,) = (block for block in re.findall(r"```python\n(.*?)```", text, re.DOTALL)
+                  if "kzsdk.Stream" in block)
+    (tmp_path / "stream.raw").write_bytes(bytes(200000))
+    monkeypatch.chdir(tmp_path)
+    with pytest.raises(kzsdk.TooLittleSoundError, match="nothing but silence in 2.3 s"):
+        exec(compile(example, "docs/python.md", "exec"), {"kzsdk": kzsdk})
+
+
 def test_the_first_four_lines_recognise_a_clip(tree, clips, tmp_path):
     text = (tree / "docs/python.md").read_text()
     first = re.search(r"```python\n(.*?)```", text, re.DOTALL).group(1)
@@ -158,6 +187,30 @@ def test_missing_libraries_are_named(tmp_path):
                           env={**os.environ, "KZSDK_LIBRARY_PATH": str(tmp_path)})
     assert "libkzsdk.so.1 cannot be loaded" in done.stdout
     assert "install the library (Debian: libkzsdk1), or name the folder" in done.stdout
+    assert f"KZSDK_LIBRARY_PATH names {tmp_path}, which has none of the libraries" in done.stdout
+
+
+def test_a_named_folder_may_have_some_libraries_only(clips, tmp_path):
+    (tmp_path / "libkzcat.so.1").symlink_to(FOLDER / "_libraries/libkzcat.so.1")
+    code = ("import kzsdk, sys\nassert 'libsndfile' in kzsdk.sound_reader\n"
+            "print(len(kzsdk.fingerprint(sys.argv[1]).values), len(kzsdk.Catalogue(None)))\n"
+            "print([line.split()[-1] for line in open('/proc/self/maps') if 'libkzcat' in line][0])")
+    done = subprocess.run([sys.executable, "-c", code, clips / "music.flac"], capture_output=True,
+                          text=True, check=True,
+                          env={**os.environ, "KZSDK_LIBRARY_PATH": str(tmp_path)})
+    assert done.stdout.splitlines() == ["30 0", str((FOLDER / "_libraries/libkzcat.so.1").resolve())]
+
+
+def test_a_reader_that_cannot_be_loaded_says_why(clips, tmp_path):
+    (tmp_path / "libkzsound.so").write_text("no library")
+    code = ("import kzsdk, sys\nsys.modules['soundfile'] = None\ntry:\n"
+            "    kzsdk.fingerprint(sys.argv[1])\n"
+            "except kzsdk.SoundFileError as error:\n    print(error)")
+    done = subprocess.run([sys.executable, "-c", code, clips / "music.flac"], capture_output=True,
+                          text=True, check=True,
+                          env={**os.environ, "KZSDK_LIBRARY_PATH": str(tmp_path)})
+    assert "the reader of sound files cannot be loaded (" in done.stdout
+    assert "libkzsound.so" in done.stdout and "install the package soundfile" in done.stdout
 
 
 def test_an_older_library_is_refused(monkeypatch):

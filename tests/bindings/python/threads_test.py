@@ -113,7 +113,7 @@ def test_users_of_an_exclusive_handle_take_turns():
     assert len(most) == 600 and max(most) == 1
 
 
-def test_who_waits_for_a_turn_learns_of_the_end():
+def test_a_thread_that_waits_for_its_turn_sees_the_close():
     counted, waits = Counted(shared=False), threading.Event()
     raised = []
 
@@ -130,6 +130,35 @@ def test_who_waits_for_a_turn_learns_of_the_end():
         counted.handle.close()
     thread.join()
     assert len(raised) == 1 and counted.freed == [4096]
+
+
+def test_calls_that_call_back_do_not_hide_each_other():
+    counted = Counted(shared=True)
+
+    def visit():
+        with counted.handle.use_with_callbacks():
+            pass
+
+    with counted.handle.use_with_callbacks():
+        run_all(visit)
+        with pytest.raises(kzsdk.Error, match="must not use the thing that calls it"):
+            counted.handle.use().__enter__()
+    with counted.handle.use():
+        pass
+
+
+def test_progress_may_not_verify_while_two_threads_do(tune):
+    raised = []
+    with kzsdk.Catalogue(None) as catalogue:
+        catalogue.add(tune, rate=RATE, title="A tune")
+
+        def progress(done, total):
+            with pytest.raises(kzsdk.Error, match="must not use the catalogue") as caught:
+                len(catalogue)
+            raised.append(caught.value)
+
+        run_all(*[lambda: [catalogue.verify(progress) for _ in range(5)]] * 2)
+    assert len(raised) >= 10
 
 
 def test_a_stream_is_closed_while_it_is_fed(tune):
