@@ -1094,7 +1094,7 @@ typedef struct kzcat_failed_job {
     int64_t job;
     const char* uri;
     const char* error;  /**< why the last attempt failed */
-    const char* worker; /**< who tried last */
+    const char* worker; /**< of the last attempt */
     uint32_t attempts;
     uint32_t reserved[5]; /**< 0 */
 } kzcat_failed_job;
@@ -1158,8 +1158,10 @@ KZ_API kzcat_status kzcat_jobs_take(kzcat_jobs* jobs, const char* worker, uint32
  * @param known     Without @p track: the id of the track that the file is one of already, in
  *                  whatever catalogue; 0 for none. It is only noted.
  * @param[out] out_added  What became of @p track; cleared without one. May be null.
- * @return 0; as kzcat_add() does. After a failure nothing was kept, and the job is still to be
- *         ended with kzcat_jobs_fail() or kzcat_jobs_give_back().
+ * @return 0; as kzcat_add() does. After a failure nothing was kept, unless the connection was lost
+ *         while the server committed: then both may have been. In either case the job is still to
+ *         be ended with kzcat_jobs_fail() or kzcat_jobs_give_back(), which change nothing about a
+ *         job that was kept as done.
  */
 KZ_API kzcat_status kzcat_jobs_finish(kzcat_jobs* jobs, const kzcat_new_track* track, int64_t known,
                                       kzcat_added* out_added) KZ_NOEXCEPT;

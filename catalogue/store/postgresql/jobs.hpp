@@ -33,7 +33,7 @@ struct FailedJob {
     int64_t attempts = 0;
     std::string uri;
     std::string error;
-    std::string worker; ///< who tried last
+    std::string worker; ///< of the last attempt
 };
 
 /// Throws StoreError. One thread at a time, and one job: a worker has as many objects as it works
@@ -57,8 +57,9 @@ public:
     virtual bool are_left() = 0;
 
     /// Ends the job that was taken. `tracks` are added to the catalogue of the same database in the
-    /// same transaction; `track` is noted when there are none, 0 for nothing. When this throws, the
-    /// job can still be failed or given back.
+    /// same transaction; `track` is noted when there are none, 0 for nothing. When this throws, nothing
+    /// was kept, or everything if the connection was lost while the server committed; the job can
+    /// still be failed or given back, which then changes nothing.
     virtual std::vector<Added> finish(std::span<const NewTrack> tracks, int64_t track) = 0;
 
     /// Notes why the job that was taken failed. It waits for another attempt unless it had
