@@ -53,13 +53,15 @@ std::optional<Runs> to_runs(Bytes bytes)
 struct State {
     int64_t change = 0;
     int64_t tracks = 0;
+    int64_t codes = 0;
 };
 
 State current_state(Connection& session)
 {
     const Rows rows = session.query("SELECT (SELECT coalesce(max(id), 0) FROM kzcat.change), "
-                                    "(SELECT count(*) FROM kzcat.track)");
-    return {.change = rows.integer(0, 0), .tracks = rows.integer(0, 1)};
+                                    "count(*), coalesce(sum(codes), 0)::bigint FROM kzcat.track");
+    return {
+        .change = rows.integer(0, 0), .tracks = rows.integer(0, 1), .codes = rows.integer(0, 2)};
 }
 
 std::optional<Runs> kept_runs(Connection& session, const State& now)
@@ -122,9 +124,9 @@ void keep_runs(Sessions& sessions, const State& state, const Runs& runs)
     const auto keep = [&](Connection& session) {
         return session.query(
             "INSERT INTO kzcat.population (only_row, change, tracks, codes, runs) VALUES "
-            "(1, $1, $2, 0, $3) ON CONFLICT (only_row) DO UPDATE SET change = $1, "
-            "tracks = $2, runs = $3",
-            state.change, state.tracks, Bytes(bytes));
+            "(1, $1, $2, $3, $4) ON CONFLICT (only_row) DO UPDATE SET change = $1, "
+            "tracks = $2, codes = $3, runs = $4",
+            state.change, state.tracks, state.codes, Bytes(bytes));
     };
     try {
         sessions.with(keep);

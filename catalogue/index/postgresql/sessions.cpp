@@ -29,9 +29,8 @@ std::unique_ptr<Connection> Sessions::take()
             return session;
         }
     }
-    auto session = std::make_unique<Connection>(address_);
-    session->execute(kSearchSession);
-    return session;
+    return std::make_unique<Connection>(
+        address_, ConnectionOptions{.session = kSearchSession, .any_server = true});
 }
 
 void Sessions::give_back(std::unique_ptr<Connection> session)

@@ -31,6 +31,8 @@ struct ConnectionOptions {
     bool read_only = false;
     std::string user = {}; ///< where the address names none; empty: as libpq finds it
     std::string password = {};
+    std::string session = {}; ///< SET statements that every session begins with
+    bool any_server = false;  ///< a standby will do even if not read_only
 };
 
 /// What a statement gave. Rows and columns count from 0.
@@ -74,8 +76,11 @@ public:
     const std::string& name() const { return options_.name; }
     const ConnectionOptions& options() const { return options_; }
     PGconn* handle() const { return connection_.get(); }
+    const std::string& address() const { return address_; }
     std::string user() const { return PQuser(handle()); }
-    std::string password() const { return PQpass(handle()); }
+
+    /// Connects again when the session is known to have ended, unless a transaction is open.
+    void ensure_connected();
 
     /// Runs statements that return nothing of interest.
     void execute(const std::string& sql);
@@ -104,16 +109,18 @@ private:
     friend class Transaction;
 
     void connect();
-    void configure();
-    void ensure_connected();
+    void configure(PGconn* session);
     Rows run(const char* sql, const Parameters& parameters);
     Rows run_once(const std::string& sql, const Parameters& parameters);
     const std::string& compiled(const char* sql, const Parameters& parameters);
-    Rows checked(PGresult* result);
+    Rows checked(PGconn* session, PGresult* result);
+    Rows checked(PGresult* result) { return checked(handle(), result); }
+
+    using Session = std::unique_ptr<PGconn, Finish>;
 
     std::string address_;
     ConnectionOptions options_;
-    std::unique_ptr<PGconn, Finish> connection_;
+    Session connection_;
     std::map<const char*, std::string> compiled_; ///< names, by the address of the text
     uint64_t compilations_ = 0; ///< the server may have compiled what the client could not note
     int depth_ = 0;             ///< transactions within each other

@@ -284,8 +284,9 @@ std::unique_ptr<Jobs> open_jobs(const std::string& address, Access access)
 {
     if (!is_server_address(address)) {
         throw StoreError(StoreError::Kind::invalid,
-                         address + ": jobs are kept on a PostgreSQL server; name its database, as "
-                                   "postgresql://HOST/DATABASE");
+                         shown_place(address) +
+                             ": jobs are kept on a PostgreSQL server; name its database, as "
+                             "postgresql://HOST/DATABASE");
     }
     return std::make_unique<PostgresJobs>(open_postgres_store(address, access));
 }

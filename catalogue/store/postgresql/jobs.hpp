@@ -57,9 +57,9 @@ public:
     virtual bool are_left() = 0;
 
     /// Ends the job that was taken. `tracks` are added to the catalogue of the same database in the
-    /// same transaction; `track` is noted when there are none, 0 for nothing. When this throws, nothing
-    /// was kept, or everything if the connection was lost while the server committed; the job can
-    /// still be failed or given back, which then changes nothing.
+    /// same transaction; `track` is noted when there are none, 0 for nothing. When this throws,
+    /// nothing was kept, or everything if the connection was lost while the server committed; the
+    /// job can still be failed or given back, which in the latter case changes nothing.
     virtual std::vector<Added> finish(std::span<const NewTrack> tracks, int64_t track) = 0;
 
     /// Notes why the job that was taken failed. It waits for another attempt unless it had

@@ -23,13 +23,20 @@ size_t after_scheme(std::string_view path)
     return 0;
 }
 
-/// USER:PASSWORD@: up to the last @, since a password may have been written with one in it.
+/// USER:PASSWORD@: up to the last @, since a password may have been written with one in it. Without
+/// an @ the host may have been forgotten: what is no port is hidden too.
 void hide_in_authority(std::string& text, size_t begin)
 {
-    const size_t end = text.rfind('@');
+    const size_t last = text.rfind('@');
+    const size_t end = last != std::string::npos ? last : text.find_first_of("/?,[", begin);
     const size_t colon = text.find(':', begin);
-    if (end != std::string::npos && colon < end) {
-        text.replace(colon + 1, end - colon - 1, kHidden);
+    if (colon >= end) {
+        return;
+    }
+    const bool is_port =
+        last == std::string::npos && text.find_first_not_of("0123456789", colon + 1) >= end;
+    if (!is_port) {
+        text.replace(colon + 1, std::min(end, text.size()) - colon - 1, kHidden);
     }
 }
 
@@ -44,6 +51,16 @@ void hide_in_options(std::string& text)
     }
 }
 
+/// "host=... password=...": up to the end, since the password may be quoted in several ways.
+void hide_in_pairs(std::string& text)
+{
+    constexpr std::string_view kKey = "password=";
+    const size_t at = text.find(kKey);
+    if (at == 0 || (at != std::string::npos && text[at - 1] == ' ')) {
+        text.replace(at + kKey.size(), std::string::npos, kHidden);
+    }
+}
+
 } // namespace
 
 bool is_server_address(std::string_view path) { return after_scheme(path) != 0; }
@@ -54,6 +71,8 @@ std::string shown_place(std::string_view path)
     if (is_server_address(path)) {
         hide_in_options(text);
         hide_in_authority(text, after_scheme(path));
+    } else {
+        hide_in_pairs(text);
     }
     return text;
 }

@@ -39,7 +39,7 @@ class PostgresStore final : public Store {
 public:
     PostgresStore(const std::string& address, Access access, const PostgresOptions& options)
         : access_(access), opened_(open_catalogue(address, access, options)),
-          own_(*opened_.connection), shards_(own_, address, opened_.identity.id)
+          own_(*opened_.connection), shards_(own_, opened_.identity.id)
     {
     }
 
@@ -52,14 +52,16 @@ public:
         for (const NewTrack& track : tracks) {
             check_new_track(track, profile());
         }
-        return change([tracks](Writer& writer) {
-            std::vector<Added> added;
-            added.reserve(tracks.size());
-            for (const NewTrack& track : tracks) {
-                added.push_back(writer.add(track));
-            }
-            return added;
-        });
+        return change(
+            [tracks](Writer& writer) {
+                std::vector<Added> added;
+                added.reserve(tracks.size());
+                for (const NewTrack& track : tracks) {
+                    added.push_back(writer.add(track));
+                }
+                return added;
+            },
+            tracks);
     }
 
     void add_source(int64_t track, const Source& source) override
@@ -201,15 +203,16 @@ public:
     }
 
 private:
-    /// Runs `act` as the only writer, in one transaction.
+    /// Runs `act` as the only writer, in one transaction. It may add `tracks`.
     template <class Act>
-    std::invoke_result_t<Act, Writer&> change(Act act)
+    std::invoke_result_t<Act, Writer&> change(Act act, std::span<const NewTrack> tracks = {})
     {
         if (access_ == Access::read) {
             throw StoreError(Kind::read_only,
                              own_.name() + ": it was opened for reading; open it for writing");
         }
         Writer writer(own_, shards_);
+        writer.prepare(tracks);
         Transaction transaction(own_, Transaction::Kind::write);
         own_.query(kTakeTurn);
         writer.settle();

@@ -5,12 +5,33 @@
 #include <utility>
 
 #include "catalogue/store/little_endian.hpp"
+#include "catalogue/store/postgresql/address.hpp"
 #include "catalogue/store/postgresql/opening.hpp"
 
 namespace kzcat::postgresql {
 
-Shards::Shards(Connection& own, std::string address, std::string catalogue)
-    : own_(own), address_(std::move(address)), catalogue_(std::move(catalogue))
+namespace {
+
+/// What is known of the own session goes for a shard whose address is silent about it. A password
+/// goes with its user, and to other servers only where it was written into the address: what libpq
+/// finds in ~/.pgpass it finds for each server by itself.
+ConnectionOptions options_for(const Connection& own, const std::string& address,
+                              const std::string& name)
+{
+    ConnectionOptions options = own.options();
+    options.name = name;
+    options.user.clear();
+    options.password.clear();
+    if (!names_user(address)) {
+        options.user = own.user();
+        options.password = password_in(own.address());
+    }
+    return options;
+}
+
+} // namespace
+
+Shards::Shards(Connection& own, std::string catalogue) : own_(own), catalogue_(std::move(catalogue))
 {
 }
 
@@ -19,30 +40,60 @@ Connection& Shards::at(int64_t shard)
     if (shard == 0) {
         return own_;
     }
-    auto& session = sessions_[shard];
-    if (session == nullptr) {
-        const std::string name = own_.name() + ", shard " + std::to_string(shard);
-        const Rows rows = own_.query("SELECT address FROM shard WHERE number = $1", shard);
-        if (rows.empty()) {
-            throw StoreError(StoreError::Kind::damaged,
-                             name + ": its address is missing; put it back into the table "
-                                    "kzcat.shard");
+    const auto begin = Clock::now();
+    try {
+        auto& session = sessions_[shard];
+        if (session == nullptr) {
+            session = connect(shard);
         }
-        ConnectionOptions options = own_.options();
-        options.name = name;
-        options.user = own_.user();
-        options.password = own_.password();
-        auto fresh = std::make_unique<Connection>(std::string(rows.text(0, 0)), options);
-        check_shard(*fresh, catalogue_, shard);
-        session = std::move(fresh);
+        session->ensure_connected();
+        silent_.erase(shard);
+        return *session;
+    } catch (const StoreError& error) {
+        if (Clock::now() - begin > kLongWait) {
+            silent_.insert_or_assign(shard,
+                                     Silence{.until = Clock::now() + kPause, .error = error});
+        }
+        throw;
     }
-    return *session;
+}
+
+Connection& Shards::promptly(int64_t shard)
+{
+    const auto silence = silent_.find(shard);
+    if (silence != silent_.end() && Clock::now() < silence->second.until) {
+        throw StoreError(silence->second.error);
+    }
+    return at(shard);
+}
+
+void Shards::reach(int64_t shard)
+{
+    try {
+        promptly(shard);
+    } catch (const StoreError&) {
+        return; // what needs it meets the same
+    }
+}
+
+std::unique_ptr<Connection> Shards::connect(int64_t shard)
+{
+    const std::string name = own_.name() + ", shard " + std::to_string(shard);
+    const Rows rows = own_.query("SELECT address FROM shard WHERE number = $1", shard);
+    if (rows.empty()) {
+        throw StoreError(StoreError::Kind::damaged,
+                         name + ": its address is missing; put it back into the table kzcat.shard");
+    }
+    const std::string address(rows.text(0, 0));
+    auto session = std::make_unique<Connection>(address, options_for(own_, address, name));
+    check_shard(*session, catalogue_, shard);
+    return session;
 }
 
 Connection& Shards::aside()
 {
     if (aside_ == nullptr) {
-        aside_ = std::make_unique<Connection>(address_, own_.options());
+        aside_ = std::make_unique<Connection>(own_.address(), own_.options());
     }
     return *aside_;
 }

@@ -2,6 +2,7 @@
 /// The databases that keep a catalogue's codes: its own, and its shards.
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <map>
 #include <memory>
@@ -15,12 +16,19 @@ namespace kzcat::postgresql {
 
 class Shards {
 public:
-    /// `own` is the catalogue's session, `address` what it was made with.
-    Shards(Connection& own, std::string address, std::string catalogue);
+    /// `own` is the catalogue's session.
+    Shards(Connection& own, std::string catalogue);
 
     /// The session with a shard, made when it is first wanted; shard 0 is the catalogue's own.
     /// Throws StoreError, with the shard's number in its text.
     Connection& at(int64_t shard);
+
+    /// The same for a caller that others wait for. A shard whose host is silent, so that to wait
+    /// for it takes long, is not tried again for a minute: what was thrown then is thrown at once.
+    Connection& promptly(int64_t shard);
+
+    /// Makes the session before promptly() asks for it, where that is possible.
+    void reach(int64_t shard);
 
     /// A second session with the catalogue's own database, for what must outlast a transaction of
     /// the first.
@@ -34,10 +42,20 @@ public:
     int64_t place_of(const ContentKey& key);
 
 private:
+    using Clock = std::chrono::steady_clock;
+    static constexpr std::chrono::seconds kLongWait{1};
+    static constexpr std::chrono::minutes kPause{1};
+    struct Silence {
+        Clock::time_point until;
+        StoreError error;
+    };
+
+    std::unique_ptr<Connection> connect(int64_t shard);
+
     Connection& own_;
-    std::string address_;
     std::string catalogue_;
     std::map<int64_t, std::unique_ptr<Connection>> sessions_;
+    std::map<int64_t, Silence> silent_;
     std::unique_ptr<Connection> aside_;
     std::optional<std::vector<int64_t>> numbers_;
 };

@@ -143,23 +143,35 @@ private:
     /// Looks whether the next codes of a shard are those of tracks; false at the end.
     bool check_some_strays(int64_t shard, int64_t& after)
     {
-        const Rows rows = shards_.at(shard).query(
-            "SELECT track FROM trail WHERE track > $1 ORDER BY track LIMIT 10000", after);
-        std::vector<int64_t> tracks;
-        for (int row = 0; row < rows.count(); ++row) {
-            tracks.push_back(after = rows.integer(row, 0));
+        std::vector<int64_t> tracks = numbers_in(shards_.at(shard).query(
+            "SELECT track FROM trail WHERE track > $1 ORDER BY track LIMIT 10000", after));
+        if (tracks.empty()) {
+            return false;
         }
-        const Rows strays = own_.query(
+        after = tracks.back();
+        tracks = numbers_in(own_.query(
             "SELECT stray FROM unnest($1::bigint[]) AS codes (stray) WHERE NOT EXISTS (SELECT 1 "
             "FROM track WHERE id = stray AND shard = $2) AND NOT EXISTS (SELECT 1 FROM pending "
             "WHERE track = stray)",
-            std::span<const int64_t>(tracks), shard);
-        for (int row = 0; row < strays.count(); ++row) {
-            fault(strays.integer(row, 0),
-                  "there are codes of it in the table kzcat.trail of shard " +
-                      std::to_string(shard) + ", but no such track; delete that row");
+            std::span<const int64_t>(tracks), shard));
+        // Those of a track that a writer has removed meanwhile have gone by now.
+        tracks = numbers_in(
+            shards_.at(shard).query("SELECT track FROM trail WHERE track = ANY ($1) ORDER BY track",
+                                    std::span<const int64_t>(tracks)));
+        for (const int64_t track : tracks) {
+            fault(track, "there are codes of it in the table kzcat.trail of shard " +
+                             std::to_string(shard) + ", but no such track; delete that row");
         }
-        return !rows.empty();
+        return true;
+    }
+
+    static std::vector<int64_t> numbers_in(const Rows& rows)
+    {
+        std::vector<int64_t> numbers;
+        for (int row = 0; row < rows.count(); ++row) {
+            numbers.push_back(rows.integer(row, 0));
+        }
+        return numbers;
     }
 
     void check_tracks()

@@ -1,103 +1,16 @@
-// In which order the databases of a catalogue are written:
-//
-//   1. the catalogue's own: `pending` names the new tracks  (committed at once by a second session)
-//   2. each shard: their codes                              (committed)
-//   3. the catalogue's own: rows of tracks, and `pending` no longer names the new ones, but those
-//      that were removed                                    (committed; only this moment counts)
-//   4. each shard: codes of what was removed goes; `pending` no longer names it
-//
-// Whatever ends this early leaves codes on shards at most, and `pending` names all of them.
+// Tracks, their tags and their sources, in the catalogue's own database.
 
 #include "catalogue/store/postgresql/writer.hpp"
 
-#include <algorithm>
-#include <deque>
+#include <set>
+#include <utility>
 
-#include "catalogue/model/crc32c.hpp"
 #include "catalogue/store/hash.hpp"
-#include "catalogue/store/little_endian.hpp"
 #include "catalogue/store/rules.hpp"
 
 namespace kzcat::postgresql {
 
 namespace {
-
-/// Numbers as the table has them; `room` keeps them where the processor's order is another.
-template <std::unsigned_integral Number>
-Bytes stored(std::span<const Number> numbers, std::vector<std::byte>& room)
-{
-    if constexpr (std::endian::native == std::endian::little) {
-        return std::as_bytes(numbers);
-    } else {
-        room.resize(numbers.size_bytes());
-        put_little_endian(numbers, std::span(room));
-        return room;
-    }
-}
-
-/// Trails on their way to one shard, which receives them in one statement.
-class Trails {
-public:
-    Trails(Connection& connection, int64_t shard) : connection_(connection), shard_(shard) {}
-
-    void add(int64_t track, const Trail& trail)
-    {
-        const Bytes bytes = stored(std::span(trail.codes), rooms_.emplace_back());
-        tracks_.push_back(track);
-        sums_.push_back(int64_t{crc32c(bytes)});
-        codes_.push_back(bytes);
-        waiting_ += bytes.size();
-        if (waiting_ >= kMostWaiting) {
-            write();
-        }
-    }
-
-    void write()
-    {
-        if (!tracks_.empty()) {
-            connection_.query("INSERT INTO trail (shard, track, crc, codes) SELECT $1::bigint, * "
-                              "FROM unnest($2::bigint[], $3::bigint[], $4::bytea[])",
-                              shard_, std::span<const int64_t>(tracks_),
-                              std::span<const int64_t>(sums_), std::span<const Bytes>(codes_));
-        }
-        tracks_.clear();
-        sums_.clear();
-        codes_.clear();
-        rooms_.clear();
-        waiting_ = 0;
-    }
-
-private:
-    static constexpr size_t kMostWaiting = size_t{1} << 24; ///< bytes
-
-    Connection& connection_;
-    int64_t shard_;
-    std::vector<int64_t> tracks_;
-    std::vector<int64_t> sums_;
-    std::vector<Bytes> codes_;
-    std::deque<std::vector<std::byte>> rooms_;
-    size_t waiting_ = 0;
-};
-
-/// Those that an interrupted writer has left are replaced.
-void write_bands(Connection& connection, int64_t track, const DocumentBands& bands)
-{
-    std::vector<std::byte> room;
-    const Bytes bytes = stored(std::span(bands), room);
-    connection.query("INSERT INTO document_bands (track, crc, bands) VALUES ($1, $2, $3) ON "
-                     "CONFLICT (track) DO UPDATE SET crc = excluded.crc, bands = excluded.bands",
-                     track, int64_t{crc32c(bytes)}, bytes);
-}
-
-/// In its turn, so that codes that were being written when their writer ended are there or not.
-void remove_codes(Connection& shard, std::span<const int64_t> tracks)
-{
-    Transaction transaction(shard, Transaction::Kind::write);
-    shard.query(kTakeTurn);
-    shard.query("DELETE FROM trail WHERE track = ANY ($1)", tracks);
-    shard.query("DELETE FROM document_bands WHERE track = ANY ($1)", tracks);
-    transaction.commit();
-}
 
 std::optional<TrackRow> find(const Rows& rows)
 {
@@ -107,30 +20,15 @@ std::optional<TrackRow> find(const Rows& rows)
 
 } // namespace
 
-void Writer::settle()
+void Writer::prepare(std::span<const NewTrack> tracks)
 {
-    if (shards_.numbers().empty()) {
-        return;
-    }
-    const Rows rows =
-        own_.query("SELECT pending.track, pending.shard, track.id IS NULL FROM pending "
-                   "LEFT JOIN track ON track.id = pending.track");
-    std::map<int64_t, std::vector<int64_t>> left;
-    for (int row = 0; row < rows.count(); ++row) {
-        auto& tracks = left[rows.integer(row, 1)];
-        if (rows.boolean(row, 2)) {
-            tracks.push_back(rows.integer(row, 0));
+    std::set<int64_t> shards;
+    if (!shards_.numbers().empty()) {
+        for (const NewTrack& track : tracks) {
+            shards.insert(shards_.place_of(content_key(track.trail)));
         }
     }
-    for (const auto& [shard, tracks] : left) {
-        try {
-            remove_codes(shards_.at(shard), tracks);
-        } catch (const StoreError&) {
-            continue; // it cannot be reached; what is to be added elsewhere need not wait for it
-        }
-        own_.query("DELETE FROM pending WHERE shard = $1 AND track = ANY ($2)", shard,
-                   std::span<const int64_t>(tracks));
-    }
+    codes_.prepare(std::move(shards));
 }
 
 Added Writer::add(const NewTrack& track)
@@ -166,8 +64,7 @@ int64_t Writer::insert(const NewTrack& track, const ContentKey& key)
                                  bytes_of(key), row.shard, row.samples, row.codes, row.has_bands,
                                  row.added, sum_of(row));
     const int64_t id = rows.integer(0, 0);
-    codes_[row.shard].push_back(
-        {.track = id, .trail = &track.trail, .bands = &track.document_bands});
+    codes_.add(row.shard, {.track = id, .trail = &track.trail, .bands = &track.document_bands});
     insert_tags(id, track.tags);
     return id;
 }
@@ -208,8 +105,7 @@ void Writer::enrich(const TrackRow& known, const NewTrack& track)
         row.has_bands = true;
         own_.query("UPDATE track SET has_bands = true, crc = $2 WHERE id = $1", row.id,
                    sum_of(row));
-        codes_[row.shard].push_back(
-            {.track = row.id, .trail = nullptr, .bands = &track.document_bands});
+        codes_.add(row.shard, {.track = row.id, .trail = nullptr, .bands = &track.document_bands});
     }
 }
 
@@ -296,85 +192,8 @@ bool Writer::note_removed(const Rows& rows)
     if (rows.empty()) {
         return false;
     }
-    const int64_t track = rows.integer(0, 0);
-    const int64_t shard = rows.integer(0, 1);
-    std::erase_if(codes_[shard], [track](const Codes& codes) { return codes.track == track; });
-    if (shard != 0) {
-        removed_[shard].push_back(track);
-    }
+    codes_.remove(rows.integer(0, 1), rows.integer(0, 0));
     return true;
-}
-
-void Writer::write_codes()
-{
-    announce();
-    for (const auto& [shard, all] : codes_) {
-        if (all.empty()) {
-            continue;
-        }
-        Connection& connection = shards_.at(shard);
-        Transaction transaction(connection, Transaction::Kind::write);
-        connection.query(kTakeTurn);
-        Trails trails(connection, shard);
-        for (const Codes& codes : all) {
-            if (codes.trail != nullptr) {
-                trails.add(codes.track, *codes.trail);
-            }
-            if (!codes.bands->empty()) {
-                write_bands(connection, codes.track, *codes.bands);
-            }
-        }
-        trails.write();
-        transaction.commit(); // for shard 0 a part of the caller's, which commits it
-    }
-    retract();
-}
-
-/// Names the new tracks of shards, for good.
-void Writer::announce()
-{
-    for (const auto& [shard, all] : codes_) {
-        std::vector<int64_t> tracks;
-        for (const Codes& codes : all) {
-            if (codes.trail != nullptr && shard != 0) {
-                tracks.push_back(codes.track);
-            }
-        }
-        if (!tracks.empty()) {
-            shards_.aside().query(
-                "INSERT INTO pending (track, shard) SELECT track, $2::bigint FROM "
-                "unnest($1::bigint[]) AS new (track)",
-                std::span<const int64_t>(tracks), shard);
-            announced_.insert(announced_.end(), tracks.begin(), tracks.end());
-        }
-    }
-}
-
-/// With the caller's transaction: the new tracks are no longer in question, but the removed are.
-void Writer::retract()
-{
-    if (!announced_.empty()) {
-        own_.query("DELETE FROM pending WHERE track = ANY ($1)",
-                   std::span<const int64_t>(announced_));
-    }
-    for (const auto& [shard, tracks] : removed_) {
-        own_.query("INSERT INTO pending (track, shard) SELECT track, $2::bigint FROM "
-                   "unnest($1::bigint[]) AS old (track) ON CONFLICT DO NOTHING",
-                   std::span<const int64_t>(tracks), shard);
-    }
-}
-
-void Writer::clean() noexcept
-{
-    try {
-        for (const auto& [shard, tracks] : removed_) {
-            remove_codes(shards_.at(shard), tracks);
-            own_.query("DELETE FROM pending WHERE track = ANY ($1)",
-                       std::span<const int64_t>(tracks));
-        }
-    } catch (const std::exception&) {
-        return; // `pending` still names them
-    }
 }
 
 } // namespace kzcat::postgresql

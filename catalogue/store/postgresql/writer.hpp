@@ -3,10 +3,10 @@
 #pragma once
 
 #include <cstdint>
-#include <map>
+#include <span>
 #include <string_view>
-#include <vector>
 
+#include "catalogue/store/postgresql/code_writer.hpp"
 #include "catalogue/store/postgresql/connection.hpp"
 #include "catalogue/store/postgresql/rows.hpp"
 #include "catalogue/store/postgresql/shards.hpp"
@@ -14,21 +14,18 @@
 
 namespace kzcat::postgresql {
 
-/// Waits until no other writer of a database is in its transaction.
-constexpr const char* kTakeTurn = "SELECT pg_advisory_xact_lock(1264206657)"; // "KZCA"
-
 /// What is done within one transaction of the catalogue's own session, which the caller has begun
-/// and in which it is the only writer.
-///
-/// Codes for shards are committed there before the catalogue's transaction, so that no transaction
-/// is over two databases: without its row in the catalogue's table a track is not there, and the
-/// table `pending` has what may have to be removed.
+/// and in which it is the only writer. The codes of its tracks are a CodeWriter's.
 class Writer {
 public:
-    Writer(Connection& own, Shards& shards) : own_(own), shards_(shards) {}
+    Writer(Connection& own, Shards& shards) : own_(own), shards_(shards), codes_(own, shards) {}
 
-    /// Removes codes that an interrupted writer has left on shards, as far as these can be reached.
-    void settle();
+    /// To be called before the caller is the only writer, so that nobody waits for a shard that is
+    /// hard to reach but those that need it. `tracks` are those that are to be added.
+    void prepare(std::span<const NewTrack> tracks);
+
+    /// The first thing to do as the only writer.
+    void settle() { codes_.settle(); }
 
     Added add(const NewTrack& track);
     void give(int64_t track, const Source& source);
@@ -36,19 +33,12 @@ public:
     bool remove_source(std::string_view uri);
 
     /// Writes the codes of what was added. The tracks passed to add() must still be there.
-    void write_codes();
+    void write_codes() { codes_.write(); }
 
-    /// To be called once the transaction is committed. Removes the codes of what was removed; what
-    /// cannot be removed now is by the next writer.
-    void clean() noexcept;
+    /// To be called once the transaction is committed.
+    void clean() noexcept { codes_.clean(); }
 
 private:
-    struct Codes {
-        int64_t track = 0;
-        const Trail* trail = nullptr; ///< null: they are there
-        const DocumentBands* bands = nullptr;
-    };
-
     int64_t insert(const NewTrack& track, const ContentKey& key);
     void enrich(const TrackRow& known, const NewTrack& track);
     void insert_tags(int64_t track, std::span<const Tag> tags);
@@ -59,14 +49,10 @@ private:
     void delete_source(std::string_view uri);
     void remove_without_sources(int64_t track);
     bool note_removed(const Rows& rows);
-    void announce();
-    void retract();
 
     Connection& own_;
     Shards& shards_;
-    std::map<int64_t, std::vector<Codes>> codes_;     ///< by shard
-    std::vector<int64_t> announced_;                  ///< what `pending` names
-    std::map<int64_t, std::vector<int64_t>> removed_; ///< by shard, but for those on shard 0
+    CodeWriter codes_;
 };
 
 } // namespace kzcat::postgresql

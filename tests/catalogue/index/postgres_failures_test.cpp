@@ -190,6 +190,20 @@ TEST_F(Shards, SendWholeTablesUnlessGroupedByShard)
     EXPECT_EQ("on\n", fleet_->coordinator.sql("SHOW enable_partitionwise_aggregate"));
 }
 
+TEST_F(Shards, HaveTheirPopulationKeptForOthers)
+{
+    EXPECT_EQ(std::to_string(kTracks) + "|" + std::to_string(store_->code_count()) + "\n",
+              fleet_->coordinator.sql("SELECT tracks, codes FROM kzcat.population"));
+}
+
+TEST_F(Shards, WhoseHostsHaveGoneAreNoticed)
+{
+    EXPECT_EQ("2\n", fleet_->coordinator.sql(
+                         "SELECT count(*) FROM pg_foreign_server WHERE srvoptions @> "
+                         "'{keepalives_idle=30, keepalives_interval=10, keepalives_count=3, "
+                         "tcp_user_timeout=40000}'"));
+}
+
 TEST_F(Shards, ThatDieAreNamedAndMissedUntilTheyAreBack)
 {
     const auto index = open_index(*store_, options_for(url()));
@@ -258,6 +272,7 @@ TEST_F(Shards, WithoutTheExtensionAreRefusedWithTheCure)
     const std::string text = failure([&] { found(*index, 1); });
     EXPECT_NE(std::string::npos, text.find("shard 1 of 2 gave no answer")) << text;
     EXPECT_NE(std::string::npos, text.find("kzcat.kz_version")) << text;
+    EXPECT_NE(std::string::npos, text.find("ALTER EXTENSION kzmatch SET SCHEMA kzcat")) << text;
     EXPECT_NE("nothing failed", failure([&] { open_index(*store_, options_for(url())); }));
     fleet_->one.sql("ALTER EXTENSION kzmatch SET SCHEMA kzcat");
     EXPECT_EQ(ids_[4], found(*index, 5));
@@ -361,6 +376,27 @@ TEST_F(Standby, TakesOverAfterOneLookUpAtMost)
     }
     EXPECT_GE(1, failed);
     EXPECT_EQ(1U, index->coverage().answered);
+}
+
+TEST_F(Standby, OfTheCataloguesServerAnswersToo)
+{
+    if (!kz::test::postgres_obstacle().empty()) {
+        GTEST_SKIP() << kz::test::postgres_obstacle();
+    }
+    kz::test::PostgresServer server;
+    const auto ids = add(*open_postgres_store(server.url(), Access::create), 1, 10);
+    const auto standby = kz::test::PostgresServer::standby_of(server);
+    test::await_replay(server, *standby);
+    const std::string both = "postgresql://postgres@/postgres?host=" + server.host() + "," +
+                             standby->host() + "&port=" + std::to_string(server.port()) + "," +
+                             std::to_string(standby->port());
+    for (const std::string& url : {standby->url(), both, both}) {
+        const auto store = open_postgres_store(url, Access::read);
+        EXPECT_EQ(ids[4], found(*open_index(*store, options_for(url)), 5)) << url;
+        if (url == both && server.is_running()) {
+            server.kill9(); // the second time round the standby is the only one
+        }
+    }
 }
 
 TEST(PostgresShards, KeepTheirNumbers)

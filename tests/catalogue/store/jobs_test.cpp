@@ -1,6 +1,7 @@
 // Jobs as workers meet them. A worker that dies is one whose connection ends: its object goes, or
 // the server ends its session.
 
+#include <cstring>
 #include <set>
 
 #include <gtest/gtest.h>
@@ -283,6 +284,12 @@ TEST(Jobs, AFileIsRefusedAsThePlaceOfJobs)
         EXPECT_STREQ("music.kzc: jobs are kept on a PostgreSQL server; name its database, as "
                      "postgresql://HOST/DATABASE",
                      error.what());
+    }
+    try {
+        open_jobs("host=h password=secret", Access::create);
+        FAIL();
+    } catch (const StoreError& error) {
+        EXPECT_EQ(nullptr, std::strstr(error.what(), "secret")) << error.what();
     }
 }
 

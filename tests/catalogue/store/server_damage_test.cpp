@@ -1,5 +1,8 @@
 // What verification finds in databases that were changed by hand, and what reading does about it.
 
+#include <future>
+#include <thread>
+
 #include <gtest/gtest.h>
 
 #include "catalogue/store/postgresql/postgres_store.hpp"
@@ -84,6 +87,27 @@ TEST_F(Damage, OfStrayCodesIsFound)
 {
     expect_fault("INSERT INTO trail (shard, track, crc, codes) VALUES (0, 99, 0, '')",
                  "no such track; delete that row");
+}
+
+TEST_F(Damage, IsNotWhatWritersRemoveMeanwhile)
+{
+    const auto store = changed("");
+    postgresql::Connection writer(connection_of(*store).address());
+    // Verification has read which codes there are when it waits for this table.
+    auto removal =
+        std::make_unique<postgresql::Transaction>(writer, postgresql::Transaction::Kind::write);
+    writer.execute("LOCK TABLE pending IN ACCESS EXCLUSIVE MODE");
+    auto verifying = std::async(std::launch::async, [&] { return faults(*store); });
+    while (writer
+               .query("SELECT FROM pg_locks WHERE relation = 'pending'::regclass AND NOT granted "
+                      "AND database = (SELECT oid FROM pg_database WHERE datname = "
+                      "current_database())")
+               .empty()) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    }
+    writer.execute("DELETE FROM track WHERE id = 2");
+    removal->commit();
+    EXPECT_EQ(std::vector<std::string>(), verifying.get());
 }
 
 TEST_F(Damage, ChangesByHandAreLogged)
