@@ -133,9 +133,9 @@ Identity identify(Connection& connection)
 
 void check_rights(Connection& connection)
 {
-    const Rows rows = connection.query(
-        "SELECT has_table_privilege('track', 'INSERT') AND "
-        "has_table_privilege('track', 'DELETE'), pg_is_in_recovery()");
+    const Rows rows =
+        connection.query("SELECT has_table_privilege('track', 'INSERT') AND "
+                         "has_table_privilege('track', 'DELETE'), pg_is_in_recovery()");
     if (rows.boolean(0, 1)) {
         refuse(Kind::read_only, connection,
                "the server is a standby, which may only be read; name the one that may be "
