@@ -1,6 +1,6 @@
 #!/bin/sh
-# Compiles libkzsdk for Android's four kinds of processors with clang, where there is no NDK: with the
-# C and C++ headers of Debian's cross compilers, and with Android's jni.h and log.h. Nothing is
+# Compiles libkzsdk for Android's four kinds of processors with clang, where there is no NDK: with
+# the C and C++ headers of Debian's cross compilers, and with Android's jni.h and log.h. Nothing is
 # linked. Says how many files were compiled for each; takes some minutes.
 #
 #   packaging/check_android.sh [file...]     default: all of kzsdk

@@ -76,6 +76,16 @@ void Shards::reach(int64_t shard)
     }
 }
 
+void Shards::reach_new()
+{
+    for (const int64_t shard : numbers()) {
+        const auto session = sessions_.find(shard);
+        if (session == sessions_.end() || session->second == nullptr) {
+            reach(shard);
+        }
+    }
+}
+
 std::unique_ptr<Connection> Shards::connect(int64_t shard)
 {
     const std::string name = own_.name() + ", shard " + std::to_string(shard);

@@ -30,6 +30,10 @@ public:
     /// Makes the session before promptly() asks for it, where that is possible.
     void reach(int64_t shard);
 
+    /// The same for every shard that had no session yet, since connecting makes the tables of a new
+    /// one: look-ups read those of all.
+    void reach_new();
+
     /// A second session with the catalogue's own database, for what must outlast a transaction of
     /// the first.
     Connection& aside();

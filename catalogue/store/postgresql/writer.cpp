@@ -27,6 +27,9 @@ void Writer::prepare(std::span<const NewTrack> tracks)
         for (const NewTrack& track : tracks) {
             shards.insert(shards_.place_of(content_key(track.trail)));
         }
+        if (!tracks.empty()) {
+            shards_.reach_new();
+        }
     }
     codes_.prepare(std::move(shards));
 }

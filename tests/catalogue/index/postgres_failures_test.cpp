@@ -423,5 +423,17 @@ TEST(PostgresShards, KeepTheirNumbers)
     EXPECT_EQ("2\n", fleet.coordinator.sql("SELECT count(*) FROM kzcat.shard"));
 }
 
+TEST(PostgresShards, WithoutTracksAreSearchedToo)
+{
+    if (!kz::test::postgres_obstacle().empty()) {
+        GTEST_SKIP() << kz::test::postgres_obstacle();
+    }
+    const test::Fleet fleet;
+    const auto store = open_postgres_store(fleet.coordinator.url(), Access::create);
+    const auto ids = add(*store, 1, 1);
+    const auto index = open_index(*store, options_for(fleet.coordinator.url()));
+    EXPECT_EQ(ids.at(0), found(*index, 1));
+}
+
 } // namespace
 } // namespace kzcat
