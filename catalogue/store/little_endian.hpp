@@ -51,6 +51,19 @@ void put_little_endian(std::span<const Number> numbers, std::span<std::byte> byt
     }
 }
 
+/// Numbers as they are stored; `room` keeps them where the processor's order is another.
+template <std::unsigned_integral Number>
+std::span<const std::byte> stored(std::span<const Number> numbers, std::vector<std::byte>& room)
+{
+    if constexpr (std::endian::native == std::endian::little) {
+        return std::as_bytes(numbers);
+    } else {
+        room.resize(numbers.size_bytes());
+        put_little_endian(numbers, std::span(room));
+        return room;
+    }
+}
+
 /// Reads whole numbers; bytes beyond the last whole one are ignored.
 template <std::unsigned_integral Number>
 void get_little_endian(std::span<const std::byte> bytes, std::vector<Number>& numbers)

@@ -22,19 +22,6 @@ namespace kzcat::postgresql {
 
 namespace {
 
-/// Numbers as the table has them; `room` keeps them where the processor's order is another.
-template <std::unsigned_integral Number>
-Bytes stored(std::span<const Number> numbers, std::vector<std::byte>& room)
-{
-    if constexpr (std::endian::native == std::endian::little) {
-        return std::as_bytes(numbers);
-    } else {
-        room.resize(numbers.size_bytes());
-        put_little_endian(numbers, std::span(room));
-        return room;
-    }
-}
-
 /// Trails on their way to one shard, which receives them in one statement.
 class Trails {
 public:

@@ -22,19 +22,6 @@ namespace {
 
 using Kind = StoreError::Kind;
 
-/// Numbers as the file has them; `room` keeps them where the processor's order is another.
-template <std::unsigned_integral Number>
-std::span<const std::byte> stored(std::span<const Number> numbers, std::vector<std::byte>& room)
-{
-    if constexpr (std::endian::native == std::endian::little) {
-        return std::as_bytes(numbers);
-    } else {
-        room.resize(numbers.size_bytes());
-        put_little_endian(numbers, std::span(room));
-        return room;
-    }
-}
-
 /// Changes to the tables within a transaction that the caller has begun.
 class Writer {
 public:

@@ -38,7 +38,7 @@ inline std::vector<int64_t> add(Store& store, uint64_t first, uint64_t count)
 }
 
 /// A clip of a track: 70 codes from place 50 on, in each code of which some bits are wrong.
-inline Reading clip_of(uint64_t number, int wrong)
+inline Reading clip_of(uint64_t number, int wrong = 8)
 {
     std::mt19937_64 random(number);
     const auto codes = codes_of(number);

@@ -12,7 +12,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include "catalogue/index/corpora.hpp"
+#include "catalogue/index/clips.hpp"
 #include "catalogue/index/forwarding_store.hpp"
 #include "catalogue/index/index.hpp"
 #include "catalogue/index/scratch_folder.hpp"
@@ -23,61 +23,10 @@
 namespace kzcat {
 namespace {
 
+using test::add;
 using test::Bytes;
+using test::clip_of;
 using test::ScratchFolder;
-
-std::vector<Code> codes_of(uint64_t number)
-{
-    return test::random_codes(number, 200 + number % 50);
-}
-
-NewTrack new_track(uint64_t number)
-{
-    NewTrack track;
-    track.trail.codes = codes_of(number);
-    track.trail.samples = track.trail.codes.size() * kCodeHop;
-    track.source.uri = "track " + std::to_string(number);
-    return track;
-}
-
-/// Adds the tracks with these numbers; their ids.
-std::vector<int64_t> add(Store& store, uint64_t first, uint64_t count)
-{
-    std::vector<NewTrack> tracks;
-    for (uint64_t number = first; number < first + count; ++number) {
-        tracks.push_back(new_track(number));
-    }
-    std::vector<int64_t> ids;
-    for (const Added& added : store.add(tracks)) {
-        ids.push_back(added.track);
-    }
-    return ids;
-}
-
-/// A clip of a track: 70 codes from place 50 on, in each code of which some bits are wrong.
-Reading clip_of(uint64_t number, int wrong = 8)
-{
-    std::mt19937_64 random(number);
-    const auto codes = codes_of(number);
-    Reading reading;
-    reading.sequences.resize(kPhases);
-    for (auto& sequence : reading.sequences) {
-        for (size_t i = 50; i < 120; ++i) {
-            BitStrengths strengths;
-            strengths.fill(60);
-            Code code = codes[i];
-            for (int turned = 0; turned < wrong; ++turned) {
-                const auto bit = static_cast<size_t>(random() % kPairs);
-                code ^= Code{1} << bit;
-                strengths[bit] = static_cast<uint8_t>(random() % 40);
-            }
-            sequence.codes.push_back(code);
-            sequence.masks.push_back(~Code{0});
-            sequence.strengths.push_back(strengths);
-        }
-    }
-    return reading;
-}
 
 IndexOptions options_for(const std::string& path, std::optional<Plan> plan = Plan::parts)
 {
