@@ -64,7 +64,8 @@ class Catalogue:
     def _open(self, name: Any, access: int, settings: Any) -> Handle:
         opened = ffi.new("kzcat_catalogue**")
         is_file = name != ffi.NULL and not self._library.kzcat_is_server_address(name)
-        # Noted first: no other thread may open the file as sound once it has locks.
+        # Noted first, so that threads refuse the file as sound from before it has locks.
+        # One that is in the middle of opening it as sound has looked already.
         forget = _open_files.register(os.fsdecode(name)) if is_file else lambda: None
         try:
             check_catalogue(self._library.kzcat_open(name, access, settings, opened))
