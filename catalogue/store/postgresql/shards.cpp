@@ -111,11 +111,12 @@ Connection& Shards::aside()
 const std::vector<int64_t>& Shards::numbers()
 {
     if (!numbers_) {
-        numbers_.emplace();
         const Rows rows = own_.query("SELECT number FROM shard ORDER BY number");
+        std::vector<int64_t> numbers;
         for (int row = 0; row < rows.count(); ++row) {
-            numbers_->push_back(rows.integer(row, 0));
+            numbers.push_back(rows.integer(row, 0));
         }
+        numbers_ = std::move(numbers);
     }
     return *numbers_;
 }

@@ -118,5 +118,16 @@ TEST_F(Damage, ChangesByHandAreLogged)
     EXPECT_EQ(std::nullopt, store->trail(2));
 }
 
+TEST_F(Damage, OfTheListOfShardsLeavesThemInUse)
+{
+    const Databases databases{2};
+    const auto store = open_postgres_store(databases.url(), Access::create);
+    connection_of(*store).execute("ALTER TABLE shard RENAME TO away");
+    EXPECT_THROW(add(*store, make_track(1)), StoreError); // the first that asks which there are
+    connection_of(*store).execute("ALTER TABLE away RENAME TO shard");
+    add(*store, make_track(1));
+    EXPECT_EQ(1, connection_of(*store).query("SELECT shard FROM track").integer(0, 0));
+}
+
 } // namespace
 } // namespace kzcat::test
