@@ -6,12 +6,12 @@
 -- that were posted together. Their codes are counted in units of eight, each track beginning one.
 CREATE TABLE kzcat.posting (
     shard integer NOT NULL,
-    list integer NOT NULL,      -- 65536 * part + value; -1: the segment's tracks, each as its id and
-                                -- its number of codes, 8 bytes each, the highest first;
+    list integer NOT NULL,      -- 65536 * part + value; -1: the segment's tracks, each as its id
+                                -- and its number of codes, 8 bytes each, the highest first;
                                 -- -2 - part: where each value's words begin among all of the part
     segment integer NOT NULL,
-    words bytea NOT NULL,       -- units that have the value: distances of 2 bytes, the lowest first;
-                                -- 65535 goes that far without a unit there
+    words bytea NOT NULL,       -- units that have the value: distances of 2 bytes, the lowest
+                                -- first; 65535 goes that far without a unit there
     PRIMARY KEY (list, segment)
 ) WITH (toast_tuple_target = 8160);
 ALTER TABLE kzcat.posting ALTER COLUMN words SET STORAGE EXTERNAL;
@@ -38,10 +38,10 @@ CREATE VIEW kzcat.tail AS
     FROM kzcat.trail JOIN kzcat.posted USING (track)
     WHERE posted.segment IS NULL;
 
--- Writes the postings of some tracks as one segment. All its rows come from one statement, which sees
--- the tracks as they were at one moment: a track that is missing from some of them would move the
--- units of all behind it. No track is held meanwhile; one that is removed stays in the segment, as any
--- does that is removed later.
+-- Writes the postings of some tracks as one segment. All its rows come from one statement, which
+-- sees the tracks as they were at one moment: a track that is missing from some of them would move
+-- the units of all behind it. No track is held meanwhile; one that is removed stays in the segment,
+-- as any does that is removed later.
 CREATE FUNCTION kzcat.write_segment(number integer, tracks bigint[]) RETURNS void
 LANGUAGE plpgsql SET search_path = pg_catalog, pg_temp AS $$
 BEGIN
@@ -60,10 +60,10 @@ BEGIN
     UPDATE kzcat.posted SET segment = number WHERE track = ANY (tracks);
 END $$;
 
--- Posts the tail when it has `threshold` codes or more, together with segments that are not much larger
--- than it: so few segments stay, and rows stay long. One call writes one segment, so that nobody waits
--- for more than that; of a longer tail the rest is left to the next call. Returns the number of tracks
--- of the segment, 0 when none was to be written.
+-- Posts the tail when it has `threshold` codes or more, together with segments that are not much
+-- larger than it: so few segments stay, and rows stay long. One call writes one segment, so that
+-- nobody waits for more than that; of a longer tail the rest is left to the next call. Returns the
+-- number of tracks of the segment, 0 when none was to be written.
 CREATE FUNCTION kzcat.post(threshold bigint) RETURNS bigint LANGUAGE plpgsql
 SET search_path = pg_catalog, pg_temp AS $$
 DECLARE
@@ -72,6 +72,7 @@ DECLARE
     gone integer[];
     joined integer[];
     tracks bigint[];
+    number integer; -- none of those that are joined
 BEGIN
     IF NOT pg_try_advisory_xact_lock(hashtextextended('kzcat.post', 0)) THEN
         RETURN 0; -- another session is at it
@@ -92,18 +93,21 @@ BEGIN
         SELECT track, codes, sum(codes) OVER (ORDER BY segment NULLS FIRST, track) AS together
         FROM kzcat.posted WHERE segment IS NULL OR segment = ANY (joined)) chosen
     WHERE together <= most OR together = codes;
+    SELECT coalesce(max(segment), 0) + 1 INTO number FROM kzcat.posting WHERE list = -1;
     IF gone IS NOT NULL OR joined IS NOT NULL THEN -- by segment, all rows have to be read
         DELETE FROM kzcat.posting WHERE segment = ANY (gone || joined);
     END IF;
-    PERFORM kzcat.write_segment(
-        (SELECT coalesce(max(segment), 0) + 1 FROM kzcat.posting WHERE list = -1), tracks);
+    PERFORM kzcat.write_segment(number, tracks);
+    -- What was added between these statements may have left no room for all tracks of the segments
+    -- that were joined.
+    UPDATE kzcat.posted SET segment = NULL WHERE segment = ANY (joined);
     RETURN cardinality(tracks);
 END $$;
 
 -- A row that is put here asks for kzcat.post(least): so it can be asked for through a coordinator,
--- too, and by users who may not write to the other tables. Nothing is kept. The function runs with the
--- owner's rights: temporary types of whoever asks, which are searched first unless they are named
--- last, must not take the place of the server's own.
+-- too, and by users who may not write to the other tables. Nothing is kept. The function runs with
+-- the owner's rights: temporary types of whoever asks, which are searched first unless they are
+-- named last, must not take the place of the server's own.
 CREATE TABLE kzcat.posting_request (shard integer NOT NULL, least bigint NOT NULL);
 CREATE FUNCTION kzcat.answer_request() RETURNS trigger LANGUAGE plpgsql
 SECURITY DEFINER SET search_path = pg_catalog, pg_temp AS $$

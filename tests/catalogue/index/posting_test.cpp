@@ -130,5 +130,33 @@ TEST_F(Posting, HoldsUpNobodyWhoRemovesATrack)
     }
 }
 
+/// The tail grows between the choice of the segments to join and that of the tracks, so that not all
+/// fit into one segment.
+TEST_F(Posting, LosesNoTrackWhenTheTailGrowsMeanwhile)
+{
+    const std::string request = "INSERT INTO kzcat.posting_request VALUES (0, 1)";
+    execute(request);
+    const int64_t codes =
+        administrator_->query("SELECT sum(codes)::bigint FROM kzcat.posted").integer(0, 0);
+    const auto tail = add(*store_, kTracks + 1, kTracks);
+    execute("DO $$ BEGIN EXECUTE replace(replace(pg_get_functiondef('kzcat.post'::regproc), "
+            "'SELECT array_agg(track) INTO tracks', 'PERFORM pg_advisory_xact_lock(7); "
+            "SELECT array_agg(track) INTO tracks'), '16777216', '" +
+            std::to_string(5 * codes / 2) + "'); END $$; SELECT pg_advisory_lock(7)");
+    std::thread other([&] { postgresql::Connection(url_).execute(request); });
+    while (count("pg_locks WHERE locktype = 'advisory' AND NOT granted") == 0) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    }
+    add(*store_, 2 * kTracks + 1, kTracks);
+    execute("SELECT pg_advisory_unlock(7)");
+    other.join();
+    EXPECT_EQ(1, count("kzcat.posting WHERE list = -1"));
+    EXPECT_LT(0, count("kzcat.tail")) << "what has no room is left to the next call";
+    const auto index = open();
+    EXPECT_EQ(ids_[0], found(*index, 1));
+    EXPECT_EQ(ids_[kTracks - 1], found(*index, kTracks));
+    EXPECT_EQ(tail[0], found(*index, kTracks + 1));
+}
+
 } // namespace
 } // namespace kzcat
