@@ -7,6 +7,8 @@
 #include "catalogue/store/postgresql/jobs.hpp"
 
 #include <algorithm>
+#include <chrono>
+#include <thread>
 #include <utility>
 
 #include "catalogue/store/postgresql/connection.hpp"
@@ -38,6 +40,13 @@ constexpr const char* kTake =
 
 constexpr const char* kHold = "SELECT id FROM job WHERE id = $1 AND attempt = $2 "
                               "AND state = 'running' FOR UPDATE SKIP LOCKED";
+
+constexpr const char* kIsOurs = "SELECT EXISTS (SELECT FROM job WHERE id = $1 AND attempt = $2 "
+                                "AND state = 'running')";
+
+/// A worker that saw the job waiting locks its row before it learns that the job was taken, until
+/// that worker's own short transaction ends.
+constexpr auto kOthersLook = std::chrono::milliseconds(10);
 
 /// For as long as the job takes. A worker's machine that has gone without a word is noticed after a
 /// minute, not after hours, and a worker that is silent because it works is left alone.
@@ -73,6 +82,7 @@ private:
     std::optional<Job> take_after(const std::string& worker, uint32_t attempts);
     std::optional<Job> note_attempt(const std::string& worker, uint32_t attempts);
     bool hold(const Job& job);
+    std::unique_ptr<Transaction> try_to_hold(const Job& job);
     std::unique_ptr<Transaction> end_hold();
     static void commit(std::unique_ptr<Transaction>& transaction);
 
@@ -155,15 +165,27 @@ std::optional<Job> PostgresJobs::note_attempt(const std::string& worker, uint32_
     return job;
 }
 
+/// False when another worker has the job by now.
 bool PostgresJobs::hold(const Job& job)
+{
+    while ((held_ = try_to_hold(job)) == nullptr) {
+        if (!connection_.query(kIsOurs, job.id, job.attempt).boolean(0, 0)) {
+            return false;
+        }
+        std::this_thread::sleep_for(kOthersLook);
+    }
+    return true;
+}
+
+/// The transaction in which the job's row is locked; null when the row is locked by another.
+std::unique_ptr<Transaction> PostgresJobs::try_to_hold(const Job& job)
 {
     auto transaction = std::make_unique<Transaction>(connection_, Transaction::Kind::write);
     connection_.execute(kPatience);
-    const Rows rows = connection_.query(kHold, job.id, job.attempt);
-    if (!rows.empty()) {
-        held_ = std::move(transaction);
+    if (connection_.query(kHold, job.id, job.attempt).empty()) {
+        return nullptr;
     }
-    return !rows.empty();
+    return transaction;
 }
 
 bool PostgresJobs::are_left()

@@ -2,7 +2,9 @@
 // the server ends its session.
 
 #include <cstring>
+#include <memory>
 #include <set>
+#include <thread>
 
 #include <gtest/gtest.h>
 
@@ -272,6 +274,31 @@ TEST_F(JobsTest, ManyWorkersGetEachJobOnce)
         }
     }
     EXPECT_EQ(std::multiset<std::string>(files.begin(), files.end()), done);
+}
+
+TEST_F(JobsTest, WorkersAtOnceLeaveNoJobTakenByNone)
+{
+    std::vector<std::string> files;
+    for (int i = 0; i < 400; ++i) {
+        files.push_back(std::to_string(i));
+    }
+    add(*open(), files);
+    {
+        std::vector<std::jthread> workers;
+        for (int i = 0; i < 8; ++i) {
+            workers.emplace_back([jobs = std::shared_ptr(open())] {
+                while (jobs->take("one", kAttempts)) {
+                    jobs->finish({}, 0);
+                }
+            });
+        }
+    }
+    const JobCounts counts = open()->counts();
+    EXPECT_EQ(0u, counts.waiting + counts.running);
+    EXPECT_EQ(400u, counts.done);
+    EXPECT_EQ("400", postgresql::Connection(databases_->url())
+                         .query("SELECT sum(attempt)::text FROM kzcat.job")
+                         .text(0, 0));
 }
 
 TEST(Jobs, AFileIsRefusedAsThePlaceOfJobs)
