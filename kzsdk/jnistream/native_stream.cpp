@@ -10,6 +10,7 @@
 
 #include <jni.h>
 
+#include "kzsdk/abs/version.h"
 #include "kzsdk/stream/stream.h"
 
 namespace {
@@ -128,6 +129,12 @@ JNIEXPORT jstring JNICALL Java_com_orvanta_android_kzsdk_NativeStream_statusText
                                                                                  jint status)
 {
     return env->NewStringUTF(kz_status_text(static_cast<kz_status>(status)));
+}
+
+JNIEXPORT jstring JNICALL Java_com_orvanta_android_kzsdk_NativeStream_version(JNIEnv* env,
+                                                                              jclass /*type*/)
+{
+    return env->NewStringUTF(kzsdk_get_version());
 }
 
 JNIEXPORT void JNICALL Java_com_orvanta_android_kzsdk_NativeStream_free(JNIEnv* /*env*/,

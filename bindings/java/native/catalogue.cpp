@@ -4,6 +4,11 @@
 
 using namespace kz::java;
 
+KZ_JAVA_METHOD(jbyteArray, version)(JNIEnv* env, jclass /*type*/)
+{
+    return to_java(env, KZCAT_JAVA_VERSION);
+}
+
 KZ_JAVA_METHOD(jlong, open)(JNIEnv* env, jclass /*type*/, jbyteArray path, jint access)
 {
     kzcat_catalogue* catalogue = nullptr;

@@ -1,4 +1,4 @@
-// The catalogue's native methods under a VM that is played: what crosses, in both directions, with
+// The catalogue's native methods under a simulated VM: what crosses, in both directions, with
 // the sanitizers watching, under which no real VM starts.
 
 #include <algorithm>
@@ -19,6 +19,7 @@
 #define NATIVE(type, name) type Java_com_orvanta_android_kzsdk_NativeCatalogue_##name
 
 extern "C" {
+NATIVE(jbyteArray, version)(JNIEnv*, jclass);
 NATIVE(jlong, open)(JNIEnv*, jclass, jbyteArray, jint);
 NATIVE(void, close)(JNIEnv*, jclass, jlong);
 NATIVE(void, facts)(JNIEnv*, jclass, jlong, jlongArray);
@@ -324,6 +325,12 @@ TEST_F(NativeCatalogue, PassesTracksWithSourcesAndTags)
     EXPECT_EQ(0, CALL(nextTrack)(env, nullptr, catalogue_, 1));
     EXPECT_EQ(0, CALL(findSource)(env, nullptr, catalogue_, text("none")));
     EXPECT_EQ("", thrown()) << "what is not there is no failure";
+}
+
+TEST_F(NativeCatalogue, NamesItsVersion)
+{
+    const Object& version = *object_of(CALL(version)(env, nullptr));
+    EXPECT_EQ(KZCAT_JAVA_VERSION, std::string(version.bytes.begin(), version.bytes.end()));
 }
 
 TEST_F(NativeCatalogue, ThrowsTheSentenceOfTheLibrary)

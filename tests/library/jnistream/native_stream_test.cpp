@@ -1,5 +1,5 @@
 // The native methods of Java's streams, called as a VM calls them: what they pass on, what they
-// refuse, what they report. The VM is played by four functions.
+// refuse, what they report. Four functions simulate the VM.
 
 #include <algorithm>
 #include <array>
@@ -11,6 +11,7 @@
 
 #include <gtest/gtest.h>
 
+#include "kzsdk/abs/version.h"
 #include "kzsdk/stream/stream.h"
 #include "support/allocation.hpp"
 #include "support/melody.hpp"
@@ -24,6 +25,7 @@ jint Java_com_orvanta_android_kzsdk_NativeStream_finish(JNIEnv*, jclass, jlong, 
 jint Java_com_orvanta_android_kzsdk_NativeStream_state(JNIEnv*, jclass, jlong, jlongArray);
 jstring Java_com_orvanta_android_kzsdk_NativeStream_document(JNIEnv*, jclass, jlong, jlongArray);
 jstring Java_com_orvanta_android_kzsdk_NativeStream_statusText(JNIEnv*, jclass, jint);
+jstring Java_com_orvanta_android_kzsdk_NativeStream_version(JNIEnv*, jclass);
 void Java_com_orvanta_android_kzsdk_NativeStream_free(JNIEnv*, jclass, jlong);
 }
 
@@ -227,6 +229,12 @@ TEST_F(NativeStream, HasTheSentenceOfEachStatus)
     Java_com_orvanta_android_kzsdk_NativeStream_statusText(&environment, nullptr,
                                                            code(KZ_STREAM_ERROR_RATE));
     EXPECT_EQ(kz_status_text(KZ_STREAM_ERROR_RATE), last_text);
+}
+
+TEST_F(NativeStream, NamesTheVersionOfTheLibrary)
+{
+    Java_com_orvanta_android_kzsdk_NativeStream_version(&environment, nullptr);
+    EXPECT_EQ(kzsdk_get_version(), last_text);
 }
 
 TEST_F(NativeStream, SurvivesEveryFailingAllocation)

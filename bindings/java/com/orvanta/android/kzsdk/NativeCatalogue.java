@@ -10,6 +10,9 @@ import java.nio.ByteBuffer;
 final class NativeCatalogue {
     private NativeCatalogue() {}
 
+    /** Returns the version of {@code libkzcat_java}. */
+    static native byte[] version();
+
     static native long open(byte[] path, int access);
 
     static native void close(long catalogue);

@@ -3,10 +3,12 @@ package com.orvanta.android.kzsdk;
 import java.io.File;
 import java.util.HashMap;
 import java.util.Map;
+import java.util.function.Supplier;
 
 /**
  * Finds and loads the native libraries, each once: the file that a system property names, else what
- * {@code System.loadLibrary} finds, else the copy inside the jar.
+ * {@code System.loadLibrary} finds, else the copy inside the jar. A library of another version is
+ * refused: its native methods may differ.
  */
 final class NativeLibrary {
     /** What failed before fails again, with the same reason. */
@@ -16,18 +18,18 @@ final class NativeLibrary {
 
     /** Loads {@code libkzsdk}; {@code -Dkzsdk.library} names its file. */
     static void loadSdk() {
-        load("kzsdk", "kzsdk.library");
+        load("kzsdk", "kzsdk.library", NativeStream::version);
     }
 
     /** Loads what a {@link Catalogue} needs; {@code -Dkzcat.library} names the file. */
     static void loadCatalogue() {
         loadSdk();
-        load("kzcat_java", "kzcat.library");
+        load("kzcat_java", "kzcat.library", () -> Texts.of(NativeCatalogue.version()));
     }
 
-    private static synchronized void load(String name, String property) {
+    private static synchronized void load(String name, String property, Supplier<String> version) {
         if (!OUTCOMES.containsKey(name)) {
-            OUTCOMES.put(name, outcome(name, property));
+            OUTCOMES.put(name, outcome(name, property, version));
         }
         UnsatisfiedLinkError failure = OUTCOMES.get(name);
         if (failure != null) {
@@ -38,7 +40,8 @@ final class NativeLibrary {
     }
 
     /** Null when it is loaded now. */
-    private static UnsatisfiedLinkError outcome(String name, String property) {
+    private static UnsatisfiedLinkError outcome(
+            String name, String property, Supplier<String> version) {
         try {
             String file = System.getProperty(property);
             if (file != null) {
@@ -46,6 +49,7 @@ final class NativeLibrary {
             } else {
                 loadFound(name, property);
             }
+            checkVersion(name, property, version);
             return null;
         } catch (UnsatisfiedLinkError failure) {
             return failure;
@@ -69,6 +73,26 @@ final class NativeLibrary {
                 throw failure(advice(name, property, notFound), notFound);
             }
         }
+    }
+
+    private static void checkVersion(String name, String property, Supplier<String> version) {
+        String file = System.mapLibraryName(name);
+        String found;
+        try {
+            found = version.get();
+        } catch (UnsatisfiedLinkError none) {
+            String fault = "is older than these classes: it does not report its version";
+            throw failure(otherVersion(file, fault, property), none);
+        }
+        if (!Version.fits(found)) {
+            throw failure(otherVersion(file, "is of version " + found, property), null);
+        }
+    }
+
+    private static String otherVersion(String file, String fault, String property) {
+        return "The native library " + file + " that was found " + fault + ". These classes are of version "
+                + Version.TEXT + ": install the library of that version, or name its file: -D" + property
+                + "=/path/" + file + "; kzsdk-desktop.jar has one, used when no other is found";
     }
 
     /** What the system says first: it may be that a library was found which needs another one. */

@@ -21,5 +21,8 @@ final class NativeStream {
 
     static native String statusText(int status);
 
+    /** Returns the version of {@code libkzsdk}. */
+    static native String version();
+
     static native void free(long stream);
 }

@@ -1,12 +1,14 @@
 package com.orvanta.android.kzsdk;
 
 import static org.junit.Assert.assertEquals;
+import static org.junit.Assert.assertFalse;
 import static org.junit.Assert.assertTrue;
 
 import java.io.ByteArrayOutputStream;
 import java.io.File;
 import java.io.IOException;
 import java.io.InputStream;
+import java.nio.file.Files;
 import java.util.ArrayList;
 import java.util.Arrays;
 import java.util.Collections;
@@ -91,6 +93,41 @@ public class NativeLibraryTest {
                 "-Dkzsdk.library=" + System.getProperty("kzsdk.library"),
                 "-Dkzcat.library=" + System.getProperty("kzcat.library"));
         assertEquals(Arrays.asList("MATCH", "MATCH"), lines);
+    }
+
+    @Test
+    public void aLibraryOfAnotherVersionIsRefused() throws Exception {
+        File found = new File(folder.getRoot(), "libkzsdk.so");
+        Files.copy(new File(System.getProperty("other")).toPath(), found.toPath());
+        for (String line : run(System.getProperty("desktop"))) {
+            assertTrue(line, line.contains("libkzsdk.so that was found is of version 0.9.7")
+                    && line.contains("These classes are of version " + Version.TEXT)
+                    && line.contains("-Dkzsdk.library="));
+        }
+        String named = run(System.getProperty("plain"), "-Dkzsdk.library=" + found).get(0);
+        assertTrue(named, named.contains("is of version 0.9.7"));
+    }
+
+    @Test
+    public void aLibraryWithoutAVersionIsRefused() throws Exception {
+        Files.copy(new File(System.getProperty("scripted")).toPath(),
+                new File(folder.getRoot(), "libkzsdk.so").toPath());
+        List<String> lines = run(System.getProperty("desktop"));
+        for (String line : lines.subList(lines.size() - 2, lines.size())) {
+            assertTrue(line, line.contains("libkzsdk.so that was found is older")
+                    && line.contains(Version.TEXT));
+        }
+    }
+
+    @Test
+    public void librariesFitThatDifferInTheirPatch() {
+        String series = Version.TEXT.substring(0, Version.TEXT.lastIndexOf('.'));
+        assertTrue(Version.fits(Version.TEXT));
+        assertTrue(Version.fits(series + ".77"));
+        assertTrue(Version.fits(series));
+        for (String other : new String[] {series + "1.0", "9.0.0", "0.9.7", "", "1"}) {
+            assertFalse(other, Version.fits(other));
+        }
     }
 
     @Test
