@@ -73,41 +73,6 @@ final class SoundFile extends Sound {
         boolean otherOrder =
                 format.isBigEndian() != (ByteOrder.nativeOrder() == ByteOrder.BIG_ENDIAN);
         int size = format.getSampleSizeInBits() / 8;
-        return otherOrder && size > 1 ? new Swapped(in, size) : in;
-    }
-
-    /** Whole samples, their bytes in the other order. */
-    private static final class Swapped extends InputStream {
-        private final AudioInputStream in;
-        private final int size;
-
-        Swapped(AudioInputStream in, int size) {
-            this.in = in;
-            this.size = size;
-        }
-
-        @Override
-        public int read() {
-            throw new UnsupportedOperationException("whole samples only");
-        }
-
-        /** The platform's stream gives whole frames. */
-        @Override
-        public int read(byte[] bytes, int offset, int most) throws IOException {
-            int count = in.read(bytes, offset, most);
-            for (int first = offset; first + size <= offset + count; first += size) {
-                for (int i = 0; i < size / 2; ++i) {
-                    byte other = bytes[first + size - 1 - i];
-                    bytes[first + size - 1 - i] = bytes[first + i];
-                    bytes[first + i] = other;
-                }
-            }
-            return count;
-        }
-
-        @Override
-        public void close() throws IOException {
-            in.close();
-        }
+        return otherOrder && size > 1 ? new SwappedSamples(in, size) : in;
     }
 }
