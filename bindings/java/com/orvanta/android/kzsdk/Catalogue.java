@@ -2,6 +2,7 @@ package com.orvanta.android.kzsdk;
 
 import java.io.File;
 import java.io.IOException;
+import java.nio.file.Path;
 import java.util.ArrayList;
 import java.util.Collections;
 import java.util.Iterator;
@@ -54,8 +55,20 @@ public final class Catalogue implements AutoCloseable, Iterable<Track> {
     private Catalogue(String path, int access) {
         byte[] bytes = path == null ? null : Texts.bytes(path, "path");
         NativeLibrary.loadCatalogue();
-        handle = new NativeHandle("catalogue", NativeCatalogue.open(bytes, access),
-                NativeCatalogue::close);
+        Path file = OpenCatalogues.opening(path);
+        handle = new NativeHandle("catalogue", opened(bytes, access, file), catalogue -> {
+            NativeCatalogue.close(catalogue);
+            OpenCatalogues.closed(file);
+        });
+    }
+
+    private static long opened(byte[] path, int access, Path file) {
+        try {
+            return NativeCatalogue.open(path, access);
+        } catch (RuntimeException | Error failed) {
+            OpenCatalogues.closed(file);
+            throw failed;
+        }
     }
 
     /**

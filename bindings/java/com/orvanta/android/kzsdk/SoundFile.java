@@ -37,6 +37,7 @@ final class SoundFile extends Sound {
         if (!file.isFile()) {
             throw new FileNotFoundException("There is no file " + file);
         }
+        OpenCatalogues.refuse(file);
         try {
             return AudioSystem.getAudioInputStream(file);
         } catch (UnsupportedAudioFileException unknown) {

@@ -7,16 +7,76 @@ import static org.junit.Assert.assertTrue;
 
 import java.io.ByteArrayInputStream;
 import java.io.ByteArrayOutputStream;
+import java.io.File;
 import java.io.IOException;
 import java.io.InputStream;
 import java.nio.ByteBuffer;
 import java.nio.ByteOrder;
+import java.nio.file.Files;
+import java.nio.file.Path;
 import java.util.Arrays;
 import java.util.Collections;
+import javax.sound.sampled.AudioFileFormat;
+import javax.sound.sampled.AudioFormat;
+import javax.sound.sampled.AudioInputStream;
+import javax.sound.sampled.AudioSystem;
+import org.junit.Rule;
 import org.junit.Test;
+import org.junit.rules.TemporaryFolder;
 
-/** Decoders that give odd pieces. */
+/** Files that are no sound although a program passes them, and decoders that give odd pieces. */
 public class SoundOfFilesTest {
+    @Rule public final TemporaryFolder folder = new TemporaryFolder();
+
+    private static String refusal(File file) {
+        return assertThrows(IOException.class, () -> Sound.file(file)).getMessage();
+    }
+
+    /** Opening and closing one of them would give up the locks on it. */
+    @Test
+    public void filesOfAnOpenCatalogueAreNotOpenedAsSound() throws Exception {
+        File file = new File(folder.getRoot(), "music.kzc");
+        File link = new File(folder.getRoot(), "other name");
+        Catalogue music = Catalogue.create(file.getPath());
+        music.add(Tunes.sound(1, 0, 10), "tune", Collections.emptyMap());
+        Files.createSymbolicLink(link.toPath(), file.toPath());
+        String[] names = {"music.kzc", "music.kzc-wal", "music.kzc-shm", "other name"};
+        try (Catalogue second = Catalogue.inMemory(); Catalogue reading = Catalogue.open(file.getPath())) {
+            for (String name : names) {
+                File part = new File(folder.getRoot(), name);
+                assertTrue(name, part.exists());
+                assertTrue(refusal(part), refusal(part).contains("which is open"));
+                assertThrows(IOException.class, () -> music.add(part));
+                assertThrows(IOException.class, () -> second.add(part));
+            }
+            music.close();
+            assertTrue("one of two is closed", refusal(file).contains("which is open"));
+            assertEquals(1, reading.size());
+        }
+        assertTrue(refusal(file), refusal(file).contains("in no format that this Java reads"));
+    }
+
+    @Test
+    public void aFileThatIsNoCatalogueStaysSound() throws Exception {
+        File file = folder.newFile("clip.wav");
+        byte[] bytes = bytesOf(Tunes.play(1, 0, 1), ByteOrder.LITTLE_ENDIAN);
+        AudioFormat format = new AudioFormat(Tunes.RATE, 16, 1, true, false);
+        AudioSystem.write(new AudioInputStream(new ByteArrayInputStream(bytes), format, bytes.length / 2),
+                AudioFileFormat.Type.WAVE, file);
+        assertThrows(CatalogueException.class, () -> Catalogue.open(file.getPath()));
+        assertEquals(SoundFormat.pcm16(Tunes.RATE, 1), Sound.file(file).format());
+    }
+
+    @Test
+    public void aCatalogueOfARelativePathIsRefusedToo() throws Exception {
+        File file = new File(folder.getRoot().getCanonicalFile(), "music.kzc");
+        Path relative = new File("").getCanonicalFile().toPath().relativize(file.toPath());
+        try (Catalogue music = Catalogue.create(relative.toString())) {
+            assertTrue(refusal(file), refusal(file).contains("which is open"));
+            assertEquals(0, music.size());
+        }
+    }
+
     /** Sound whose decoder gives odd numbers of bytes, or none, in turn. */
     private static final class Dripping extends InputStream {
         private static final int[] COUNTS = {0, 1, 3, 0, 0, 4001, 2, 65536};
