@@ -1,5 +1,6 @@
 package com.orvanta.android.kzsdk;
 
+import java.util.AbstractMap.SimpleImmutableEntry;
 import java.util.ArrayList;
 import java.util.Collections;
 import java.util.Date;
@@ -12,15 +13,19 @@ public final class Track {
     private final long[] integers;
     private final List<String> sources = new ArrayList<>();
     private final Map<String, String> tags = new LinkedHashMap<>();
+    private final List<Map.Entry<String, String>> allTags = new ArrayList<>();
 
-    private Track(long[] integers, byte[][] texts) {
+    Track(long[] integers, byte[][] texts) {
         this.integers = integers;
         int sourceCount = (int) integers[4];
         for (int i = 0; i < sourceCount; ++i) {
             sources.add(Texts.of(texts[i]));
         }
         for (int i = sourceCount; i < texts.length; i += 2) {
-            tags.put(Texts.of(texts[i]), Texts.of(texts[i + 1]));
+            String name = Texts.of(texts[i]);
+            String value = Texts.of(texts[i + 1]);
+            tags.putIfAbsent(name, value);
+            allTags.add(new SimpleImmutableEntry<>(name, value));
         }
     }
 
@@ -77,10 +82,19 @@ public final class Track {
     /**
      * Returns the tags: "title", "artist" and so on.
      *
-     * @return in the order in which they were added; of several with one name the last
+     * @return in the order in which they were added; of several with one name the first
      */
     public Map<String, String> tags() {
         return Collections.unmodifiableMap(tags);
+    }
+
+    /**
+     * Returns every tag, several with one name too: a track may have two artists.
+     *
+     * @return names and values in the order in which they were added
+     */
+    public List<Map.Entry<String, String>> allTags() {
+        return Collections.unmodifiableList(allTags);
     }
 
     /**
