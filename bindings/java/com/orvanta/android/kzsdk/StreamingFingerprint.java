@@ -10,10 +10,13 @@ import java.util.concurrent.CompletableFuture;
  *
  * <pre>{@code
  * try (StreamingFingerprint stream = new StreamingFingerprint(SoundFormat.float32(48000, 1))) {
- *     while (!stream.feed(samples, 0, read(samples))) {
+ *     int count;
+ *     while ((count = read(samples)) > 0 && !stream.feed(samples, 0, count)) {
  *         show(stream.progress().percent());
  *     }
- *     send(stream.document().text());
+ *     if (stream.finish()) { // false when the sound ended too early: see progress()
+ *         send(stream.document().text());
+ *     }
  * }
  * }</pre>
  *
@@ -46,7 +49,8 @@ public final class StreamingFingerprint implements AutoCloseable {
     private final CompletableFuture<QueryDocument> completion = new CompletableFuture<>();
     /** What arrays are copied to, piece by piece. */
     private ByteBuffer pieces;
-    private QueryDocument document;
+    /** Null until the fingerprint is complete. */
+    private volatile QueryDocument document;
 
     /**
      * Begins with the fixed-point algorithm.
@@ -82,8 +86,8 @@ public final class StreamingFingerprint implements AutoCloseable {
      *
      * @param bytes the array
      * @param offset of the first byte
-     * @param count how many; 0 and below feed nothing, so that what a stream or a recorder returns
-     *     at its end can be passed on
+     * @param count how many; 0 and below feed nothing, so that what a recorder returns can be passed
+     *     on. At the end of the sound leave the loop and call {@link #finish}
      * @return whether the fingerprint is complete; what is fed after that is ignored
      * @throws IndexOutOfBoundsException when the array has fewer bytes
      * @throws IllegalStateException when the object is closed, or {@link #finish} was called
@@ -192,7 +196,7 @@ public final class StreamingFingerprint implements AutoCloseable {
         return complete;
     }
 
-    private synchronized boolean feedNative(ByteBuffer bytes, int position, int count) {
+    synchronized boolean feedNative(ByteBuffer bytes, int position, int count) {
         long stream = handle.enter();
         try {
             long[] out = new long[2];
@@ -219,10 +223,7 @@ public final class StreamingFingerprint implements AutoCloseable {
 
     /** Completes the future, which runs what waits for it: not while other calls wait for this. */
     private void settle() {
-        QueryDocument made;
-        synchronized (this) {
-            made = document;
-        }
+        QueryDocument made = document;
         if (made != null) {
             completion.complete(made);
         }
@@ -313,6 +314,7 @@ public final class StreamingFingerprint implements AutoCloseable {
     @Override
     public void close() {
         handle.close();
+        settle(); // the call that completed the fingerprint may not have come to it yet
         completion.completeExceptionally(
                 new FingerprintException("The stream was closed before the fingerprint was complete"));
     }

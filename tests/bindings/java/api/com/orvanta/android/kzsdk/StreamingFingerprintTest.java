@@ -6,6 +6,8 @@ import static org.junit.Assert.assertSame;
 import static org.junit.Assert.assertThrows;
 import static org.junit.Assert.assertTrue;
 
+import java.io.ByteArrayInputStream;
+import java.io.InputStream;
 import java.nio.ByteBuffer;
 import java.nio.ByteOrder;
 import java.util.ArrayList;
@@ -133,6 +135,33 @@ public class StreamingFingerprintTest {
         StreamingFingerprint closed = new StreamingFingerprint(MONO);
         closed.close();
         assertTrue(failure(closed), failure(closed).contains("closed"));
+    }
+
+    @Test
+    public void closingDoesNotFailACompleteFingerprint() throws Exception {
+        ByteBuffer direct = ByteBuffer.allocateDirect(MUSIC.length);
+        direct.put(MUSIC);
+        StreamingFingerprint stream = new StreamingFingerprint(MONO);
+        // As far as a call has come when another thread closes the stream before the call returns.
+        assertTrue(stream.feedNative(direct, 0, MUSIC.length));
+        stream.close();
+        assertEquals(expected(), stream.completion().get());
+    }
+
+    @Test
+    public void aLoopOverAStreamEndsWithTheSound() throws Exception {
+        for (int seconds : new int[] {0, 5, 15}) {
+            InputStream in = new ByteArrayInputStream(MUSIC, 0, 2 * 11025 * seconds);
+            byte[] piece = new byte[4000];
+            try (StreamingFingerprint stream = new StreamingFingerprint(MONO)) {
+                int count;
+                while ((count = in.read(piece)) > 0 && !stream.feed(piece, 0, count)) {
+                    assertTrue(stream.progress().percent() < 100);
+                }
+                assertEquals(seconds == 15, stream.finish());
+                assertEquals(seconds == 15, !stream.completion().isCompletedExceptionally());
+            }
+        }
     }
 
     @Test
