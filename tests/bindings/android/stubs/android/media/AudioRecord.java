@@ -15,6 +15,8 @@ public class AudioRecord {
     public static int firstSilenced = -1;
     public static int lastSilenced = -1;
     public static int state = STATE_INITIALIZED;
+    /** What recording fails with, when it is not null: of a kind that needs no declaration. */
+    public static Throwable refusal;
     /** The recorders that were made and not released, and the source of the last one. */
     public static int open;
     public static int lastSource;
@@ -43,7 +45,14 @@ public class AudioRecord {
         this.callback = callback;
     }
 
-    public void startRecording() {}
+    public void startRecording() {
+        if (refusal instanceof Error) {
+            throw (Error) refusal;
+        }
+        if (refusal != null) {
+            throw (RuntimeException) refusal;
+        }
+    }
 
     public int read(float[] audio, int offset, int count, int mode) {
         if (sound.length == 0) {

@@ -20,7 +20,7 @@ import java.util.concurrent.TimeUnit;
 import org.junit.Before;
 import org.junit.Test;
 
-/** The feeder of the example app, over a microphone that is played. */
+/** The feeder of the example app, over a simulated microphone. */
 public class MicrophoneFeederTest {
     private static final int RATE = 44100;
 
@@ -91,6 +91,7 @@ public class MicrophoneFeederTest {
         AudioRecord.firstSilenced = -1;
         AudioRecord.lastSilenced = -1;
         AudioRecord.state = AudioRecord.STATE_INITIALIZED;
+        AudioRecord.refusal = null;
         AudioManager.unprocessed = "true";
         Build.VERSION.SDK_INT = 35;
     }
@@ -136,5 +137,30 @@ public class MicrophoneFeederTest {
         assertEquals("The microphone failed (-3)", listen(new Reports()));
         AudioRecord.state = AudioRecord.STATE_UNINITIALIZED;
         assertEquals("The microphone cannot be opened", listen(new Reports()));
+    }
+
+    @Test
+    public void everyFailureReachesTheListener() throws Exception {
+        for (Throwable refusal : new Throwable[] {new SecurityException("no permission"),
+            new IllegalArgumentException("no such rate"), new UnsatisfiedLinkError("no library"),
+            new OutOfMemoryError("no memory")}) {
+            AudioRecord.refusal = refusal;
+            assertEquals(refusal.getMessage(), listen(new Reports()));
+        }
+        AudioRecord.refusal = new NullPointerException();
+        assertEquals("java.lang.NullPointerException", listen(new Reports()));
+    }
+
+    @Test
+    public void closingDropsReportsThatWait() throws Exception {
+        BlockingQueue<Runnable> waiting = new LinkedBlockingQueue<>();
+        Reports reports = new Reports();
+        MicrophoneFeeder feeder = new MicrophoneFeeder(new Context(), waiting::add, reports);
+        AudioRecord.sound = new float[0];
+        feeder.start();
+        Runnable failure = waiting.poll(300, TimeUnit.SECONDS);
+        feeder.close();
+        failure.run();
+        assertTrue(reports.last.isEmpty());
     }
 }

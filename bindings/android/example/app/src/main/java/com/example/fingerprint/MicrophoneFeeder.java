@@ -67,12 +67,15 @@ final class MicrophoneFeeder implements AutoCloseable {
                 : MediaRecorder.AudioSource.VOICE_RECOGNITION;
     }
 
-    /** Starts listening, on a thread of its own. To be called once; the permission is there. */
+    /** Starts listening, on a thread of its own. To be called once, with the permission granted. */
     void start() {
         new Thread(this::listen, "microphone").start();
     }
 
-    /** Stops listening. The listener is not called any more, but for what is on its way. */
+    /**
+     * Stops listening. On the thread that runs the listener, this is the end of all calls of it:
+     * reports that wait for the executor are dropped.
+     */
     @Override
     public void close() {
         stopped = true;
@@ -86,8 +89,9 @@ final class MicrophoneFeeder implements AutoCloseable {
             watch(recorder);
             recorder.startRecording();
             feed(recorder, stream);
-        } catch (IllegalStateException | UnsupportedOperationException failed) {
-            report(() -> listener.onFailure(failed.getMessage()));
+        } catch (RuntimeException | LinkageError | OutOfMemoryError failed) {
+            String reason = failed.getMessage();
+            report(() -> listener.onFailure(reason != null ? reason : failed.toString()));
         } finally {
             if (recorder != null) {
                 recorder.release(); // stops it too
@@ -95,7 +99,7 @@ final class MicrophoneFeeder implements AutoCloseable {
         }
     }
 
-    @SuppressLint("MissingPermission") // who calls start() has it
+    @SuppressLint("MissingPermission") // callers of start() hold it
     private AudioRecord open() {
         int least = AudioRecord.getMinBufferSize(
                 RATE, AudioFormat.CHANNEL_IN_MONO, AudioFormat.ENCODING_PCM_FLOAT);
@@ -168,8 +172,10 @@ final class MicrophoneFeeder implements AutoCloseable {
     }
 
     private void report(Runnable report) {
-        if (!stopped) {
-            executor.execute(report);
-        }
+        executor.execute(() -> {
+            if (!stopped) {
+                report.run();
+            }
+        });
     }
 }
