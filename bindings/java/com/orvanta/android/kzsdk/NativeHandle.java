@@ -43,7 +43,7 @@ final class NativeHandle {
         }
     }
 
-    /** Lets nobody enter any more, and frees at once or when the last user leaves. */
+    /** Refuses new calls, and frees at once or when the last user leaves. */
     void close() {
         boolean last;
         synchronized (this) {
