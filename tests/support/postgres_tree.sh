@@ -3,10 +3,10 @@
 # stays as it is: a copy of the server program among links to everything else. The server looks for
 # its libraries and extensions beside its own program.
 #
-#   postgres_tree.sh PG_CONFIG EXTENSION_FOLDER KZMATCH_SO TREE
+#   postgres_tree.sh PG_CONFIG EXTENSION_FOLDER BUILD_FOLDER TREE
 set -eu
 umask 022
-config=$1 extension=$2 library=$3 tree=$4
+config=$1 extension=$2 built=$3 tree=$4
 bin=$("$config" --bindir)
 share=$("$config" --sharedir)
 lib=$("$config" --pkglibdir)
@@ -22,6 +22,6 @@ ln -s "$share"/extension/* "$tree$share/extension"
 rm "$tree$bin/postgres"
 cp "$bin/postgres" "$tree$bin"
 rm -f "$tree$lib/kzmatch.so" "$tree$share"/extension/kzmatch*
-cp "$library" "$tree$lib/kzmatch.so"
-cp "$extension"/kzmatch.control "$extension"/kzmatch--*.sql "$tree$share/extension"
+cp "$built/kzmatch.so" "$tree$lib"
+cp "$extension"/kzmatch.control "$built"/kzmatch--*.sql "$tree$share/extension"
 touch "$tree"

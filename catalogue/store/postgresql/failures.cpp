@@ -154,12 +154,20 @@ constexpr Failure kFailures[] = {
 
 constexpr std::string_view kNoServer = "could not connect to server \"";
 
-/// Before the sentence: whose failure it is. A coordinator passes on what a shard has reported with
-/// the statement that it had sent there.
-std::string reporter(const std::string& name, const ServerReport& report)
+/// A coordinator passes on what a shard has reported with the statement that it had sent there.
+bool is_of_shard(const ServerReport& report)
 {
-    const bool is_shards = report.context.find("remote SQL command") != std::string_view::npos;
-    return is_shards ? name + ", one of the shards" : name;
+    return report.context.find("remote SQL command") != std::string_view::npos;
+}
+
+StoreError describe_empty_shard(const std::string& whose, const ServerReport& report)
+{
+    return {Kind::damaged,
+            whose +
+                ": a table of the catalogue is missing; let the administrator run kzcat-shards "
+                "with all shards in their order, which makes the tables where there are none, "
+                "or restore the database from a copy (" +
+                in_one_line(report.text) + ")"};
 }
 
 /// A coordinator reports its own failures to connect as libpq does, in the detail.
@@ -205,13 +213,16 @@ StoreError describe_refusal(const std::string& name, std::string_view text)
 StoreError describe_failure(const std::string& name, const ServerReport& report,
                             std::chrono::milliseconds patience)
 {
-    const std::string whose = reporter(name, report);
+    const std::string whose = is_of_shard(report) ? name + ", one of the shards" : name;
     if (report.state == "55P03") {
         return {Kind::busy, whose + ": another writer has held it for " + in_seconds(patience) +
                                 "; try again when that has finished"};
     }
     if (report.state == "08001" && report.text.starts_with(kNoServer)) {
         return describe_unreached(name, report);
+    }
+    if (report.state == "42P01" && is_of_shard(report)) {
+        return describe_empty_shard(whose, report);
     }
     const auto* found = std::ranges::find_if(kFailures, [&report](const Failure& failure) {
         return report.state.starts_with(failure.state) &&

@@ -184,7 +184,8 @@ void check_shard(Connection& connection, const std::string& catalogue, int64_t s
         if (connection.options().read_only) {
             refuse(Kind::damaged, connection,
                    "it has no tables of a catalogue; restore the database from a copy, or, when "
-                   "it is new, add to the catalogue first");
+                   "it is new, let the administrator run kzcat-shards with all shards in their "
+                   "order");
         }
         Transaction transaction(connection, Transaction::Kind::write);
         begin_making(connection);

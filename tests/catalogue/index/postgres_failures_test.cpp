@@ -402,38 +402,5 @@ TEST_F(Standby, OfTheCataloguesServerAnswersToo)
     }
 }
 
-TEST(PostgresShards, KeepTheirNumbers)
-{
-    if (!kz::test::postgres_obstacle().empty()) {
-        GTEST_SKIP() << kz::test::postgres_obstacle();
-    }
-    const test::Fleet fleet;
-    const std::string address = fleet.coordinator.url();
-    const std::string one = test::shard_address(fleet.one);
-    const std::string two = test::shard_address(fleet.two);
-    EXPECT_NO_THROW(test::attach_shards(address, {one, two}));
-    try {
-        test::attach_shards(address, {two});
-        ADD_FAILURE() << "the second shard was taken for the first";
-    } catch (const std::runtime_error& error) {
-        EXPECT_NE(std::string::npos,
-                  std::string(error.what()).find("name all shards in their order"))
-            << error.what();
-    }
-    EXPECT_EQ("2\n", fleet.coordinator.sql("SELECT count(*) FROM kzcat.shard"));
-}
-
-TEST(PostgresShards, WithoutTracksAreSearchedToo)
-{
-    if (!kz::test::postgres_obstacle().empty()) {
-        GTEST_SKIP() << kz::test::postgres_obstacle();
-    }
-    const test::Fleet fleet;
-    const auto store = open_postgres_store(fleet.coordinator.url(), Access::create);
-    const auto ids = add(*store, 1, 1);
-    const auto index = open_index(*store, options_for(fleet.coordinator.url()));
-    EXPECT_EQ(ids.at(0), found(*index, 1));
-}
-
 } // namespace
 } // namespace kzcat
