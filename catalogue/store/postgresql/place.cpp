@@ -1,5 +1,5 @@
-// Addresses are taken apart by their text alone, so that a wrong one is shown without its password
-// too.
+// Addresses are taken apart by their text alone, so that one that libpq would not understand is shown
+// without its password, too.
 
 #include "catalogue/store/postgresql/place.hpp"
 
@@ -51,13 +51,19 @@ void hide_in_options(std::string& text)
     }
 }
 
-/// "host=... password=...": up to the end, since the password may be quoted in several ways.
+/// "host=... password = ...", sslpassword, and whatever else ends so: from the first one on to the
+/// end, since values may be quoted in several ways, and others may follow.
 void hide_in_pairs(std::string& text)
 {
-    constexpr std::string_view kKey = "password=";
-    const size_t at = text.find(kKey);
-    if (at == 0 || (at != std::string::npos && text[at - 1] == ' ')) {
-        text.replace(at + kKey.size(), std::string::npos, kHidden);
+    constexpr std::string_view kKey = "password";
+    for (size_t at = text.find(kKey); at != std::string::npos; at = text.find(kKey, at)) {
+        at += kKey.size();
+        const size_t sign = text.find_first_not_of(" \t\n\r\f\v", at);
+        if (sign != std::string::npos && text[sign] == '=') {
+            text.resize(at);
+            text += '=';
+            text += kHidden;
+        }
     }
 }
 

@@ -58,13 +58,19 @@ TEST(ShownPlace, HidesPasswordsWhereverTheyStand)
     EXPECT_EQ("postgres://me:***", shown_place("postgres://me:secret"));
     EXPECT_EQ("host=h password=***", shown_place("host=h password='se cret' dbname=a"));
     EXPECT_EQ("password=***", shown_place("password=secret"));
+    EXPECT_EQ("host=h sslpassword=***", shown_place("host=h sslpassword=a password=secret"));
+    EXPECT_EQ("host=h password=***", shown_place("host=h password = secret"));
+    EXPECT_EQ("host=h\tpassword=***", shown_place("host=h\tpassword\n=\tsecret"));
+    EXPECT_EQ("user='a'password=***", shown_place("user='a'password=secret"));
+    EXPECT_EQ("dbname=passwords password=***", shown_place("dbname=passwords password=secret"));
 }
 
 TEST(ShownPlace, LeavesOtherPathsAlone)
 {
     for (const char* path : {"postgres://me@host:5432/db", "postgresql:///db?host=/tmp", "a.kzc",
                              "postgres://host:5432/db", "postgres://host:5432", "postgres://[::1]/",
-                             "/music/me:secret@home.kzc", "postgres:/a", ""}) {
+                             "/music/me:secret@home.kzc", "postgres:/a", "", "password",
+                             "/home/password list/b.kzc"}) {
         EXPECT_EQ(path, shown_place(path));
     }
 }
