@@ -48,8 +48,8 @@ const char* const kLengthsStatement = "SELECT shard, list, kzcat.kz_lengths(word
                                       "FROM kzcat.posting WHERE list BETWEEN -5 AND -2 "
                                       "GROUP BY shard, list";
 
-Lookups::Lookups(std::string address, bool partial)
-    : sessions_(std::move(address)), partial_(partial)
+Lookups::Lookups(std::string address, bool any_server, bool partial)
+    : sessions_(std::move(address), any_server), partial_(partial)
 {
 }
 

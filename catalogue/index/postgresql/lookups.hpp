@@ -24,7 +24,8 @@ extern const char* const kLengthsStatement;
 /// Several threads may look up at once.
 class Lookups {
 public:
-    Lookups(std::string address, bool partial);
+    /// Looking up at a standby, which may lag behind, is for `any_server`.
+    Lookups(std::string address, bool any_server, bool partial);
 
     /// Looks which servers have tracks, and whether look-ups reach them and no others. Throws
     /// StoreError, which names a cure.

@@ -35,8 +35,8 @@ std::vector<Candidate> candidates_of(std::vector<RankedPlace> places, size_t lim
 /// threads at once.
 class Servers {
 public:
-    explicit Servers(const IndexOptions& options)
-        : lookups(options.server, options.partial), lists(options.lists)
+    Servers(const IndexOptions& options, bool any_server)
+        : lookups(options.server, any_server, options.partial), lists(options.lists)
     {
     }
 
@@ -134,8 +134,10 @@ private:
 
 class PostgresIndex final : public Index {
 public:
+    /// What a writer has just added is found at the server that it was added to.
     PostgresIndex(Store& store, const IndexOptions& options)
-        : options_(options), servers_(options), everything_(servers_)
+        : options_(options), servers_(options, connection_of(store).options().read_only),
+          everything_(servers_)
     {
         take_in(store);
     }

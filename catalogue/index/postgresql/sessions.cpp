@@ -30,7 +30,7 @@ std::unique_ptr<Connection> Sessions::take()
         }
     }
     return std::make_unique<Connection>(
-        address_, ConnectionOptions{.session = kSearchSession, .any_server = true});
+        address_, ConnectionOptions{.session = kSearchSession, .any_server = any_server_});
 }
 
 void Sessions::give_back(std::unique_ptr<Connection> session)

@@ -20,10 +20,14 @@ extern const char* const kSearchSession;
 /// The first column of rows.
 std::vector<int64_t> numbers_in(const Rows& rows);
 
-/// Sessions with one server: as many as have ever been in use at once.
+/// Sessions with one server: as many as have ever been in use at once. A standby will do for
+/// `any_server`.
 class Sessions {
 public:
-    explicit Sessions(std::string address) : address_(std::move(address)) {}
+    Sessions(std::string address, bool any_server)
+        : address_(std::move(address)), any_server_(any_server)
+    {
+    }
 
     /// Gives `use` a session to which it has sole access.
     template <class Use>
@@ -40,6 +44,7 @@ private:
     void give_back(std::unique_ptr<Connection> session);
 
     std::string address_;
+    bool any_server_;
     std::mutex mutex_;
     std::vector<std::unique_ptr<Connection>> free_;
 };

@@ -402,5 +402,26 @@ TEST_F(Standby, OfTheCataloguesServerAnswersToo)
     }
 }
 
+TEST_F(Standby, ThatLagsHidesNothingFromAWriter)
+{
+    if (!kz::test::postgres_obstacle().empty()) {
+        GTEST_SKIP() << kz::test::postgres_obstacle();
+    }
+    const kz::test::PostgresServer primary;
+    add(*open_postgres_store(primary.url(), Access::create), 1, 10);
+    const auto standby = kz::test::PostgresServer::standby_of(primary);
+    test::await_replay(primary, *standby);
+    standby->sql("SELECT pg_wal_replay_pause()");
+    const std::string both = "postgresql://postgres@/postgres?host=" + standby->host() + "," +
+                             primary.host() + "&port=" + std::to_string(standby->port()) + "," +
+                             std::to_string(primary.port());
+    const auto store = open_postgres_store(both, Access::write);
+    const auto ids = add(*store, 11, 1);
+    EXPECT_EQ(ids[0], found(*open_index(*store, options_for(both)), 11));
+    const auto reader = open_postgres_store(both, Access::read);
+    EXPECT_EQ(10U, reader->track_count()) << "which the standby serves";
+    EXPECT_EQ(0, found(*open_index(*reader, options_for(both)), 11));
+}
+
 } // namespace
 } // namespace kzcat
