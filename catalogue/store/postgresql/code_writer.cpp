@@ -11,8 +11,6 @@
 #include "catalogue/store/postgresql/code_writer.hpp"
 
 #include <algorithm>
-#include <bit>
-#include <concepts>
 #include <deque>
 
 #include "catalogue/model/crc32c.hpp"
@@ -76,16 +74,6 @@ void write_bands(Connection& connection, int64_t track, const DocumentBands& ban
                      track, int64_t{crc32c(bytes)}, bytes);
 }
 
-/// In its turn, so that codes that were being written when their writer ended are there or not.
-void remove_codes(Connection& shard, std::span<const int64_t> tracks)
-{
-    Transaction transaction(shard, Transaction::Kind::write);
-    shard.query(kTakeTurn);
-    shard.query("DELETE FROM trail WHERE track = ANY ($1)", tracks);
-    shard.query("DELETE FROM document_bands WHERE track = ANY ($1)", tracks);
-    transaction.commit();
-}
-
 } // namespace
 
 void CodeWriter::prepare(std::set<int64_t> shards)
@@ -117,13 +105,26 @@ void CodeWriter::settle()
     }
     for (const auto& [shard, tracks] : left) {
         try {
-            remove_codes(shards_.promptly(shard), tracks);
+            remove_codes(shard, tracks);
         } catch (const StoreError&) {
             continue; // it cannot be reached; what is to be added elsewhere need not wait for it
         }
         own_.query("DELETE FROM pending WHERE shard = $1 AND track = ANY ($2)", shard,
                    std::span<const int64_t>(tracks));
     }
+}
+
+/// In its turn, so that codes that were being written when their writer ended are there or not.
+void CodeWriter::remove_codes(int64_t shard, std::span<const int64_t> tracks)
+{
+    shards_.note_silence(shard, [&] {
+        Connection& connection = shards_.promptly(shard);
+        Transaction transaction(connection, Transaction::Kind::write);
+        connection.query(kTakeTurn);
+        connection.query("DELETE FROM trail WHERE track = ANY ($1)", tracks);
+        connection.query("DELETE FROM document_bands WHERE track = ANY ($1)", tracks);
+        transaction.commit();
+    });
 }
 
 void CodeWriter::add(int64_t shard, const Codes& codes) { codes_[shard].push_back(codes); }
@@ -141,7 +142,7 @@ void CodeWriter::write()
     announce();
     for (const auto& [shard, all] : codes_) {
         if (!all.empty()) {
-            write(shard, all);
+            shards_.note_silence(shard, [&] { write(shard, all); });
         }
     }
     retract();
@@ -208,7 +209,7 @@ void CodeWriter::clean() noexcept
 {
     try {
         for (const auto& [shard, tracks] : removed_) {
-            remove_codes(shards_.promptly(shard), tracks);
+            remove_codes(shard, tracks);
             own_.query("DELETE FROM pending WHERE track = ANY ($1)",
                        std::span<const int64_t>(tracks));
         }

@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <map>
 #include <set>
+#include <span>
 #include <vector>
 
 #include "catalogue/store/postgresql/connection.hpp"
@@ -31,7 +32,8 @@ public:
 
     CodeWriter(Connection& own, Shards& shards) : own_(own), shards_(shards) {}
 
-    /// Connects to these shards and to those that settle() needs, as far as they can be reached.
+    /// Asks these shards and those that settle() needs for an answer, so that those whose hosts are
+    /// silent are waited for before the turn.
     void prepare(std::set<int64_t> shards);
 
     /// Removes codes that an interrupted writer has left on shards, as far as these can be reached.
@@ -44,12 +46,13 @@ public:
     /// Writes the codes of what was added and not removed since.
     void write();
 
-    /// Removes the codes of what was removed, once that is committed; what cannot be removed now is
-    /// by the next writer.
+    /// Removes the codes of what was removed, once that is committed; what cannot be removed now,
+    /// the next writer removes.
     void clean() noexcept;
 
 private:
     void write(int64_t shard, const std::vector<Codes>& all);
+    void remove_codes(int64_t shard, std::span<const int64_t> tracks);
     void announce();
     void retract();
 

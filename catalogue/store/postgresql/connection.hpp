@@ -105,6 +105,9 @@ public:
 
     bool in_transaction() const { return depth_ != 0; }
 
+    /// Whether the session is known to have ended.
+    bool is_lost() const { return PQstatus(handle()) != CONNECTION_OK; }
+
 private:
     friend class Transaction;
 

@@ -20,7 +20,7 @@ struct Refusal {
     bool quoted; ///< libpq's text is of use
 };
 
-// The first whose signs are in the text holds.
+// The first one applies whose signs are both in the text.
 constexpr Refusal kRefusals[] = {
     {"password authentication failed", "",
      "the server refused the user's password; correct it in the address, in PGPASSWORD or in "
@@ -64,6 +64,11 @@ constexpr Refusal kRefusals[] = {
     {"is starting up", "", "the server is starting; try again in a moment", Kind::busy, false},
     {"is shutting down", "", "the server is stopping; try again when it runs again", Kind::busy,
      false},
+    {"is in recovery mode", "", "the server recovers from a crash; try again in a moment",
+     Kind::busy, false},
+    {"not yet accepting connections", "",
+     "the server is starting, and has to read what it has written before; try again in a moment",
+     Kind::busy, false},
     {"session is read-only", "",
      "the server is a standby, or allows reading only; name the one that may be written",
      Kind::read_only, true},
@@ -109,7 +114,7 @@ struct Failure {
     std::string_view sentence;
 };
 
-// The first whose state and sign are the server's holds.
+// The first one applies whose state and sign are the server's.
 constexpr Failure kFailures[] = {
     {"08", "", Kind::failed, ""},
     {"57P", "", Kind::failed, ""}, // ended by an administrator, crashed, starting

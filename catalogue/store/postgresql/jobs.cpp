@@ -48,11 +48,8 @@ constexpr const char* kIsOurs = "SELECT EXISTS (SELECT FROM job WHERE id = $1 AN
 /// that worker's own short transaction ends.
 constexpr auto kOthersLook = std::chrono::milliseconds(10);
 
-/// For as long as the job takes. A worker's machine that has gone without a word is noticed after a
-/// minute, not after hours, and a worker that is silent because it works is left alone.
-constexpr const char* kPatience =
-    "SET LOCAL tcp_keepalives_idle = 30; SET LOCAL tcp_keepalives_interval = 10; "
-    "SET LOCAL tcp_keepalives_count = 3; SET LOCAL idle_in_transaction_session_timeout = 0";
+/// For as long as the job takes: a worker that is silent because it works is left alone.
+constexpr const char* kPatience = "SET LOCAL idle_in_transaction_session_timeout = 0";
 
 constexpr const char* kGiveUp =
     "UPDATE job SET state = 'failed', finished = clock_timestamp(), "

@@ -1,5 +1,5 @@
-// Addresses are taken apart by their text alone, so that one that libpq would not understand is shown
-// without its password, too.
+// Addresses are taken apart by their text alone, so that one that libpq would not understand is
+// shown without its password, too.
 
 #include "catalogue/store/postgresql/place.hpp"
 

@@ -40,21 +40,24 @@ Connection& Shards::at(int64_t shard)
     if (shard == 0) {
         return own_;
     }
-    const auto begin = Clock::now();
-    try {
+    note_silence(shard, [this, shard] {
         auto& session = sessions_[shard];
         if (session == nullptr) {
             session = connect(shard);
         }
         session->ensure_connected();
-        silent_.erase(shard);
-        return *session;
-    } catch (const StoreError& error) {
-        if (Clock::now() - begin > kLongWait) {
-            silent_.insert_or_assign(shard,
-                                     Silence{.until = Clock::now() + kPause, .error = error});
-        }
-        throw;
+        silent_.erase(shard); // a session that was lost is a new one
+    });
+    return *sessions_[shard];
+}
+
+/// Of what fails late only what was lost was silent: others report that a disk is full, or that
+/// another writer is at it.
+void Shards::note(int64_t shard, const StoreError& error)
+{
+    const auto& session = sessions_[shard];
+    if (session == nullptr || session->is_lost()) {
+        silent_.insert_or_assign(shard, Silence{.until = Clock::now() + kPause, .error = error});
     }
 }
 
@@ -70,7 +73,7 @@ Connection& Shards::promptly(int64_t shard)
 void Shards::reach(int64_t shard)
 {
     try {
-        promptly(shard);
+        note_silence(shard, [this, shard] { promptly(shard).query("SELECT 1"); });
     } catch (const StoreError&) {
         return; // what needs it meets the same
     }

@@ -27,12 +27,29 @@ public:
     /// for it takes long, is not tried again for a minute: what was thrown then is thrown at once.
     Connection& promptly(int64_t shard);
 
-    /// Makes the session before promptly() asks for it, where that is possible.
+    /// Asks the shard for an answer, so that one whose host is silent is waited for now, and not by
+    /// promptly(). What fails is met again by what needs it.
     void reach(int64_t shard);
 
     /// The same for every shard that had no session yet, since connecting makes the tables of a new
-    /// one: look-ups read those of all.
+    /// one.
     void reach_new();
+
+    /// Runs `act`, which uses a shard; when it has waited in vain for that the shard is noted as
+    /// silent.
+    template <class Act>
+    void note_silence(int64_t shard, Act act)
+    {
+        const auto begin = Clock::now();
+        try {
+            act();
+        } catch (const StoreError& error) {
+            if (Clock::now() - begin > kLongWait) {
+                note(shard, error);
+            }
+            throw;
+        }
+    }
 
     /// A second session with the catalogue's own database, for what must outlast a transaction of
     /// the first.
@@ -55,6 +72,7 @@ private:
     };
 
     std::unique_ptr<Connection> connect(int64_t shard);
+    void note(int64_t shard, const StoreError& error);
 
     Connection& own_;
     std::string catalogue_;

@@ -20,8 +20,8 @@ class Writer {
 public:
     Writer(Connection& own, Shards& shards) : own_(own), shards_(shards), codes_(own, shards) {}
 
-    /// To be called before the caller is the only writer, so that nobody waits for a shard that is
-    /// hard to reach but those that need it. `tracks` are those that are to be added.
+    /// To be called before the caller is the only writer: it waits for shards whose hosts are
+    /// silent, so that other writers need not. `tracks` are those that are to be added.
     void prepare(std::span<const NewTrack> tracks);
 
     /// The first thing to do as the only writer.

@@ -64,6 +64,15 @@ TEST(Report, OfAShardSaysSo)
     }
 }
 
+TEST(Report, OfAServerThatRecoversHasOneTryAgain)
+{
+    for (const char* text : {"FATAL:  the database system is in recovery mode",
+                             "FATAL:  the database system is not yet accepting connections"}) {
+        const StoreError error = postgresql::describe_refusal("music", text);
+        EXPECT_EQ(Kind::busy, error.kind()) << error.what();
+    }
+}
+
 class Server : public ::testing::Test {
 protected:
     void SetUp() override

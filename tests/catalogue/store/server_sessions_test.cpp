@@ -1,7 +1,6 @@
 // Sessions with servers and shards: what they begin with, what they wait for, and what becomes of
 // writers whose sessions end.
 
-#include <atomic>
 #include <fstream>
 #include <future>
 #include <thread>
@@ -11,7 +10,6 @@
 #include <netinet/tcp.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include "catalogue/store/postgresql/code_writer.hpp"
 #include "catalogue/store/postgresql/postgres_store.hpp"
@@ -96,11 +94,15 @@ TEST_F(Session, IsNotUsedWithoutItsSettings)
 TEST_F(Session, NoticesAHostThatHasGone)
 {
     const std::string url = guarded().tcp_url("postgres", "postgres:right");
-    const Connection usual(url);
+    Connection usual(url);
     EXPECT_EQ(30, socket_option(usual, TCP_KEEPIDLE));
     EXPECT_EQ(10, socket_option(usual, TCP_KEEPINTVL));
     EXPECT_EQ(3, socket_option(usual, TCP_KEEPCNT));
     EXPECT_EQ(40'000, socket_option(usual, TCP_USER_TIMEOUT));
+    // And so is a client that has, by the server: it may hold a lock.
+    EXPECT_EQ("30", usual.query("SHOW tcp_keepalives_idle").text(0, 0));
+    EXPECT_EQ("10", usual.query("SHOW tcp_keepalives_interval").text(0, 0));
+    EXPECT_EQ("3", usual.query("SHOW tcp_keepalives_count").text(0, 0));
     const Connection chosen(url + "?keepalives_idle=77&tcp_user_timeout=5000");
     EXPECT_EQ(77, socket_option(chosen, TCP_KEEPIDLE));
     EXPECT_EQ(5000, socket_option(chosen, TCP_USER_TIMEOUT));
@@ -189,83 +191,6 @@ TEST_F(ShardSession, OfANamedUserIsGivenNoPassword)
     EXPECT_NE(std::string::npos, text.find("shard 1: the server wants a password")) << text;
     keep_password({shard_});
     EXPECT_EQ("", adding("postgres:right"));
-}
-
-/// Accepts connections, says nothing for a while and ends them.
-class SilentHost {
-public:
-    explicit SilentHost(const std::string& catalogue)
-        : listener_(::socket(AF_INET, SOCK_STREAM, 0)), observer_(catalogue)
-    {
-        sockaddr_in address = {};
-        address.sin_family = AF_INET;
-        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-        socklen_t size = sizeof address;
-        EXPECT_EQ(0, ::bind(listener_, reinterpret_cast<sockaddr*>(&address), size));
-        EXPECT_EQ(0, ::listen(listener_, 8));
-        ::getsockname(listener_, reinterpret_cast<sockaddr*>(&address), &size);
-        port_ = ntohs(address.sin_port);
-        thread_ = std::thread([this] { run(); });
-    }
-    ~SilentHost()
-    {
-        ::shutdown(listener_, SHUT_RDWR);
-        thread_.join();
-        ::close(listener_);
-    }
-    SilentHost(const SilentHost&) = delete;
-    SilentHost& operator=(const SilentHost&) = delete;
-
-    int port() const { return port_; }
-    int connections() const { return connections_; }
-    int in_a_turn() const { return in_a_turn_; }
-
-private:
-    void run()
-    {
-        for (int one = ::accept(listener_, nullptr, nullptr); one >= 0;
-             one = ::accept(listener_, nullptr, nullptr)) {
-            ++connections_;
-            postgresql::Transaction look(observer_, postgresql::Transaction::Kind::write);
-            const bool is_free =
-                observer_.query("SELECT pg_try_advisory_xact_lock(1264206657)").boolean(0, 0);
-            look.commit();
-            in_a_turn_ += is_free ? 0 : 1;
-            std::this_thread::sleep_for(std::chrono::milliseconds(1100));
-            ::close(one);
-        }
-    }
-
-    int listener_;
-    int port_ = 0;
-    Connection observer_;
-    std::atomic<int> connections_ = 0;
-    std::atomic<int> in_a_turn_ = 0; ///< connections that a writer waited for in its turn
-    std::thread thread_;
-};
-
-TEST_F(Session, WithASilentShardKeepsNobodyWaiting)
-{
-    const std::string url = server().new_database();
-    const std::string shard = server().new_database();
-    Connection session(url);
-    session.execute("CREATE SCHEMA kzcat; CREATE TABLE kzcat.shard (number INTEGER PRIMARY "
-                    "KEY, address TEXT NOT NULL)");
-    const SilentHost silent(url);
-    const std::string address = "host=127.0.0.1 port=" + std::to_string(silent.port()) +
-                                " dbname=a sslmode=disable gssencmode=disable";
-    session.query("INSERT INTO shard (number, address) VALUES (1, $1), (2, $2)",
-                  std::string_view{shard}, std::string_view{address});
-    const auto store = open_postgres_store(url, Access::create);
-    session.execute("INSERT INTO pending VALUES (999, 2)"); // as an interrupted writer leaves it
-    for (const char* value : {"a", "b", "c"}) {
-        store->set_setting("name", value);
-    }
-    EXPECT_EQ(1, silent.connections());
-    const Failure failure = failure_of([&] { add_tracks(*store, 1, 8); });
-    EXPECT_NE(std::string::npos, failure.text.find("shard 2")) << failure.text;
-    EXPECT_EQ(1, silent.connections());
-    EXPECT_EQ(0, silent.in_a_turn());
 }
 
 TEST_F(Session, ThatHasEndedWritesNoCodes)
