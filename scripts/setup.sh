@@ -18,7 +18,7 @@ packages_of() {
     # FFmpeg's libraries read what libsndfile does not, PortAudio listens to microphones.
     tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev libavformat-dev libavcodec-dev portaudio19-dev libpng-dev" ;;
     test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso python3 zsh fish libexpat1-dev libpng-dev chromium-headless-shell" ;;
-    # The Java front and its tests; Android's log and threads as a desktop has them, and its resources.
+    # The Java front and its tests; Android's log and threads as a desktop has them, its resources.
     java) echo "default-jdk-headless junit4 android-liblog-dev android-libutils-dev proguard-cli aapt android-framework-res" ;;
     kotlin) echo "kotlin" ;; # for -DKZ_KOTLIN=ON; 70 packages
     # The package, what tests it, and what its example and its other reader of files want.

@@ -8,7 +8,7 @@ function(output_of variable)
   set(${variable} "${output}" PARENT_SCOPE)
 endfunction()
 
-# packed(<variable> <manifest> <raw files> <argument of aapt>...): what a device reads in the archive.
+# packed(<variable> <manifest> <raw files> <argument of aapt>...): what a device reads of it.
 function(packed variable manifest raw)
   output_of(ignored "${AAPT}" package -f -M "${manifest}" -I "${FRAMEWORK}" -F "${WORK_DIR}/archive.apk" ${ARGN} ${raw})
   output_of(contents "${AAPT}" dump badging "${WORK_DIR}/archive.apk")

@@ -130,8 +130,8 @@ TEST_F(Posting, HoldsUpNobodyWhoRemovesATrack)
     }
 }
 
-/// The tail grows between the choice of the segments to join and that of the tracks, so that not all
-/// fit into one segment.
+/// The tail grows between the choice of the segments to join and that of the tracks, so that not
+/// all fit into one segment.
 TEST_F(Posting, LosesNoTrackWhenTheTailGrowsMeanwhile)
 {
     const std::string request = "INSERT INTO kzcat.posting_request VALUES (0, 1)";

@@ -3,7 +3,9 @@
 
 #include "kzfp.hpp"
 
+#include <csignal>
 #include <filesystem>
+#include <fstream>
 #include <sstream>
 
 #include <sys/stat.h>
@@ -12,6 +14,7 @@
 #include <nlohmann/json.hpp>
 
 #include "programs/report/xml.hpp"
+#include "running.hpp"
 
 namespace {
 
@@ -291,12 +294,13 @@ TEST(KzfpInterrupted, KeepsWhatIsDone)
     const std::string path = directory.path("fifo");
     ASSERT_EQ(0, ::mkfifo(path.c_str(), 0600));
     const std::string out = directory.path("out");
-    // The FIFO, into which nobody writes, holds the program until the signal comes.
-    const ProcessResult result =
-        run({"/usr/bin/timeout", "--preserve-status", "-s", "INT", "3", KZFP_PROGRAM, "-f", "json",
-             "-j", "1", "-o", out, kMusic, path, kLate});
-    EXPECT_EQ(130, result.status);
-    EXPECT_TRUE(contains(result.err, "interrupted: 1 of 3 files were left out")) << result.err;
+    Running program({"-f", "json", "-j", "1", "-o", out, kMusic, path, kLate},
+                    directory.path("printed"), directory.path("err"));
+    const std::ofstream sound(path); // returns once the program reads
+    program.send(SIGINT);
+    EXPECT_EQ(130, program.wait());
+    const std::string err = contents(directory.path("err"));
+    EXPECT_TRUE(contains(err, "interrupted: 1 of 3 files were left out")) << err;
     const auto lines = lines_of(contents(out));
     ASSERT_EQ(2u, lines.size());
     EXPECT_EQ(kMusic, json::parse(lines[0])["file"]);

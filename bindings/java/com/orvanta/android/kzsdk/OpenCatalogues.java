@@ -23,8 +23,8 @@ final class OpenCatalogues {
     private OpenCatalogues() {}
 
     /**
-     * Keeps the path of a catalogue that is about to be opened. The address of a server is kept too,
-     * as the path of a file that does not exist.
+     * Keeps the path of a catalogue that is about to be opened. The address of a server is kept
+     * too, as the path of a file that does not exist.
      *
      * @return what {@link #closed} takes; null for a catalogue in memory
      */

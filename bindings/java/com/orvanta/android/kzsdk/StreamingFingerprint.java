@@ -86,8 +86,8 @@ public final class StreamingFingerprint implements AutoCloseable {
      *
      * @param bytes the array
      * @param offset of the first byte
-     * @param count how many; 0 and below feed nothing, so that what a recorder returns can be passed
-     *     on. At the end of the sound leave the loop and call {@link #finish}
+     * @param count how many; 0 and below feed nothing, so that what a recorder returns can be
+     *     passed on. At the end of the sound leave the loop and call {@link #finish}
      * @return whether the fingerprint is complete; what is fed after that is ignored
      * @throws IndexOutOfBoundsException when the array has fewer bytes
      * @throws IllegalStateException when the object is closed, or {@link #finish} was called
