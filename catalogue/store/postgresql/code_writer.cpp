@@ -140,9 +140,9 @@ void CodeWriter::remove(int64_t shard, int64_t track)
 void CodeWriter::write()
 {
     announce();
-    for (const auto& [shard, all] : codes_) {
-        if (!all.empty()) {
-            shards_.note_silence(shard, [&] { write(shard, all); });
+    for (const auto& of_shard : codes_) {
+        if (!of_shard.second.empty()) {
+            shards_.note_silence(of_shard.first, [&] { write(of_shard.first, of_shard.second); });
         }
     }
     retract();
