@@ -67,6 +67,17 @@ void hide_in_pairs(std::string& text)
     }
 }
 
+/// "dbname=postgresql://...": an address in the place of the database's name.
+void hide_address(std::string& text)
+{
+    for (const std::string_view scheme : kSchemes) {
+        if (const size_t at = text.find(scheme); at != std::string::npos) {
+            text.resize(at + scheme.size());
+            text += kHidden;
+        }
+    }
+}
+
 } // namespace
 
 bool is_server_address(std::string_view path) { return after_scheme(path) != 0; }
@@ -79,6 +90,7 @@ std::string shown_place(std::string_view path)
         hide_in_authority(text, after_scheme(path));
     } else {
         hide_in_pairs(text);
+        hide_address(text);
     }
     return text;
 }
