@@ -8,6 +8,12 @@
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
 set -eu
 
+# What brings npm: Debian's package, unless Node came from elsewhere and brought its own, which that
+# package conflicts with.
+npm_package() {
+    command -v npm >/dev/null || echo npm
+}
+
 packages_of() {
     case $1 in
     # Also a jni.h, for the library's Java front.
@@ -29,7 +35,7 @@ packages_of() {
     fuzz) echo "libexpat1-dev python3" ;; # a parser to read what is rendered, and the seeds
     # The programs that degrade music, and the peer that is packaged.
     evaluation) echo "ffmpeg sox libsox-fmt-all espeak-ng libchromaprint-tools python3 python3-numpy" ;;
-    lint) echo "python3-mypy clang-format-14 clang-tidy-14 cppcheck mandoc shellcheck" ;;
+    lint) echo "python3-mypy clang-format-14 clang-tidy-14 cppcheck mandoc shellcheck nodejs $(npm_package)" ;;
     clang) echo "clang-14 libclang-rt-14-dev" ;;
     coverage) echo "llvm-14" ;; # what counts
     # Cross compilers, and what runs their programs.
