@@ -47,17 +47,25 @@ export function findBrowser() {
 /**
  * Flags with which getUserMedia() gives what the WAV file contains.
  * @param {string} wavFile
- * @param {{ loop?: boolean, ask?: boolean }} options
+ * @param {{ loop?: boolean }} options
  *   loop: the file begins again at its end; otherwise silence follows
- *   ask: the permission is what setPermission() made it; otherwise every page has it
  */
-export function microphoneFlags(wavFile, { loop = false, ask = false } = {}) {
-  const flags = [
+export function microphoneFlags(wavFile, { loop = false } = {}) {
+  return [
     "--use-fake-device-for-media-stream",
+    "--use-fake-ui-for-media-stream",
     `--use-file-for-fake-audio-capture=${resolve(wavFile)}${loop ? "" : "%noloop"}`,
   ];
-  return ask ? flags : [...flags, "--use-fake-ui-for-media-stream"];
 }
+
+/** Flags with which there is a microphone, and the user refuses it: NotAllowedError. */
+export const REFUSED_MICROPHONE = [
+  "--use-fake-device-for-media-stream",
+  "--use-fake-ui-for-media-stream=deny",
+];
+
+/** Flags with which there is no microphone: NotFoundError. */
+export const NO_MICROPHONE = ["--use-fake-ui-for-media-stream"];
 
 function programArguments(folder, flags) {
   return [
