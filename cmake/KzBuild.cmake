@@ -18,6 +18,13 @@ target_compile_options(kz_settings INTERFACE -ffp-contract=off)
 if(CMAKE_SYSTEM_PROCESSOR MATCHES "^(i[3-6]86|x86|x86_64|amd64|AMD64)$" AND CMAKE_SIZEOF_VOID_P EQUAL 4)
   target_compile_options(kz_settings INTERFACE -msse2 -mfpmath=sse)
 endif()
+if(EMSCRIPTEN)
+  # In every object, so that exceptions and vectors are of one kind in all of them.
+  target_compile_options(
+    kz_settings INTERFACE -msimd128
+                          "$<$<COMPILE_LANGUAGE:CXX>:-fwasm-exceptions;SHELL:-include \"${PROJECT_SOURCE_DIR}/bindings/wasm/native/missing_library.hpp\">")
+  target_link_options(kz_settings INTERFACE -msimd128 -fwasm-exceptions)
+endif()
 target_compile_options(kz_settings INTERFACE -Wall -Wextra -Wconversion -Wsign-conversion -Wshadow)
 if(KZ_WERROR)
   target_compile_options(kz_settings INTERFACE -Werror)
@@ -81,6 +88,9 @@ function(kz_objects target)
   set_target_properties(
     ${target} PROPERTIES LINKER_LANGUAGE CXX POSITION_INDEPENDENT_CODE ON CXX_VISIBILITY_PRESET hidden
                          VISIBILITY_INLINES_HIDDEN ON)
+  if(EMSCRIPTEN)
+    set_target_properties(${target} PROPERTIES POSITION_INDEPENDENT_CODE OFF) # a module is loaded once
+  endif()
 endfunction()
 
 # Those of kzsdk, which nothing of the C++ run-time library serves.
@@ -103,6 +113,8 @@ function(kz_instruction_set set)
     set(options_avx2 -mavx2)
     set(options_avx512 -mavx2 -mavx512f -mavx512bw -mavx512vpopcntdq)
     set(options ${options_${set}})
+  elseif(CMAKE_SYSTEM_PROCESSOR STREQUAL "wasm32" AND set STREQUAL "sse41")
+    set(options -msse4.1) # intrinsics, which become those of WebAssembly
   endif()
   # Scratch of the loops is written before it is read.
   if(KZ_HAS_AUTO_VAR_INIT)

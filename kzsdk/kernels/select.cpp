@@ -60,6 +60,8 @@ RunnableVariants runnable_variants() noexcept
     if (__builtin_cpu_supports("avx2") != 0) {
         add(kAvx2Variant);
     }
+#elif defined(KZ_KERNELS_WASM)
+    add(kSse41Variant); // a module with vectors is not compiled by what has none
 #elif defined(KZ_KERNELS_NEON)
     add(kNeonVariant); // every processor of this architecture has it
 #endif

@@ -1,10 +1,10 @@
 /// @file
-/// The variant for processors with SSE4.1. It is compiled for them, and defines nothing but its
-/// table.
+/// The variant for processors with SSE4.1, and for WebAssembly. It is compiled for them, and defines
+/// nothing but its table.
 
 #include "kzsdk/kernels/variants.hpp"
 
-#if defined(KZ_KERNELS_X86)
+#if defined(KZ_KERNELS_X86) || defined(KZ_KERNELS_WASM)
 
 #include "kzsdk/kernels/isa/sse41.hpp"
 #include "kzsdk/kernels/isa/vector_table.hpp"

@@ -62,7 +62,9 @@ struct Sse41 {
     static void add_to(Ints& sum, Ints v) noexcept
     {
         sum = add(sum, v);
+#if !defined(__wasm__) // which has no registers
         __asm__("" : "+x"(sum));
+#endif
     }
 
     /// Exchanges the 16-bit halves of every lane.
