@@ -31,6 +31,16 @@ void check_taking(const kzcat_builder& builder)
     }
 }
 
+/// Moves the codes that are complete from the extractor to the builder.
+void take_codes(kzcat_builder& builder)
+{
+    const std::vector<Code> fresh = builder.extractor.take_codes();
+    builder.codes.insert(builder.codes.end(), fresh.begin(), fresh.end());
+}
+
+/// The least sound that has so many codes.
+uint64_t samples_of(size_t codes) { return codes == 0 ? 0 : (codes - 1) * kCodeHop + kFrameLength; }
+
 } // namespace
 
 SoundFormat kzcat::to_sound_format(const kzcat_format* format)
@@ -57,7 +67,7 @@ kzcat_status kzcat_builder_create(const kzcat_format* format,
         const bool documents = settings != nullptr && wants_documents(*settings);
         const SoundFormat sound = to_sound_format(format);
         *out_builder = with_format_checked(
-            [&] { return new kzcat_builder{.extractor = TrailExtractor(sound, documents)}; });
+            [&] { return new kzcat_builder{TrailExtractor(sound, documents), {}}; });
     });
 }
 
@@ -74,6 +84,22 @@ kzcat_status kzcat_builder_feed(kzcat_builder* builder, const void* bytes,
     });
 }
 
+kzcat_status kzcat_builder_get_trail(kzcat_builder* builder, kzcat_trail** out_trail) noexcept
+{
+    return guarded([=] {
+        clear_place(out_trail);
+        require(builder != nullptr, "the builder is null; create one");
+        check_taking(*builder);
+        builder->state = kzcat_builder::broken;
+        take_codes(*builder);
+        auto made = std::make_unique<kzcat_trail>();
+        made->trail.samples = samples_of(builder->codes.size());
+        made->trail.codes = builder->codes;
+        builder->state = kzcat_builder::taking;
+        *out_trail = made.release();
+    });
+}
+
 kzcat_status kzcat_builder_finish(kzcat_builder* builder, kzcat_trail** out_trail) noexcept
 {
     return guarded([=] {
@@ -83,7 +109,11 @@ kzcat_status kzcat_builder_finish(kzcat_builder* builder, kzcat_trail** out_trai
         builder->state = kzcat_builder::broken;
         auto made = std::make_unique<kzcat_trail>();
         made->document_bands = builder->extractor.take_document_bands();
+        take_codes(*builder);
         made->trail = builder->extractor.finish();
+        made->trail.codes.swap(builder->codes);
+        made->trail.codes.insert(made->trail.codes.end(), builder->codes.begin(),
+                                 builder->codes.end());
         builder->state = kzcat_builder::finished;
         *out_trail = made.release();
     });

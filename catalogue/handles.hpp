@@ -25,6 +25,7 @@ struct kzcat_catalogue {
 
 struct kzcat_builder {
     kzcat::TrailExtractor extractor;
+    std::vector<kzcat::Code> codes; ///< that were taken out of it already
     enum { taking, broken, finished } state = taking;
 };
 

@@ -356,6 +356,19 @@ KZ_API kzcat_status kzcat_builder_feed(kzcat_builder* builder, const void* bytes
                                        uint64_t byte_count) KZ_NOEXCEPT;
 
 /**
+ * Gives the trail of what was fed so far; more may be fed afterwards. It is the beginning of the
+ * trail that kzcat_builder_finish() will give, without what answers documents: a code is known
+ * once the 0.37 s of sound that it stands for are.
+ *
+ * @param[out] out_trail  Freed by the caller with kzcat_trail_free(); null on failure. It may have
+ *                        no codes yet.
+ * @return 0; KZCAT_ERROR_INVALID_ARGUMENT; KZCAT_ERROR_ORDER after kzcat_builder_finish();
+ *         KZCAT_ERROR_MEMORY: also when it was short in an earlier call with this builder.
+ */
+KZ_API kzcat_status kzcat_builder_get_trail(kzcat_builder* builder,
+                                            kzcat_trail** out_trail) KZ_NOEXCEPT;
+
+/**
  * Ends the sound and gives its trail. Bytes of an unfinished frame are left out.
  *
  * @param[out] out_trail  Freed by the caller with kzcat_trail_free(); null on failure. It has no
