@@ -14,11 +14,19 @@ const CATALOGUE_CODES = {
   13: "order",
 };
 
+// In the place of the library's own sentences, which name what C programs can do.
+const SENTENCES = {
+  0x90090012:
+    "the fixed-point algorithm does not take this rate: resample the sound to 44100 or 48000 Hz, " +
+    'or take the algorithm "float"',
+  0x90090013: "the number of channels must be 1 to 65535: pass that of the sound",
+};
+
 /** The word for a status: those of the library have its number above 0x90000000. */
 function codeOf(status) {
   if (status < 0x90000000) return CATALOGUE_CODES[status] ?? "failed";
   const number = status & 0xffff;
-  if ((status >>> 16 === 0x9009) && number >= 0x10 && number <= 0x13) return "format";
+  if (status >>> 16 === 0x9009 && number >= 0x10 && number <= 0x13) return "format";
   if (number === 0x0014) return "order";
   if (number === 0x0001 || number === 0x0015) return "memory";
   return number === 0x0004 ? "invalid-argument" : "failed";
@@ -49,7 +57,7 @@ export class Memory {
   /** The error of the call that failed last. */
   failure() {
     const status = this.functions.status() >>> 0;
-    const message = this.text(this.functions.status_text());
+    const message = SENTENCES[status] ?? this.text(this.functions.status_text());
     return new KzError(codeOf(status), message, { status });
   }
 

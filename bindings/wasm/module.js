@@ -10,7 +10,11 @@ const isNode = typeof process === "object" && Boolean(process.versions?.node);
 /** The bytes of a file: fetch() of Node does not read files. */
 async function readFile(url) {
   const { readFile: read } = await import("node:fs/promises");
-  return read(url);
+  try {
+    return await read(url);
+  } catch (error) {
+    throw new KzError("load", `${url} could not be read (${error.message}): pass where it lies`);
+  }
 }
 
 async function compileResponse(url) {
