@@ -66,8 +66,9 @@ kzcat_status kzcat_builder_create(const kzcat_format* format,
         clear_place(out_builder);
         const bool documents = settings != nullptr && wants_documents(*settings);
         const SoundFormat sound = to_sound_format(format);
-        *out_builder = with_format_checked(
-            [&] { return new kzcat_builder{TrailExtractor(sound, documents), {}}; });
+        *out_builder = with_format_checked([&] {
+            return new kzcat_builder{TrailExtractor(sound, documents), {}};
+        });
     });
 }
 

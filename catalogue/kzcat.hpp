@@ -164,6 +164,12 @@ public:
         return detail::catalogue_outcome(
             kzcat_builder_feed(handle(), samples.bytes(), samples.size()));
     }
+    /** The trail of the sound so far; more may be fed afterwards. */
+    result<trail> so_far()
+    {
+        return detail::made<trail, kzcat_trail>(
+            [this](kzcat_trail** out) { return kzcat_builder_get_trail(handle(), out); });
+    }
     /** Ends the sound; only once. */
     result<trail> finish()
     {

@@ -159,6 +159,7 @@ TEST(CppTrail, IsTheSameFromPiecesAndFromAFile)
     for (size_t at = 0; at < samples.size(); at += 777) {
         builder.feed({samples.data() + at, std::min<size_t>(777, samples.size() - at)}).value();
     }
+    EXPECT_EQ(whole.cut(0, 9)->codes().value(), builder.so_far()->cut(0, 9)->codes().value());
     EXPECT_EQ(whole.codes().value(), builder.finish()->codes().value());
     EXPECT_EQ(whole.codes().value(), kz::trail::read(whole.write().value())->codes().value());
     EXPECT_EQ(10U, whole.cut(5, 10)->facts()->code_count);

@@ -239,6 +239,32 @@ TEST(DoorTrails, BuildersFinishOnce)
     ASSERT_EQ(KZCAT_OK, make<Trail>(kzcat_builder_finish, builder.handle.get()).status);
     EXPECT_EQ(KZCAT_ERROR_ORDER, make<Trail>(kzcat_builder_finish, builder.handle.get()).status);
     EXPECT_EQ(KZCAT_ERROR_ORDER, kzcat_builder_feed(builder.handle.get(), "ab", 2));
+    EXPECT_EQ(KZCAT_ERROR_ORDER, make<Trail>(kzcat_builder_get_trail, builder.handle.get()).status);
+}
+
+TEST(DoorTrails, SoFarAreTheBeginningOfTheWhole)
+{
+    const auto samples = piece(1, 6);
+    const auto whole = codes_of(trail_of(samples));
+    const auto builder = make<Builder>(kzcat_builder_create, &kFormat,
+                                       static_cast<const kzcat_builder_settings*>(nullptr));
+    EXPECT_TRUE(
+        codes_of(make<Trail>(kzcat_builder_get_trail, builder.handle.get()).handle).empty());
+    size_t known = 0;
+    for (size_t done = 0; done < samples.size(); done += 5000) {
+        const size_t count = std::min<size_t>(5000, samples.size() - done);
+        kzcat_builder_feed(builder.handle.get(), samples.data() + done, count * sizeof samples[0]);
+        const auto made = make<Trail>(kzcat_builder_get_trail, builder.handle.get());
+        ASSERT_EQ(KZCAT_OK, made.status);
+        const auto codes = codes_of(made.handle);
+        ASSERT_LE(known, codes.size());
+        ASSERT_LE(codes.size(), whole.size());
+        known = codes.size();
+        EXPECT_TRUE(std::equal(codes.begin(), codes.end(), whole.begin()));
+        EXPECT_FALSE(bytes_of(made.handle).empty()) << "it has as many codes as its samples say";
+    }
+    EXPECT_LE(whole.size(), known + 3);
+    EXPECT_EQ(whole, codes_of(make<Trail>(kzcat_builder_finish, builder.handle.get()).handle));
 }
 
 // ---- Catalogues
@@ -675,6 +701,9 @@ TEST(DoorNull, ArgumentsAreRefused)
 {
     const Catalogue catalogue = open_memory();
     const Trail trail = trail_of(piece(1, 2));
+    const auto builder = make<Builder>(kzcat_builder_create, &kFormat,
+                                       static_cast<const kzcat_builder_settings*>(nullptr));
+    kzcat_trail* made_trail = nullptr;
     kzcat_facts facts;
     kzcat_trail_facts trail_facts;
     kzcat_summary summary;
@@ -690,6 +719,8 @@ TEST(DoorNull, ArgumentsAreRefused)
         kzcat_get_facts(catalogue.get(), 0, nullptr),
         kzcat_builder_create(nullptr, nullptr, nullptr),
         kzcat_builder_feed(nullptr, "ab", 2),
+        kzcat_builder_get_trail(nullptr, &made_trail),
+        kzcat_builder_get_trail(builder.handle.get(), nullptr),
         kzcat_builder_free(nullptr),
         kzcat_trail_get_facts(nullptr, &trail_facts),
         kzcat_trail_get_codes(trail.get(), nullptr, 5, &count),

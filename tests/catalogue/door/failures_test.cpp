@@ -117,6 +117,13 @@ TEST_F(DoorFailures, AreReportedByBuilders)
                 << "sound may be lost, so it must not go on";
             return fed;
         }
+        const kzcat_status so_far =
+            make<Trail>(kzcat_builder_get_trail, builder.handle.get()).status;
+        if (so_far != KZCAT_OK) {
+            EXPECT_EQ(KZCAT_ERROR_MEMORY,
+                      make<Trail>(kzcat_builder_finish, builder.handle.get()).status);
+            return so_far;
+        }
         return make<Trail>(kzcat_builder_finish, builder.handle.get()).status;
     });
 }
