@@ -2,7 +2,7 @@
 # Installs what is missing to build and test the library on Debian 12.
 #
 #   scripts/setup.sh [build] [catalogue] [postgresql] [java] [python] [tools] [test] [clips] [bench]
-#                    [lint] [clang] [fuzz] [coverage] [arch] [debian] [wide]
+#                    [lint] [clang] [fuzz] [wasm] [browser] [coverage] [arch] [debian] [wide]
 #                                 default: all of them but the last four
 #
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
@@ -29,6 +29,10 @@ packages_of() {
     kotlin) echo "kotlin" ;; # for -DKZ_KOTLIN=ON; 70 packages
     # The package, what tests it, and what its example and its other reader of files want.
     python) echo "python3-cffi python3-setuptools python3-wheel python3-build python3-venv python3-pytest python3-numpy python3-soundfile python3-matplotlib" ;;
+    # The npm package for browsers and Node: its compiler, and that of its types.
+    wasm) echo "emscripten nodejs node-typescript" ;;
+    # What runs pages in tests, and fetches what checks them. Node from elsewhere brings its own npm.
+    browser) echo "chromium-headless-shell nodejs $(command -v npm >/dev/null || echo npm)" ;;
     clips) echo "sox libsox-fmt-all espeak-ng ffmpeg" ;; # the demo's music, and the tests' clips
     # Tools that count instructions and print tables, and the peers, each of which may be missing.
     bench) echo "valgrind python3 pkg-config libcli11-dev nlohmann-json3-dev libchromaprint-dev libfftw3-dev libswresample-dev libavutil-dev libsoxr-dev libspeexdsp-dev libpugixml-dev libtinyxml2-dev libxml2-dev" ;;
@@ -54,7 +58,7 @@ installed() {
     [ "$(dpkg-query -W -f '${db:Status-Status}' "$1" 2>/dev/null || true)" = installed ]
 }
 
-[ $# -gt 0 ] || set -- build catalogue postgresql java python tools test clips bench lint clang fuzz
+[ $# -gt 0 ] || set -- build catalogue postgresql java python tools test clips bench lint clang fuzz wasm browser
 
 wanted=
 for group in "$@"; do

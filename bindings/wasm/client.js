@@ -3,6 +3,8 @@
 
 import { KzError } from "./error.js";
 
+export { KzError };
+
 /** A worker of the browser, or one of Node that looks the same. */
 async function startWorker(url) {
   if (typeof Worker !== "undefined") return new Worker(url, { type: "module" });
@@ -71,9 +73,12 @@ class Calls {
   }
 }
 
-/** The buffer of samples that the caller hands over, and the options without that wish. */
-function handedOver(samples, { transfer = false, ...options } = {}) {
-  return { options, buffers: transfer ? [samples.buffer] : [] };
+/** What is sent of samples, the buffers that go along, and the options without that wish. A part of
+ *  a longer array is copied here: the whole of it would be sent otherwise. */
+function packed(samples, { transfer = false, ...options } = {}) {
+  const isPart = ArrayBuffer.isView(samples) && samples.byteLength < samples.buffer.byteLength;
+  if (transfer) return { sent: samples, buffers: [samples?.buffer], options };
+  return { sent: isPart ? samples.slice() : samples, options };
 }
 
 /** An object of the worker's: `feed` may hand its samples over, the rest are plain calls. */
@@ -88,7 +93,8 @@ class Remote {
   }
 
   feed(samples, options) {
-    return this.call("feed", [samples], handedOver(samples, options).buffers);
+    const { sent, buffers } = packed(samples, options);
+    return this.call("feed", [sent], buffers);
   }
 
   finish() {
@@ -156,8 +162,8 @@ class Client {
   }
 
   #withSamples(call, samples, rate, given) {
-    const { options, buffers } = handedOver(samples, given);
-    return this.#calls.make({ call, args: [samples, rate, options] }, buffers);
+    const { sent, buffers, options } = packed(samples, given);
+    return this.#calls.make({ call, args: [sent, rate, options] }, buffers);
   }
 }
 

@@ -13,7 +13,9 @@
  * nothing sound.
  */
 
-import type { KzError } from "./index.js";
+import { KzError } from "./index.js";
+
+export { KzError };
 
 export interface MicrophoneOptions {
   /**

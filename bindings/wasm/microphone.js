@@ -2,6 +2,8 @@
 
 import { KzError } from "./error.js";
 
+export { KzError };
+
 const REFUSALS = {
   NotAllowedError: ["refused", "the microphone was refused: allow it for this page, and try again"],
   SecurityError: ["refused", "this page may not use microphones: its server has to permit it"],

@@ -26,7 +26,8 @@ uint32_t trail_bit_errors(const kzcat_trail* first, const kzcat_trail* second, u
                           uint32_t capacity)
 {
     uint64_t count = 0;
-    return take_catalogue_status(kzcat_trail_get_bit_errors(first, second, errors, capacity, &count))
+    return take_catalogue_status(
+               kzcat_trail_get_bit_errors(first, second, errors, capacity, &count))
                ? 1
                : 0;
 }

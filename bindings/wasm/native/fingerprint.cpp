@@ -49,12 +49,11 @@ KZ_EXPORTED(stream_state) uint32_t stream_state(kz_stream* stream)
         !take_library_status(kz_stream_get_times(stream, &start, &duration))) {
         return 0;
     }
-    kzwasm::numbers() = {{static_cast<double>(state.frames),
-                          static_cast<double>(state.silence_milliseconds),
-                          static_cast<double>(state.sound_milliseconds),
-                          static_cast<double>(state.phase), static_cast<double>(state.percent),
-                          static_cast<double>(state.missing_milliseconds),
-                          static_cast<double>(start), static_cast<double>(duration)}};
+    kzwasm::numbers() = {
+        {static_cast<double>(state.frames), static_cast<double>(state.silence_milliseconds),
+         static_cast<double>(state.sound_milliseconds), static_cast<double>(state.phase),
+         static_cast<double>(state.percent), static_cast<double>(state.missing_milliseconds),
+         static_cast<double>(start), static_cast<double>(duration)}};
     return 1;
 }
 
