@@ -5,6 +5,7 @@ import { KzError } from "./error.js";
 // Samples go in by blocks: the module's memory does not grow with the sound.
 const BLOCK_SAMPLES = 65536;
 
+// Of catalogue/kzcat.h.
 const CATALOGUE_CODES = {
   1: "memory",
   2: "invalid-argument",
@@ -14,22 +15,35 @@ const CATALOGUE_CODES = {
   13: "order",
 };
 
-// In the place of the library's own sentences, which name what C programs can do.
+// Of kzsdk/abs/status.h: the number of the family of streams, and those of its statuses that have
+// sentences of their own here, since the library's name what C programs can do.
+const STREAMS = 9;
+const RATE = 0x12;
+const CHANNELS = 0x13;
 const SENTENCES = {
-  0x90090012:
+  [RATE]:
     "the fixed-point algorithm does not take this rate: resample the sound to 44100 or 48000 Hz, " +
     'or take the algorithm "float"',
-  0x90090013: "the number of channels must be 1 to 65535: pass that of the sound",
+  [CHANNELS]: "the number of channels must be 1 to 65535: pass that of the sound",
+};
+const LIBRARY_CODES = { 1: "memory", 4: "invalid-argument" };
+const STREAM_CODES = {
+  0x10: "format",
+  0x11: "format",
+  [RATE]: "format",
+  [CHANNELS]: "format",
+  0x14: "order",
+  0x15: "memory",
 };
 
-/** The word for a status: those of the library have its number above 0x90000000. */
-function codeOf(status) {
-  if (status < 0x90000000) return CATALOGUE_CODES[status] ?? "failed";
+/** Word and, where it is not the library's, sentence for a status. Those of libkzsdk have the
+ *  highest bit, then the number of a family, then their own. */
+function explain(status) {
+  if (status >>> 31 === 0) return { code: CATALOGUE_CODES[status] ?? "failed" };
   const number = status & 0xffff;
-  if (status >>> 16 === 0x9009 && number >= 0x10 && number <= 0x13) return "format";
-  if (number === 0x0014) return "order";
-  if (number === 0x0001 || number === 0x0015) return "memory";
-  return number === 0x0004 ? "invalid-argument" : "failed";
+  const ofStreams = ((status >>> 16) & 0xff) === STREAMS;
+  const code = (ofStreams && STREAM_CODES[number]) || LIBRARY_CODES[number] || "failed";
+  return { code, sentence: ofStreams ? SENTENCES[number] : undefined };
 }
 
 /** The module's functions with the views into its memory, which moves when it grows. */
@@ -57,8 +71,9 @@ export class Memory {
   /** The error of the call that failed last. */
   failure() {
     const status = this.functions.status() >>> 0;
-    const message = SENTENCES[status] ?? this.text(this.functions.status_text());
-    return new KzError(codeOf(status), message, { status });
+    const { code, sentence } = explain(status);
+    const message = sentence ?? this.text(this.functions.status_text());
+    return new KzError(code, message, { status });
   }
 
   /** Returns what a call returned, or throws its failure. */

@@ -4,6 +4,7 @@ import assert from "node:assert/strict";
 import { readFileSync } from "node:fs";
 import { join } from "node:path";
 import { test } from "node:test";
+import { pathToFileURL } from "node:url";
 
 import { melody, noise, toFloats } from "./sounds.mjs";
 import { importOf, packageFolder } from "./support.mjs";
@@ -233,8 +234,10 @@ test("libraries loaded apart are independent", async () => {
 test("the module may be given in any form", async () => {
   const file = join(packageFolder, "kzsdk.wasm");
   const bytes = readFileSync(file);
-  for (const module of [bytes, bytes.buffer.slice(bytes.byteOffset, bytes.byteOffset + bytes.length),
-    await WebAssembly.compile(bytes), new URL(`file://${file}`), `file://${file}`]) {
+  const compiled = await WebAssembly.compile(bytes);
+  const address = pathToFileURL(file);
+  const forms = [bytes, Uint8Array.from(bytes).buffer, compiled, address, address.href];
+  for (const module of forms) {
     assert.equal((await load({ module })).version, kz.version);
   }
 });

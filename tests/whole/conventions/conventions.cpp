@@ -13,7 +13,8 @@ namespace {
 namespace fs = std::filesystem;
 
 const Names kExtensions = {".h",   ".hpp", ".c",  ".cpp", ".java", ".cmake",
-                           ".txt", ".py",  ".sh", ".md",  ".1",    ".map"};
+                           ".txt", ".py",  ".sh", ".md",  ".1",    ".map",
+                           ".js",  ".mjs", ".ts"};
 
 bool is_left_out(const fs::path& folder)
 {
@@ -69,7 +70,7 @@ void for_each_test(const File& file, Visit visit)
 bool is_source(const File& file)
 {
     const std::string extension = fs::path(file.name).extension().string();
-    return Names{".h", ".hpp", ".c", ".cpp"}.contains(extension);
+    return Names{".h", ".hpp", ".c", ".cpp", ".js", ".mjs", ".ts"}.contains(extension);
 }
 
 /// Characters of UTF-8: every byte but those that continue one.

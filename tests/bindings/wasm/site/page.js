@@ -9,7 +9,7 @@ async function textOf(path) {
   return (await fetch(path)).text();
 }
 
-/** A client's calls wait for each other here, so that those that compare need not be written twice. */
+/** What a worker makes of a golden document, or without an algorithm of a golden trail. */
 async function digestsInWorker(client, each, algorithm) {
   const { rate, channels } = each;
   if (!algorithm) {
@@ -47,7 +47,8 @@ window.compareGolden = async () => {
 /** The same sound in the page itself, and through a worker with the addresses given. */
 window.compareThreads = async () => {
   const kz = await load({ module: "/kzsdk/kzsdk.wasm" });
-  const client = await createClient({ workerUrl: "/kzsdk/worker.js", moduleUrl: "kzsdk/kzsdk.wasm" });
+  const addresses = { workerUrl: "/kzsdk/worker.js", moduleUrl: "kzsdk/kzsdk.wasm" };
+  const client = await createClient(addresses);
   const samples = sounds.toFloats(sounds.melody(44100, 1, 5));
   const inPage = String(kz.trail(samples, 44100));
   const inWorker = String(await client.trail(samples, 44100));
