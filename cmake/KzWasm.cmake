@@ -1,7 +1,7 @@
 # The npm package: whether it is built.
 #
-#   KZ_WASM              AUTO builds it where Emscripten is found; ON stops without it; OFF leaves it
-#                        out. It is built once for users, not with sanitizers or for other processors
+#   KZ_WASM              AUTO builds it where Emscripten is found, but not with sanitizers or for
+#                        other processors; ON stops without it; OFF leaves it out
 #   KZ_WASM_INSTALL_DIR  folder that `cmake --install` puts the package into, such as
 #                        share/nodejs/kzsdk; empty at first: npm installs it from its folder
 set(KZ_WASM AUTO CACHE STRING "The npm package for browsers and Node: AUTO, ON or OFF")

@@ -31,7 +31,7 @@ packages_of() {
     python) echo "python3-cffi python3-setuptools python3-wheel python3-build python3-venv python3-pytest python3-numpy python3-soundfile python3-matplotlib" ;;
     # The npm package for browsers and Node: its compiler, and that of its types.
     wasm) echo "emscripten nodejs node-typescript" ;;
-    # What runs pages in tests, and fetches what checks them. Node from elsewhere brings its own npm.
+    # What runs pages in tests, and fetches what checks them. Other Nodes bring their own npm.
     browser) echo "chromium-headless-shell nodejs $(command -v npm >/dev/null || echo npm)" ;;
     clips) echo "sox libsox-fmt-all espeak-ng ffmpeg" ;; # the demo's music, and the tests' clips
     # Tools that count instructions and print tables, and the peers, each of which may be missing.

@@ -1,6 +1,6 @@
 /// @file
-/// What the C++ library of Emscripten 3.1.6 lacks of C++20, as far as the sources use it: put before
-/// each of them by the compiler's option -include. A later Emscripten has all of it.
+/// What the C++ library of Emscripten 3.1.6 lacks of C++20, as far as the sources use it: -include
+/// puts it before each of them. A later Emscripten has all of it.
 #pragma once
 
 #include <version>

@@ -1,6 +1,6 @@
 /// @file
-/// The variant for processors with SSE4.1, and for WebAssembly. It is compiled for them, and defines
-/// nothing but its table.
+/// The variant for processors with SSE4.1, and for WebAssembly. It is compiled for these, and
+/// defines nothing but its table.
 
 #include "kzsdk/kernels/variants.hpp"
 
