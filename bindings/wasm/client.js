@@ -73,12 +73,20 @@ class Calls {
   }
 }
 
-/** What is sent of samples, the buffers that go along, and the options without that wish. A part of
- *  a longer array is copied here: the whole of it would be sent otherwise. */
+/** An array as it can be sent alone: of a part the whole memory would be copied, and one that was
+ *  handed over before, which is empty, would never arrive. */
+function sendable(array) {
+  if (!ArrayBuffer.isView(array)) return array;
+  if (array.byteLength === 0) return new array.constructor(0);
+  return array.byteLength < array.buffer.byteLength ? array.slice() : array;
+}
+
+/** What is sent of samples, the buffers that go along, and the options without that wish. */
 function packed(samples, { transfer = false, ...options } = {}) {
-  const isPart = ArrayBuffer.isView(samples) && samples.byteLength < samples.buffer.byteLength;
-  if (transfer) return { sent: samples, buffers: [samples?.buffer], options };
-  return { sent: isPart ? samples.slice() : samples, options };
+  const handsOver = transfer && samples?.byteLength > 0;
+  return handsOver
+    ? { sent: samples, buffers: [samples.buffer], options }
+    : { sent: sendable(samples), options };
 }
 
 /** An object of the worker's: `feed` may hand its samples over, the rest are plain calls. */
@@ -140,11 +148,11 @@ class Client {
   }
 
   readTrail(bytes) {
-    return this.#calls.make({ call: "readTrail", args: [bytes] });
+    return this.#calls.make({ call: "readTrail", args: [sendable(bytes)] });
   }
 
   align(first, second) {
-    return this.#calls.make({ call: "align", args: [first, second] });
+    return this.#calls.make({ call: "align", args: [sendable(first), sendable(second)] });
   }
 
   async fingerprintStream(rate, options) {

@@ -31,6 +31,7 @@ const CALLS = {
 function run({ call, object, args }) {
   if (object === undefined) return CALLS[call](...args);
   const target = objects.get(object);
+  if (!target && call === "free") return undefined;
   if (!target) throw new KzError("order", "it was freed: create another one");
   if (call === "free") objects.delete(object);
   return target[call](...args);

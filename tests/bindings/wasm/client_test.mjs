@@ -67,6 +67,7 @@ test("a worker's errors are the library's", async () => {
   const builder = await client.trailBuilder(RATE);
   await builder.free();
   await assert.rejects(builder.trail(), { code: "order" });
+  await builder.free();
 });
 
 test("samples are handed over only if wanted", async () => {
@@ -75,6 +76,17 @@ test("samples are handed over only if wanted", async () => {
   assert.equal(kept.length, music.length);
   await client.trail(kept, RATE, { transfer: true });
   assert.equal(kept.length, 0);
+});
+
+test("an array that was handed over is empty", async () => {
+  const gone = music.slice();
+  await client.trail(gone, RATE, { transfer: true });
+  const empty = kz.trail(new Float32Array(0), RATE);
+  assert.deepEqual(await client.trail(gone, RATE, { transfer: true }), empty);
+  assert.deepEqual(await client.trail(gone, RATE), empty);
+  const bytes = new Uint8Array(8);
+  structuredClone(bytes, { transfer: [bytes.buffer] });
+  await assert.rejects(client.readTrail(bytes), { code: "not-readable" });
 });
 
 test("a closed client refuses calls", async () => {
