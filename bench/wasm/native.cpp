@@ -34,6 +34,11 @@ std::vector<float> read_floats(const char* path)
     return samples;
 }
 
+uint32_t number_of(const char* text)
+{
+    return static_cast<uint32_t>(std::strtoul(text, nullptr, 10));
+}
+
 bool make_fingerprint(const Sound& sound)
 {
     kz_stream_settings settings;
@@ -77,8 +82,7 @@ int main(int argc, char** argv)
         std::fputs("usage: native FILE RATE CHANNELS\n", stderr);
         return 2;
     }
-    const Sound sound{read_floats(argv[1]), static_cast<uint32_t>(std::atoi(argv[2])),
-                      static_cast<uint32_t>(std::atoi(argv[3]))};
+    const Sound sound{read_floats(argv[1]), number_of(argv[2]), number_of(argv[3])};
     for (std::string what; std::getline(std::cin, what);) {
         const auto begin = std::chrono::steady_clock::now();
         const bool made = what == "trail" ? make_trail(sound) : make_fingerprint(sound);

@@ -82,6 +82,7 @@ window.listen = async (seconds) => {
   });
   const before = blocks.length;
   await new Promise((resolve) => setTimeout(resolve, seconds * 1000));
+  const beforeStop = blocks.length;
   await microphone.stop();
   const afterStop = blocks.length;
   const builder = kz.trailBuilder(microphone.rate);
@@ -97,6 +98,7 @@ window.listen = async (seconds) => {
     highest,
     levelAfterwards: microphone.level,
     before,
+    lastBlocks: afterStop - beforeStop,
     blocksAfterStop: blocks.length - afterStop,
     longest: Math.max(...blocks.map((block) => block.length)),
     found: found.found,
