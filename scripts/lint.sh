@@ -84,16 +84,6 @@ python_scripts() {
     done
 }
 
-# As modules, which all of them are; the compiler of types reads the package's own in its tests.
-javascript() {
-    find bindings/wasm bench tests -name '*.js' -o -name '*.mjs' | while read -r script; do
-        node --input-type=module --check <"$script" || {
-            echo "in $script" >&2
-            return 1
-        }
-    done
-}
-
 # The package says which types it takes and gives; what the build writes of it has none.
 python_types() {
     python3=$(command -v /usr/bin/python3 || echo python3) # the one that mypy is packaged for
@@ -121,7 +111,6 @@ check JavaScript javascript
 check "shell scripts" shell_scripts
 check "Python scripts" python_scripts
 check "types in Python" python_types
-check JavaScript javascript
 check "man pages" man_pages
 check documents scripts/check_documents.py
 check cppcheck other_analyser

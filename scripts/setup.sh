@@ -32,7 +32,7 @@ packages_of() {
     # The npm package for browsers and Node: its compiler, and that of its types.
     wasm) echo "emscripten nodejs node-typescript" ;;
     # What runs pages in tests, and fetches what checks them. Other Nodes bring their own npm.
-    browser) echo "chromium-headless-shell nodejs $(command -v npm >/dev/null || echo npm)" ;;
+    browser) echo "chromium-headless-shell nodejs $(npm_package)" ;;
     clips) echo "sox libsox-fmt-all espeak-ng ffmpeg" ;; # the demo's music, and the tests' clips
     # Tools that count instructions and print tables, and the peers, each of which may be missing.
     bench) echo "valgrind python3 pkg-config libcli11-dev nlohmann-json3-dev libchromaprint-dev libfftw3-dev libswresample-dev libavutil-dev libsoxr-dev libspeexdsp-dev libpugixml-dev libtinyxml2-dev libxml2-dev" ;;
