@@ -71,7 +71,8 @@ Answer look_up(kzcat_catalogue& catalogue, const kzcat_query& query, const std::
             .left_out = summary.left_out,
             .shards = summary.shards,
             .shards_answered = summary.shards_answered,
-            .line = 0};
+            .line = 0,
+            .by_document = summary.by == KZCAT_BY_DOCUMENT};
 }
 
 const char* sure_text(const FoundTrack& track)

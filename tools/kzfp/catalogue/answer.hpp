@@ -41,7 +41,8 @@ struct Answer {
     uint32_t left_out = 0; ///< tracks that are damaged and were not looked through
     uint32_t shards = 1;   ///< servers that have tracks
     uint32_t shards_answered = 1;
-    size_t line = 0; ///< of the file, which holds a clip on each line; otherwise 0
+    size_t line = 0;          ///< of the file, which holds a clip on each line; otherwise 0
+    bool by_document = false; ///< looked up by 30 values alone
 };
 
 /// How clips are looked up and which of it is shown.

@@ -2,9 +2,8 @@
 
 #include <cmath>
 
-#include "kzfp/catalogue/answer.hpp"
+#include "kzfp/catalogue/answer_object.hpp"
 #include "kzfp/output/csv.hpp"
-#include "kzfp/output/json_object.hpp"
 #include "kzfp/output/printed.hpp"
 
 namespace kzfp {
@@ -109,13 +108,8 @@ std::string csv_rows(const Answer& answer, const std::vector<ClipPart>& parts)
 
 } // namespace
 
-std::string to_json(const Answer& answer, const Lookup& lookup)
+void set_answer(JsonObject& object, const Answer& answer, const Lookup& lookup)
 {
-    JsonObject object = make_object();
-    set_path(object, "file", answer.file);
-    if (answer.line != 0) {
-        object["line"] = answer.line;
-    }
     object["verdict"] = answer.error.empty() ? kzcat_verdict_text(answer.verdict) : "error";
     if (!answer.error.empty()) {
         object["error"] = answer.error;
@@ -138,6 +132,16 @@ std::string to_json(const Answer& answer, const Lookup& lookup)
     if (answer.shards_answered < answer.shards) {
         object["shards"] = {{"answered", answer.shards_answered}, {"of", answer.shards}};
     }
+}
+
+std::string to_json(const Answer& answer, const Lookup& lookup)
+{
+    JsonObject object = make_object();
+    set_path(object, "file", answer.file);
+    if (answer.line != 0) {
+        object["line"] = answer.line;
+    }
+    set_answer(object, answer, lookup);
     return to_line(object);
 }
 

@@ -44,6 +44,7 @@ double feed(audio::Source& source, const Begin& begin)
 struct Fed {
     std::vector<audio::Tag> tags;
     std::string warning;
+    double seconds = 0;
 };
 
 std::string damaged_after(double seconds, const std::string& trouble)
@@ -61,12 +62,13 @@ Fed fed(const audio::OpenedInput& opened, double seconds, bool strict)
         throw audio::FileError(damaged_after(seconds, trouble));
     }
     if (trouble.empty()) {
-        return {.tags = opened.facts.tags, .warning = {}};
+        return {.tags = opened.facts.tags, .warning = {}, .seconds = seconds};
     }
     return {.tags = opened.facts.tags,
             .warning = opened.source->went_on()
                            ? "is damaged (" + trouble + "); the rest was used"
-                           : damaged_after(seconds, trouble) + "; what comes before was used"};
+                           : damaged_after(seconds, trouble) + "; what comes before was used",
+            .seconds = seconds};
 }
 
 /// Feeds a sound file. A pipe is copied to its end first, or as far as the section reaches.
@@ -166,7 +168,8 @@ uint32_t to_stream_format(audio::Encoding encoding)
     return KZ_STREAM_FORMAT_PCM16;
 }
 
-Recording read_recording(const std::string& path, const SoundOptions& options, bool documents)
+Recording read_recording(const std::string& path, const SoundOptions& options, bool documents,
+                         const std::string& name)
 {
     Recording recording;
     if (content_of(path, options) == Content::trail) {
@@ -185,10 +188,11 @@ Recording read_recording(const std::string& path, const SoundOptions& options, b
         Fed result = feed_file(path, options, begin);
         recording.tags = std::move(result.tags);
         recording.warning = std::move(result.warning);
+        recording.seconds = result.seconds;
         recording.trail = made<Trail>(kzcat_builder_finish, builder.get());
     }
     check_length(recording.trail);
-    add_title(recording.tags, path);
+    add_title(recording.tags, name.empty() ? path : name);
     return recording;
 }
 
@@ -201,7 +205,9 @@ Clip read_sound_clip(const std::string& path, const SoundOptions& options)
             check(kzcat_query_feed(clip.query.get(), bytes.data(), bytes.size()));
         };
     };
-    clip.warning = feed_file(path, options, begin).warning;
+    Fed result = feed_file(path, options, begin);
+    clip.warning = std::move(result.warning);
+    clip.seconds = result.seconds;
     check(kzcat_query_finish(clip.query.get()));
     return clip;
 }

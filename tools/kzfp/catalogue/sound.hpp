@@ -24,16 +24,20 @@ struct Recording {
     Trail trail;
     std::vector<audio::Tag> tags; ///< the title at least
     std::string warning;          ///< what was wrong with the file; empty when nothing was
+    double seconds = 0;           ///< of sound that were read; 0 for a trail file
 };
 
 /// Reads a sound file, or a trail file (.kzt), to its end or that of the section. `documents`: it
-/// is to answer query documents too. Throws audio::FileError and CatalogueError.
-Recording read_recording(const std::string& path, const SoundOptions& options, bool documents);
+/// is to answer query documents too. Where the sound has no title it is that of `name`, which is the
+/// path unless another is given. Throws audio::FileError and CatalogueError.
+Recording read_recording(const std::string& path, const SoundOptions& options, bool documents,
+                         const std::string& name = {});
 
 /// A clip as it is looked up.
 struct Clip {
     Query query;
     std::string warning;
+    double seconds = 0; ///< of sound that were read; 0 for a trail or a document
 };
 
 /// Reads a sound file, a trail file or a query document. Throws as read_recording() does.

@@ -19,6 +19,7 @@ ExitStatus run_match(const Arguments& arguments);
 ExitStatus run_compare(const Arguments& arguments);
 ExitStatus run_duplicates(const Arguments& arguments);
 ExitStatus run_monitor(const Arguments& arguments);
+ExitStatus run_serve(const Arguments& arguments);
 ExitStatus run_evaluate(const Arguments& arguments);
 ExitStatus run_list(const Arguments& arguments);
 ExitStatus run_remove(const Arguments& arguments);
@@ -42,6 +43,7 @@ constexpr Command kCommands[] = {
     {"duplicates", "Finds files that hold the same recording, and the best of them",
      run_duplicates},
     {"monitor", "Prints what runs on a stream, from when to when", run_monitor},
+    {"serve", "Answers over HTTP what clips are, with a page that listens", run_serve},
     {"evaluate", "Measures how well clips of your own music are recognised", run_evaluate},
     {"add", "Adds sound files to a catalogue", run_add, Purpose::catalogues},
     {"list", "Lists the tracks of a catalogue", run_list, Purpose::catalogues},

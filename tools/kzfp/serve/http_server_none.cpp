@@ -1,0 +1,30 @@
+// Stands for the HTTP server in a build without libmicrohttpd.
+
+#include "audio/source.hpp"
+#include "kzfp/serve/http_server.hpp"
+
+namespace kzfp::serve {
+
+class HttpServer::Inside {};
+
+bool has_http() { return false; }
+
+HttpServer::HttpServer(const HttpSettings& /*settings*/, Receiver& /*receiver*/)
+{
+    throw audio::FileError("this build has no service; install libmicrohttpd (Debian: "
+                           "libmicrohttpd-dev) and build again with -DKZ_SERVICE=ON");
+}
+
+HttpServer::~HttpServer() = default;
+
+void HttpServer::resume(Exchange& /*exchange*/) {}
+
+void HttpServer::stop_accepting() {}
+
+size_t HttpServer::connections() const { return 0; }
+
+size_t HttpServer::exchanges() const { return 0; }
+
+void HttpServer::close_slow_ones() {}
+
+} // namespace kzfp::serve
