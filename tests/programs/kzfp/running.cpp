@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <csignal>
+#include <cstdlib>
 #include <filesystem>
 #include <system_error>
 #include <thread>
@@ -18,12 +19,31 @@ namespace {
 
 constexpr uid_t kNobody = 65534;
 
+constexpr int kFirstHandedOver = 3;
+
+void set_environment(const RunningSetup& setup)
+{
+    for (const std::string& variable : setup.environment) {
+        const size_t equals = variable.find('=');
+        setenv(variable.substr(0, equals).c_str(), variable.c_str() + equals + 1, 1);
+    }
+    if (setup.handed_over >= 0) {
+        if (setup.handed_over == kFirstHandedOver) {
+            fcntl(kFirstHandedOver, F_SETFD, 0);
+        }
+        dup2(setup.handed_over, kFirstHandedOver);
+        setenv("LISTEN_FDS", "1", 1);
+        setenv("LISTEN_PID", std::to_string(getpid()).c_str(), 1);
+    }
+}
+
 [[noreturn]] void start(std::vector<std::string> arguments, const std::string& out,
                         const std::string& err, const RunningSetup& setup)
 {
     if (setup.input >= 0) {
         dup2(setup.input, STDIN_FILENO);
     }
+    set_environment(setup);
     dup2(open(out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0666), STDOUT_FILENO);
     dup2(open(err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0666), STDERR_FILENO);
     if (setup.without_rights && geteuid() == 0 && setuid(kNobody) != 0) {

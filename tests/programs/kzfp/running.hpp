@@ -14,6 +14,10 @@ struct RunningSetup {
     bool without_rights = false;
     /// A descriptor for standard input; -1 for that of the test.
     int input = -1;
+    /// A socket that is handed over as systemd does it, as descriptor 3; -1 for none.
+    int handed_over = -1;
+    /// "NAME=value", added to the environment.
+    std::vector<std::string> environment = {};
 };
 
 /// Its two outputs go to files. Killed at the end when it still runs.

@@ -34,23 +34,28 @@ constexpr const char* kWorth =
                   "kzfp --format values prints");
 }
 
+constexpr int64_t kNone = std::numeric_limits<int64_t>::max();
+
 int16_t value_of(const nlohmann::json& number)
 {
     using Limits = std::numeric_limits<int16_t>;
-    if (!number.is_number_integer() || number < Limits::min() || number > Limits::max()) {
+    const bool is_large = number.is_number_unsigned() && number.get<uint64_t>() > Limits::max();
+    const int64_t value = number.is_number_integer() && !is_large ? number.get<int64_t>() : kNone;
+    if (value < Limits::min() || value > Limits::max()) {
         refuse_values("a value is no whole number of 16 bits");
     }
-    return number.get<int16_t>();
+    return static_cast<int16_t>(value);
 }
 
 /// The library's refusal of a body is the client's to mend.
 template <class Make>
-auto made_from_body(const char* code, Make make)
+auto made_from_body(const char* code, const char* cure, Make make)
 {
     try {
         return make();
     } catch (const CatalogueError& error) {
-        refuse(400, code, error.what());
+        const std::string text = error.what();
+        refuse(400, code, text.substr(0, text.find_last_not_of('.') + 1) + "; " + cure);
     }
 }
 
@@ -82,16 +87,17 @@ Query query_of(BodyKind kind, std::string& body, std::string& warning)
                            static_cast<const kzcat_trail*>(trail.get()));
     }
     case BodyKind::document:
-        return made_from_body("bad_document", [&body] {
+        return made_from_body("bad_document", "send one as kzfp prints it", [&body] {
             return made<Query>(kzcat_query_create_from_document, body.data(),
                                uint64_t{body.size()});
         });
     case BodyKind::values: {
         const std::vector<int16_t> values = values_of(body);
-        return made_from_body("bad_values", [&values] {
-            return made<Query>(kzcat_query_create_from_values, values.data(),
-                               static_cast<uint32_t>(values.size()));
-        });
+        return made_from_body("bad_values", "send those that kzfp --format values prints",
+                              [&values] {
+                                  return made<Query>(kzcat_query_create_from_values, values.data(),
+                                                     static_cast<uint32_t>(values.size()));
+                              });
     }
     default:
         return query_of_sound(body, warning);
@@ -199,7 +205,7 @@ void refuse_sound(const std::string& why)
 
 Trail trail_of(std::string_view bytes)
 {
-    return made_from_body("bad_trail", [bytes] {
+    return made_from_body("bad_trail", "send all bytes of a .kzt file", [bytes] {
         return made<Trail>(kzcat_trail_read, static_cast<const void*>(bytes.data()),
                            uint64_t{bytes.size()});
     });

@@ -4,8 +4,9 @@
 
 #include <algorithm>
 #include <cmath>
-#include <limits>
+#include <filesystem>
 
+#include "audio/source.hpp"
 #include "kzfp/catalogue/sound.hpp"
 #include "kzfp/catalogue/tracks.hpp"
 #include "kzfp/output/json_object.hpp"
@@ -82,6 +83,8 @@ Recording recording_of(const Plan& plan, std::string& body)
     if (plan.body == BodyKind::trail) {
         Recording recording;
         recording.trail = trail_of(body);
+        const std::string name = std::filesystem::path(plan.source).stem().string();
+        recording.tags.push_back({.name = "title", .value = audio::to_utf8(name)});
         return recording;
     }
     try {
