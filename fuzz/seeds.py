@@ -12,7 +12,7 @@ import sys
 TARGETS = (
     "extraction stream tags paths render exchange resampler_fixed resampler_float converters dyn_buf "
     "disc_names disc_files documents trail_file trails index_file catalogue_file kzfp_options "
-    "kzfp_files"
+    "kzfp_files requests"
 ).split()
 
 
@@ -140,6 +140,25 @@ def kzfp_files():
                 seed.number(0, 0, 6).number(0, 0, 7).number(0, 0, 7).number(1, 0, 9)
                 seed.number(0, 0, 6).number(0, 0, 3).number(0, 0, 3)
             yield seed.text(b"").all()
+
+
+def requests():
+    """Each known target with each method, with a token and a type; and bodies of 30 values."""
+    values = b'{"values": [' + b", ".join(b"%d" % (31 * i - 500) for i in range(30)) + b"]}"
+    for method in range(6):
+        for target in range(14):
+            seed = Seed().flag(True).flag(True).flag(True).flag(method % 2)
+            if method % 2:
+                seed.flag(False)
+            seed.number(0, 0, 3).number(method, 0, 5).number(0, 0, 2)
+            seed.number(0, 0, 3).number(target, 0, 13).number(0, 0, 2)
+            seed.number(2, 0, 6)
+            for name, value in ((1, 3), (2, 4)):
+                seed.number(0, 0, 3).number(name, 0, 8).number(0, 0, 2)
+                seed.number(0, 0, 3).number(value, 0, 12).number(0, 0, 2)
+            seed.number(0, 0, 2)
+            seed.front += values
+            yield seed.all()
 
 
 def at_random(target):

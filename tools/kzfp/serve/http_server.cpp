@@ -81,7 +81,7 @@ public:
         start();
     }
 
-    ~Inside() { http_.MHD_stop_daemon(daemon_); }
+    ~Inside() { stop(); }
     Inside(const Inside&) = delete;
     Inside& operator=(const Inside&) = delete;
 
@@ -91,6 +91,13 @@ public:
     }
 
     void stop_accepting();
+
+    void stop()
+    {
+        if (daemon_ != nullptr) {
+            http_.MHD_stop_daemon(std::exchange(daemon_, nullptr));
+        }
+    }
 
     size_t connections() const { return connections_.count(); }
     size_t exchanges() const { return exchanges_.load(); }
@@ -400,6 +407,8 @@ HttpServer::HttpServer(const HttpSettings& settings, Receiver& receiver)
 HttpServer::~HttpServer() = default;
 
 void HttpServer::resume(Exchange& exchange) { inside_->resume(exchange); }
+
+void HttpServer::stop() { inside_->stop(); }
 
 void HttpServer::stop_accepting() { inside_->stop_accepting(); }
 

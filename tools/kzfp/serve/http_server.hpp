@@ -19,9 +19,9 @@ struct HttpSettings {
     uint32_t per_address = 0;       ///< of these from one address; 0 for no limit
     uint32_t idle_seconds = 15;     ///< a connection on which nothing moves for so long is closed
     uint32_t receive_seconds = 120; ///< a request has to have arrived within these
-    uint64_t body_bytes = 256U << 20U; ///< of all requests that are being received or worked on
-    std::string certificate;           ///< PEM; empty for no TLS
-    std::string key;                   ///< PEM
+    uint64_t body_bytes = uint64_t{256} << 20U; ///< of all requests that are received or wait
+    std::string certificate;                    ///< PEM; empty for no TLS
+    std::string key;                            ///< PEM
 };
 
 /// Whether this build has an HTTP server.
@@ -33,7 +33,6 @@ public:
     /// Begins to serve. `receiver` outlives the object. Throws audio::FileError.
     HttpServer(const HttpSettings& settings, Receiver& receiver);
 
-    /// Ends all connections. No exchange may be in the receiver's hands.
     ~HttpServer();
     HttpServer(const HttpServer&) = delete;
     HttpServer& operator=(const HttpServer&) = delete;
@@ -44,6 +43,10 @@ public:
     /// From now on connections end with their answers, and none are accepted but those that were
     /// made before.
     void stop_accepting();
+
+    /// Ends all connections and threads. No exchange may be in the receiver's hands. The
+    /// destructor does the same.
+    void stop();
 
     /// Connections that are open.
     size_t connections() const;

@@ -19,6 +19,8 @@ HttpServer::~HttpServer() = default;
 
 void HttpServer::resume(Exchange& /*exchange*/) {}
 
+void HttpServer::stop() {}
+
 void HttpServer::stop_accepting() {}
 
 size_t HttpServer::connections() const { return 0; }

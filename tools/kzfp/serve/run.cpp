@@ -2,6 +2,7 @@
 
 #include "kzfp/serve/run.hpp"
 
+#include <algorithm>
 #include <csignal>
 #include <ctime>
 #include <utility>
@@ -107,6 +108,7 @@ ServiceSettings service_settings(const RunSettings& settings, const Listener& li
     wanted.http.listener = listener.socket.number();
     wanted.http.is_shared = listener.is_handed_over;
     wanted.http.per_address = settings.per_address.value_or(listener.is_local ? 0 : kPerAddress);
+    wanted.http.body_bytes = std::max(wanted.http.body_bytes, 2 * wanted.rules.largest_body);
     wanted.http.certificate = pem_of(settings.certificate_file);
     wanted.http.key = pem_of(settings.key_file);
     wanted.page = page_of(settings);

@@ -214,6 +214,7 @@ Reply Service::answer_at_once(const Exchange& exchange) const
     case Task::options:
         return options();
     case Task::metrics: {
+        served_.wait(); // the first request can be faster than the constructor
         const Catalogues::Facts facts = catalogue_.facts();
         return {.status = 200,
                 .type = "text/plain; version=0.0.4; charset=utf-8",
@@ -305,7 +306,7 @@ void Service::finish(Exchange& exchange)
 {
     std::string().swap(exchange.body);
     add_headers(exchange, settings_.rules.access);
-    served_.wait(); // the first request can be faster than the constructor
+    served_.wait();
     server_->resume(exchange);
 }
 
@@ -345,7 +346,7 @@ void Service::drain(uint32_t seconds)
         }
     }
     wait_for_quiet(Clock::now() + kLastAnswers);
-    server_.reset();
+    server_->stop();
 }
 
 void Service::wait_for_quiet(Clock::time_point end) const
