@@ -1,8 +1,6 @@
 // Runs in the audio thread of a page: collects what a microphone gives as one channel, and hands it
 // over in blocks, each with its level. microphone.js loads it.
 
-/* global AudioWorkletProcessor, registerProcessor */
-
 const BLOCK_FRAMES = 4096; // 85 ms at 48000 Hz: few messages, and a meter that still moves
 
 /** The mean of all channels, added to `target` from `position` on. */
