@@ -44,6 +44,16 @@ async function openStream(deviceId) {
   }
 }
 
+/** At the microphone's own rate where it is known: not every browser converts rates here. */
+function contextFor(track) {
+  const { sampleRate } = track.getSettings();
+  try {
+    return new AudioContext(sampleRate ? { sampleRate } : {});
+  } catch {
+    return new AudioContext();
+  }
+}
+
 async function loadWorklet(context, url) {
   try {
     await context.audioWorklet.addModule(url);
@@ -60,9 +70,8 @@ class Microphone {
   #stopped;
   #level = 0;
 
-  constructor(stream, context) {
+  constructor(stream) {
     this.#stream = stream;
-    this.#context = context;
   }
 
   get rate() {
@@ -78,6 +87,7 @@ class Microphone {
   }
 
   async start({ onSamples, onEnded, workletUrl }) {
+    this.#context = contextFor(this.#stream.getAudioTracks()[0]);
     await loadWorklet(this.#context, workletUrl ?? new URL("./worklet.js", import.meta.url));
     // Made long after the user's click it may be waiting; nobody is to wait for it here.
     this.#context.resume().catch(() => {});
@@ -87,9 +97,9 @@ class Microphone {
       this.#level = data.level;
       onSamples(data.samples);
     };
-    this.#stream.getAudioTracks()[0].addEventListener("ended", () => {
+    this.#stream.getAudioTracks()[0].addEventListener("ended", async () => {
       if (this.#stopped) return;
-      this.stop();
+      await this.stop();
       onEnded?.(new KzError("no-microphone", "the microphone has gone: connect it, and try again"));
     });
     this.#context.createMediaStreamSource(this.#stream).connect(this.#node);
@@ -106,7 +116,7 @@ class Microphone {
     if (this.#node && this.#context.state === "running") await this.#lastBlock();
     this.#level = 0;
     this.#stream.getTracks().forEach((track) => track.stop());
-    await this.#context.close();
+    await this.#context?.close();
   }
 
   #lastBlock() {
@@ -130,12 +140,12 @@ export async function openMicrophone({ onSamples, onEnded, deviceId, workletUrl 
   }
   checkSupport();
   const stream = await openStream(deviceId);
-  const microphone = new Microphone(stream, new AudioContext());
+  const microphone = new Microphone(stream);
   try {
     await microphone.start({ onSamples, onEnded, workletUrl });
   } catch (error) {
     await microphone.stop();
-    throw error;
+    throw error instanceof KzError ? error : refusalOf(error);
   }
   return microphone;
 }

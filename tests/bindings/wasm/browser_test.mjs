@@ -127,6 +127,15 @@ test("a microphone gives the sound that plays", async () => {
   });
 });
 
+test("a microphone that goes is let go", async () => {
+  const file = join(folder, "going.wav");
+  writeWav(file, melody(44100, 1, 5), 44100);
+  await inBrowser(microphoneFlags(file), async (page) => {
+    const ended = await page.evaluate("disconnect()");
+    assert.deepEqual(ended, { code: "no-microphone", state: "ended" });
+  });
+});
+
 test("microphones that cannot be had are named", async () => {
   const codeWith = (flags, options) =>
     inBrowser(flags, (page) =>

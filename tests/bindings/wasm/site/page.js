@@ -106,6 +106,21 @@ window.listen = async (seconds) => {
   };
 };
 
+/** What is told when the microphone's sound ends, as it does when that is disconnected. */
+window.disconnect = async () => {
+  const devices = navigator.mediaDevices;
+  const getUserMedia = devices.getUserMedia.bind(devices);
+  let stream;
+  devices.getUserMedia = async (wanted) => (stream = await getUserMedia(wanted));
+  const error = await new Promise((resolve, reject) => {
+    openMicrophone({ onSamples: () => {}, onEnded: resolve }).then(() => {
+      stream.getAudioTracks()[0].dispatchEvent(new Event("ended"));
+    }, reject);
+  });
+  devices.getUserMedia = getUserMedia;
+  return { code: error.code, state: stream.getAudioTracks()[0].readyState };
+};
+
 window.microphoneCode = (options = {}) =>
   openMicrophone({ onSamples: () => {}, ...options }).then(
     async (microphone) => {
