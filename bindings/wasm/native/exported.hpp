@@ -4,8 +4,8 @@
 
 #include <cstdint>
 
-/// Marks a function that JavaScript calls, by its name. Numbers of 64 bits would need BigInts there:
-/// sizes have 32 bits, as addresses have. Compilers for processors only check these files.
+/// Marks a function that JavaScript calls, by its name. Numbers of 64 bits would need BigInts
+/// there: sizes have 32 bits, as addresses have. Compilers for processors only check these files.
 #if defined(__wasm__)
 #define KZ_EXPORTED(name) extern "C" __attribute__((export_name(#name), used))
 #else
