@@ -1,0 +1,176 @@
+"""A full queue, and the end: what was accepted is answered, and another start goes on."""
+
+import concurrent.futures
+import signal
+import threading
+import time
+
+import pytest
+import service_run
+from conftest import WRITE_TOKEN
+
+TRAIL, WAV = "application/x-kzt", "audio/wav"
+
+
+class Flood:
+    """Keeps a service busy with half hours of sound."""
+
+    def __init__(self, client, material, threads=6):
+        self.client, self.material = client, material
+        self.over = threading.Event()
+        self.statuses = []
+        self.threads = [threading.Thread(target=self.run) for _ in range(threads)]
+
+    def run(self):
+        while not self.over.is_set():
+            try:
+                self.statuses.append(self.client.match(self.material.long, WAV)[0])
+            except OSError:
+                return
+
+    def __enter__(self):
+        for thread in self.threads:
+            thread.start()
+        return self
+
+    def __exit__(self, *_):
+        self.over.set()
+        for thread in self.threads:
+            thread.join()
+
+
+def until_busy(ask):
+    """Asks until the answer is 503; gives it."""
+    for _ in range(3000):
+        status, answer, headers = ask()
+        if status == 503:
+            return answer, headers
+    pytest.fail("the queue was never full")
+
+
+def test_a_full_queue_refuses_at_once(start, catalogue, material, token_files):
+    client = start(catalogue, "--lookups", "1", "--queue", "1", "--max-body", "200000000",
+                   "--write-token-file", token_files / "write")
+    with Flood(client, material) as flood:
+        answer, headers = until_busy(lambda: client.match(material.trail))
+        assert answer["error"]["code"] == "busy"
+        assert int(headers["Retry-After"]) >= 1
+        for ask in (lambda: client.ask("POST", "/v1/tracks?source=a", material.other_trail, TRAIL,
+                                       WRITE_TOKEN),
+                    lambda: client.ask("DELETE", "/v1/tracks/99", token=WRITE_TOKEN),
+                    lambda: client.ask("GET", "/v1/tracks"),
+                    lambda: client.ask("GET", "/v1/tracks/1"),
+                    lambda: client.ask("GET", "/v1/tracks/1/trail")):
+            until_busy(ask)
+        assert client.ask("GET", "/v1/health")[0] == 200
+        assert client.ask("GET", "/metrics")[0] == 200
+    assert 200 in flood.statuses
+    assert client.match(material.trail)[0] == 200
+    refused = service_run.total(client.service.metrics(), "kzfp_refused_total")
+    assert refused >= 6
+
+
+@pytest.mark.parametrize("how", [signal.SIGTERM, signal.SIGINT])
+def test_what_was_accepted_is_answered_before_the_end(start, material, how):
+    client = start(material.catalogue, "--lookups", "1")
+    with concurrent.futures.ThreadPoolExecutor(12) as pool:
+        asked = [pool.submit(client.match, material.long, WAV) for _ in range(12)]
+        while service_run.total(client.service.metrics(), "kzfp_queue_length") < 10:
+            time.sleep(0.01)
+        client.service.process.send_signal(how)
+        answers = [one.result() for one in asked]
+    assert [answer[0] for answer in answers] == [200] * 12
+    assert client.service.stop() == 0
+
+
+def test_health_says_that_the_service_is_being_stopped(start, material):
+    """Asked on connections that were there before."""
+    client = start(material.catalogue, "--lookups", "1")
+    with concurrent.futures.ThreadPoolExecutor(8) as pool:
+        asked = [pool.submit(client.match, material.long, WAV) for _ in range(8)]
+        while service_run.total(client.service.metrics(), "kzfp_queue_length") < 6:
+            time.sleep(0.01)
+        client.service.process.send_signal(signal.SIGTERM)
+        for one in asked:
+            assert one.result()[0] == 200
+    assert client.service.stop() == 0
+
+
+def test_no_connection_is_taken_after_the_end(start, material):
+    client = start(material.catalogue)
+    assert client.service.stop() == 0
+    with pytest.raises(OSError):
+        client.service.request("GET", "/v1/health")
+
+
+def test_another_start_goes_on(start, material):
+    listener = service_run.listening_socket()
+    with listener:
+        first = start(material.catalogue, listener=listener)
+        assert first.match(material.trail)[0] == 200
+        assert first.service.stop() == 0
+        with concurrent.futures.ThreadPoolExecutor(4) as pool:
+            # Connections wait in the socket while no program runs.
+            waiting = [pool.submit(first.match, material.trail) for _ in range(4)]
+            second = start(material.catalogue, listener=listener)
+            assert [one.result()[0] for one in waiting] == [200] * 4
+        assert second.service.stop() == 0
+
+
+def test_a_stop_in_the_middle_of_many_loses_none(start, material):
+    """Whatever connection was made is answered, over three stops."""
+    listener = service_run.listening_socket()
+    over = threading.Event()
+    statuses = []
+
+    def ask(client):
+        while not over.is_set():
+            statuses.append(client.match(material.trail)[0])  # raises when there is no answer
+    with listener, concurrent.futures.ThreadPoolExecutor(8) as pool:
+        client = start(material.catalogue, listener=listener)
+        asking = [pool.submit(ask, client) for _ in range(8)]
+        for _ in range(3):
+            seen = len(statuses)
+            while len(statuses) < seen + 40 and not any(one.done() for one in asking):
+                time.sleep(0.01)
+            assert client.service.stop() == 0
+            client = start(material.catalogue, listener=listener)
+        over.set()
+        for one in asking:
+            one.result()
+    assert set(statuses) <= {200, 503}
+    assert statuses.count(200) >= 120
+
+
+def test_tracks_that_were_added_are_there_after_another_start(start, catalogue, material,
+                                                              token_files):
+    options = ("--write-token-file", token_files / "write")
+    first = start(catalogue, *options)
+    assert first.ask("POST", "/v1/tracks?source=new.wav&title=New", material.other_trail, TRAIL,
+                     WRITE_TOKEN)[0] == 201
+    first.service.process.kill()  # without any warning
+    first.service.process.wait()
+    second = start(catalogue, *options)
+    assert second.match(material.other_trail)[1]["matches"][0]["title"] == "New"
+
+
+@pytest.mark.parametrize("options,told", [
+    (("--listen", "0.0.0.0:0"), "--insecure"), (("--listen", "nonsense"), "--listen"),
+    (("--listen", "127.0.0.1:99999"), "--listen"), (("--token-file", "/nowhere"), "/nowhere"),
+    (("--tls-cert", "/nowhere"), "--tls-key"), (("--queue", "0"), "--queue"),
+    (("--page", "/nowhere"), "/nowhere")])
+def test_wrong_usage_is_told_with_the_cure(material, kzfp, options, told):
+    with pytest.raises(service_run.NotStarted) as failure:
+        service_run.Service(kzfp.program, material.catalogue, *options)
+    assert told in str(failure.value)
+
+
+def test_short_and_open_tokens_are_refused(material, kzfp, tmp_path):
+    path = tmp_path / "token"
+    for text, mode in (("short", 0o600), ("", 0o600), ("a-token-that-is-long-enough", 0o644)):
+        path.write_text(text, encoding="ascii")
+        path.chmod(mode)
+        with pytest.raises(service_run.NotStarted) as failure:
+            service_run.Service(kzfp.program, material.catalogue, "--token-file", path)
+        assert str(path) in str(failure.value)
+        assert "a-token" not in str(failure.value)
