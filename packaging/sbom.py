@@ -24,6 +24,7 @@ LICENCES = {
     "libc6": "LGPL-2.1-or-later",
     "libgcc-s1": "GPL-3.0-or-later WITH GCC-exception-3.1",
     "libstdc++6": "GPL-3.0-or-later WITH GCC-exception-3.1",
+    "libmicrohttpd12": "LGPL-2.1-or-later",
     "libnettle8": "LGPL-3.0-or-later OR GPL-2.0-or-later",
     "libsndfile1": "LGPL-2.1-or-later",
     "libsqlite3-0": "blessing",

@@ -1,8 +1,9 @@
 #!/bin/sh
 # Installs what is missing to build and test the library on Debian 12.
 #
-#   scripts/setup.sh [build] [catalogue] [postgresql] [java] [python] [tools] [test] [clips] [bench]
-#                    [lint] [clang] [fuzz] [wasm] [browser] [coverage] [arch] [debian] [wide]
+#   scripts/setup.sh [build] [catalogue] [postgresql] [java] [python] [tools] [service] [test]
+#                    [clips] [bench] [lint] [clang] [fuzz] [wasm] [browser] [coverage] [arch]
+#                    [debian] [wide]
 #                                 default: all of them but the last four
 #
 # Needs root, or sudo. Installs only what is missing and does nothing when nothing is.
@@ -23,6 +24,8 @@ packages_of() {
     postgresql) echo "libpq-dev postgresql-15 postgresql-client-15 postgresql-server-dev-15" ;;
     # FFmpeg's libraries read what libsndfile does not, PortAudio listens to microphones.
     tools) echo "pkg-config libsndfile1-dev libsoxr-dev libcli11-dev nlohmann-json3-dev libavformat-dev libavcodec-dev portaudio19-dev libpng-dev" ;;
+    # kzfp serve; what asks it, stands before it and loads it; what reads its description.
+    service) echo "libmicrohttpd-dev curl wrk openssl nginx-light python3-pytest python3-yaml python3-jsonschema python3-numpy" ;;
     test) echo "libgtest-dev libgmock-dev pkg-config binutils genisoimage udftools xorriso python3 zsh fish libexpat1-dev libpng-dev chromium-headless-shell" ;;
     # The Java front and its tests; Android's log and threads as a desktop has them, its resources.
     java) echo "default-jdk-headless junit4 android-liblog-dev android-libutils-dev proguard-cli aapt android-framework-res" ;;
@@ -58,7 +61,7 @@ installed() {
     [ "$(dpkg-query -W -f '${db:Status-Status}' "$1" 2>/dev/null || true)" = installed ]
 }
 
-[ $# -gt 0 ] || set -- build catalogue postgresql java python tools test clips bench lint clang fuzz wasm browser
+[ $# -gt 0 ] || set -- build catalogue postgresql java python tools service test clips bench lint clang fuzz wasm browser
 
 wanted=
 for group in "$@"; do
