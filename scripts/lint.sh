@@ -79,7 +79,8 @@ shell_scripts() {
 
 python_scripts() {
     for script in bench/*.py bindings/python/*.py bindings/python/kzsdk/*.py evaluation/*.py examples/python/*.py \
-        fuzz/*.py packaging/*.py scripts/*.py tests/bindings/python/*.py bench/service/*.py tests/programs/serve_api/*.py; do
+        fuzz/*.py packaging/*.py scripts/*.py tests/bindings/python/*.py bench/service/*.py \
+        tests/programs/serve_api/*.py; do
         python3 -c 'import ast, sys; ast.parse(open(sys.argv[1]).read(), sys.argv[1])' "$script" || return 1
     done
 }
