@@ -258,7 +258,8 @@ class Run:
         status = service.stop(timeout=120)
         print(f"stopped in {time.monotonic() - begin:.2f} s with status {status}", flush=True)
         self.good &= status == 0
-        self.logged += sum(line.startswith("{") and '"status"' in line for line in service.errors)
+        self.logged += sum('"status":' in line and '"status":null' not in line
+                           for line in service.errors)
 
     def start_clients(self, service):
         learn(service, self.cases)
