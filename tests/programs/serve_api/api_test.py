@@ -32,8 +32,10 @@ def test_a_trail_is_named_with_its_place(open_service, material):
 def test_sound_is_named_as_its_trail_is(open_service, material):
     _, by_trail, _ = open_service.match(material.trail)
     status, by_sound, _ = open_service.match(material.clip, WAV)
-    assert status == 200
-    assert by_sound["matches"] == by_trail["matches"]
+    assert (status, best(by_sound)) == (200, best(by_trail))
+    # Sound is read at more places, so that its trail lies closer to the track's.
+    assert by_sound["matches"][0]["offset"] == pytest.approx(20, abs=0.02)
+    assert by_sound["matches"][0]["score"] > by_trail["matches"][0]["score"]
 
 
 @pytest.mark.parametrize("kind", [XML, "text/xml"])
@@ -142,6 +144,8 @@ def test_a_track_has_facts_and_a_trail(open_service, material, kzfp):
         assert open_service.ask("GET", path)[0] == 404
     for path in ("/v1/tracks/x", "/v1/tracks/0", "/v1/tracks/99999999999999999999/trail"):
         assert open_service.ask("GET", path)[0] in (400, 404), path
+    for path in ("/v1/tracks/1?no=1", "/v1/tracks/1/trail?no=1"):
+        assert open_service.ask("GET", path)[0] == 400, path
 
 
 @pytest.fixture()
@@ -307,7 +311,7 @@ def test_preflights_are_answered_to_allowed_origins(start, material, described):
         assert (status, headers["Access-Control-Allow-Origin"]) == (204, origin), template
         asked["Origin"] = "https://other.example"
         status, _, headers = client.ask("OPTIONS", template.replace("{track}", "1"), headers=asked)
-        assert (status, headers["Access-Control-Allow-Origin"]) == (204, None), template
+        assert (status, headers["Access-Control-Allow-Origin"]) == (403, None), template
     status, _, headers = client.match(material.trail, headers={"Origin": origin})
     assert (status, headers["Access-Control-Allow-Origin"]) == (200, origin)
 

@@ -72,7 +72,7 @@ class Description:
             header = self.resolved(header)
             assert headers[name] is not None or not header.get("required"), f"{where}: no {name}"
             if headers[name] is not None:
-                jsonschema.validate(headers[name], header["schema"])
+                fits(headers[name], header["schema"], f"{where}, {name}")
         if method == "HEAD" or status in (204, 304):
             assert body == b"", where
             return None
@@ -82,5 +82,12 @@ class Description:
         if kind != "application/json":
             return body
         value = json.loads(body)
-        jsonschema.validate(value, self.schema(kinds[kind]["schema"]))
+        fits(value, self.schema(kinds[kind]["schema"]), where)
         return value
+
+
+def fits(value, schema, where):
+    """Fails with a sentence when a value is not as its schema says."""
+    complaints = list(jsonschema.Draft7Validator(schema).iter_errors(value))
+    assert not complaints, f"{where}: " + "; ".join(
+        f"{list(complaint.path)}: {complaint.message}" for complaint in complaints)

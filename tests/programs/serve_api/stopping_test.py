@@ -1,6 +1,7 @@
 """A full queue, and the end: what was accepted is answered, and another start goes on."""
 
 import concurrent.futures
+import http.client
 import signal
 import threading
 import time
@@ -19,14 +20,14 @@ class Flood:
         self.client, self.material = client, material
         self.over = threading.Event()
         self.statuses = []
-        self.threads = [threading.Thread(target=self.run) for _ in range(threads)]
+        self.threads = [threading.Thread(target=self.run, args=(path, token))
+                        for path, token in (("/v1/match", None),
+                                            ("/v1/tracks?source=long", WRITE_TOKEN))
+                        for _ in range(threads)]
 
-    def run(self):
+    def run(self, path, token):
         while not self.over.is_set():
-            try:
-                self.statuses.append(self.client.match(self.material.long, WAV)[0])
-            except OSError:
-                return
+            self.statuses.append(self.client.ask("POST", path, self.material.long, WAV, token)[0])
 
     def __enter__(self):
         for thread in self.threads:
@@ -53,7 +54,7 @@ def test_a_full_queue_refuses_at_once(start, catalogue, material, token_files):
                    "--write-token-file", token_files / "write")
     with Flood(client, material) as flood:
         answer, headers = until_busy(lambda: client.match(material.trail))
-        assert answer["error"]["code"] == "busy"
+        assert answer["error"]["code"] == "queue_full"
         assert int(headers["Retry-After"]) >= 1
         for ask in (lambda: client.ask("POST", "/v1/tracks?source=a", material.other_trail, TRAIL,
                                        WRITE_TOKEN),
@@ -83,16 +84,25 @@ def test_what_was_accepted_is_answered_before_the_end(start, material, how):
     assert client.service.stop() == 0
 
 
-def test_health_says_that_the_service_is_being_stopped(start, material):
-    """Asked on connections that were there before."""
+def test_health_says_that_the_service_is_being_stopped(start, material, described):
+    """Asked on a connection that has sent a part of its request before."""
     client = start(material.catalogue, "--lookups", "1")
     with concurrent.futures.ThreadPoolExecutor(8) as pool:
         asked = [pool.submit(client.match, material.long, WAV) for _ in range(8)]
         while service_run.total(client.service.metrics(), "kzfp_queue_length") < 6:
             time.sleep(0.01)
+        connection = http.client.HTTPConnection(client.service.host, client.service.port)
+        connection.connect()
+        connection.send(b"GET /v1/health HTTP/1.1\r\n")
+        time.sleep(0.1)
         client.service.process.send_signal(signal.SIGTERM)
-        for one in asked:
-            assert one.result()[0] == 200
+        time.sleep(0.1)
+        connection.send(b"Host: localhost\r\n\r\n")
+        answer = connection.response_class(connection.sock, method="GET")
+        answer.begin()
+        told = described.check("GET", "/v1/health", answer.status, answer.headers, answer.read())
+        assert (answer.status, told["status"]) == (503, "draining")
+        assert [one.result()[0] for one in asked] == [200] * 8
     assert client.service.stop() == 0
 
 
