@@ -84,6 +84,10 @@ class Service:
         """Asks it to end; gives its exit status."""
         if self.process.poll() is None:
             self.process.send_signal(how)
+        return self.ended(timeout)
+
+    def ended(self, timeout=60):
+        """Waits for its end; gives its exit status."""
         try:
             status = self.process.wait(timeout)
         except subprocess.TimeoutExpired:

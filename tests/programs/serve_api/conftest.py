@@ -67,7 +67,7 @@ class Material:
         service_music.write_wav(folder / "clip.wav", piece[20 * rate:36 * rate])
         service_music.write_wav(folder / "silence.wav", 0 * piece[:16 * rate])
         service_music.write_wav(folder / "stranger.wav", service_music.melody(77, 16))
-        service_music.write_wav(folder / "long.wav", service_music.melody(78, 1800))
+        service_music.write_wav(folder / "long.wav", service_music.melody(78, 300))
         self.clip = (folder / "clip.wav").read_bytes()
         self.stranger = (folder / "stranger.wav").read_bytes()
         self.silence = (folder / "silence.wav").read_bytes()

@@ -46,7 +46,10 @@ def said(service, bytes_):
     """What the service answers to these bytes and no more."""
     with Raw(service) as raw:
         raw.send(bytes_)
-        raw.socket.shutdown(socket.SHUT_WR)
+        try:
+            raw.socket.shutdown(socket.SHUT_WR)
+        except OSError:
+            pass  # it was closed already
         return raw.rest()
 
 
