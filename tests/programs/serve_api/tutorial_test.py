@@ -129,7 +129,7 @@ def nginx_configuration(place, service_port, port):
 @pytest.mark.skipif(not (shutil.which("nginx") or pathlib.Path("/usr/sbin/nginx").exists()),
                     reason="nginx is missing: scripts/setup.sh service")
 def test_nginx_passes_requests_on_as_configured(start, material, place):
-    client = start(material.catalogue, "--host", "music.example", "--per-address", "0")
+    client = start(material.catalogue, "--host", "music.example")
     port = free_port()
     subprocess.run(["openssl", "req", "-x509", "-newkey", "rsa:2048", "-nodes", "-subj",
                     "/CN=music.example", "-addext", "subjectAltName=DNS:music.example", "-keyout",
