@@ -74,8 +74,9 @@ def matching(kzfp, catalogue, options, clips):
 def measure_program(kzfp, catalogue, kind, clips):
     """Look-ups a second of the program without a service, on all processors."""
     options = ["--no-speeds"] if KINDS[kind].endswith("speeds=0") else []
-    spent = matching(kzfp, catalogue, options, clips) - matching(kzfp, catalogue, options, clips[:1])
-    print(f"| {kind} | {(len(clips) - 1) / spent:.1f} |", flush=True)
+    many = clips * 10
+    spent = matching(kzfp, catalogue, options, many) - matching(kzfp, catalogue, options, clips[:1])
+    print(f"| {kind} | {(len(many) - 1) / spent:.1f} |", flush=True)
 
 
 def measure_all(options, folder):
