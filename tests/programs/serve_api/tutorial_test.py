@@ -6,6 +6,7 @@ import os
 import pathlib
 import re
 import shutil
+import signal
 import socket
 import subprocess
 
@@ -84,12 +85,24 @@ def place(material, tmp_path):
 def run(shell, place):
     """What each block prints."""
     path = f"{place / '.programs'}:{os.environ['PATH']}"
-    done = subprocess.run(["bash", "-eu", "-o", "pipefail", "-c", script(shell)], cwd=place,
-                          env={**os.environ, "PATH": path}, stdout=subprocess.PIPE,
-                          stderr=subprocess.PIPE, text=True, timeout=120, check=False)
-    printed = done.stdout.split(MARK + "\n")
-    assert done.returncode == 0, f"after {len(printed) - 1} blocks: {done.stdout}{done.stderr}"
+    bash = subprocess.Popen(["bash", "-eu", "-o", "pipefail", "-c", script(shell)], cwd=place,
+                            env={**os.environ, "PATH": path}, stdout=subprocess.PIPE,
+                            stderr=subprocess.PIPE, text=True, start_new_session=True)
+    try:
+        out, errors = bash.communicate(timeout=120)
+    finally:
+        end_all_of(bash.pid)
+    printed = out.split(MARK + "\n")
+    assert bash.returncode == 0, f"after {len(printed) - 1} blocks: {out}{errors}"
     return printed[:-1]
+
+
+def end_all_of(group):
+    """Ends a service that a shell has left behind."""
+    try:
+        os.killpg(group, signal.SIGKILL)
+    except ProcessLookupError:
+        pass
 
 
 def without_starts(text):
@@ -140,7 +153,8 @@ def test_nginx_passes_requests_on_as_configured(start, material, place):
     nginx = subprocess.Popen([shutil.which("nginx") or "/usr/sbin/nginx", "-c",
                               place / "nginx.conf", "-g", "daemon off; master_process off;"])
     try:
-        ask = ["curl", "--silent", "--retry", "10", "--retry-connrefused", "--cacert",
+        assert nginx.poll() is None
+        ask = ["curl", "--silent", "--retry", "5", "--retry-connrefused", "--cacert",
                place / "cert.pem", "--resolve", f"music.example:{port}:127.0.0.1"]
         url = f"https://music.example:{port}"
         answer = subprocess.run([*ask, "--data-binary", f"@{place / 'clip.kzt'}", "-H",
