@@ -300,6 +300,16 @@ def test_other_methods_are_refused_with_those_there_are(open_service, described)
             assert allowed - {"HEAD"} == told, path
 
 
+def test_heads_are_those_of_the_whole_answers(open_service, described):
+    for template, item in described.text["paths"].items():
+        if "get" in item:
+            path = template.replace("{track}", "1")
+            status, _, headers = open_service.ask("GET", path)
+            short, body, own = open_service.ask("HEAD", path)
+            assert (short, body) == (status, None), path
+            assert own["Content-Type"] == headers["Content-Type"], path
+
+
 def test_unknown_paths_are_not_found(open_service):
     for path in ("/v1", "/v1/", "/v1/match/", "/v1/nothing", "/v2/match", "/v1/tracks/1/nothing",
                  "/v1/tracks/1/trail/", "/metrics/x", "/" + "x" * 1000):

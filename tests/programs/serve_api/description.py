@@ -56,6 +56,7 @@ class Description:
     def answer(self, method, path, status):
         """What the file says of an answer; fails when it says nothing."""
         template = self.template_of(path)
+        method = "GET" if method == "HEAD" else method
         own = self.text["paths"].get(template, {}).get(method.lower(), {}).get("responses", {})
         if str(status) in own:
             self.seen.add((method.lower(), template, status))
