@@ -2,8 +2,10 @@
 answer or close, and go on working."""
 
 import concurrent.futures
+import http.client
 import os
 import random
+import select
 import socket
 
 import pytest
@@ -178,6 +180,22 @@ def test_slow_requests_are_ended(start, material):
             answer = raw.rest()
             assert answer == b"" or status_of(answer) == 408
     assert works(client, material)
+
+
+def test_a_request_that_takes_too_long_is_told_so(start, material, described):
+    """It keeps sending, so that it is never idle."""
+    client = start(material.catalogue, "--timeout", "5", "--deadline", "1")
+    with Raw(client.service) as raw:
+        raw.send(b"POST /v1/match HTTP/1.1\r\n" + HOST + b"Content-Type: application/x-kzt\r\n"
+                 b"Content-Length: 100000\r\n\r\n")
+        answered = None
+        while not answered:
+            raw.send(b"x")
+            answered, _, _ = select.select([raw.socket], [], [], 0.2)
+        answer = http.client.HTTPResponse(raw.socket, method="POST")
+        answer.begin()
+        described.check("POST", "/v1/match", answer.status, answer.headers, answer.read())
+        assert answer.status == 408
 
 
 def test_slow_clients_do_not_hold_others_up(start, material):
