@@ -156,3 +156,6 @@ def open_service(material, described):
 def pytest_collection_modifyitems(items):
     """What has been seen is judged when all else has been."""
     items.sort(key=lambda item: "every_promised_answer" in item.name)
+    is_last = bool(items) and "every_promised_answer" in items[-1].name
+    if is_last and not any("stopping_test" in item.nodeid for item in items):
+        items[-1].add_marker(pytest.mark.skip(reason="only some of the answers were asked for"))
