@@ -18,7 +18,6 @@ import argparse
 import collections
 import http.client
 import json
-import os
 import pathlib
 import random
 import statistics

@@ -26,7 +26,8 @@ end
 
 function request()
     at = at + 1
-    return wrk.format("POST", path, {["Content-Type"] = "application/x-kzt"}, bodies[at % #bodies + 1])
+    local headers = {["Content-Type"] = "application/x-kzt"}
+    return wrk.format("POST", path, headers, bodies[at % #bodies + 1])
 end
 
 function response(status)
@@ -45,8 +46,8 @@ function done(summary, latency)
     end
     local errors = summary.errors
     io.write(string.format(
-        '\n{"requests":%d,"seconds":%.6f,"median":%.6f,"p99":%.6f,"most":%.6f,"busy":%d,"others":%d,' ..
-        '"connect":%d,"read":%d,"write":%d,"timeout":%d}\n',
+        '\n{"requests":%d,"seconds":%.6f,"median":%.6f,"p99":%.6f,"most":%.6f,"busy":%d,' ..
+        '"others":%d,"connect":%d,"read":%d,"write":%d,"timeout":%d}\n',
         summary.requests, summary.duration / 1e6, latency:percentile(50) / 1e6,
         latency:percentile(99) / 1e6, latency.max / 1e6, busy, others,
         errors.connect, errors.read, errors.write, errors.timeout))

@@ -9,7 +9,6 @@ import socket
 import subprocess
 import sys
 import threading
-import urllib.parse
 
 STARTED = re.compile(r"listening on (https?)://(.+):(\d+)/")
 LISTEN_FDS_START = 3  # the first descriptor of a socket that is handed over
@@ -137,10 +136,6 @@ def total(metrics, name, **labels):
     wanted = [f'{key}="{value}"' for key, value in labels.items()]
     return sum(value for key, value in metrics.items()
                if key.split("{")[0] == name and all(part in key for part in wanted))
-
-
-def with_query(path, **parameters):
-    return path + ("?" + urllib.parse.urlencode(parameters) if parameters else "")
 
 
 def fail(message):

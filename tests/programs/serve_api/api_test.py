@@ -344,7 +344,8 @@ def test_pages_of_other_origins_are_refused(open_service, material):
 def test_other_names_of_the_host_are_refused(start, material):
     client = start(material.catalogue, "--host", "music.example")
     for host, status in (("evil.example", 421), ("music.example", 200), ("localhost", 200),
-                         (f"127.0.0.1:{client.service.port}", 200), ("127.0.0.1.evil.example", 421)):
+                         (f"127.0.0.1:{client.service.port}", 200),
+                         ("127.0.0.1.evil.example", 421)):
         assert client.ask("GET", "/v1/health", headers={"Host": host})[0] == status, host
 
 

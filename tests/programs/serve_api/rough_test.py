@@ -101,7 +101,8 @@ def hasty(material, described):
 @pytest.mark.parametrize("what", MALFORMED)
 def test_malformed_requests_are_refused(hasty, material, what):
     answer = said(hasty.service, MALFORMED[what])
-    assert answer == b"" or 400 <= status_of(answer) < 500 or status_of(answer) in (501, 505), answer
+    status = status_of(answer)
+    assert answer == b"" or 400 <= status < 500 or status in (501, 505), answer
     assert works(hasty, material)
 
 
@@ -250,7 +251,8 @@ def test_long_tokens_and_odd_ones_are_refused(start, material, token_files):
     for field in ("Bearer", "Bearer ", "Basic " + READ_TOKEN, READ_TOKEN, "Bearer " + "x" * 4000,
                   "Bearer " + READ_TOKEN + " x"):
         assert client.ask("GET", "/metrics", headers={"Authorization": field})[0] == 401, field
-    assert client.ask("GET", "/metrics", headers={"Authorization": "bearer " + READ_TOKEN})[0] == 200
+    small = {"Authorization": "bearer " + READ_TOKEN}
+    assert client.ask("GET", "/metrics", headers=small)[0] == 200
 
 
 def test_answers_repeat_nothing_of_the_request(open_service):
