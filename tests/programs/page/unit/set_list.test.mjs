@@ -1,0 +1,71 @@
+// Set-lists as rows, text and CSV.
+
+import assert from "node:assert/strict";
+import { test } from "node:test";
+
+import { entriesOf, toCsv, toText } from "../../../../web/app/set_list.js";
+
+const track = (title, clip_begin, clip_end) => ({
+  track: 1,
+  title,
+  artist: "Band",
+  source: "a/b.ogg",
+  sure: "certain",
+  score: 12,
+  threshold: 7,
+  offset: 10 - clip_begin,
+  tempo: 1,
+  clip_begin,
+  clip_end,
+});
+
+const ANSWER = {
+  verdict: "match",
+  matches: [track("Second", 70, 130), track("First", 0, 60)],
+  gaps: [{ clip_begin: 60, clip_end: 70 }],
+};
+
+test("entries stand in the order of the recording", () => {
+  const entries = entriesOf(ANSWER);
+  assert.deepEqual(entries.map((entry) => entry.begin), [0, 60, 70]);
+  assert.deepEqual(
+    entries.map((entry) => entry.match?.title ?? null),
+    ["First", null, "Second"],
+  );
+  assert.deepEqual(entriesOf({}), []);
+});
+
+test("text has a line for each entry and gap", () => {
+  assert.equal(
+    toText(entriesOf(ANSWER)),
+    "0:00 – 1:00  First by Band\n1:00 – 1:10  not recognised\n1:10 – 2:10  Second by Band\n",
+  );
+});
+
+test("a title with a line end stays on one line", () => {
+  const [line, rest] = toText(entriesOf({ matches: [track("A\nB", 0, 5)] })).split("\n");
+  assert.equal(line, "0:00 – 0:05  A B by Band");
+  assert.equal(rest, "");
+});
+
+test("CSV has a header, times and places in seconds", () => {
+  const lines = toCsv(entriesOf(ANSWER)).split("\r\n");
+  assert.equal(lines[0], "begin,end,title,artist,source,place,sure");
+  assert.equal(lines[1], "0.0,60.0,First,Band,a/b.ogg,10.0,certain");
+  assert.equal(lines[2], "60.0,70.0,,,,,");
+  assert.equal(lines.length, 5);
+});
+
+test("CSV quotes commas, quotes and line ends", () => {
+  const csv = toCsv(entriesOf({ matches: [track('He said "no",\nthen', 0, 5)] }));
+  assert.ok(csv.includes('"He said ""no"",\nthen"'), csv);
+});
+
+test("a title cannot become a spreadsheet formula", () => {
+  const titleOf = (title) =>
+    toCsv(entriesOf({ matches: [track(title, 0, 5)] })).split("\r\n")[1].split(",")[2];
+  assert.equal(titleOf("=1+1"), "'=1+1");
+  assert.equal(titleOf("@home"), "'@home");
+  assert.equal(titleOf("-5"), "-5", "a number is one");
+  assert.equal(titleOf("C=64"), "C=64");
+});

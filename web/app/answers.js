@@ -1,0 +1,141 @@
+// What the service answers, put into words. Nothing here touches the page or the network.
+
+import { clockText } from "./times.js";
+
+/** Factors of speed are good to a quarter of a percent. */
+const NO_CHANGE = 0.0025;
+
+/**
+ * The name under which a track is shown.
+ *
+ * @param {{track: number, source?: string, title?: string|null}} match
+ * @returns {string} its title; without one the file's name; without that its number
+ */
+export function nameOf(match) {
+  const title = (match.title ?? "").trim();
+  if (title) {
+    return title;
+  }
+  const file = (match.source ?? "").split(/[\\/]/).pop();
+  return file || `Track ${match.track}`;
+}
+
+/**
+ * Title and artist in one line.
+ *
+ * @param {{title?: string|null, artist?: string|null}} match
+ * @returns {string} "Title by Artist", or the name alone
+ */
+export function nameAndArtist(match) {
+  const artist = (match.artist ?? "").trim();
+  return artist ? `${nameOf(match)} by ${artist}` : nameOf(match);
+}
+
+/**
+ * Where in the track what was heard begins. `offset` is the place of the clip's first sample, also
+ * when only a later part of the clip is from the track.
+ *
+ * @param {{offset: number, clip_begin?: number, tempo?: number}} match
+ * @returns {number} seconds of the track
+ */
+export function placeOf(match) {
+  return match.offset + (match.clip_begin ?? 0) * (match.tempo ?? 1);
+}
+
+function changeText(factor, more, less) {
+  const percent = (factor - 1) * 100;
+  return `${Math.abs(percent).toFixed(1)} % ${percent > 0 ? more : less}`;
+}
+
+/**
+ * How the clip differs from the track in speed, tempo and pitch.
+ *
+ * @param {{speed?: number, tempo?: number, pitch?: number}} match
+ * @returns {string} "3.9 % faster", or "" when nothing was changed
+ */
+export function changesOf(match) {
+  const changed = (factor) => Number.isFinite(factor) && Math.abs(factor - 1) >= NO_CHANGE;
+  if (changed(match.speed)) {
+    return changeText(match.speed, "faster", "slower");
+  }
+  const parts = [];
+  if (changed(match.tempo)) {
+    parts.push(changeText(match.tempo, "quicker in tempo", "slower in tempo"));
+  }
+  if (changed(match.pitch)) {
+    parts.push(changeText(match.pitch, "higher in pitch", "lower in pitch"));
+  }
+  return parts.join(", ");
+}
+
+/**
+ * How sure an answer is, with the numbers it rests on.
+ *
+ * @param {{sure?: string, score: number, threshold: number}} match
+ * @returns {string} "certain (score 12.9, 7.3 needed)"
+ */
+export function sureText(match) {
+  const numbers = `score ${match.score.toFixed(1)}, ${match.threshold.toFixed(1)} needed`;
+  return match.sure ? `${match.sure} (${numbers})` : numbers;
+}
+
+/**
+ * The sentence that is read out when a track was recognised.
+ *
+ * @param {object} match  One of `matches` of an answer.
+ * @returns {string} "Recognised: Title by Artist, at 1:40."
+ */
+export function announcement(match) {
+  return `Recognised: ${nameAndArtist(match)}, at ${clockText(placeOf(match))}.`;
+}
+
+/**
+ * The answer to a trail that was read as if the clip had been played at another speed, in the
+ * clip's own seconds and with its own speed.
+ *
+ * @param {object} answer  What the service said.
+ * @param {number} speed   How much faster the clip was taken to be: 1.04 is 4 %.
+ * @returns {object} a copy
+ */
+export function atOwnSpeed(answer, speed) {
+  if (speed === 1) {
+    return answer;
+  }
+  const ownMatch = (match) => ({
+    ...match,
+    speed: factorTimes(match.speed, speed),
+    tempo: factorTimes(match.tempo, speed),
+    pitch: factorTimes(match.pitch, speed),
+    clip_begin: secondsOver(match.clip_begin, speed),
+    clip_end: secondsOver(match.clip_end, speed),
+  });
+  return { ...answer, matches: (answer.matches ?? []).map(ownMatch) };
+}
+
+function factorTimes(factor, speed) {
+  return (factor ?? 1) * speed;
+}
+
+function secondsOver(seconds, speed) {
+  return seconds === undefined ? undefined : seconds / speed;
+}
+
+/**
+ * The answer to a trail of a clip's end, in seconds of the whole clip.
+ *
+ * @param {object} answer   What the service said.
+ * @param {number} skipped  Seconds of the clip before the trail begins.
+ * @returns {object} a copy
+ */
+export function fromTheStart(answer, skipped) {
+  if (skipped === 0) {
+    return answer;
+  }
+  const ownMatch = (match) => ({
+    ...match,
+    offset: match.offset - skipped * (match.tempo ?? 1),
+    clip_begin: (match.clip_begin ?? 0) + skipped,
+    clip_end: (match.clip_end ?? 0) + skipped,
+  });
+  return { ...answer, matches: (answer.matches ?? []).map(ownMatch) };
+}

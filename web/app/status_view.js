@@ -1,0 +1,55 @@
+// What the page says at the moment: the line that screen readers follow, the meter, and problems.
+
+import { byId, make } from "./dom.js";
+
+export class StatusView {
+  #line = byId("status");
+  #detail = byId("detail");
+  #meter = byId("meter");
+  #problem = byId("problem");
+
+  /** Says something to everybody; it is read out. */
+  say(text) {
+    this.#line.textContent = text;
+  }
+
+  /** Shows something that changes too often to be read out. */
+  detail(text) {
+    this.#detail.textContent = text;
+  }
+
+  /**
+   * Shows how loud it is.
+   *
+   * @param {number|null} level  0 to 1; null takes the meter away.
+   */
+  level(level) {
+    this.#meter.hidden = level === null;
+    this.#meter.value = level ?? 0;
+  }
+
+  /**
+   * Shows a problem; it is read out at once.
+   *
+   * @param {import("./problems.js").Problem} problem
+   * @param {(() => void)|null} tryAgain  Asks once more with what there is; null offers nothing.
+   */
+  problem(problem, tryAgain) {
+    const parts = [
+      make("h2", { text: problem.title }),
+      make("p", { text: problem.advice }),
+    ];
+    if (tryAgain) {
+      const button = make("button", { type: "button", class: "plain", text: "Try again" });
+      button.addEventListener("click", tryAgain);
+      parts.push(button);
+    }
+    this.#problem.replaceChildren(...parts);
+    this.#problem.hidden = false;
+  }
+
+  clearProblem() {
+    this.#problem.hidden = true;
+    this.#problem.replaceChildren();
+  }
+}
