@@ -25,7 +25,9 @@ export class StatusView {
    */
   level(level) {
     this.#meter.hidden = level === null;
-    this.#meter.value = level ?? 0;
+    const percent = String(Math.round(100 * (level ?? 0)));
+    this.#meter.setAttribute("aria-valuenow", percent);
+    this.#meter.firstElementChild.style.width = `${percent}%`;
   }
 
   /**
