@@ -139,3 +139,60 @@ export function fromTheStart(answer, skipped) {
   });
   return { ...answer, matches: (answer.matches ?? []).map(ownMatch) };
 }
+
+/** How much more a clip has to score that was read at another speed: each is one more chance for
+ *  a stranger. The service asks the same of the readings that it makes itself. */
+const FURTHER_MARGIN = 1;
+
+/** Whether an answer names a track, and how well one that names none is worth telling. */
+const VERDICTS = ["too quiet", "no match", "not sure"];
+
+function rankOf(answer) {
+  return VERDICTS.indexOf(answer.verdict);
+}
+
+/**
+ * Whether an answer names a track.
+ *
+ * @param {object} answer
+ */
+export function isMatch(answer) {
+  return answer.verdict === "match" && (answer.matches ?? []).length > 0;
+}
+
+/**
+ * An answer to a clip that was read at another speed than its own, less sure of itself.
+ *
+ * @param {object} answer
+ * @param {number} speed  1 changes nothing.
+ * @returns {object}
+ */
+export function withMargin(answer, speed) {
+  if (speed === 1 || !isMatch(answer)) {
+    return answer;
+  }
+  const matches = answer.matches
+    .map((match) => ({ ...match, threshold: match.threshold + FURTHER_MARGIN }))
+    .filter((match) => match.score >= match.threshold);
+  return { ...answer, verdict: matches.length > 0 ? "match" : "not sure", matches };
+}
+
+/**
+ * The best of several answers about one clip.
+ *
+ * @param {object[]} answers  At least one.
+ * @returns {object} of those that name a track the one that scores highest; else the one that comes
+ *          nearest to it
+ */
+export function bestOf(answers) {
+  const better = (one, other) => {
+    if (isMatch(one) && isMatch(other)) {
+      return other.matches[0].score > one.matches[0].score ? other : one;
+    }
+    if (isMatch(one) || isMatch(other)) {
+      return isMatch(one) ? one : other;
+    }
+    return rankOf(other) > rankOf(one) ? other : one;
+  };
+  return answers.reduce(better);
+}

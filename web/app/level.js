@@ -1,4 +1,4 @@
-// How loud what is heard is, for the meter.
+// How loud what is heard is: for the meter, and to know silence.
 
 /** Decibels below full scale at which the meter is empty. */
 const FLOOR = -60;
@@ -16,6 +16,22 @@ export function levelOf(samples) {
   }
   const decibels = 10 * Math.log10(sum / samples.length);
   return Math.min(1, Math.max(0, 1 - decibels / FLOOR));
+}
+
+/**
+ * Whether no second of a clip is as loud as 60 dB below full scale, which is silence to a
+ * microphone.
+ *
+ * @param {Float32Array} samples
+ * @param {number} rate
+ */
+export function isQuiet(samples, rate) {
+  for (let at = 0; at < samples.length; at += rate) {
+    if (levelOf(samples.subarray(at, at + rate)) > 0) {
+      return false;
+    }
+  }
+  return true;
 }
 
 /** Falls slowly, so that the eye can follow it; rises at once. */

@@ -1,7 +1,8 @@
 // Listening: the microphone is heard, and the service asked at the schedule's moments, until a
 // track is recognised, the last moment has passed or the person stops.
 
-import { nextMoment, readingsAt } from "./schedule.js";
+import { isMatch } from "./answers.js";
+import { nextMoment, roundsAt } from "./schedule.js";
 import { ServiceAway } from "./service.js";
 import { HeardSound } from "./sound.js";
 
@@ -47,7 +48,7 @@ export async function listen({ openMicrophone, recogniser, signal, onHeard, onCl
     early.splice(0).forEach(take);
     const ask = (clip, seconds) => {
       onClip(clip);
-      return recogniser.ask(clip, readingsAt(seconds), { signal, onBusy });
+      return recogniser.ask(clip, roundsAt(seconds), { signal, onBusy });
     };
     return await askUntilKnown({ sound, rate: microphone.rate, signal, ask });
   } finally {
@@ -67,7 +68,7 @@ async function askUntilKnown({ sound, rate, signal, ask }) {
       }
       continue;
     }
-    if (answer.verdict === "match") {
+    if (isMatch(answer)) {
       break;
     }
   }

@@ -1,6 +1,6 @@
 // The page: one thing at a time is looked up, out of the microphone or a file, and shown.
 
-import { announcement, nameAndArtist, placeOf } from "./answers.js";
+import { announcement, isMatch, nameAndArtist, placeOf } from "./answers.js";
 import { byId } from "./dom.js";
 import { HistoryView } from "./history_view.js";
 import { History, Token } from "./keeping.js";
@@ -10,7 +10,7 @@ import { openMicrophone, trailMakers } from "./package.js";
 import { problemOf, problemOfAnswer } from "./problems.js";
 import { Recogniser } from "./recogniser.js";
 import { ResultView } from "./result_view.js";
-import { readingsAt } from "./schedule.js";
+import { roundsAt } from "./schedule.js";
 import { Service } from "./service.js";
 import { entriesOf } from "./set_list.js";
 import { SetListView } from "./set_list_view.js";
@@ -207,20 +207,19 @@ async function askAbout(clip, name, signal, keep) {
   const options = { signal, onBusy };
   const answer = passages
     ? await recogniser.askPassages(clip, options)
-    : await recogniser.ask(clip, readingsAt(seconds), options);
+    : await recogniser.ask(clip, roundsAt(seconds), options);
   await showAnswer({ answer, clip, from: name, signal, passages });
 }
 
 // ---- What came of it
 
 async function showAnswer({ answer, clip, from, signal, passages = false }) {
-  const matches = answer.matches ?? [];
-  if (answer.verdict !== "match" || matches.length === 0) {
-    const problem = problemOfAnswer(answer);
+  if (!isMatch(answer)) {
     say("");
-    status.problem(problem, null);
+    status.problem(problemOfAnswer(answer), null);
     return;
   }
+  const { matches } = answer;
   if (passages) {
     views.setList.show(entriesOf(answer), from);
   }

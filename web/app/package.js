@@ -23,10 +23,7 @@ export function trailMakers() {
 
 async function startClient() {
   const { createClient } = await import(new URL("client.js", FOLDER).href);
-  return createClient({
-    workerUrl: new URL("worker.js", FOLDER),
-    moduleUrl: new URL("kzsdk_module.wasm", FOLDER),
-  });
+  return createClient();
 }
 
 /**
@@ -45,5 +42,5 @@ export async function openMicrophone({ onSamples }) {
   } catch (cause) {
     throw new PageBroken("The part that opens the microphone could not be loaded.", { cause });
   }
-  return library.openMicrophone({ onSamples, workletUrl: new URL("worklet.js", FOLDER) });
+  return library.openMicrophone({ onSamples });
 }

@@ -67,6 +67,14 @@ const MICROPHONE = {
     ),
 };
 
+/** What the package says of a microphone, and of itself. */
+const PACKAGE = {
+  refused: () => MICROPHONE.NotAllowedError(),
+  "no-microphone": () => MICROPHONE.NotFoundError(),
+  busy: () => MICROPHONE.NotReadableError(),
+  load: (error) => OTHERS.PageBroken(new PageBroken(error.message)),
+};
+
 const OTHERS = {
   NoMicrophoneHere: (error) =>
     error.secure
@@ -127,7 +135,10 @@ export function problemOf(error) {
   }
   // A helper may wrap what the browser said.
   for (const each of [error, error.cause]) {
-    const known = OTHERS[each?.name] ?? MICROPHONE[each?.name];
+    const known =
+      OTHERS[each?.name] ??
+      MICROPHONE[each?.name] ??
+      (each?.name === "KzError" ? PACKAGE[each.code] : undefined);
     if (known) {
       return known(each);
     }

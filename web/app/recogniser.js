@@ -1,9 +1,14 @@
 // From samples to an answer: the trail is made on this device by the worker, the service is asked,
 // and what it says is told in the clip's own seconds.
 
-import { atOwnSpeed, fromTheStart } from "./answers.js";
+import { atOwnSpeed, bestOf, fromTheStart, isMatch, withMargin } from "./answers.js";
 import { gridStart, lay } from "./codes.js";
-import { CODE_SECONDS } from "./schedule.js";
+import { isQuiet } from "./level.js";
+import { CODE_SECONDS, OWN_SPEED } from "./schedule.js";
+import { merged } from "./set_list.js";
+
+/** A trail does not say how loud the sound was, so the service cannot. */
+const TOO_QUIET = { verdict: "too quiet", matches: [] };
 
 /** No more than this much of a clip is drawn, in seconds. */
 const LONGEST_DRAWN = 30;
@@ -28,42 +33,57 @@ export class Recogniser {
   }
 
   /**
-   * Asks about a clip by each reading in turn until one is recognised.
+   * Asks about a clip, round after round, until it is recognised.
    *
    * @param {Clip} clip
-   * @param {import("./schedule.js").Reading[]} readings  At least one.
+   * @param {import("./schedule.js").Reading[][]} rounds  At least one.
    * @param {{signal: AbortSignal, onBusy?: Function}} options
-   * @returns {Promise<object>} the answer that has matches; else that of the first reading
+   * @returns {Promise<object>} the best answer of the last round that was needed
    */
-  async ask(clip, readings, options) {
-    let first;
-    for (const reading of readings) {
-      const answer = await this.#read(clip, reading, options);
-      if (answer.verdict === "match" && answer.matches.length > 0) {
-        return answer;
-      }
-      first ??= answer;
-      if (answer.verdict === "too quiet") {
+  async ask(clip, rounds, options) {
+    if (isQuiet(clip.samples, clip.rate)) {
+      return TOO_QUIET;
+    }
+    let best;
+    for (const readings of rounds) {
+      const answers = await this.#readAll(clip, readings, options);
+      best = bestOf(best ? [best, ...answers] : answers);
+      if (isMatch(best)) {
         break;
       }
     }
-    return first;
+    return best;
   }
 
-  /** Asks for all that a long recording holds. */
-  async askPassages(clip, { signal, onBusy }) {
-    const trail = await this.#makers.trail(clip.samples, clip.rate);
-    signal.throwIfAborted();
-    return this.#service.match(trail, { passages: true, signal, onBusy });
+  /**
+   * Asks for all that a long recording holds.
+   *
+   * @param {Clip} clip
+   * @param {{signal: AbortSignal, onBusy?: Function}} options
+   * @returns {Promise<object>} with `matches` in the recording's order, and `gaps`
+   */
+  async askPassages(clip, options) {
+    if (isQuiet(clip.samples, clip.rate)) {
+      return TOO_QUIET;
+    }
+    const answers = [];
+    for (const reading of OWN_SPEED) {
+      answers.push(await this.#read(clip, reading, { ...options, passages: true }));
+    }
+    return merged(answers, clip.samples.length / clip.rate);
   }
 
-  async #read(clip, { speed, skipped }, { signal, onBusy }) {
+  #readAll(clip, readings, options) {
+    return Promise.all(readings.map((reading) => this.#read(clip, reading, options)));
+  }
+
+  async #read(clip, { speed, skipped }, options) {
     // Sound that is said to have a lower rate is slower by as much.
     const samples = clip.samples.subarray(Math.round(skipped * clip.rate));
     const trail = await this.#makers.trail(samples, Math.round(clip.rate / speed));
-    signal.throwIfAborted();
-    const answer = await this.#service.match(trail, { signal, onBusy });
-    return fromTheStart(atOwnSpeed(answer, speed), skipped);
+    options.signal.throwIfAborted();
+    const answer = await this.#service.match(trail, options);
+    return fromTheStart(atOwnSpeed(withMargin(answer, speed), speed), skipped);
   }
 
   /**

@@ -17,23 +17,28 @@ export const CODE_SECONDS = 2048 / 11025;
  * @property {number} skipped  seconds left out at the clip's beginning
  */
 
+/** The same reading from so many places of a code on, evenly apart. */
+function phases(speed, count) {
+  return Array.from({ length: count }, (_, i) => ({ speed, skipped: (i * CODE_SECONDS) / count }));
+}
+
 /**
- * The readings to try, in this order, until one is recognised. A trail has codes at fixed distances
- * from its beginning, and those of a track lie somewhere between them; the second reading begins
- * half a code later, so that one of the two lies near.
+ * The readings of a clip at its own speed. A trail has codes at fixed distances from its beginning,
+ * and those of a track lie somewhere between them: the nearer, the more bits agree. In music that
+ * repeats itself another place of the same track may otherwise lie nearer than the right one.
+ */
+export const OWN_SPEED = phases(1, 4);
+
+const OTHER_SPEEDS = [...phases(1.04, 2), ...phases(0.96, 2)];
+
+/**
+ * The rounds of readings to try until one is recognised; of a round all are asked about.
  *
  * @param {number} seconds  of sound that were heard
- * @returns {Reading[]}
+ * @returns {Reading[][]}
  */
-export function readingsAt(seconds) {
-  const readings = [
-    { speed: 1, skipped: 0 },
-    { speed: 1, skipped: CODE_SECONDS / 2 },
-  ];
-  if (seconds >= SPEEDS_FROM) {
-    readings.push({ speed: 1.04, skipped: 0 }, { speed: 0.96, skipped: 0 });
-  }
-  return readings;
+export function roundsAt(seconds) {
+  return seconds >= SPEEDS_FROM ? [OWN_SPEED, OTHER_SPEEDS] : [OWN_SPEED];
 }
 
 /**

@@ -1,6 +1,6 @@
-// The set-list of a long recording: what ran from when to when, as rows, as text and as CSV.
+// The set-list of a long recording: what ran from when to when, as entries, as text and as CSV.
 
-import { nameAndArtist, nameOf, placeOf } from "./answers.js";
+import { bestOf, isMatch, nameAndArtist, nameOf, placeOf } from "./answers.js";
 import { clockText } from "./times.js";
 
 /**
@@ -28,6 +28,76 @@ export function entriesOf(answer) {
     match: null,
   }));
   return [...found, ...gaps].sort((one, other) => one.begin - other.begin || one.end - other.end);
+}
+
+/** Shorter stretches between two passages are no gap, in seconds: ends are found to a second. */
+const SHORTEST_GAP = 2;
+
+/** A passage that lies in others by more than this share of it is what they are. */
+const MOST_OVERLAP = 0.5;
+
+/**
+ * One answer out of several about one recording, of each stretch the passage that scores highest.
+ *
+ * @param {object[]} answers  With passages, in seconds of the recording.
+ * @param {number} seconds    that the recording lasts
+ * @returns {object} an answer with `matches`, in the recording's order, and `gaps`
+ */
+export function merged(answers, seconds) {
+  const all = answers.filter(isMatch).flatMap((answer) => answer.matches);
+  const kept = [];
+  for (const match of all.sort((one, other) => other.score - one.score)) {
+    if (sharedWith(kept, match) <= MOST_OVERLAP * (match.clip_end - match.clip_begin)) {
+      kept.push(match);
+    }
+  }
+  if (kept.length === 0) {
+    return bestOf(answers);
+  }
+  const placed = kept.map((match) => withUsualEnds(match, all));
+  const matches = withoutOverlap(placed.sort((one, other) => one.clip_begin - other.clip_begin));
+  return { verdict: "match", matches, gaps: gapsBetween(matches, seconds) };
+}
+
+/** Seconds of a passage that lie in others. */
+function sharedWith(others, match) {
+  const shared = (other) =>
+    Math.min(match.clip_end, other.clip_end) - Math.max(match.clip_begin, other.clip_begin);
+  return others.reduce((sum, other) => sum + Math.max(0, shared(other)), 0);
+}
+
+/** Its ends as most answers have them: one alone may take what comes before or after for more. */
+function withUsualEnds(match, all) {
+  const same = all.filter(
+    (other) => other.track === match.track && sharedWith([other], match) > 0,
+  );
+  return {
+    ...match,
+    clip_begin: middle(same.map((each) => each.clip_begin)),
+    clip_end: middle(same.map((each) => each.clip_end)),
+  };
+}
+
+/** The median; of an even number of values the lower one in the middle. */
+function middle(values) {
+  const sorted = values.sort((one, other) => one - other);
+  return sorted[Math.floor((sorted.length - 1) / 2)];
+}
+
+/** A passage ends where the next one begins. */
+function withoutOverlap(matches) {
+  return matches.map((match, i) => {
+    const next = matches[i + 1]?.clip_begin ?? Infinity;
+    return { ...match, clip_end: Math.min(match.clip_end, next) };
+  });
+}
+
+function gapsBetween(matches, seconds) {
+  const begins = [0, ...matches.map((match) => match.clip_end)];
+  const ends = [...matches.map((match) => match.clip_begin), seconds];
+  return begins
+    .map((begin, i) => ({ clip_begin: begin, clip_end: ends[i] }))
+    .filter((gap) => gap.clip_end - gap.clip_begin >= SHORTEST_GAP);
 }
 
 /**

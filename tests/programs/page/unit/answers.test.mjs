@@ -87,3 +87,12 @@ test("what was skipped counts as part of the clip", () => {
   assert.equal(own.clip_begin, 0.5);
   assert.equal(own.clip_end, 11.5);
 });
+
+test("of answers without a track the nearest is told", () => {
+  const verdicts = (...list) => answers.bestOf(list.map((verdict) => ({ verdict, matches: [] })));
+  assert.equal(verdicts("no match", "not sure", "too quiet").verdict, "not sure");
+  assert.equal(verdicts("too quiet", "no match").verdict, "no match");
+  const match = { verdict: "match", matches: [MATCH] };
+  assert.equal(answers.bestOf([{ verdict: "not sure" }, match]), match);
+  assert.equal(answers.bestOf([match, { verdict: "no match" }]), match);
+});

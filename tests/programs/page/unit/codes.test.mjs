@@ -4,7 +4,13 @@ import assert from "node:assert/strict";
 import { test } from "node:test";
 
 import { countDifferent, gridStart, lay } from "../../../../web/app/codes.js";
-import { CODE_SECONDS, MOMENTS, nextMoment, readingsAt } from "../../../../web/app/schedule.js";
+import {
+  CODE_SECONDS,
+  MOMENTS,
+  OWN_SPEED,
+  nextMoment,
+  roundsAt,
+} from "../../../../web/app/schedule.js";
 
 const ALL = 0xffffffffffffffffn;
 
@@ -63,8 +69,13 @@ test("the moments to ask at come one by one", () => {
 });
 
 test("other speeds are tried once enough was heard", () => {
-  const speeds = (seconds) => readingsAt(seconds).map((reading) => reading.speed);
+  const speeds = (seconds) => roundsAt(seconds).flat().map((reading) => reading.speed);
   assert.deepEqual(new Set(speeds(8)), new Set([1]));
   assert.deepEqual(new Set(speeds(11)), new Set([1, 1.04, 0.96]));
-  assert.deepEqual(readingsAt(5)[0], { speed: 1, skipped: 0 });
+  assert.ok(roundsAt(11)[0].every((reading) => reading.speed === 1), "its own speed comes first");
+});
+
+test("readings begin evenly apart within a code", () => {
+  const skipped = OWN_SPEED.map((reading) => reading.skipped / CODE_SECONDS);
+  assert.deepEqual(skipped, [0, 0.25, 0.5, 0.75]);
 });

@@ -104,37 +104,56 @@ test("samples come out as they went in", () => {
   assert.equal(sound.seconds, 1.5);
 });
 
-test("readings are tried until one is recognised", async () => {
-  const rates = [];
+/** A recogniser over trails that are numbered as they are made. */
+function numbered(answerTo) {
+  const made = [];
   const makers = {
     trail: async (samples, rate) => {
-      rates.push([samples.length, rate]);
-      return Uint8Array.of(rates.length);
+      made.push([samples.length, rate]);
+      return Uint8Array.of(made.length);
     },
   };
-  const service = { match: async ([number]) => (number === 3 ? MATCH : NONE) };
-  const readings = [
-    { speed: 1, skipped: 0 },
-    { speed: 1, skipped: 1 },
-    { speed: 1.25, skipped: 0 },
-    { speed: 2, skipped: 0 },
-  ];
-  const { signal } = new AbortController();
-  const clip = { samples: new Float32Array(1000), rate: 100 };
-  const answer = await new Recogniser(makers, service).ask(clip, readings, { signal });
-  assert.deepEqual(rates, [[1000, 100], [900, 100], [1000, 80]]);
-  assert.equal(answer.matches[0].tempo, 1.25);
+  const service = { match: async ([number]) => answerTo(number) };
+  return { made, recogniser: new Recogniser(makers, service) };
+}
+
+const CLIP = { samples: new Float32Array(1000).fill(0.1), rate: 100 };
+const OPTIONS = { signal: new AbortController().signal };
+const scored = (score, more = {}) => ({
+  verdict: "match",
+  matches: [{ track: 1, offset: 2, score, threshold: 7, ...more }],
 });
 
-test("a clip that is too quiet is asked about once", async () => {
-  let count = 0;
-  const makers = { trail: async () => Uint8Array.of(0) };
-  const service = { match: async () => (++count, { verdict: "too quiet", matches: [] }) };
-  const { signal } = new AbortController();
-  const clip = { samples: new Float32Array(1000), rate: 100 };
-  const readings = [{ speed: 1, skipped: 0 }, { speed: 1, skipped: 1 }];
-  await new Recogniser(makers, service).ask(clip, readings, { signal });
-  assert.equal(count, 1);
+test("of a round the highest score is taken", async () => {
+  const { made, recogniser } = numbered((number) => [NONE, scored(8), scored(9)][number - 1]);
+  const round = [0, 1, 2].map((skipped) => ({ speed: 1, skipped }));
+  const { matches } = await recogniser.ask(CLIP, [round, round], OPTIONS);
+  assert.deepEqual(made, [[1000, 100], [900, 100], [800, 100]], "the second round is not needed");
+  assert.equal(matches[0].score, 9);
+  assert.equal(matches[0].offset, 0, "of the clip's beginning, two seconds before the reading's");
+});
+
+test("another speed has to score more", async () => {
+  const rounds = [[{ speed: 1, skipped: 0 }], [{ speed: 1.25, skipped: 0 }]];
+  const answerWith = (score) => numbered((number) => (number === 2 ? scored(score) : NONE));
+  const weak = await answerWith(7.9).recogniser.ask(CLIP, rounds, OPTIONS);
+  assert.equal(weak.verdict, "not sure");
+  const { made, recogniser } = answerWith(8);
+  const answer = await recogniser.ask(CLIP, rounds, OPTIONS);
+  assert.deepEqual(made, [[1000, 100], [1000, 80]]);
+  assert.equal(answer.matches[0].tempo, 1.25);
+  assert.equal(answer.matches[0].threshold, 8);
+});
+
+test("about silence nobody is asked", async () => {
+  const { made, recogniser } = numbered(() => scored(9));
+  const silence = { samples: new Float32Array(1000).fill(0.0009), rate: 100 };
+  const round = [{ speed: 1, skipped: 0 }];
+  assert.equal((await recogniser.ask(silence, [round], OPTIONS)).verdict, "too quiet");
+  assert.equal((await recogniser.askPassages(silence, OPTIONS)).verdict, "too quiet");
+  assert.equal(made.length, 0);
+  silence.samples.fill(0.01, 400, 500);
+  assert.equal((await recogniser.ask(silence, [round], OPTIONS)).verdict, "match");
 });
 
 test("the meter is empty in silence, full at the top", () => {

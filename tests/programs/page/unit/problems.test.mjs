@@ -24,6 +24,14 @@ test("each trouble of the microphone has its words", () => {
   assert.match(problemOf(new NoMicrophoneHere(true)).advice, /current version/);
 });
 
+test("the package's words for them are known too", () => {
+  const coded = (code) => Object.assign(named("KzError"), { code });
+  assert.match(problemOf(coded("refused")).title, /refused/);
+  assert.match(problemOf(coded("no-microphone")).title, /No microphone/);
+  assert.match(problemOf(coded("busy")).title, /cannot be used/);
+  assert.match(problemOf(coded("load")).title, /part of the page/);
+});
+
 test("an error that was wrapped is still known", () => {
   const wrapped = new Error("could not open", { cause: named("NotAllowedError") });
   assert.match(problemOf(wrapped).title, /refused/);

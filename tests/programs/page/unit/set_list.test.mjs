@@ -3,7 +3,7 @@
 import assert from "node:assert/strict";
 import { test } from "node:test";
 
-import { entriesOf, toCsv, toText } from "../../../../web/app/set_list.js";
+import { entriesOf, merged, toCsv, toText } from "../../../../web/app/set_list.js";
 
 const track = (title, clip_begin, clip_end) => ({
   track: 1,
@@ -33,6 +33,49 @@ test("entries stand in the order of the recording", () => {
     ["First", null, "Second"],
   );
   assert.deepEqual(entriesOf({}), []);
+});
+
+const passage = (title, clip_begin, clip_end, score, number = 1) => ({
+  ...track(title, clip_begin, clip_end),
+  track: number,
+  score,
+});
+const timesOf = (answer) =>
+  answer.matches.map(({ title, clip_begin, clip_end }) => [title, clip_begin, clip_end]);
+const matching = (...matches) => ({ verdict: "match", matches });
+
+test("of several answers the surest passages stay", () => {
+  const answer = merged(
+    [
+      matching(passage("wrong track", 0, 60, 8, 2), passage("B", 70, 130, 9)),
+      matching(passage("A", 1, 59, 12)),
+      matching(passage("B", 71, 129, 8)),
+    ],
+    140,
+  );
+  assert.deepEqual(timesOf(answer), [["A", 1, 59], ["B", 70, 129]]);
+  assert.deepEqual(answer.gaps, [
+    { clip_begin: 59, clip_end: 70 },
+    { clip_begin: 129, clip_end: 140 },
+  ]);
+});
+
+test("a passage ends where most answers say", () => {
+  const ends = [[0, 42, 15], [1, 35, 9], [1, 35, 10]];
+  const answers = ends.map(([begin, end, score]) => matching(passage("A", begin, end, score)));
+  const { matches } = merged(answers, 100);
+  assert.deepEqual([matches[0].score, matches[0].clip_begin, matches[0].clip_end], [15, 1, 35]);
+});
+
+test("a passage ends where the next one begins", () => {
+  const answer = merged([matching(passage("A", 0, 62, 9)), matching(passage("B", 60, 90, 8, 2))], 91);
+  assert.deepEqual(answer.matches.map((match) => match.clip_end), [60, 90]);
+  assert.deepEqual(answer.gaps, []);
+});
+
+test("answers without passages give none", () => {
+  const answer = merged([{ verdict: "no match", matches: [] }, { verdict: "not sure" }], 90);
+  assert.equal(answer.verdict, "not sure");
 });
 
 test("text has a line for each entry and gap", () => {
