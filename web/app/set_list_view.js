@@ -61,17 +61,20 @@ function row({ begin, end, match }) {
     const cell = make("td", { colspan: "3", class: "soft", text: "not recognised" });
     return make("tr", {}, time, cell);
   }
+  const place = clockText(placeOf(match));
+  const sure = [match.sure, changesOf(match)].filter(Boolean).join(", ");
   const track = make("td", {}, make("span", { class: "strong", text: nameOf(match) }));
   if (match.artist) {
-    track.append(make("span", { class: "artist", text: match.artist }));
+    track.append(make("span", { class: "below", text: match.artist }));
   }
-  const sure = [match.sure, changesOf(match)].filter(Boolean).join(", ");
+  // A narrow screen has no room for the columns of these two, and shows them here instead.
+  track.append(make("span", { class: "below narrow soft", text: `from ${place}, ${sure}` }));
   return make(
     "tr",
     {},
     time,
     track,
-    make("td", { class: "number", text: clockText(placeOf(match)) }),
-    make("td", { text: sure }),
+    make("td", { class: "wide number", text: place }),
+    make("td", { class: "wide", text: sure }),
   );
 }

@@ -112,7 +112,7 @@ describe("files", { skip: setting.SKIPPED }, () => {
       /Only the first of 2 files/.test(document.querySelector("#status").textContent));
     await dropMany(page, ["telephone-15s.wav", "silence.wav"]);
     await said;
-    await shown(page, "#result");
+    await shown(page, "#drawing"); // the last that moves what is below
   });
 
   test("the history can be cleared", async () => {
