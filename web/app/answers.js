@@ -2,8 +2,8 @@
 
 import { clockText } from "./times.js";
 
-/** Factors of speed are good to a quarter of a percent. */
-const NO_CHANGE = 0.0025;
+/** A change of speed that is not worth telling. */
+const NO_CHANGE = 0.005;
 
 /**
  * The name under which a track is shown.
@@ -43,15 +43,16 @@ export function placeOf(match) {
 }
 
 function changeText(factor, more, less) {
-  const percent = (factor - 1) * 100;
-  return `${Math.abs(percent).toFixed(1)} % ${percent > 0 ? more : less}`;
+  const percent = Math.round((factor - 1) * 100);
+  return `about ${Math.abs(percent)} % ${percent > 0 ? more : less}`;
 }
 
 /**
- * How the clip differs from the track in speed, tempo and pitch.
+ * How the clip differs from the track in speed, tempo and pitch. Of a trail it is known by how it
+ * was read, to two percent or so.
  *
  * @param {{speed?: number, tempo?: number, pitch?: number}} match
- * @returns {string} "3.9 % faster", or "" when nothing was changed
+ * @returns {string} "about 4 % faster", or "" when nothing was changed
  */
 export function changesOf(match) {
   const changed = (factor) => Number.isFinite(factor) && Math.abs(factor - 1) >= NO_CHANGE;

@@ -22,8 +22,9 @@ import { TokenView } from "./token_view.js";
 /** From this many seconds on a recording may hold several tracks. */
 const LONG = 60;
 
-/** Seconds after which it is said that the page is still listening. */
+/** Seconds after which it is said that the page is still listening, and that it hears nothing. */
 const REMINDER = 15;
+const SILENCE = 4;
 
 const token = new Token(() => sessionStorage);
 const service = new Service(new URL("../", import.meta.url), token);
@@ -136,6 +137,7 @@ function startListening() {
     trailMakers().catch(() => {});
     const level = new Level();
     let clip;
+    let loudest = 0;
     let lastSaid = null;
     const answer = await listen({
       openMicrophone,
@@ -143,8 +145,11 @@ function startListening() {
       signal,
       onBusy,
       onHeard: ({ seconds, samples, rate }) => {
-        lastSaid = sayHowLong(seconds, lastSaid);
-        status.level(level.after(samples, samples.length / rate));
+        const now = level.after(samples, samples.length / rate);
+        loudest = Math.max(loudest, now);
+        status.level(now);
+        status.detail(`${Math.floor(seconds)} s heard`);
+        lastSaid = sayOnce(listeningText(seconds, loudest), lastSaid);
       },
       onClip: (heard) => {
         clip = heard;
@@ -155,12 +160,17 @@ function startListening() {
   });
 }
 
-function sayHowLong(seconds, lastSaid) {
-  status.detail(`${Math.floor(seconds)} s heard`);
-  const text =
-    seconds < REMINDER
-      ? "Listening. Hold this device near the loudspeaker."
-      : `Still listening: ${REMINDER} seconds were not enough.`;
+function listeningText(seconds, loudest) {
+  if (loudest === 0 && seconds > SILENCE) {
+    return "Listening, and hearing nothing. Is the music on, and the microphone?";
+  }
+  return seconds < REMINDER
+    ? "Listening. Hold this device near the loudspeaker."
+    : `Still listening: ${REMINDER} seconds were not enough.`;
+}
+
+/** What is said again is read out again. */
+function sayOnce(text, lastSaid) {
   if (text !== lastSaid) {
     say(text);
   }

@@ -9,6 +9,9 @@ import { CODE_SECONDS } from "./schedule.js";
  */
 const RATE = 11025;
 
+/** For browsers that decode at no lower rate than sound is played at. */
+const USUAL_RATE = 44100;
+
 /** The largest file, in bytes: beyond it browsers end the page for want of memory. */
 const LARGEST = 1 << 30;
 
@@ -71,7 +74,7 @@ export async function bytesOf(file) {
  * @throws {UnreadableFile}
  */
 export async function decode(bytes, name) {
-  const context = new OfflineAudioContext(1, 1, RATE);
+  const context = decoder();
   let sound;
   try {
     sound = await context.decodeAudioData(bytes);
@@ -86,6 +89,14 @@ export async function decode(bytes, name) {
     sound.getChannelData(i),
   );
   return { samples: mixed(channels), rate: sound.sampleRate };
+}
+
+function decoder() {
+  try {
+    return new OfflineAudioContext(1, 1, RATE);
+  } catch {
+    return new OfflineAudioContext(1, 1, USUAL_RATE);
+  }
 }
 
 /**

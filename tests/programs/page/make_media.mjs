@@ -88,6 +88,7 @@ function makeAll(media, folder) {
   sox(tune, ...telephone, at("telephone.au"), "trim", "100.05", "33", "sinc", "300-3400");
   sox(at("telephone.au"), "-r", "48000", "-b", "16", "-e", "signed", at("telephone.wav"));
   sox(at("telephone.wav"), at("telephone-15s.wav"), "trim", "0", "15");
+  sox(at("telephone-15s.wav"), "-b", "16", at("fast.wav"), "speed", "1.05");
 
   // A long recording: two tracks with noise between them, and a third at its end.
   const piece = (name, from, begin) => {

@@ -35,6 +35,14 @@ describe("files", { skip: setting.SKIPPED }, () => {
     setting.assertNothingLeaked(page, server.url);
   });
 
+  test("a clip that runs too fast is named", async () => {
+    await page.setFiles("#file", [sound("fast.wav")]);
+    await page.waitFor(() => /faster/.test(document.querySelector("#result-facts").innerText));
+    assert.match(await textOf(page, "#result-facts"), /Place in the track\s+1:40/);
+    assert.match(await textOf(page, "#result-facts"), /Played\s+about 4 % faster/);
+    await shown(page, "#drawing");
+  });
+
   test("a dropped clip is named", async () => {
     await drop(page, "telephone-15s.wav");
     await page.waitFor(() => document.querySelector("#result").hidden);

@@ -48,6 +48,16 @@ describe("listening", { skip: setting.SKIPPED }, () => {
     await page.close();
   });
 
+  test("silence is told while it lasts", async () => {
+    const silent = await setting.browserHearing("silence.wav");
+    const page = await setting.openPage(silent, server.url);
+    await page.click("#listen");
+    await page.waitFor(() => /hearing nothing/.test(document.querySelector("#status").innerText));
+    await page.press("Escape");
+    assert.deepEqual(page.sent.filter(({ verb }) => verb !== "GET"), [], "nobody was asked");
+    await silent.close();
+  });
+
   test("keys alone listen, stop and clear", async () => {
     const page = await setting.openPage(browser, server.url);
     await page.press("Tab");

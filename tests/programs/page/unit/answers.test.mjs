@@ -57,13 +57,13 @@ test("the place is where the heard part begins", () => {
 
 test("changes of speed are told, small ones not", () => {
   assert.equal(answers.changesOf(MATCH), "");
-  assert.equal(answers.changesOf({ ...MATCH, speed: 1.0391 }), "3.9 % faster");
-  assert.equal(answers.changesOf({ ...MATCH, speed: 0.96 }), "4.0 % slower");
+  assert.equal(answers.changesOf({ ...MATCH, speed: 1.0391 }), "about 4 % faster");
+  assert.equal(answers.changesOf({ ...MATCH, speed: 0.96 }), "about 4 % slower");
   assert.equal(
     answers.changesOf({ ...MATCH, tempo: 1.03, pitch: 0.98 }),
-    "3.0 % quicker in tempo, 2.0 % lower in pitch",
+    "about 3 % quicker in tempo, about 2 % lower in pitch",
   );
-  assert.equal(answers.changesOf({ ...MATCH, speed: 1.001 }), "");
+  assert.equal(answers.changesOf({ ...MATCH, speed: 1.004 }), "");
 });
 
 test("certainty comes with its numbers", () => {
