@@ -20,6 +20,7 @@ function microphone(log) {
   return async ({ onSamples }) => {
     onSamples(new Float32Array(RATE).fill(0.1)); // before the rate is known
     const timer = setInterval(() => onSamples(new Float32Array(RATE).fill(0.1)), 1);
+    timer.unref(); // one that is not stopped is to be noticed, not to run for ever
     return {
       rate: RATE,
       stop: () => {
