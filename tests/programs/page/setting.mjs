@@ -51,12 +51,13 @@ export class Server {
   /**
    * Starts it at a free port, or the one named.
    *
-   * @param {{port?: number, options?: string[]}} settings
+   * @param {{port?: number, folder?: string, options?: string[]}} settings
+   *   folder: of the page, when it is another one
    */
-  static async start({ port = 0, options = [] } = {}) {
+  static async start({ port = 0, folder = env.KZ_PAGE, options = [] } = {}) {
     Server.#catalogue ??= makeCatalogue(temporaryFolder());
     const server = new Server();
-    const where = ["--listen", `127.0.0.1:${port}`, "--page", env.KZ_PAGE, "--log", "none"];
+    const where = ["--listen", `127.0.0.1:${port}`, "--page", folder, "--log", "none"];
     server.child = spawn(env.KZFP, ["serve", Server.#catalogue, ...where, ...options], {
       stdio: ["ignore", "pipe", "inherit"],
     });

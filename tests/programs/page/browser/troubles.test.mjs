@@ -1,7 +1,7 @@
 // What the page says when something is missing: microphone, server, token, storage.
 
 import assert from "node:assert/strict";
-import { writeFileSync, mkdtempSync, rmSync } from "node:fs";
+import { cpSync, mkdtempSync, rmSync, writeFileSync } from "node:fs";
 import { tmpdir } from "node:os";
 import { join } from "node:path";
 import { after, describe, test } from "node:test";
@@ -28,6 +28,11 @@ describe("troubles", { skip: setting.SKIPPED }, () => {
     const browser = await setting.browserHearing(undefined, flags);
     open.push(browser);
     return browser;
+  };
+  const temporary = (name) => {
+    const folder = mkdtempSync(join(tmpdir(), name));
+    open.push({ close: () => rmSync(folder, { recursive: true }) });
+    return folder;
   };
   /** Presses Listen, and returns what is said to be wrong. */
   const troubleOf = async (page) => {
@@ -69,9 +74,7 @@ describe("troubles", { skip: setting.SKIPPED }, () => {
   });
 
   test("a token is asked for when it is wanted", async () => {
-    const folder = mkdtempSync(join(tmpdir(), "kz-token-"));
-    open.push({ close: () => rmSync(folder, { recursive: true }) });
-    const file = join(folder, "token");
+    const file = join(temporary("kz-token-"), "token");
     writeFileSync(file, `${TOKEN}\n`, { mode: 0o600 });
     const server = await start({ options: ["--token-file", file] });
     const page = await setting.openPage(await browse([]), server.url);
@@ -92,6 +95,19 @@ describe("troubles", { skip: setting.SKIPPED }, () => {
     await page.reload();
     await page.setFiles("#file", [sound("telephone-15s.wav")]);
     await shown(page, "#result");
+  });
+
+  test("a part of the page that does not come", async () => {
+    const browser = await browse([]);
+    for (const part of ["kzsdk.wasm", "worker.js", "client.js"]) {
+      const folder = temporary("kz-part-");
+      const isKept = (name) => !name.includes(part);
+      cpSync(process.env.KZ_PAGE, folder, { recursive: true, filter: isKept });
+      const { url } = await start({ folder });
+      const page = await setting.openPage(browser, url);
+      await page.setFiles("#file", [sound("telephone-15s.wav")]);
+      assert.match(await shown(page, "#problem"), /A part of the page is missing/, part);
+    }
   });
 
   test("a browser that keeps nothing", async () => {
