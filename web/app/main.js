@@ -124,9 +124,7 @@ function showError(error, tryAgain) {
   status.problem(problem, problem.again && !problem.token ? tryAgain : null);
 }
 
-function onBusy(seconds) {
-  status.detail(`The server is busy; asking again in ${lengthText(Math.ceil(seconds))}.`);
-}
+const BUSY = "The server is busy, and is asked again in a moment.";
 
 // ---- Out of the microphone
 
@@ -138,17 +136,19 @@ function startListening() {
     const level = new Level();
     let clip;
     let loudest = 0;
+    let busyUntil = 0;
     let lastSaid = null;
     const answer = await listen({
       openMicrophone,
       recogniser,
       signal,
-      onBusy,
+      onBusy: (seconds) => (busyUntil = performance.now() + 1000 * seconds),
       onHeard: ({ seconds, samples, rate }) => {
         const now = level.after(samples, samples.length / rate);
         loudest = Math.max(loudest, now);
         status.level(now);
-        status.detail(`${Math.floor(seconds)} s heard`);
+        const isBusy = performance.now() < busyUntil;
+        status.detail(isBusy ? BUSY : `${Math.floor(seconds)} s heard`);
         lastSaid = sayOnce(listeningText(seconds, loudest), lastSaid);
       },
       onClip: (heard) => {
@@ -204,7 +204,7 @@ async function askAboutTrail(trail, name, signal, keep) {
   keep((later, keepAgain) => askAboutTrail(trail, name, later, keepAgain));
   say(`Looking up “${name}”.`);
   const passages = secondsOfTrail(trail) > LONG;
-  const answer = await service.match(trail, { passages, signal, onBusy });
+  const answer = await service.match(trail, { passages, signal, onBusy: sayBusy });
   await showAnswer({ answer, clip: null, from: name, signal, passages });
 }
 
@@ -214,11 +214,15 @@ async function askAbout(clip, name, signal, keep) {
   const passages = seconds > LONG;
   const what = name ? `“${name}”, ${lengthText(seconds)}` : "what was heard";
   say(`Looking up ${what}.`);
-  const options = { signal, onBusy };
+  const options = { signal, onBusy: sayBusy };
   const answer = passages
     ? await recogniser.askPassages(clip, options)
     : await recogniser.ask(clip, roundsAt(seconds), options);
   await showAnswer({ answer, clip, from: name, signal, passages });
+}
+
+function sayBusy() {
+  status.detail(BUSY);
 }
 
 // ---- What came of it

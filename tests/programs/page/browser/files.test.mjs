@@ -1,7 +1,9 @@
 // Files that are chosen or dropped: clips, long recordings, and what is no sound.
 
 import assert from "node:assert/strict";
-import { readFileSync } from "node:fs";
+import { existsSync, mkdtempSync, readFileSync, rmSync } from "node:fs";
+import { tmpdir } from "node:os";
+import { join } from "node:path";
 import { after, before, describe, test } from "node:test";
 
 import * as setting from "../setting.mjs";
@@ -86,6 +88,22 @@ describe("files", { skip: setting.SKIPPED }, () => {
     await page.click("#copy-csv");
     await page.waitFor(() => document.querySelector("#status").textContent.endsWith("as CSV."));
     assert.match(await clipboard(page), /^begin,end,title,artist,source,place,sure\r?\n0\.\d,3/);
+  });
+
+  test("a set-list is saved as a file", async () => {
+    const folder = mkdtempSync(join(tmpdir(), "kz-saved-"));
+    await browser.connection.send("Browser.setDownloadBehavior", {
+      behavior: "allow",
+      downloadPath: folder,
+      browserContextId: page.ids.browserContextId,
+    });
+    await page.click("#save-csv");
+    const file = join(folder, "evening.csv");
+    await page.until(() => existsSync(file), "the file to be saved", 10_000);
+    const [header, first] = readFileSync(file, "utf8").split("\r\n");
+    assert.match(header, /^begin,end,title,artist/);
+    assert.match(first, /^0\.\d,3\d\.\d,Trip on the Funny Boat,JDruid/);
+    rmSync(folder, { recursive: true });
   });
 
   test("where copying is refused the text is offered", async () => {
