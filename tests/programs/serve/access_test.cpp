@@ -205,6 +205,15 @@ TEST_F(ServeAccess, BadPlacesAreRefusedWithACure)
                          "Address already in use"));
 }
 
+TEST_F(ServeAccess, AMissingLibraryIsNamedWithItsCure)
+{
+    ProcessSetup setup;
+    setup.environment = {"LD_PRELOAD=" KZFP_MISSING_LIBRARIES, "MISSING_LIBRARIES=libmicrohttpd"};
+    const ProcessResult result = kzfp({"serve", catalogue(), "--listen", "127.0.0.1:0"}, setup);
+    EXPECT_EQ(1, result.status);
+    EXPECT_TRUE(contains(result.err, "install it (Debian: libmicrohttpd12)")) << result.err;
+}
+
 TEST_F(ServeAccess, CataloguesThatAreMissingAreReported)
 {
     const ProcessResult result =

@@ -63,6 +63,16 @@ TEST_F(ServeLimits, EachKindOfBodyHasItsOwn)
     }
 }
 
+TEST_F(ServeLimits, SoundLongerThanAnHourIsRefused)
+{
+    const Service service = start({catalogue()});
+    const uint32_t samples = 3601 * 4000;
+    const std::string sound = wav_header(4000, 1, samples * 2) + std::string(samples * 2, '\0');
+    const Response response = service.post("/v1/match", "audio/wav", sound);
+    EXPECT_EQ(413, response.status) << response.body;
+    EXPECT_EQ("sound_too_long", response.error());
+}
+
 TEST_F(ServeLimits, SlowHeadsAreToldSo)
 {
     Service service = start({catalogue(), "--deadline", "1"});

@@ -28,8 +28,8 @@ struct Recording {
 };
 
 /// Reads a sound file, or a trail file (.kzt), to its end or that of the section. `documents`: it
-/// is to answer query documents too. Where the sound has no title it is that of `name`, which is the
-/// path unless another is given. Throws audio::FileError and CatalogueError.
+/// is to answer query documents too. Sound without a title takes it from `name`, which is the path
+/// unless another is given. Throws audio::FileError and CatalogueError.
 Recording read_recording(const std::string& path, const SoundOptions& options, bool documents,
                          const std::string& name = {});
 

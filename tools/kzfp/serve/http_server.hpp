@@ -24,10 +24,10 @@ struct HttpSettings {
     std::string key;                            ///< PEM
 };
 
-/// Whether this build has an HTTP server.
-bool has_http();
+/// Throws audio::FileError when there is no HTTP server in this build, or on this machine, and says
+/// what to install.
+void check_http();
 
-/// Throws audio::FileError when this build has no HTTP server, naming what it needs.
 class HttpServer {
 public:
     /// Begins to serve. `receiver` outlives the object. Throws audio::FileError.

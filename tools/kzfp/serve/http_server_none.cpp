@@ -7,13 +7,13 @@ namespace kzfp::serve {
 
 class HttpServer::Inside {};
 
-bool has_http() { return false; }
-
-HttpServer::HttpServer(const HttpSettings& /*settings*/, Receiver& /*receiver*/)
+void check_http()
 {
     throw audio::FileError("this build has no service; install libmicrohttpd (Debian: "
                            "libmicrohttpd-dev) and build again with -DKZ_SERVICE=ON");
 }
+
+HttpServer::HttpServer(const HttpSettings& /*settings*/, Receiver& /*receiver*/) { check_http(); }
 
 HttpServer::~HttpServer() = default;
 

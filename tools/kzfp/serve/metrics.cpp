@@ -46,8 +46,9 @@ void Metrics::count_lookup(const std::string& kind, const std::string& verdict, 
 
 void Metrics::count_request(const std::string& route, unsigned status)
 {
+    const Labels labels(route, std::to_string(status));
     const std::lock_guard lock(mutex_);
-    ++requests_[{route, std::to_string(status)}];
+    ++requests_[labels];
 }
 
 void Metrics::count_refusal(const std::string& reason)

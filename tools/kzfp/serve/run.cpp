@@ -125,6 +125,7 @@ std::string address_text(const Listener& listener, const RunSettings& settings)
 
 void run(RunSettings settings)
 {
+    check_http();
     const EndSignals signals;
     const Listener listener = listen_at(settings.listen);
     check_is_safe(listener, settings);
