@@ -30,7 +30,7 @@ const token = new Token(() => sessionStorage);
 const service = new Service(new URL("../", import.meta.url), token);
 const recogniser = new Recogniser(
   {
-    trail: async (...sound) => (await trailMakers()).trail(...sound),
+    trailBuilder: async (rate) => (await trailMakers()).trailBuilder(rate),
     readTrail: async (bytes) => (await trailMakers()).readTrail(bytes),
   },
   service,

@@ -10,7 +10,7 @@ let client = null;
 /**
  * What makes and reads trails, in a worker.
  *
- * @returns {Promise<{trail: Function, readTrail: Function}>}
+ * @returns {Promise<{trailBuilder: Function, readTrail: Function}>}
  * @throws {PageBroken}
  */
 export function trailMakers() {

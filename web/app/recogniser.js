@@ -7,6 +7,9 @@ import { isQuiet } from "./level.js";
 import { CODE_SECONDS, OWN_SPEED } from "./schedule.js";
 import { merged } from "./set_list.js";
 
+/** Samples that go to the worker at once. */
+const PIECE = 1 << 20;
+
 /** A trail does not say how loud the sound was, so the service cannot. */
 const TOO_QUIET = { verdict: "too quiet", matches: [] };
 
@@ -24,7 +27,7 @@ export class Recogniser {
   #service;
 
   /**
-   * @param {{trail: Function, readTrail: Function}} makers  Make and read trails; promises.
+   * @param {{trailBuilder: Function, readTrail: Function}} makers  Make and read trails; promises.
    * @param {import("./service.js").Service} service
    */
   constructor(makers, service) {
@@ -80,10 +83,24 @@ export class Recogniser {
   async #read(clip, { speed, skipped }, options) {
     // Sound that is said to have a lower rate is slower by as much.
     const samples = clip.samples.subarray(Math.round(skipped * clip.rate));
-    const trail = await this.#makers.trail(samples, Math.round(clip.rate / speed));
-    options.signal.throwIfAborted();
+    const trail = await this.#trail(samples, Math.round(clip.rate / speed), options.signal);
     const answer = await this.#service.match(trail, options);
     return fromTheStart(atOwnSpeed(withMargin(answer, speed), speed), skipped);
+  }
+
+  /** Made piece by piece: hours of sound are not copied at once, and a stop is soon noticed. */
+  async #trail(samples, rate, signal) {
+    const builder = await this.#makers.trailBuilder(rate);
+    try {
+      for (let at = 0; at < samples.length; at += PIECE) {
+        signal.throwIfAborted();
+        await builder.feed(samples.slice(at, at + PIECE), { transfer: true });
+      }
+      return await builder.finish();
+    } finally {
+      // What ended badly has ended all the same.
+      builder.free().catch(() => {});
+    }
   }
 
   /**
@@ -106,7 +123,7 @@ export class Recogniser {
       Math.round(end * clip.rate),
     );
     const [own, track] = await Promise.all([
-      this.#makers.trail(samples, Math.round(clip.rate / pitch)),
+      this.#trail(samples, Math.round(clip.rate / pitch), signal),
       this.#service.trail(match.track, signal),
     ]);
     const [ownCodes, trackCodes] = await Promise.all(

@@ -33,6 +33,9 @@ const STATES = {
     await page.setFiles("#file", [sound("telephone-15s.wav")]);
     await shown(page, "#drawing");
   },
+  token: async (page) => {
+    await page.evaluate(() => (document.querySelector("#token-form").hidden = false));
+  },
   "set-list": async (page) => {
     await page.setFiles("#file", [sound("evening.mp3")]);
     await page.waitFor(() => document.querySelectorAll("#set-list-rows tr").length >= 4);

@@ -108,14 +108,21 @@ test("samples come out as they went in", () => {
 /** A recogniser over trails that are numbered as they are made. */
 function numbered(answerTo) {
   const made = [];
+  const freed = [];
   const makers = {
-    trail: async (samples, rate) => {
-      made.push([samples.length, rate]);
-      return Uint8Array.of(made.length);
+    trailBuilder: async (rate) => {
+      const trail = [0, rate];
+      made.push(trail);
+      const number = made.length;
+      return {
+        feed: async (samples) => (trail[0] += samples.length),
+        finish: async () => Uint8Array.of(number),
+        free: async () => freed.push(number),
+      };
     },
   };
   const service = { match: async ([number]) => answerTo(number) };
-  return { made, recogniser: new Recogniser(makers, service) };
+  return { made, freed, recogniser: new Recogniser(makers, service) };
 }
 
 const CLIP = { samples: new Float32Array(1000).fill(0.1), rate: 100 };
@@ -144,6 +151,14 @@ test("another speed has to score more", async () => {
   assert.deepEqual(made, [[1000, 100], [1000, 80]]);
   assert.equal(answer.matches[0].tempo, 1.25);
   assert.equal(answer.matches[0].threshold, 8);
+});
+
+test("long sound goes piece by piece, all of it", async () => {
+  const { made, freed, recogniser } = numbered(() => NONE);
+  const long = { samples: new Float32Array(2 ** 20 + 500).fill(0.1), rate: 100 };
+  await recogniser.ask(long, [[{ speed: 1, skipped: 1 }]], OPTIONS);
+  assert.deepEqual(made, [[2 ** 20 + 400, 100]]);
+  assert.deepEqual(freed, [1], "the worker's memory is given back");
 });
 
 test("about silence nobody is asked", async () => {
