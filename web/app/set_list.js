@@ -36,17 +36,22 @@ const SHORTEST_GAP = 2;
 /** A passage that lies in others by more than this share of it is what they are. */
 const MOST_OVERLAP = 0.5;
 
+/** Answers that place a track within so many seconds of each other mean the same playing of it. */
+const SAME_PLACE = 2;
+
 /**
- * One answer out of several about one recording, of each stretch the passage that scores highest.
+ * One answer out of several about one recording. Where they disagree, the passage stays that is
+ * above its threshold by most, for longest and in most answers.
  *
  * @param {object[]} answers  With passages, in seconds of the recording.
  * @param {number} seconds    that the recording lasts
  * @returns {object} an answer with `matches`, in the recording's order, and `gaps`
  */
 export function merged(answers, seconds) {
-  const all = answers.filter(isMatch).flatMap((answer) => answer.matches);
+  const playings = playingsOf(answers.filter(isMatch));
   const kept = [];
-  for (const match of all.sort((one, other) => other.score - one.score)) {
+  for (const playing of playings.sort((one, other) => other.weight - one.weight)) {
+    const match = { ...playing.best, ...endsOf(playing) };
     if (sharedWith(kept, match) <= MOST_OVERLAP * (match.clip_end - match.clip_begin)) {
       kept.push(match);
     }
@@ -54,9 +59,58 @@ export function merged(answers, seconds) {
   if (kept.length === 0) {
     return bestOf(answers);
   }
-  const placed = kept.map((match) => withUsualEnds(match, all));
-  const matches = withoutOverlap(placed.sort((one, other) => one.clip_begin - other.clip_begin));
+  const matches = withoutOverlap(kept.sort((one, other) => one.clip_begin - other.clip_begin));
   return { verdict: "match", matches, gaps: gapsBetween(matches, seconds) };
+}
+
+/**
+ * A track that was played once, as several answers have it. `offset` is the place of the
+ * recording's beginning in it, so that no two playings of a track have the same.
+ *
+ * @typedef {object} Playing
+ * @property {object} best                         the match that scores highest
+ * @property {number} weight                       what speaks for it
+ * @property {Map<object, [number, number]>} ends  by answer, in seconds of the recording
+ */
+
+/** @returns {Playing[]} */
+function playingsOf(answers) {
+  const playings = [];
+  const isOf = (match) => (playing) =>
+    playing.best.track === match.track &&
+    Math.abs(playing.best.offset - match.offset) <= SAME_PLACE;
+  for (const answer of answers) {
+    for (const match of answer.matches) {
+      let playing = playings.find(isOf(match));
+      if (!playing) {
+        playing = { best: match, weight: 0, ends: new Map() };
+        playings.push(playing);
+      }
+      addTo(playing, answer, match);
+    }
+  }
+  return playings;
+}
+
+function addTo(playing, answer, match) {
+  const { clip_begin: begin, clip_end: end, score, threshold } = match;
+  const [first, last] = playing.ends.get(answer) ?? [Infinity, -Infinity];
+  playing.ends.set(answer, [Math.min(first, begin), Math.max(last, end)]);
+  playing.weight += (score - threshold) * (end - begin);
+  if (score > playing.best.score) {
+    playing.best = match;
+  }
+}
+
+/** Its ends as two answers have them: one alone may take what comes before or after for more. */
+function endsOf({ ends }) {
+  const second = (values) => values[Math.min(1, values.length - 1)];
+  const begins = [...ends.values()].map(([begin]) => begin);
+  const lasts = [...ends.values()].map(([, end]) => end);
+  return {
+    clip_begin: second(begins.sort((one, other) => one - other)),
+    clip_end: second(lasts.sort((one, other) => other - one)),
+  };
 }
 
 /** Seconds of a passage that lie in others. */
@@ -64,24 +118,6 @@ function sharedWith(others, match) {
   const shared = (other) =>
     Math.min(match.clip_end, other.clip_end) - Math.max(match.clip_begin, other.clip_begin);
   return others.reduce((sum, other) => sum + Math.max(0, shared(other)), 0);
-}
-
-/** Its ends as most answers have them: one alone may take what comes before or after for more. */
-function withUsualEnds(match, all) {
-  const same = all.filter(
-    (other) => other.track === match.track && sharedWith([other], match) > 0,
-  );
-  return {
-    ...match,
-    clip_begin: middle(same.map((each) => each.clip_begin)),
-    clip_end: middle(same.map((each) => each.clip_end)),
-  };
-}
-
-/** The median; of an even number of values the lower one in the middle. */
-function middle(values) {
-  const sorted = values.sort((one, other) => one - other);
-  return sorted[Math.floor((sorted.length - 1) / 2)];
 }
 
 /** A passage ends where the next one begins. */

@@ -38,6 +38,7 @@ test("entries stand in the order of the recording", () => {
 const passage = (title, clip_begin, clip_end, score, number = 1) => ({
   ...track(title, clip_begin, clip_end),
   track: number,
+  offset: number * (title === "B" ? 100 : 10),
   score,
 });
 const timesOf = (answer) =>
@@ -53,22 +54,36 @@ test("of several answers the surest passages stay", () => {
     ],
     140,
   );
-  assert.deepEqual(timesOf(answer), [["A", 1, 59], ["B", 70, 129]]);
+  assert.deepEqual(timesOf(answer), [["A", 1, 59], ["B", 71, 129]]);
   assert.deepEqual(answer.gaps, [
-    { clip_begin: 59, clip_end: 70 },
+    { clip_begin: 59, clip_end: 71 },
     { clip_begin: 129, clip_end: 140 },
   ]);
 });
 
-test("a passage ends where most answers say", () => {
+test("a passage ends where two answers say", () => {
   const ends = [[0, 42, 15], [1, 35, 9], [1, 35, 10]];
   const answers = ends.map(([begin, end, score]) => matching(passage("A", begin, end, score)));
   const { matches } = merged(answers, 100);
   assert.deepEqual([matches[0].score, matches[0].clip_begin, matches[0].clip_end], [15, 1, 35]);
 });
 
+test("what one answer cuts in two stays whole", () => {
+  const whole = passage("A", 0, 90, 9);
+  const parts = [passage("A", 0, 30, 20), passage("A", 60, 90, 20)];
+  const answer = merged([matching(...parts), matching(whole), matching(whole)], 90);
+  assert.deepEqual(timesOf(answer), [["A", 0, 90]]);
+});
+
+test("a track that runs twice has two passages", () => {
+  const again = { ...passage("A", 60, 120, 9), offset: -60 };
+  const answers = [1, 2].map(() => matching({ ...passage("A", 0, 60, 9), offset: 0 }, again));
+  assert.deepEqual(timesOf(merged(answers, 120)), [["A", 0, 60], ["A", 60, 120]]);
+});
+
 test("a passage ends where the next one begins", () => {
-  const answer = merged([matching(passage("A", 0, 62, 9)), matching(passage("B", 60, 90, 8, 2))], 91);
+  const answers = [matching(passage("A", 0, 62, 9)), matching(passage("B", 60, 90, 8, 2))];
+  const answer = merged(answers, 91);
   assert.deepEqual(answer.matches.map((match) => match.clip_end), [60, 90]);
   assert.deepEqual(answer.gaps, []);
 });
