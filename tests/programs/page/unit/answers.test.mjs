@@ -88,7 +88,7 @@ test("what was skipped counts as part of the clip", () => {
   assert.equal(own.clip_end, 11.5);
 });
 
-test("of answers without a track the nearest is told", () => {
+test("of answers without track the nearest is told", () => {
   const verdicts = (...list) => answers.bestOf(list.map((verdict) => ({ verdict, matches: [] })));
   assert.equal(verdicts("no match", "not sure", "too quiet").verdict, "not sure");
   assert.equal(verdicts("too quiet", "no match").verdict, "no match");

@@ -68,7 +68,7 @@ test("clearing is kept", () => {
   assert.deepEqual(new History(() => store).entries, []);
 });
 
-test("a storage that refuses leaves the list in the tab", () => {
+test("a storage that refuses leaves the tab its list", () => {
   const history = new History(() => {
     throw new Error("SecurityError");
   });
@@ -94,7 +94,7 @@ test("fields of the wrong kind are not believed", () => {
   ]);
 });
 
-test("a token lasts for the session, null forgets it", () => {
+test("a token lasts for the session, null ends it", () => {
   const store = new Store();
   const token = new Token(() => store);
   assert.equal(token.value, null);

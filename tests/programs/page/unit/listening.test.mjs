@@ -172,7 +172,7 @@ test("about silence nobody is asked", async () => {
   assert.equal((await recogniser.ask(silence, [round], OPTIONS)).verdict, "match");
 });
 
-test("the meter is empty in silence, full at the top", () => {
+test("the meter is empty in silence, full when loud", () => {
   assert.equal(levelOf(new Float32Array(10)), 0);
   assert.equal(levelOf(new Float32Array(10).fill(1)), 1);
   assert.ok(Math.abs(levelOf(new Float32Array(10).fill(10 ** (-30 / 20))) - 0.5) < 1e-6);
