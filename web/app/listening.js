@@ -28,10 +28,11 @@ const ENOUGH_TO_KEEP = 11;
  */
 export async function listen({ openMicrophone, recogniser, signal, onHeard, onClip, onBusy }) {
   let sound = null;
+  let isOver = false;
   // Samples may come before the promise says at which rate.
   const early = [];
   const take = (samples) => {
-    if (signal.aborted) {
+    if (isOver || signal.aborted) {
       return;
     }
     if (sound === null) {
@@ -52,7 +53,9 @@ export async function listen({ openMicrophone, recogniser, signal, onHeard, onCl
     };
     return await askUntilKnown({ sound, rate: microphone.rate, signal, ask });
   } finally {
-    microphone.stop();
+    // It may give a last piece while it is being closed.
+    isOver = true;
+    Promise.resolve(microphone.stop()).catch(() => {});
   }
 }
 

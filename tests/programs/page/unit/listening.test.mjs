@@ -23,9 +23,11 @@ function microphone(log) {
     timer.unref(); // one that is not stopped is to be noticed, not to run for ever
     return {
       rate: RATE,
-      stop: () => {
+      stop: async () => {
         clearInterval(timer);
         log.push("stopped");
+        onSamples(new Float32Array(RATE).fill(0.1)); // the last piece comes late
+        throw new Error("the device has gone meanwhile");
       },
     };
   };
@@ -40,7 +42,7 @@ async function listenWith(answerTo, signal = new AbortController().signal) {
     openMicrophone: microphone(log),
     recogniser,
     signal,
-    onHeard: () => {},
+    onHeard: () => log.length > 0 && log.push("heard after the end"),
     onClip: (clip) => moments.push(Math.floor(clip.samples.length / clip.rate)),
   });
   return { answer: await answer.catch((error) => error), moments, log };
