@@ -41,6 +41,7 @@ describe("listening", { skip: setting.SKIPPED }, () => {
     assert.equal(await textOf(page, "#listen"), "Listen");
     await shown(page, "#drawing");
     await assertAgreement(page);
+    await setting.picture(page, "heard");
     setting.assertNothingLeaked(page, server.url);
 
     await page.reload();

@@ -83,6 +83,14 @@ describe("looks", { skip: setting.SKIPPED }, () => {
       }
     });
   }
+
+  test("nothing moves if the system asks for that", async () => {
+    const bar = () => getComputedStyle(document.querySelector("#meter div")).transitionDuration;
+    const duration = () => page.evaluate(bar);
+    assert.notEqual(await duration(), "0s");
+    await page.emulate({ reducedMotion: true });
+    assert.equal(await duration(), "0s");
+  });
 });
 
 async function assertFits(page, what) {
