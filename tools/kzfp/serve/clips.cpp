@@ -54,8 +54,11 @@ auto made_from_body(const char* code, const char* cure, Make make)
     try {
         return make();
     } catch (const CatalogueError& error) {
-        const std::string text = error.what();
-        refuse(400, code, text.substr(0, text.find_last_not_of('.') + 1) + "; " + cure);
+        std::string text = error.what();
+        if (text.ends_with('.')) {
+            text.pop_back();
+        }
+        refuse(400, code, text + "; " + cure);
     }
 }
 
@@ -213,7 +216,8 @@ Trail trail_of(std::string_view bytes)
 
 std::string file_name_of(const std::string& source)
 {
-    return source.substr(source.find_last_of('/') + 1); // npos + 1 is 0
+    const size_t slash = source.find_last_of('/');
+    return slash == std::string::npos ? source : source.substr(slash + 1);
 }
 
 } // namespace kzfp::serve

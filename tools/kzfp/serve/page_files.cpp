@@ -76,7 +76,9 @@ bool names(const std::string* list, std::string_view wanted)
                                 item.find("q=0.") == std::string_view::npos;
         item = item.substr(0, item.find(';'));
         item.remove_prefix(std::min(item.find_first_not_of(' '), item.size()));
-        item = item.substr(0, item.find_last_not_of(' ') + 1);
+        while (item.ends_with(' ')) {
+            item.remove_suffix(1);
+        }
         if (item == wanted && !is_refused) {
             return true;
         }
