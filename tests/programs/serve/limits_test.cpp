@@ -101,6 +101,16 @@ TEST_F(ServeLimits, BodiesThatDribbleAreToldSo)
     dribble.join();
 }
 
+TEST_F(ServeLimits, ConnectionsThatWaitEndWithTheDeadline)
+{
+    Service service = start({catalogue(), "--deadline", "1", "--timeout", "60"});
+    Connection connection(service.port());
+    connection.send(request_text("GET", "/v1/health"));
+    EXPECT_EQ(200, connection.receive().status);
+    EXPECT_EQ(408, connection.receive().status);
+    EXPECT_TRUE(connection.is_closed_soon());
+}
+
 TEST_F(ServeLimits, SilentConnectionsAreClosed)
 {
     Service service = start({catalogue(), "--timeout", "1"});
