@@ -127,6 +127,16 @@ TEST_F(ServeTracks, ThatGainDocumentsAnswerThemAtOnce)
     }
 }
 
+TEST_F(ServeTracks, WithNamesThatAreNotUtf8CanBeFoundAgain)
+{
+    const Service service = start_writing("bytes.kzc");
+    change(service, "POST", "/v1/tracks?source=p%ff", "application/x-kzt", trail_file(piece(8)));
+    const json found = service.get("/v1/tracks?source=p%ff").json();
+    ASSERT_EQ(1u, found["tracks"].size()) << found;
+    EXPECT_EQ("70ff", found["tracks"][0]["sources_bytes"][0]);
+    EXPECT_FALSE(service.get("/v1/tracks/1").json().contains("sources_bytes"));
+}
+
 TEST_F(ServeTracks, AreRemoved)
 {
     const Service service = start_writing("removing.kzc");

@@ -9,6 +9,7 @@
 #include "audio/source.hpp"
 #include "kzfp/catalogue/sound.hpp"
 #include "kzfp/catalogue/tracks.hpp"
+#include "kzfp/output/encoding.hpp"
 #include "kzfp/output/json_object.hpp"
 #include "kzfp/serve/clips.hpp"
 
@@ -44,6 +45,24 @@ JsonObject tag_in(const Track& track, std::string_view name)
     return nullptr;
 }
 
+/// The bytes of names that are not UTF-8 are there too, since JSON cannot show these.
+void set_sources(JsonObject& object, const Track& track, bool hide_sources)
+{
+    object["sources"] = JsonObject::array();
+    JsonObject bytes = JsonObject::array();
+    bool all_are_text = true;
+    for (const kzcat_source& source : sources_of(track)) {
+        const std::string name = hide_sources ? file_name_of(source.uri) : source.uri;
+        const bool is_text = is_utf8(name);
+        all_are_text = all_are_text && is_text;
+        object["sources"].push_back(name);
+        bytes.push_back(is_text ? JsonObject() : JsonObject(to_hexadecimal(name)));
+    }
+    if (!all_are_text) {
+        object["sources_bytes"] = bytes;
+    }
+}
+
 JsonObject to_object(const Track& track, bool hide_sources)
 {
     const kzcat_track_facts facts = facts_of(track);
@@ -56,11 +75,7 @@ JsonObject to_object(const Track& track, bool hide_sources)
     for (const kzcat_tag& tag : tags_of(track)) {
         object["tags"][tag.name].push_back(tag.value); // there may be several of one name
     }
-    object["sources"] = JsonObject::array();
-    for (const kzcat_source& source : sources_of(track)) {
-        object["sources"].push_back(hide_sources ? file_name_of(source.uri)
-                                                 : std::string(source.uri));
-    }
+    set_sources(object, track, hide_sources);
     object["seconds"] =
         std::round(1e4 * static_cast<double>(facts.samples) / facts.sample_rate) / 1e4;
     object["codes"] = facts.code_count;
