@@ -12,9 +12,8 @@ namespace {
 
 namespace fs = std::filesystem;
 
-const Names kExtensions = {".h",   ".hpp", ".c",  ".cpp", ".java", ".cmake",
-                           ".txt", ".py",  ".sh", ".md",  ".1",    ".map",
-                           ".js",  ".mjs", ".ts"};
+const Names kExtensions = {".h",  ".hpp", ".c", ".cpp", ".java", ".cmake", ".txt", ".py",
+                           ".sh", ".md",  ".1", ".map", ".js",   ".mjs",   ".ts"};
 
 bool is_left_out(const fs::path& folder)
 {
