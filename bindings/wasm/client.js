@@ -64,6 +64,8 @@ class Calls {
   }
 
   #settle({ id, result, error }) {
+    // An answer may have been under way when the client was closed: its caller knows already.
+    if (!this.#waiting.has(id)) return undefined;
     const { resolve, reject } = this.#waiting.get(id);
     this.#waiting.delete(id);
     if (this.#waiting.size === 0) this.#worker.unref?.();

@@ -97,6 +97,16 @@ test("a closed client refuses calls", async () => {
   await assert.rejects(other.trail(music, RATE), { code: "closed" });
 });
 
+test("an answer that comes after close() is dropped", async () => {
+  const other = await createClient();
+  const waiting = other.readTrail(kz.trail(music, RATE));
+  // The worker answers while this thread is held, so that the answer waits here to be taken.
+  Atomics.wait(new Int32Array(new SharedArrayBuffer(4)), 0, 0, 1000);
+  other.close();
+  await assert.rejects(waiting, { code: "closed" });
+  await new Promise((resolve) => setTimeout(resolve, 100));
+});
+
 test("a worker that cannot start says so", async () => {
   const nowhere = new URL("file:///nowhere.js");
   await assert.rejects(createClient({ workerUrl: nowhere }), { code: "load" });
