@@ -123,6 +123,18 @@ export class History {
   }
 }
 
+/** The server takes no others for a token, and most of the others no header of HTTP can carry. */
+const TOKEN_TEXT = /^[!-~]+$/;
+
+/**
+ * Whether a text can be a token: visible characters of ASCII.
+ *
+ * @param {string} text
+ */
+export function isToken(text) {
+  return TOKEN_TEXT.test(text);
+}
+
 /** The token for the server, for as long as the tab is open. */
 export class Token {
   #storage;
@@ -131,7 +143,8 @@ export class Token {
   /** @param {() => Storage} storage  For example `() => sessionStorage`. */
   constructor(storage) {
     this.#storage = storage;
-    this.#value = read(storage, TOKEN);
+    const stored = read(storage, TOKEN);
+    this.#value = stored !== null && isToken(stored) ? stored : null;
   }
 
   /** @returns {string|null} */

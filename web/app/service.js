@@ -120,14 +120,11 @@ export class Service {
   }
 
   async #ask(path, { headers = {}, signal, ...request }) {
-    const ownHeaders = this.#token.value
-      ? { ...headers, Authorization: `Bearer ${this.#token.value}` }
-      : headers;
     const limit = AbortSignal.timeout(LONGEST_ANSWER);
     const response = await whole(
       fetch(new URL(path, this.#base), {
         ...request,
-        headers: ownHeaders,
+        headers: headersWith(headers, this.#token.value),
         signal: signal ? anyOf(signal, limit) : limit,
         cache: "no-store",
         credentials: "same-origin",
@@ -139,6 +136,18 @@ export class Service {
       throw await refusalOf(response);
     }
     return response;
+  }
+}
+
+/** A token that no header can carry is not the server's; it is told as one that was refused. */
+function headersWith(headers, token) {
+  if (!token) {
+    return headers;
+  }
+  try {
+    return new Headers({ ...headers, Authorization: `Bearer ${token}` });
+  } catch {
+    throw new ServiceRefused(401, "bad_token", "The token has characters that no token has.", 0);
   }
 }
 

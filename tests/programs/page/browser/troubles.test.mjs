@@ -82,6 +82,10 @@ describe("troubles", { skip: setting.SKIPPED }, () => {
     await shown(page, "#token-form");
     assert.equal(await page.evaluate(() => document.activeElement.id), "token");
 
+    await page.type("a-token\u200bof-the-tests");
+    await page.press("Enter");
+    assert.match(await shown(page, "#token-refused"), /^This cannot be a token/);
+    await page.evaluate(() => document.querySelector("#token").select());
     await page.type("another-token-than-that");
     await page.press("Enter");
     assert.match(await shown(page, "#problem"), /was not accepted/);

@@ -3,7 +3,7 @@
 import assert from "node:assert/strict";
 import { test } from "node:test";
 
-import { History, MOST_ENTRIES, Token } from "../../../../web/app/keeping.js";
+import { History, isToken, MOST_ENTRIES, Token } from "../../../../web/app/keeping.js";
 
 /** A storage as browsers have it. */
 class Store {
@@ -102,4 +102,14 @@ test("a token lasts for the session, null ends it", () => {
   assert.equal(new Token(() => store).value, "secret");
   token.value = null;
   assert.equal(new Token(() => store).value, null);
+});
+
+test("what cannot be a token is not kept as one", () => {
+  assert.ok(isToken("0123456789abcdef+/=~!"));
+  const store = new Store();
+  for (const bad of ["", "two words", "snow\u2603man", "soft\u00adhyphen", "zero\u200bwidth"]) {
+    assert.ok(!isToken(bad), bad);
+    store.setItem("kzfp.token", bad);
+    assert.equal(new Token(() => store).value, null, bad);
+  }
 });

@@ -62,6 +62,14 @@ test("a token goes with every request", async () => {
   assert.equal(requests[1].url, "/below/v1/tracks/7/trail");
 });
 
+test("a token that cannot be sent is a refused one", async () => {
+  for (const bad of ["snow\u2603man", "zero\u200bwidth", "line\nend"]) {
+    token.value = bad;
+    await assert.rejects(service.options(), { name: "ServiceRefused", status: 401 });
+  }
+  assert.equal(requests.length, 0);
+});
+
 test("a busy service is asked again after its time", async () => {
   answers = [{ status: 503, headers: { "Retry-After": "0" } }, { body: MATCH }];
   const waits = [];
