@@ -2,7 +2,7 @@
 // track is recognised, the last moment has passed or the person stops.
 
 import { isMatch } from "./answers.js";
-import { nextMoment, roundsAt } from "./schedule.js";
+import { LONGEST_HEARD, nextMoment, roundsAt } from "./schedule.js";
 import { ServiceAway } from "./service.js";
 import { HeardSound } from "./sound.js";
 
@@ -64,7 +64,7 @@ async function askUntilKnown({ sound, rate, signal, ask }) {
   for (let moment = nextMoment(0); moment !== undefined; moment = nextMoment(moment)) {
     await sound.until(moment, signal, PATIENCE);
     try {
-      answer = await ask({ samples: sound.samples(), rate }, moment);
+      answer = await ask({ samples: sound.last(LONGEST_HEARD), rate }, moment);
     } catch (error) {
       if (!(error instanceof ServiceAway) || moment >= ENOUGH_TO_KEEP) {
         throw error;

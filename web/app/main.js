@@ -10,7 +10,7 @@ import { openMicrophone, trailMakers } from "./package.js";
 import { problemOf, problemOfAnswer } from "./problems.js";
 import { Recogniser } from "./recogniser.js";
 import { ResultView } from "./result_view.js";
-import { roundsAt } from "./schedule.js";
+import { asksPassages, roundsAt } from "./schedule.js";
 import { Service } from "./service.js";
 import { entriesOf } from "./set_list.js";
 import { SetListView } from "./set_list_view.js";
@@ -18,9 +18,6 @@ import { bytesOf, decode, isTrail, secondsOfTrail } from "./sound_files.js";
 import { StatusView } from "./status_view.js";
 import { lengthText } from "./times.js";
 import { TokenView } from "./token_view.js";
-
-/** From this many seconds on a recording may hold several tracks. */
-const LONG = 60;
 
 /** Seconds after which it is said that the page is still listening, and that it hears nothing. */
 const REMINDER = 15;
@@ -203,7 +200,7 @@ function startFile(files) {
 async function askAboutTrail(trail, name, signal, keep) {
   keep((later, keepAgain) => askAboutTrail(trail, name, later, keepAgain));
   say(`Looking up “${name}”.`);
-  const passages = secondsOfTrail(trail) > LONG;
+  const passages = asksPassages(name, secondsOfTrail(trail));
   const answer = await service.match(trail, { passages, signal, onBusy: sayBusy });
   await showAnswer({ answer, clip: null, from: name, signal, passages });
 }
@@ -211,8 +208,8 @@ async function askAboutTrail(trail, name, signal, keep) {
 async function askAbout(clip, name, signal, keep) {
   keep((later, keepAgain) => askAbout(clip, name, later, keepAgain));
   const seconds = clip.samples.length / clip.rate;
-  const passages = seconds > LONG;
-  const what = name ? `“${name}”, ${lengthText(seconds)}` : "what was heard";
+  const passages = asksPassages(name, seconds);
+  const what = name !== null ? `“${name}”, ${lengthText(seconds)}` : "what was heard";
   say(`Looking up ${what}.`);
   const options = { signal, onBusy: sayBusy };
   const answer = passages

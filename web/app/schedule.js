@@ -3,6 +3,23 @@
 /** Seconds of sound after which the service is asked; after the last the page gives up. */
 export const MOMENTS = [5, 8, 11, 15, 20, 25, 30];
 
+/** Of what the microphone has heard, no more than the last so many seconds are asked about: while
+ *  a slow answer is awaited, much more may be heard. */
+export const LONGEST_HEARD = MOMENTS.at(-1);
+
+/** From this many seconds on a recording may hold several tracks. */
+const LONG = 60;
+
+/**
+ * Whether all passages are asked for; of the microphone it is one track.
+ *
+ * @param {string|null} name  of the file; null for the microphone
+ * @param {number} seconds    that it lasts
+ */
+export function asksPassages(name, seconds) {
+  return name !== null && seconds > LONG;
+}
+
 /** From this many seconds on the sound is also read as if it were played too fast or too slowly. */
 const SPEEDS_FROM = 11;
 

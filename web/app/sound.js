@@ -44,15 +44,20 @@ export class HeardSound {
     }
   }
 
-  /** All samples so far, in an array of their own. */
-  samples() {
-    const all = new Float32Array(this.#count);
-    let at = 0;
-    for (const piece of this.#pieces) {
-      all.set(piece, at);
-      at += piece.length;
+  /**
+   * The samples heard last, in an array of their own.
+   *
+   * @param {number} seconds  At most so many.
+   */
+  last(seconds) {
+    const samples = new Float32Array(Math.min(this.#count, Math.round(seconds * this.#rate)));
+    let end = samples.length;
+    for (let i = this.#pieces.length - 1; end > 0; --i) {
+      const part = this.#pieces[i].subarray(-end);
+      end -= part.length;
+      samples.set(part, end);
     }
-    return all;
+    return samples;
   }
 
   /**

@@ -6,7 +6,7 @@ import { test } from "node:test";
 import { levelOf, Level } from "../../../../web/app/level.js";
 import { listen } from "../../../../web/app/listening.js";
 import { Recogniser } from "../../../../web/app/recogniser.js";
-import { MOMENTS } from "../../../../web/app/schedule.js";
+import { asksPassages, MOMENTS } from "../../../../web/app/schedule.js";
 import { ServiceAway } from "../../../../web/app/service.js";
 import { HeardSound, SilentDevice } from "../../../../web/app/sound.js";
 import { isTrail, mixed, secondsOfTrail } from "../../../../web/app/sound_files.js";
@@ -103,8 +103,27 @@ test("samples come out as they went in", () => {
   const sound = new HeardSound(2);
   sound.add(Float32Array.of(1, 2));
   sound.add(Float32Array.of(3));
-  assert.deepEqual([...sound.samples()], [1, 2, 3]);
+  assert.deepEqual([...sound.last(30)], [1, 2, 3]);
   assert.equal(sound.seconds, 1.5);
+  assert.deepEqual([...sound.last(1)], [2, 3]);
+  assert.deepEqual([...sound.last(0.5)], [3]);
+});
+
+test("of what is heard meanwhile the end is asked about", async () => {
+  const lengths = [];
+  const { answer } = await listenWith(async (seconds) => {
+    lengths.push(seconds);
+    await new Promise((resolve) => setTimeout(resolve, 100));
+    return lengths.length < 3 ? NONE : MATCH;
+  });
+  assert.equal(answer, MATCH);
+  assert.equal(Math.max(...lengths), 30);
+});
+
+test("only of long files all passages are asked for", () => {
+  assert.equal(asksPassages("evening.mp3", 61), true);
+  assert.equal(asksPassages("evening.mp3", 60), false);
+  assert.equal(asksPassages(null, 300), false);
 });
 
 /** A recogniser over trails that are numbered as they are made. */
