@@ -195,5 +195,55 @@ export function bestOf(answers) {
     }
     return rankOf(other) > rankOf(one) ? other : one;
   };
-  return answers.reduce(better);
+  return { ...answers.reduce(better), ...lacksOf(answers) };
+}
+
+/**
+ * What several answers about one clip rest on less than they should: each as the worst has it.
+ *
+ * @param {object[]} answers
+ * @returns {{warning?: string, left_out?: number, shards?: {answered: number, of: number}}} only
+ *          what there is
+ */
+export function lacksOf(answers) {
+  const lacks = {};
+  for (const { warning, left_out: leftOut, shards } of answers) {
+    if (warning) {
+      lacks.warning ??= warning;
+    }
+    if (leftOut > (lacks.left_out ?? 0)) {
+      lacks.left_out = leftOut;
+    }
+    if (shards && !(shards.answered >= lacks.shards?.answered)) {
+      lacks.shards = shards;
+    }
+  }
+  return lacks;
+}
+
+/**
+ * What an answer lacks, for the person who reads it.
+ *
+ * @param {object} answer
+ * @returns {string} sentences; "" when it lacks nothing
+ */
+export function lacksText({ warning, left_out: leftOut, shards }) {
+  const sentences = [];
+  if (shards) {
+    const { answered, of } = shards;
+    sentences.push(
+      `Part of the catalogue was not searched: ${answered} of its ${of} servers answered. ` +
+        "Try again later.",
+    );
+  }
+  if (leftOut) {
+    const many = leftOut === 1 ? "1 track is" : `${leftOut} tracks are`;
+    sentences.push(
+      `Part of the catalogue was not searched: ${many} damaged. Tell whoever runs the server.`,
+    );
+  }
+  if (warning) {
+    sentences.push(`The server says: ${warning}`);
+  }
+  return sentences.join(" ");
 }

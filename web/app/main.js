@@ -1,6 +1,6 @@
 // The page: one thing at a time is looked up, out of the microphone or a file, and shown.
 
-import { announcement, isMatch, nameAndArtist, placeOf } from "./answers.js";
+import { announcement, isMatch, lacksText, nameAndArtist, placeOf } from "./answers.js";
 import { byId } from "./dom.js";
 import { HistoryView } from "./history_view.js";
 import { History, Token } from "./keeping.js";
@@ -70,6 +70,7 @@ function setBusy(busy) {
 
 function clear() {
   status.clearProblem();
+  status.lacks("");
   views.result.hide();
   views.setList.hide();
   views.token.hide();
@@ -225,6 +226,7 @@ function sayBusy() {
 // ---- What came of it
 
 async function showAnswer({ answer, clip, from, signal, passages = false }) {
+  status.lacks(lacksText(answer));
   if (!isMatch(answer)) {
     say("");
     status.problem(problemOfAnswer(answer), null);

@@ -1,6 +1,6 @@
 // The set-list of a long recording: what ran from when to when, as entries, as text and as CSV.
 
-import { bestOf, isMatch, nameAndArtist, nameOf, placeOf } from "./answers.js";
+import { bestOf, isMatch, lacksOf, nameAndArtist, nameOf, placeOf } from "./answers.js";
 import { clockText } from "./times.js";
 
 /**
@@ -60,7 +60,7 @@ export function merged(answers, seconds) {
     return bestOf(answers);
   }
   const matches = withoutOverlap(kept.sort((one, other) => one.clip_begin - other.clip_begin));
-  return { verdict: "match", matches, gaps: gapsBetween(matches, seconds) };
+  return { verdict: "match", matches, gaps: gapsBetween(matches, seconds), ...lacksOf(answers) };
 }
 
 /**

@@ -7,6 +7,7 @@ export class StatusView {
   #detail = byId("detail");
   #meter = byId("meter");
   #problem = byId("problem");
+  #lacks = byId("lacks");
 
   /** Says something to everybody; it is read out. */
   say(text) {
@@ -48,6 +49,12 @@ export class StatusView {
     }
     this.#problem.replaceChildren(...parts);
     this.#problem.hidden = false;
+  }
+
+  /** Shows what an answer lacks; "" takes it away. */
+  lacks(text) {
+    this.#lacks.textContent = text;
+    this.#lacks.hidden = text === "";
   }
 
   clearProblem() {

@@ -118,6 +118,20 @@ describe("files", { skip: setting.SKIPPED }, () => {
     assert.match(selected, /Trip on the Funny Boat by JDruid\n/);
   });
 
+  test("an answer says if not all was searched", async () => {
+    await page.evaluate(() => {
+      const ask = window.fetch;
+      window.fetch = async (...request) => {
+        const answer = await (await ask(...request)).json();
+        return Response.json({ ...answer, shards: { answered: 1, of: 2 } });
+      };
+    });
+    await page.setFiles("#file", [sound("unknown.wav")]);
+    await shown(page, "#problem");
+    assert.match(await shown(page, "#lacks"), /^Part of the catalogue was not searched: 1 of/);
+    await page.reload();
+  });
+
   test("a track that the server does not know", async () => {
     await page.setFiles("#file", [sound("unknown.wav")]);
     assert.match(await shown(page, "#problem"), /^Not (recognised|sure)\s/);

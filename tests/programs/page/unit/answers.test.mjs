@@ -93,6 +93,25 @@ test("of answers without track the nearest is told", () => {
   assert.equal(verdicts("no match", "not sure", "too quiet").verdict, "not sure");
   assert.equal(verdicts("too quiet", "no match").verdict, "no match");
   const match = { verdict: "match", matches: [MATCH] };
-  assert.equal(answers.bestOf([{ verdict: "not sure" }, match]), match);
-  assert.equal(answers.bestOf([match, { verdict: "no match" }]), match);
+  assert.deepEqual(answers.bestOf([{ verdict: "not sure" }, match]), match);
+  assert.deepEqual(answers.bestOf([match, { verdict: "no match" }]), match);
+});
+
+test("what an answer lacks is kept and told", () => {
+  const given = [
+    { verdict: "not sure", left_out: 2 },
+    { verdict: "no match", shards: { answered: 2, of: 3 } },
+    { verdict: "no match", shards: { answered: 1, of: 3 }, left_out: 1, warning: "It is cut." },
+  ];
+  const best = answers.bestOf(given);
+  assert.deepEqual(best, {
+    verdict: "not sure",
+    left_out: 2,
+    shards: { answered: 1, of: 3 },
+    warning: "It is cut.",
+  });
+  const text = answers.lacksText(best);
+  assert.match(text, /^Part of the catalogue was not searched: 1 of its 3 servers answered/);
+  assert.match(text, /was not searched: 2 tracks are damaged\..*The server says: It is cut\.$/);
+  assert.equal(answers.lacksText({ verdict: "match" }), "");
 });

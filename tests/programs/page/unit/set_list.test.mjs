@@ -88,6 +88,13 @@ test("a passage ends where the next one begins", () => {
   assert.deepEqual(answer.gaps, []);
 });
 
+test("a set-list says what its answers lack", () => {
+  const shards = { answered: 1, of: 2 };
+  const answers = [matching(passage("A", 0, 60, 9)), { verdict: "no match", shards, left_out: 1 }];
+  const { shards: kept, left_out: leftOut } = merged(answers, 60);
+  assert.deepEqual([kept, leftOut], [shards, 1]);
+});
+
 test("answers without passages give none", () => {
   const answer = merged([{ verdict: "no match", matches: [] }, { verdict: "not sure" }], 90);
   assert.equal(answer.verdict, "not sure");
