@@ -22,8 +22,11 @@ function(put file name)
   if(GZIP)
     set(small "${PAGE}/${name}.gz")
     if("${PAGE}/${name}" IS_NEWER_THAN "${small}")
-      # Without name and time, so that the same bytes come out every time.
-      execute_process(COMMAND "${GZIP}" -9 -n -c "${PAGE}/${name}" OUTPUT_FILE "${small}" COMMAND_ERROR_IS_FATAL ANY)
+      # Without name and time, so that the same bytes come out every time. What was interrupted must
+      # not pass for finished: it would be newer than the file, and never made again.
+      execute_process(COMMAND "${GZIP}" -9 -n -c "${PAGE}/${name}" OUTPUT_FILE "${small}.part"
+                      COMMAND_ERROR_IS_FATAL ANY)
+      file(RENAME "${small}.part" "${small}")
     endif()
     list(APPEND files "${name}.gz")
   endif()
