@@ -70,7 +70,7 @@ function setBusy(busy) {
 
 function clear() {
   status.clearProblem();
-  status.lacks("");
+  status.notice("");
   views.result.hide();
   views.setList.hide();
   views.token.hide();
@@ -182,10 +182,11 @@ function startFile(files) {
   if (!file) {
     return undefined;
   }
-  const left =
-    files.length > 1 ? ` Only the first of ${files.length} files is looked up.` : "";
   return run(async (signal, keep) => {
-    say(`Reading “${file.name}”.${left}`);
+    say(`Reading “${file.name}”.`);
+    if (files.length > 1) {
+      status.notice(`Only the first of ${files.length} files is looked up.`);
+    }
     const bytes = await bytesOf(file);
     const head = new Uint8Array(bytes, 0, Math.min(64, bytes.byteLength));
     if (isTrail(head)) {
@@ -226,7 +227,7 @@ function sayBusy() {
 // ---- What came of it
 
 async function showAnswer({ answer, clip, from, signal, passages = false }) {
-  status.lacks(lacksText(answer));
+  status.notice(lacksText(answer));
   if (!isMatch(answer)) {
     say("");
     status.problem(problemOfAnswer(answer), null);

@@ -7,7 +7,7 @@ export class StatusView {
   #detail = byId("detail");
   #meter = byId("meter");
   #problem = byId("problem");
-  #lacks = byId("lacks");
+  #notice = byId("notice");
 
   /** Says something to everybody; it is read out. */
   say(text) {
@@ -51,10 +51,10 @@ export class StatusView {
     this.#problem.hidden = false;
   }
 
-  /** Shows what an answer lacks; "" takes it away. */
-  lacks(text) {
-    this.#lacks.textContent = text;
-    this.#lacks.hidden = text === "";
+  /** Shows what has to be known beside all else; it is read out. "" takes it away. */
+  notice(text) {
+    this.#notice.textContent = text;
+    this.#notice.hidden = text === "";
   }
 
   clearProblem() {
