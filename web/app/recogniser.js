@@ -5,6 +5,7 @@ import { atOwnSpeed, bestOf, fromTheStart, isMatch, withMargin } from "./answers
 import { gridStart, lay } from "./codes.js";
 import { isQuiet } from "./level.js";
 import { CODE_SECONDS, OWN_SPEED } from "./schedule.js";
+import { anyOf } from "./service.js";
 import { merged } from "./set_list.js";
 
 /** Samples that go to the worker at once. */
@@ -76,8 +77,16 @@ export class Recogniser {
     return merged(answers, clip.samples.length / clip.rate);
   }
 
-  #readAll(clip, readings, options) {
-    return Promise.all(readings.map((reading) => this.#read(clip, reading, options)));
+  /** When one asking of a round fails, nobody waits for the others: they end with it. */
+  async #readAll(clip, readings, options) {
+    const round = new AbortController();
+    const ending = { ...options, signal: anyOf(options.signal, round.signal) };
+    try {
+      return await Promise.all(readings.map((reading) => this.#read(clip, reading, ending)));
+    } catch (error) {
+      round.abort(error);
+      throw error;
+    }
   }
 
   async #read(clip, { speed, skipped }, options) {

@@ -151,8 +151,14 @@ function headersWith(headers, token) {
   }
 }
 
-/** AbortSignal.any() is younger than the browsers that can run the rest of the page. */
-function anyOf(...signals) {
+/**
+ * A signal that ends with the first of several: AbortSignal.any() is younger than the browsers that
+ * can run the rest of the page.
+ *
+ * @param {...AbortSignal} signals
+ * @returns {AbortSignal}
+ */
+export function anyOf(...signals) {
   if (AbortSignal.any) {
     return AbortSignal.any(signals);
   }

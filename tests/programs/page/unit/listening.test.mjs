@@ -142,7 +142,7 @@ function numbered(answerTo) {
       };
     },
   };
-  const service = { match: async ([number]) => answerTo(number) };
+  const service = { match: async ([number], options) => answerTo(number, options) };
   return { made, freed, recogniser: new Recogniser(makers, service) };
 }
 
@@ -160,6 +160,23 @@ test("of a round the highest score is taken", async () => {
   assert.deepEqual(made, [[1000, 100], [900, 100], [800, 100]], "the second round is not needed");
   assert.equal(matches[0].score, 9);
   assert.equal(matches[0].offset, 0, "of the clip's beginning, two seconds before the reading's");
+});
+
+test("of a round that failed nothing goes on", async () => {
+  const ended = [];
+  const { recogniser } = numbered((number, { signal }) => {
+    if (number === 2) {
+      throw new ServiceAway("away");
+    }
+    return new Promise((resolve, reject) => {
+      const end = () => ended.push(number) && reject(signal.reason);
+      signal.addEventListener("abort", end, { once: true });
+    });
+  });
+  const round = [0, 1, 2].map((skipped) => ({ speed: 1, skipped }));
+  await assert.rejects(recogniser.ask(CLIP, [round], OPTIONS), ServiceAway);
+  assert.ok(ended.includes(1), "what was asked already is given up");
+  assert.ok(!OPTIONS.signal.aborted);
 });
 
 test("another speed has to score more", async () => {
