@@ -220,8 +220,8 @@ async function askAbout(clip, name, signal, keep) {
   await showAnswer({ answer, clip, from: name, signal, passages });
 }
 
-function sayBusy() {
-  status.detail(BUSY);
+function sayBusy(seconds) {
+  status.detail(BUSY, seconds);
 }
 
 // ---- What came of it

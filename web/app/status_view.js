@@ -8,15 +8,25 @@ export class StatusView {
   #meter = byId("meter");
   #problem = byId("problem");
   #notice = byId("notice");
+  #ending;
 
   /** Says something to everybody; it is read out. */
   say(text) {
     this.#line.textContent = text;
   }
 
-  /** Shows something that changes too often to be read out. */
-  detail(text) {
+  /**
+   * Shows something that changes too often to be read out.
+   *
+   * @param {string} text
+   * @param {number} [seconds]  after which it is taken away, if nothing else has replaced it
+   */
+  detail(text, seconds) {
+    clearTimeout(this.#ending);
     this.#detail.textContent = text;
+    if (seconds !== undefined) {
+      this.#ending = setTimeout(() => this.detail(""), 1000 * seconds);
+    }
   }
 
   /**

@@ -118,6 +118,32 @@ describe("files", { skip: setting.SKIPPED }, () => {
     assert.match(selected, /Trip on the Funny Boat by JDruid\n/);
   });
 
+  test("a busy server is told of while it is", async () => {
+    await page.evaluate(() => {
+      const ask = window.fetch;
+      const detail = document.querySelector("#detail");
+      window.details = [];
+      new MutationObserver(() => window.details.push(detail.textContent)).observe(detail, {
+        childList: true,
+      });
+      let asked = 0;
+      window.fetch = async (...request) => {
+        if (++asked === 1) {
+          return Response.json({}, { status: 503, headers: { "Retry-After": "0.5" } });
+        }
+        await new Promise((resolve) => setTimeout(resolve, 1000));
+        window.details.push(`asked again: ${detail.textContent}`);
+        return ask(...request);
+      };
+    });
+    await drop(page, "track.kzt", await trailOf(server, 1));
+    await shown(page, "#set-list");
+    const details = await page.evaluate(() => window.details);
+    assert.ok(details.some((text) => text.startsWith("The server is busy")), `${details}`);
+    assert.ok(details.includes("asked again: "), `${details}`);
+    await page.reload();
+  });
+
   test("an answer says if not all was searched", async () => {
     await page.evaluate(() => {
       const ask = window.fetch;
