@@ -13,6 +13,17 @@ export function checkSamples(samples) {
   return samples;
 }
 
+/** Sound that is passed at once ends with a frame; of a stream the rest may still come. */
+export function checkFrames(samples, channels) {
+  if (samples.length % channels !== 0) {
+    throw new KzError(
+      "invalid-argument",
+      `${samples.length} samples are no whole number of frames of ${channels} channels: pass the ` +
+        "number of channels that the sound has, and all samples of its last frame",
+    );
+  }
+}
+
 /** A whole number that the module takes; it says itself which of these it can use. */
 export function checkWhole(name, value) {
   if (!Number.isInteger(value) || value < 0 || value > 0xffffffff) {

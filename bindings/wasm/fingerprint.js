@@ -1,6 +1,6 @@
 // Fingerprints: 30 values of 14.2 seconds of sound, and the document that carries them.
 
-import { checkSamples, checkWhole } from "./arguments.js";
+import { checkFrames, checkSamples, checkWhole } from "./arguments.js";
 import { KzError } from "./error.js";
 
 const ALGORITHMS = { fixed: 1, float: 2 };
@@ -119,6 +119,7 @@ export function fingerprintOf(memory, samples, rate, options) {
   checkSamples(samples);
   const stream = new FingerprintStream(memory, rate, options);
   try {
+    checkFrames(samples, options?.channels ?? 1);
     if (!stream.feed(samples)) stream.finish();
     return stream.result();
   } finally {

@@ -74,7 +74,7 @@ export interface TrailOptions {
   channels?: number;
   /**
    * How many times too fast the sound runs, 0.25 to 4, 1 at first: it is read as that much slower
-   * and deeper, at the next whole rate.
+   * and deeper, at the next whole rate, which has to be one of 1 to 4000000 Hz too.
    */
   speed?: number;
 }
@@ -113,7 +113,10 @@ export interface FingerprintStream {
    * @returns whether the fingerprint is complete; what is fed from then on is not taken
    */
   feed(samples: Float32Array): boolean;
-  /** Ends the sound, and returns whether the fingerprint is complete. May be repeated. */
+  /**
+   * Ends the sound, and returns whether the fingerprint is complete. May be repeated. A frame that
+   * is not whole yet is left out.
+   */
   finish(): boolean;
   state(): StreamState;
   /** Throws a KzError of `nothing-fed`, `silent` or `too-short` when it is not complete. */
@@ -128,7 +131,10 @@ export interface TrailBuilder {
   feed(samples: Float32Array): void;
   /** The bytes of the trail so far, which is the beginning of the whole one; more may be fed. */
   trail(): Uint8Array;
-  /** Ends the sound and returns the bytes of the whole trail. */
+  /**
+   * Ends the sound and returns the bytes of the whole trail. A frame that is not whole yet is left
+   * out.
+   */
   finish(): Uint8Array;
   /** Gives its memory back, which JavaScript does not collect. May be repeated. */
   free(): void;
@@ -177,11 +183,11 @@ export const NOT_COMPARED: 255;
 export interface Library {
   /** Of the C library. */
   readonly version: string;
-  /** The fingerprint of the beginning of the samples. */
+  /** The fingerprint of the beginning of the samples, which are whole frames. */
   fingerprint(samples: Float32Array, rate: number, options?: FingerprintOptions): Fingerprint;
   fingerprintStream(rate: number, options?: FingerprintOptions): FingerprintStream;
   /**
-   * The trail of all samples, as the bytes of a .kzt file.
+   * The trail of all samples, which are whole frames, as the bytes of a .kzt file.
    * @param rate  hertz, a whole number of 1 to 4000000
    */
   trail(samples: Float32Array, rate: number, options?: TrailOptions): Uint8Array;

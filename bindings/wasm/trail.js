@@ -1,6 +1,6 @@
 // Trails: what is kept of sound of any length, 43 bytes for a second of it.
 
-import { checkBytes, checkSamples, checkWhole } from "./arguments.js";
+import { checkBytes, checkFrames, checkSamples, checkWhole } from "./arguments.js";
 import { KzError } from "./error.js";
 
 /** Calls `use` with a trail's address and frees the trail. */
@@ -22,12 +22,22 @@ function bytesOf(memory, trail) {
   });
 }
 
+const HIGHEST_RATE = 4000000;
+
 /** The rate at which sound that runs `speed` times too fast is read at its own speed. */
 function rateAt(rate, speed) {
   if (!(typeof speed === "number" && speed >= 0.25 && speed <= 4)) {
     throw new KzError("invalid-argument", `the speed is ${speed}: pass a number of 0.25 to 4`);
   }
-  return Math.round(checkWhole("rate", rate) / speed);
+  const read = Math.round(checkWhole("rate", rate) / speed);
+  if (read < 1 || read > HIGHEST_RATE) {
+    throw new KzError(
+      "format",
+      `sound of ${rate} Hz at the speed ${speed} would be read at ${read} Hz: pass a rate of 1 ` +
+        `to ${HIGHEST_RATE} Hz that stays in this range when it is divided by the speed`,
+    );
+  }
+  return read;
 }
 
 /** Sound that arrives bit by bit, and its trail at any time. */
@@ -78,6 +88,7 @@ export function trailOf(memory, samples, rate, options) {
   checkSamples(samples);
   const builder = new TrailBuilder(memory, rate, options);
   try {
+    checkFrames(samples, options?.channels ?? 1);
     builder.feed(samples);
     return builder.finish();
   } finally {

@@ -148,6 +148,29 @@ test("rates and channels that cannot be are refused", () => {
   assert.equal(codeOf(() => kz.trailBuilder(RATE, { channels: 65536 })), "format");
 });
 
+test("a rate that the speed makes too high is refused", () => {
+  const wrapping = Math.ceil((2 ** 32 + RATE) / 4);
+  assert.equal(codeOf(() => kz.trail(music, wrapping, { speed: 0.25 })), "format");
+  assert.equal(codeOf(() => kz.trailBuilder(4000000, { speed: 0.9 })), "format");
+  assert.equal(codeOf(() => kz.trailBuilder(1, { speed: 4 })), "format");
+  assert.equal(codeOf(() => kz.trailBuilder(4000000, { speed: 1.1 }).free()), "none");
+});
+
+test("sound that ends within a frame is refused", () => {
+  const odd = music.subarray(0, 1001);
+  assert.equal(codeOf(() => kz.trail(odd, RATE, stereo)), "invalid-argument");
+  assert.equal(codeOf(() => kz.fingerprint(odd, RATE, stereo)), "invalid-argument");
+  assert.equal(codeOf(() => kz.trail(odd, RATE)), "none");
+});
+
+test("a builder takes the rest of a frame later", () => {
+  const builder = kz.trailBuilder(RATE, stereo);
+  builder.feed(music.subarray(0, 1001));
+  builder.feed(music.subarray(1001));
+  assert.deepEqual(builder.finish(), kz.trail(music, RATE, stereo));
+  builder.free();
+});
+
 test("arguments of other types are refused", () => {
   const refused = [
     () => kz.fingerprint([0, 1], RATE),
