@@ -59,7 +59,7 @@ export function merged(answers, seconds) {
   if (kept.length === 0) {
     return bestOf(answers);
   }
-  const matches = withoutOverlap(kept.sort((one, other) => one.clip_begin - other.clip_begin));
+  const matches = withoutOverlap(kept.sort(byBegin));
   return { verdict: "match", matches, gaps: gapsBetween(matches, seconds), ...lacksOf(answers) };
 }
 
@@ -113,6 +113,11 @@ function endsOf({ ends }) {
   };
 }
 
+/** In the recording's order; of two that begin together the shorter one is the later. */
+function byBegin(one, other) {
+  return one.clip_begin - other.clip_begin || other.clip_end - one.clip_end;
+}
+
 /** Seconds of a passage that lie in others. */
 function sharedWith(others, match) {
   const shared = (other) =>
@@ -120,12 +125,31 @@ function sharedWith(others, match) {
   return others.reduce((sum, other) => sum + Math.max(0, shared(other)), 0);
 }
 
-/** A passage ends where the next one begins. */
+/** A passage ends where the next one begins, and goes on where that ends if it lasts longer. */
 function withoutOverlap(matches) {
-  return matches.map((match, i) => {
-    const next = matches[i + 1]?.clip_begin ?? Infinity;
-    return { ...match, clip_end: Math.min(match.clip_end, next) };
-  });
+  const times = matches.flatMap(({ clip_begin: begin, clip_end: end }) => [begin, end]);
+  const borders = [...new Set(times)].sort((one, other) => one - other);
+  const parts = [];
+  for (let i = 0; i + 1 < borders.length; ++i) {
+    const [begin, end] = [borders[i], borders[i + 1]];
+    const runs = (match) => match.clip_begin <= begin && end <= match.clip_end;
+    addPart(parts, matches.filter(runs).at(-1), begin, end);
+  }
+  const isWorthTelling = ({ match, begin, end }) =>
+    begin === match.clip_begin || end - begin >= SHORTEST_GAP;
+  return parts
+    .filter(isWorthTelling)
+    .map(({ match, begin, end }) => ({ ...match, clip_begin: begin, clip_end: end }));
+}
+
+/** Adds a stretch to the part before it when both are of the same passage. */
+function addPart(parts, match, begin, end) {
+  const last = parts.at(-1);
+  if (match && last?.match === match && last.end === begin) {
+    last.end = end;
+  } else if (match) {
+    parts.push({ match, begin, end });
+  }
 }
 
 function gapsBetween(matches, seconds) {

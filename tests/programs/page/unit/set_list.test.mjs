@@ -88,6 +88,21 @@ test("a passage ends where the next one begins", () => {
   assert.deepEqual(answer.gaps, []);
 });
 
+test("a passage goes on after one within it", () => {
+  const outer = passage("A", 0, 120, 8);
+  const inner = [passage("B", 40, 60, 20, 2), passage("C", 58, 70, 30, 3)];
+  const answer = merged([matching(outer, ...inner)], 120);
+  assert.deepEqual(timesOf(answer), [
+    ["A", 0, 40],
+    ["B", 40, 58],
+    ["C", 58, 70],
+    ["A", 70, 120],
+  ]);
+  assert.deepEqual(answer.gaps, []);
+  const late = merged([matching(passage("A", 0, 61, 8), inner[0])], 61);
+  assert.deepEqual(timesOf(late), [["A", 0, 40], ["B", 40, 60]], "a second more is no passage");
+});
+
 test("a set-list says what its answers lack", () => {
   const shards = { answered: 1, of: 2 };
   const answers = [matching(passage("A", 0, 60, 9)), { verdict: "no match", shards, left_out: 1 }];
