@@ -204,10 +204,10 @@ function seconds(number) {
 }
 
 /**
- * A spreadsheet takes what begins with one of these signs for a formula and computes it; titles
- * come from files of anybody. An apostrophe in front makes it text.
+ * A spreadsheet takes what begins with one of these signs for a formula and computes it, some also
+ * their full-width forms; titles come from files of anybody. An apostrophe in front makes it text.
  */
-const FORMULA = /^[=+\-@\t\r]/;
+const FORMULA = /^[=+\-@\t\r\uff1d\uff0b\uff0d\uff20]/;
 const NUMBER = /^-?\d+(\.\d+)?$/;
 
 function field(text) {

@@ -5,6 +5,9 @@ import { byId, copy, make, save } from "./dom.js";
 import { toCsv, toText } from "./set_list.js";
 import { clockText } from "./times.js";
 
+/** Without it spreadsheets take a file for one in the code page of the system. */
+const BYTE_ORDER_MARK = "\ufeff";
+
 export class SetListView {
   #section = byId("set-list");
   #entries = [];
@@ -24,7 +27,7 @@ export class SetListView {
     byId("copy-text").addEventListener("click", onCopy(toText, "text"));
     byId("copy-csv").addEventListener("click", onCopy(toCsv, "CSV"));
     byId("save-csv").addEventListener("click", () => {
-      save(toCsv(this.#entries), `${this.#name}.csv`, "text/csv;charset=utf-8");
+      save(BYTE_ORDER_MARK + toCsv(this.#entries), `${this.#name}.csv`, "text/csv;charset=utf-8");
     });
   }
 

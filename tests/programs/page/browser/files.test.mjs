@@ -101,7 +101,7 @@ describe("files", { skip: setting.SKIPPED }, () => {
     const file = join(folder, "evening.csv");
     await page.until(() => existsSync(file), "the file to be saved", 10_000);
     const [header, first] = readFileSync(file, "utf8").split("\r\n");
-    assert.match(header, /^begin,end,title,artist/);
+    assert.match(header, /^\ufeffbegin,end,title,artist/);
     assert.match(first, /^0\.\d,3\d\.\d,Trip on the Funny Boat,JDruid/);
     rmSync(folder, { recursive: true });
   });

@@ -146,6 +146,9 @@ test("a title cannot become a spreadsheet formula", () => {
     toCsv(entriesOf({ matches: [track(title, 0, 5)] })).split("\r\n")[1].split(",")[2];
   assert.equal(titleOf("=1+1"), "'=1+1");
   assert.equal(titleOf("@home"), "'@home");
+  for (const sign of ["\uff1d", "\uff0b", "\uff0d", "\uff20"]) {
+    assert.equal(titleOf(`${sign}1`), `'${sign}1`);
+  }
   assert.equal(titleOf("-5"), "-5", "a number is one");
   assert.equal(titleOf("C=64"), "C=64");
 });
