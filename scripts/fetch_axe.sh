@@ -3,6 +3,8 @@
 # tests only, nothing of it is shipped. Its scripts are not run.
 #
 #   scripts/fetch_axe.sh FOLDER     axe.min.js is in FOLDER afterwards; nothing is done if it is
+#
+# Ends with 77 when the registry cannot be reached, and with 1 for all else that goes wrong.
 set -eu
 
 version=4.14.1
@@ -22,7 +24,14 @@ command -v npm >/dev/null || fail "npm is missing; apt-get install npm"
 mkdir -p "$folder"
 made=$(mktemp -d "$folder/fetch.XXXXXX")
 trap 'rm -rf "$made"' EXIT
-(cd "$made" && npm pack --silent --ignore-scripts "axe-core@$version" >/dev/null)
+unreachable='E(NOTFOUND|AI_AGAIN|CONNREFUSED|CONNRESET|TIMEDOUT|NETUNREACH|HOSTUNREACH)'
+(cd "$made" && npm pack --ignore-scripts --fetch-retries=1 --fetch-retry-mintimeout=1000 \
+    --fetch-timeout=30000 "axe-core@$version" >/dev/null 2>said) || {
+    cat "$made/said" >&2
+    grep -Eq "$unreachable" "$made/said" || fail "axe-core $version could not be fetched"
+    echo "fetch_axe.sh: the npm registry cannot be reached; try again with a network" >&2
+    exit 77
+}
 archive=$made/axe-core-$version.tgz
 echo "$digest  $archive" | sha512sum --check --quiet ||
     fail "what came as axe-core $version is not what is known as it"
