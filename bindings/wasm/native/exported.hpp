@@ -21,7 +21,7 @@ struct Numbers {
 
 Numbers& numbers() noexcept;
 
-/// Keeps the status of a call; failure_text() then has its sentence.
+/// Keeps the status of a call; status_text() then gives its sentence.
 ///
 /// @return Whether it succeeded.
 bool take_library_status(uint32_t status) noexcept;
