@@ -58,8 +58,11 @@ def needed(file):
 
 
 def opened(file):
-    """The libraries whose names a program has among its texts, to open them: ["libavutil.so.57", ...]"""
-    texts = re.findall(rb"(?<=\0)lib[a-z0-9_+-]+\.so\.[0-9]+(?=\0)", file.read_bytes())
+    """The libraries whose names a program has among its texts, to open them: ["libavutil.so.57", ...]
+
+    Compilers put texts that are only copied behind each other, without an end between them.
+    """
+    texts = re.findall(rb"(?<![a-z0-9_+-])lib[a-z0-9_+-]+\.so\.[0-9]+(?=\0)", file.read_bytes())
     return sorted({text.decode() for text in texts} - set(needed(file)) - set(dynamic(file, "SONAME")))
 
 
