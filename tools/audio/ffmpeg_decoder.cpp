@@ -3,6 +3,8 @@
 
 #include "audio/ffmpeg_decoder.hpp"
 
+#include <algorithm>
+#include <array>
 #include <cstring>
 #include <new>
 #include <string_view>
@@ -20,6 +22,42 @@ constexpr const char* kProtocols = "http,https,httpproxy,tls,tcp,udp,rtp,srtp,rt
 int refuse_to_open(AVFormatContext*, AVIOContext**, const char*, int, AVDictionary**)
 {
     return AVERROR(EPERM);
+}
+
+/// Formats that name other places, which FFmpeg would open: playlists and sessions.
+constexpr std::array<std::string_view, 13> kReferring = {
+    "hls", "applehttp", "dash", "concat",   "concatf", "imf",        "rtsp",
+    "sdp", "sap",       "rtp",  "avisynth", "lavfi",   "vapoursynth"};
+
+/// Whether one of a format's names, which commas part, is among these.
+bool is_referring(const AVInputFormat& format)
+{
+    std::string_view names = format.name;
+    while (!names.empty()) {
+        const size_t comma = std::min(names.find(','), names.size());
+        if (std::ranges::find(kReferring, names.substr(0, comma)) != kReferring.end()) {
+            return true;
+        }
+        names.remove_prefix(std::min(comma + 1, names.size()));
+    }
+    return false;
+}
+
+/// The format of bytes by what they begin with; null when it is not found, for a reason that
+/// opening them tells. Some formats open sockets while their heads are read: those are refused
+/// before.
+const AVInputFormat* format_of(AVIOContext& io)
+{
+    const AVInputFormat* format = nullptr;
+    if (ffmpeg().av_probe_input_buffer2(&io, &format, nullptr, nullptr, 0, 0) < 0) {
+        return nullptr;
+    }
+    if (format != nullptr && is_referring(*format)) {
+        throw FileError("holds no sound but says where some is (it is of the format " +
+                        std::string(format->name) +
+                        "), and nothing that a file refers to is opened; give the sound itself");
+    }
+    return format;
 }
 
 template <class Handle>
@@ -72,6 +110,7 @@ struct Options {
 FfmpegDecoder::FfmpegDecoder(std::unique_ptr<FfmpegInput> input) : input_(std::move(input))
 {
     io_ = make_io(*input_);
+    const AVInputFormat* const format = format_of(*io_);
     auto* const container = ffmpeg().avformat_alloc_context();
     if (container == nullptr) {
         throw std::bad_alloc();
@@ -79,7 +118,8 @@ FfmpegDecoder::FfmpegDecoder(std::unique_ptr<FfmpegInput> input) : input_(std::m
     container->pb = io_.get();
     container->io_open = refuse_to_open;
     Options options;
-    open(container, nullptr, &options.entries);
+    options.set("protocol_whitelist", "none"); // which is no protocol's name; an empty list is any
+    open(container, nullptr, format, &options.entries);
 }
 
 FfmpegDecoder::FfmpegDecoder(const std::string& url, const AVIOInterruptCB& interrupt)
@@ -96,13 +136,14 @@ FfmpegDecoder::FfmpegDecoder(const std::string& url, const AVIOInterruptCB& inte
     options.set("reconnect_on_network_error", "1");
     options.set("reconnect_delay_max", "10");
     options.set("rtsp_transport", "tcp");
-    open(container, url.c_str(), &options.entries);
+    open(container, url.c_str(), nullptr, &options.entries);
 }
 
 /// Takes the container, which FFmpeg frees when it cannot open it.
-void FfmpegDecoder::open(AVFormatContext* container, const char* url, AVDictionary** options)
+void FfmpegDecoder::open(AVFormatContext* container, const char* url, const AVInputFormat* format,
+                         AVDictionary** options)
 {
-    const int error = ffmpeg().avformat_open_input(&container, url, nullptr, options);
+    const int error = ffmpeg().avformat_open_input(&container, url, format, options);
     if (error == AVERROR(ENOMEM)) {
         throw std::bad_alloc();
     }

@@ -46,7 +46,8 @@ public:
     uint64_t damaged() const { return damaged_; }
 
 private:
-    void open(AVFormatContext* container, const char* url, AVDictionary** options);
+    void open(AVFormatContext* container, const char* url, const AVInputFormat* format,
+              AVDictionary** options);
     void choose_stream();
     void open_codec();
     bool feed();

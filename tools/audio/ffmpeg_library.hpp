@@ -34,6 +34,7 @@ public:
     decltype(&::avformat_seek_file) avformat_seek_file = format_["avformat_seek_file"];
     decltype(&::avio_alloc_context) avio_alloc_context = format_["avio_alloc_context"];
     decltype(&::avio_context_free) avio_context_free = format_["avio_context_free"];
+    decltype(&::av_probe_input_buffer2) av_probe_input_buffer2 = format_["av_probe_input_buffer2"];
     decltype(&::av_read_frame) av_read_frame = format_["av_read_frame"];
 
     decltype(&::avcodec_alloc_context3) avcodec_alloc_context3 = codec_["avcodec_alloc_context3"];
