@@ -63,14 +63,26 @@ TEST_F(ServeLimits, EachKindOfBodyHasItsOwn)
     }
 }
 
-TEST_F(ServeLimits, SoundLongerThanAnHourIsRefused)
+TEST_F(ServeLimits, ClipsLongerThanTenMinutesAreRefused)
 {
     const Service service = start({catalogue()});
-    const uint32_t samples = 3601 * 4000;
+    const uint32_t samples = 601 * 4000;
     const std::string sound = wav_header(4000, 1, samples * 2) + std::string(samples * 2, '\0');
     const Response response = service.post("/v1/match", "audio/wav", sound);
     EXPECT_EQ(413, response.status) << response.body;
-    EXPECT_EQ("sound_too_long", response.error());
+    EXPECT_EQ("clip_too_long", response.error());
+    EXPECT_TRUE(contains(response.body, "600 s")) << response.body;
+}
+
+TEST_F(ServeLimits, LengthIsThatOfTrailsToo)
+{
+    const Service service = start({catalogue(), "--longest-clip", "20"});
+    for (const auto& [seconds, error] : {std::pair(25, "clip_too_long"), std::pair(19, "")}) {
+        const std::vector<int16_t> samples = part(piece(1), 0, seconds);
+        EXPECT_EQ(error,
+                  service.post("/v1/match", "application/x-kzt", trail_file(samples)).error());
+        EXPECT_EQ(error, service.post("/v1/match", "audio/wav", wav(samples)).error());
+    }
 }
 
 TEST_F(ServeLimits, SlowHeadsAreToldSo)

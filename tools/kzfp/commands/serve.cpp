@@ -100,6 +100,11 @@ void add_limit_options(Parser& parser, RunSettings& settings)
         ->type_name("BYTES")
         ->range(1024.0, 1073741824.0);
     parser
+        .add_option("--longest-clip", settings.service.longest_clip,
+                    "Seconds of sound, or of a trail, that are looked up at once (default: 600)")
+        ->type_name("SECONDS")
+        ->range(1, 86400);
+    parser
         .add_option("--max-connections", http.connections,
                     "Connections at once (default: 1024); further ones wait")
         ->type_name("NUMBER")

@@ -18,7 +18,6 @@ namespace kzfp::serve {
 namespace {
 
 constexpr size_t kValueCount = 30;
-constexpr double kLongestClip = 3600; ///< seconds of sound; a query takes 25 KB for each
 
 /// What an answer by 30 values is worth: docs/documents_in_catalogues.md has the measurements.
 constexpr const char* kWorth =
@@ -62,17 +61,35 @@ auto made_from_body(const char* code, const char* cure, Make make)
     }
 }
 
-Query query_of_sound(std::string& body, std::string& warning)
+[[noreturn]] void refuse_long_clip(uint32_t longest)
+{
+    refuse(413, "clip_too_long",
+           "the clip is longer than the " + std::to_string(longest) +
+               " s that this service looks up at once; send it in parts, or start the service "
+               "with --longest-clip SECONDS");
+}
+
+Query query_of_trail(const std::string& body, uint32_t longest)
+{
+    const Trail trail = trail_of(body);
+    kzcat_trail_facts facts;
+    check(kzcat_trail_get_facts(trail.get(), &facts));
+    if (facts.samples / facts.sample_rate > longest) {
+        refuse_long_clip(longest);
+    }
+    return made<Query>(kzcat_query_create_from_trail, static_cast<const kzcat_trail*>(trail.get()));
+}
+
+Query query_of_sound(std::string& body, uint32_t longest, std::string& warning)
 {
     try {
         const MemoryFile file(body);
         std::string().swap(body);
         SoundOptions options;
-        options.section.length = kLongestClip + 1;
+        options.section.length = longest + 1.0;
         Clip clip = read_sound_clip(file.path(), options);
-        if (clip.seconds > kLongestClip) {
-            refuse(413, "sound_too_long",
-                   "the sound is longer than an hour; send a part, or its trail");
+        if (clip.seconds > longest) {
+            refuse_long_clip(longest);
         }
         warning = clip.warning;
         return std::move(clip.query);
@@ -81,14 +98,11 @@ Query query_of_sound(std::string& body, std::string& warning)
     }
 }
 
-Query query_of(BodyKind kind, std::string& body, std::string& warning)
+Query query_of(BodyKind kind, std::string& body, uint32_t longest, std::string& warning)
 {
     switch (kind) {
-    case BodyKind::trail: {
-        const Trail trail = trail_of(body);
-        return made<Query>(kzcat_query_create_from_trail,
-                           static_cast<const kzcat_trail*>(trail.get()));
-    }
+    case BodyKind::trail:
+        return query_of_trail(body, longest);
     case BodyKind::document:
         return made_from_body("bad_document", "send one as kzfp prints it", [&body] {
             return made<Query>(kzcat_query_create_from_document, body.data(),
@@ -103,7 +117,7 @@ Query query_of(BodyKind kind, std::string& body, std::string& warning)
                               });
     }
     default:
-        return query_of_sound(body, warning);
+        return query_of_sound(body, longest, warning);
     }
 }
 
@@ -166,15 +180,16 @@ MemoryFile::MemoryFile(std::string_view bytes)
 
 std::string MemoryFile::path() const { return "/proc/self/fd/" + std::to_string(file_.number()); }
 
-Found find_clip(kzcat_catalogue& catalogue, const Plan& plan, std::string& body, bool hide_sources)
+Found find_clip(kzcat_catalogue& catalogue, const Plan& plan, std::string& body,
+                const ClipRules& rules)
 {
     std::string warning;
-    const Query query = query_of(plan.body, body, warning);
+    const Query query = query_of(plan.body, body, rules.longest, warning);
     const auto begin = std::chrono::steady_clock::now();
     Answer answer = look_up(catalogue, *query, {}, plan.lookup);
     const std::chrono::duration<double> took = std::chrono::steady_clock::now() - begin;
     answer.warning = warning;
-    if (hide_sources) {
+    if (rules.hide_sources) {
         hide_paths(answer);
     }
     return {.reply = json_reply(200, to_json(answer, plan.lookup, took.count())),
@@ -200,8 +215,9 @@ const char* word_of(BodyKind kind)
 
 void refuse_sound(const std::string& why)
 {
+    // What only a command line has is no cure here.
     refuse(422, "unreadable_audio",
-           "the sound cannot be used: it " + why +
+           "the sound cannot be used: it " + why.substr(0, why.find("; headerless audio needs")) +
                "; send a whole file in a usual format, such "
                "as WAV or FLAC");
 }

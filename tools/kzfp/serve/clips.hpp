@@ -33,9 +33,14 @@ struct Found {
     const char* verdict; ///< in words
 };
 
-/// Looks up what the body holds. `hide_sources`: of the path of a source only the name of its file
-/// is told. Throws a Refusal, and CatalogueError when the catalogue has failed.
-Found find_clip(kzcat_catalogue& catalogue, const Plan& plan, std::string& body, bool hide_sources);
+struct ClipRules {
+    uint32_t longest;  ///< seconds of a clip; longer ones are refused
+    bool hide_sources; ///< of the path of a source only the name of its file is told
+};
+
+/// Looks up what the body holds. Throws a Refusal, and CatalogueError when the catalogue has failed.
+Found find_clip(kzcat_catalogue& catalogue, const Plan& plan, std::string& body,
+                const ClipRules& rules);
 
 /// The word for what is looked up by a kind of body: "trail", "document", "values" or "sound".
 const char* word_of(BodyKind kind);

@@ -269,7 +269,9 @@ Reply Service::answer(Exchange& exchange)
     switch (plan.task) {
     case Task::match: {
         const auto begin = std::chrono::steady_clock::now();
-        Found found = find_clip(*reading, plan, exchange.body, settings_.hide_sources);
+        Found found =
+            find_clip(*reading, plan, exchange.body,
+                      {.longest = settings_.longest_clip, .hide_sources = settings_.hide_sources});
         const std::chrono::duration<double> took = std::chrono::steady_clock::now() - begin;
         metrics_.count_lookup(word_of(plan.body), found.verdict, took.count());
         return std::move(found.reply);

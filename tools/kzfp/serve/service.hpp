@@ -26,8 +26,9 @@ struct ServiceSettings {
     HttpSettings http = {};
     std::string page = {}; ///< a folder; empty for none
     bool hide_sources = false;
-    size_t lookups = 1; ///< threads that answer
-    size_t places = 64; ///< requests that may wait for them
+    uint32_t longest_clip = 600; ///< seconds of what is looked up
+    size_t lookups = 1;          ///< threads that answer
+    size_t places = 64;          ///< requests that may wait for them
     LogFormat log = LogFormat::text;
     bool log_addresses = false;
 };
