@@ -76,9 +76,6 @@ MALFORMED = {
     "two lengths": b"POST /v1/match HTTP/1.1\r\n" + HOST +
                    b"Content-Type: application/x-kzt\r\nContent-Length: 3\r\nContent-Length: 5"
                    b"\r\n\r\nabcde",
-    "a length and chunks": b"POST /v1/match HTTP/1.1\r\n" + HOST +
-                           b"Content-Type: application/x-kzt\r\nContent-Length: 3\r\n"
-                           b"Transfer-Encoding: chunked\r\n\r\n0\r\n\r\n",
     "a chunk without a number": b"POST /v1/match HTTP/1.1\r\n" + HOST +
                                 b"Content-Type: application/x-kzt\r\n"
                                 b"Transfer-Encoding: chunked\r\n\r\nxyz\r\n",
@@ -143,6 +140,18 @@ def test_a_refused_body_does_not_become_the_next_request(hasty):
                   b"Content-Length: %d\r\n\r\n" % len(inner) + inner)
     assert answer.count(b"HTTP/1.1 ") == 1
     assert status_of(answer) == 415
+
+
+@pytest.mark.parametrize("fields", (b"Content-Length: %d\r\nTransfer-Encoding: chunked\r\n",
+                                    b"Transfer-Encoding: gzip, chunked\r\n"))
+def test_a_body_that_ends_in_two_places_is_refused(hasty, material, fields):
+    body = b"%x\r\n" % len(material.trail) + material.trail + b"\r\n0\r\n\r\n"
+    stated = fields % len(body) if b"%d" in fields else fields
+    answer = said(hasty.service, b"POST /v1/match HTTP/1.1\r\n" + HOST +
+                  b"Content-Type: application/x-kzt\r\n" + stated + b"\r\n" + body)
+    assert status_of(answer) == 400
+    assert answer.count(b"HTTP/1.1 ") == 1
+    assert b"bad_framing" in answer or b"<html>" in answer.lower()
 
 
 def test_a_chunked_body_is_taken(hasty, material):

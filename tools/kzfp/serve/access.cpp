@@ -47,6 +47,13 @@ std::string host_of_origin(const std::string& origin)
     return scheme == std::string::npos ? "" : origin.substr(scheme + 3);
 }
 
+/// Whether this may stand behind a name: nothing, or a colon and up to five digits.
+bool is_port(const std::string& text)
+{
+    return text.empty() || (text.front() == ':' && text.size() <= 6 &&
+                            text.find_first_not_of("0123456789", 1) == std::string::npos);
+}
+
 } // namespace
 
 Token::Token(const std::string& secret) : hash_(sha256(secret)) {}
@@ -85,10 +92,11 @@ std::string host_name(const std::string& host_and_port)
     const std::string host = to_lower(host_and_port);
     if (host.starts_with('[')) {
         const size_t end = host.find(']');
-        return end == std::string::npos ? host : host.substr(1, end - 1);
+        return end != std::string::npos && is_port(host.substr(end + 1)) ? host.substr(1, end - 1)
+                                                                         : host;
     }
-    const size_t colon = host.find(':');
-    return colon == host.rfind(':') ? host.substr(0, colon) : host;
+    const size_t colon = std::min(host.find(':'), host.size());
+    return is_port(host.substr(colon)) ? host.substr(0, colon) : host;
 }
 
 bool is_address(const std::string& name)

@@ -56,7 +56,8 @@ bool may_write(const RequestHead& head, const Access& access);
 /// Throws a Refusal because no token, or a wrong one, was shown.
 [[noreturn]] void refuse_without_token(const RequestHead& head, const char* option);
 
-/// A name with or without a port: the name alone, in lower case and without brackets.
+/// A name with or without a port: the name alone, in lower case and without brackets. All of the
+/// text where what follows the name is no port.
 std::string host_name(const std::string& host_and_port);
 
 /// Whether a name is an address in numbers.

@@ -47,6 +47,21 @@ constexpr Way kWays[] = {
     {"GET", "/metrics", Task::metrics, Needs::reading},
 };
 
+/// Whoever passes requests on must not see another end of the body than the service does.
+void check_framing(const RequestHead& head)
+{
+    const std::string* const coding = header_of(head, "Transfer-Encoding");
+    if (coding == nullptr) {
+        return;
+    }
+    if (header_of(head, "Content-Length") != nullptr || !same_name(*coding, "chunked")) {
+        refuse(400, "bad_framing",
+               "the end of the body is not stated in one way; send Content-Length, or "
+               "Transfer-Encoding: chunked, and nothing else",
+               {{"Connection", "close"}});
+    }
+}
+
 void check_headers(const RequestHead& head)
 {
     for (const char* const name : kSingleHeaders) {
@@ -57,6 +72,7 @@ void check_headers(const RequestHead& head)
                    std::string("the request has more than one field ") + name + "; send one");
         }
     }
+    check_framing(head);
 }
 
 /// The number of a track; nothing when it is none.
@@ -287,6 +303,25 @@ bool take(const Parameter& parameter, Plan& plan)
     }
 }
 
+/// Parameters that would have no effect beside what else is sent.
+void check_fit(const std::vector<Parameter>& parameters, const Plan& plan)
+{
+    const auto has = [&parameters](std::string_view name) {
+        return std::ranges::find(parameters, name, &Parameter::name) != parameters.end();
+    };
+    if (plan.documents && plan.body == BodyKind::trail) {
+        refuse(400, "bad_parameter",
+               "documents=1 takes a sound file; a trail answers documents if it was made so");
+    }
+    if (plan.lookup.passages &&
+        (plan.body == BodyKind::document || plan.body == BodyKind::values)) {
+        refuse(400, "bad_parameter", "passages=1 takes a trail or sound");
+    }
+    if (plan.task == Task::list_tracks && has("source") && (has("after") || has("limit"))) {
+        refuse(400, "bad_parameter", "source finds one track; leave out after and limit");
+    }
+}
+
 void take_parameters(const std::vector<Parameter>& parameters, Plan& plan)
 {
     for (const Parameter& parameter : parameters) {
@@ -299,6 +334,7 @@ void take_parameters(const std::vector<Parameter>& parameters, Plan& plan)
                    "a parameter is unknown or empty; " + known_parameters(plan.task));
         }
     }
+    check_fit(parameters, plan);
     if (plan.task == Task::add_track && plan.source.empty()) {
         refuse(400, "source_missing",
                "a track needs a name by which it is found again; add ?source=NAME");
