@@ -32,6 +32,9 @@ public:
     /// The head has arrived: sets `largest_body`, or a reply that refuses the request.
     virtual void begin(Exchange& exchange) noexcept = 0;
 
+    /// The HTTP server itself has set a reply that refuses the request: adds what every answer has.
+    virtual void complete(Exchange& exchange) noexcept = 0;
+
     /// All of the request has arrived. Sets the reply; or returns true when it takes longer, and
     /// then a place is kept for what submit() hands over.
     virtual bool takes_longer(Exchange& exchange) noexcept = 0;

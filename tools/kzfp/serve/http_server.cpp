@@ -264,6 +264,7 @@ MHD_Result HttpServer::Inside::take_head(Request& request, const char* method)
         receiver_.begin(exchange);
     }
     const uint64_t length = stated_length(exchange.head);
+        receiver_.complete(exchange);
     if (!exchange.reply && length > exchange.largest_body) {
         refuse_body(request, body_too_large(exchange.largest_body), "body_too_large");
     }
@@ -286,7 +287,7 @@ MHD_Result HttpServer::Inside::take_body(Request& request, const char* bytes, si
     if (held_.fetch_add(count) + count > settings_.body_bytes) {
         Reply reply = error_reply(503, "busy", "too much is being sent at once; try again soon");
         reply.headers = {{"Retry-After", "1"}};
-        refuse_body(request, std::move(reply), "uploads");
+        refuse_body(request, std::move(reply), "busy");
         return MHD_YES;
     }
     exchange.body.append(bytes, count);
@@ -351,6 +352,7 @@ void HttpServer::Inside::refuse_body(Request& request, Reply reply, const char* 
 }
 
 void HttpServer::Inside::drop_body(Request& request)
+    receiver_.complete(request.exchange);
 {
     std::string().swap(request.exchange.body);
     held_ -= std::exchange(request.held, 0);

@@ -184,6 +184,15 @@ void Service::begin(Exchange& exchange) noexcept
 }
 
 WorkQueue& Service::queue_of(const Exchange& exchange)
+void Service::complete(Exchange& exchange) noexcept
+{
+    try {
+        add_headers(exchange, settings_.rules.access);
+    } catch (const std::bad_alloc&) {
+        return; // an answer with fewer headers
+    }
+}
+
 {
     return is_change(exchange.plan.task) ? changes_ : lookups_;
 }

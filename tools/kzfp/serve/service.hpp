@@ -51,6 +51,7 @@ public:
     void begin(Exchange& exchange) noexcept override;
     bool takes_longer(Exchange& exchange) noexcept override;
     void submit(Exchange& exchange) noexcept override;
+    void complete(Exchange& exchange) noexcept override;
     void end(const Exchange& exchange, bool sent) noexcept override;
 
 private:
