@@ -113,14 +113,15 @@ TEST_F(ServeLimits, BodiesThatDribbleAreToldSo)
     dribble.join();
 }
 
-TEST_F(ServeLimits, ConnectionsThatWaitEndWithTheDeadline)
+TEST_F(ServeLimits, TheDeadlineBeginsWithTheRequest)
 {
     Service service = start({catalogue(), "--deadline", "1", "--timeout", "60"});
     Connection connection(service.port());
-    connection.send(request_text("GET", "/v1/health"));
-    EXPECT_EQ(200, connection.receive().status);
-    EXPECT_EQ(408, connection.receive().status);
-    EXPECT_TRUE(connection.is_closed_soon());
+    for (int i = 0; i < 2; ++i) {
+        connection.send(request_text("GET", "/v1/health"));
+        EXPECT_EQ(200, connection.receive().status);
+        std::this_thread::sleep_for(std::chrono::milliseconds(2500));
+    }
 }
 
 TEST_F(ServeLimits, SilentConnectionsAreClosed)
@@ -163,6 +164,30 @@ TEST_F(ServeLimits, AddressesHaveSoManyConnections)
     EXPECT_TRUE(third.is_closed_soon());
     first.send(request);
     EXPECT_EQ(200, first.receive().status);
+}
+
+TEST_F(ServeLimits, ConnectionsTooManyEndWithoutARequest)
+{
+    const Service service = start({catalogue(), "--per-address", "2", "--timeout", "600"});
+    const Connection first(service.port());
+    const Connection second(service.port());
+    Connection third(service.port());
+    EXPECT_EQ(429, third.receive().status);
+    EXPECT_TRUE(third.is_closed_soon());
+}
+
+TEST_F(ServeLimits, RefusalsHaveTheHeadersOfAllAnswers)
+{
+    const Service service = start({catalogue(), "--allow-origin", "https://a.example"});
+    const Response response =
+        service.ask("POST", "/v1/match",
+                    {.headers = {"Content-Type: application/json", "Origin: https://a.example"},
+                     .body = std::string(5000, ' ')});
+    EXPECT_EQ("body_too_large", response.error());
+    for (const char* const name :
+         {"x-content-type-options", "cache-control", "access-control-allow-origin"}) {
+        EXPECT_TRUE(response.headers.contains(name)) << name;
+    }
 }
 
 TEST_F(ServeLimits, FullQueuesRefuseAtOnceAndLoseNothing)

@@ -17,7 +17,8 @@ using Clock = std::chrono::steady_clock;
 
 /// What happens on a connection.
 enum class Stage {
-    receiving, ///< a request is expected, or arrives
+    idle,      ///< a request is expected
+    receiving, ///< one arrives
     working,   ///< its answer is made
     sending
 };
@@ -29,8 +30,9 @@ public:
     struct Connection {
         int socket;
         std::string address; ///< as numbers; empty when there is none
+        std::string group;   ///< what it is counted with
         bool too_many;       ///< more from its address than may be
-        Stage stage = Stage::receiving;
+        Stage stage = Stage::idle;
         Clock::time_point since = Clock::now();
     };
 
@@ -40,25 +42,30 @@ public:
     {
     }
 
-    /// The result stays valid until close().
+    /// One too many is told so, and ended. The result stays valid until close().
     Connection* open(int socket, const sockaddr* address);
     void close(Connection* connection);
 
     void enter(Connection& connection, Stage stage);
 
-    /// Ends those that have been receiving or sending for longer. Those that have not sent a whole
-    /// request are told so first.
-    void end_those_before(Clock::time_point time);
+    /// Ends those that have been receiving or sending since before `moving`, or idle since before
+    /// `idle`. Those that have sent a part of a request are told so first.
+    void end_those_before(Clock::time_point moving, Clock::time_point idle);
 
     size_t count() const;
 
 private:
+    void end(const Connection& connection, const std::string& last_words) const;
+
     const size_t per_address_;
     const bool is_plain_;
     mutable std::mutex mutex_;
     std::map<const Connection*, std::unique_ptr<Connection>> open_;
     std::map<std::string, size_t> by_address_;
 };
+
+/// The addresses among which a client can choose, as a text: of IPv6 the network of 64 bits.
+std::string group_of(const sockaddr* address);
 
 /// An address as numbers, without its port; empty for one that is none of the network's.
 std::string numbers_of(const sockaddr* address);

@@ -7,6 +7,7 @@
 
 #include "kzfp/serve/http_server.hpp"
 
+#include <algorithm>
 #include <array>
 #include <atomic>
 #include <cerrno>
@@ -104,8 +105,10 @@ public:
 
     void close_slow_ones()
     {
+        const uint32_t idle = std::max(settings_.receive_seconds, settings_.idle_seconds);
         connections_.end_those_before(Clock::now() -
-                                      std::chrono::seconds(settings_.receive_seconds));
+                                          std::chrono::seconds(settings_.receive_seconds),
+                                      Clock::now() - std::chrono::seconds(idle));
     }
 
 private:
@@ -215,6 +218,7 @@ void* HttpServer::Inside::begin(void* context, const char* target,
         if (of != nullptr && of->socket_context != nullptr) {
             request->of = static_cast<Connections::Connection*>(of->socket_context);
             request->exchange.address = request->of->address;
+            inside.connections_.enter(*request->of, Stage::receiving);
         }
         ++inside.exchanges_;
         return request.release();
@@ -260,11 +264,11 @@ MHD_Result HttpServer::Inside::take_head(Request& request, const char* method)
                                      "some, or use one for several requests");
         exchange.reply->headers = {{"Retry-After", "1"}, {"Connection", "close"}};
         exchange.reason = "too_many_connections";
+        receiver_.complete(exchange);
     } else {
         receiver_.begin(exchange);
     }
     const uint64_t length = stated_length(exchange.head);
-        receiver_.complete(exchange);
     if (!exchange.reply && length > exchange.largest_body) {
         refuse_body(request, body_too_large(exchange.largest_body), "body_too_large");
     }
@@ -348,11 +352,11 @@ void HttpServer::Inside::refuse_body(Request& request, Reply reply, const char* 
 {
     request.exchange.reply = std::move(reply);
     request.exchange.reason = reason;
+    receiver_.complete(request.exchange);
     drop_body(request);
 }
 
 void HttpServer::Inside::drop_body(Request& request)
-    receiver_.complete(request.exchange);
 {
     std::string().swap(request.exchange.body);
     held_ -= std::exchange(request.held, 0);
@@ -371,7 +375,7 @@ void HttpServer::Inside::end(void* context, MHD_Connection* /*connection*/, void
         inside.receiver_.end(its->exchange, why == MHD_REQUEST_TERMINATED_COMPLETED_OK);
     }
     if (its->of != nullptr) {
-        inside.connections_.enter(*its->of, Stage::receiving);
+        inside.connections_.enter(*its->of, Stage::idle);
     }
     --inside.exchanges_;
 }
