@@ -222,4 +222,22 @@ TEST_F(ServeAccess, CataloguesThatAreMissingAreReported)
     EXPECT_TRUE(result.err.starts_with("/nonexistent/music.kzc: ")) << result.err;
 }
 
+TEST_F(ServeAccess, NamesThatNoRequestHasAreRefused)
+{
+    const auto refused = [](const char* option, const char* value) {
+        const ProcessResult result =
+            kzfp({"serve", "/nonexistent/music.kzc", "--listen", "127.0.0.1:0", option, value});
+        return result.status == 1 && contains(result.err, option) &&
+               contains(result.err, "; give ");
+    };
+    for (const char* const host : {"https://music.example", "music.example/", "a:b", ""}) {
+        EXPECT_TRUE(refused("--host", host)) << host;
+    }
+    for (const char* const origin : {"https://a.example/", "a.example", "https://", ""}) {
+        EXPECT_TRUE(refused("--allow-origin", origin)) << origin;
+    }
+    EXPECT_FALSE(refused("--host", "music.example:8443"));
+    EXPECT_FALSE(refused("--allow-origin", "https://a.example:8443"));
+}
+
 } // namespace

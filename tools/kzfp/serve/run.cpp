@@ -77,6 +77,31 @@ void check_is_safe(const Listener& listener, const RunSettings& settings)
 }
 
 /// The name of --listen is one of the service's own.
+/// What would never be equal to what requests have.
+void check_names(const RunSettings& settings)
+{
+    for (const std::string& host : settings.hosts) {
+        const std::string name = host_name(host);
+        if (name.empty() || name.find_first_of("/ @[]") != std::string::npos ||
+            (name.find(':') != std::string::npos && !is_address(name))) {
+            throw audio::FileError("--host '" + host +
+                                   "' is no name; give it without scheme and path, such as "
+                                   "music.example");
+        }
+    }
+    for (const std::string& origin : settings.origins) {
+        const size_t scheme = origin.find("://");
+        const bool is_whole = scheme != 0 && scheme != std::string::npos &&
+                              scheme + 3 < origin.size() &&
+                              origin.find_first_of("/ ?#", scheme + 3) == std::string::npos;
+        if (origin != "*" && !is_whole) {
+            throw audio::FileError("--allow-origin '" + origin +
+                                   "' is no origin; give scheme and host, without a slash behind "
+                                   "them, such as https://music.example");
+        }
+    }
+}
+
 std::vector<std::string> names_of(const RunSettings& settings)
 {
     std::vector<std::string> names;
@@ -126,6 +151,7 @@ std::string address_text(const Listener& listener, const RunSettings& settings)
 void run(RunSettings settings)
 {
     check_http();
+    check_names(settings);
     const EndSignals signals;
     const Listener listener = listen_at(settings.listen);
     check_is_safe(listener, settings);
