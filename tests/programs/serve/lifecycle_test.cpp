@@ -127,6 +127,31 @@ TEST_F(ServeLifecycle, WhatStillWaitsAtItsEndIsToldSo)
     EXPECT_EQ(0, service.wait());
 }
 
+TEST_F(ServeLifecycle, CutsOffWhatTakesTooLongAndSaysSo)
+{
+    Service service = start({catalogue(), "--lookups", "1", "--drain", "0", "--max-body",
+                             "1000000000", "--longest-clip", "86400"});
+    const std::vector<int16_t> once = piece(1, 120);
+    std::vector<int16_t> samples;
+    for (int i = 0; i < 60; ++i) {
+        samples.insert(samples.end(), once.begin(), once.end());
+    }
+    const std::string request =
+        request_text("POST", "/v1/match?passages=1",
+                     {.headers = {"Content-Type: audio/wav"}, .body = wav(samples)});
+    Connection longest(service.port());
+    ASSERT_TRUE(longest.send(request));
+    Connection waiting(service.port());
+    ASSERT_TRUE(waiting.send(long_request()));
+    while (!contains(service.get("/metrics").body, "\nkzfp_queue_length 1\n")) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+    service.send(SIGTERM);
+    EXPECT_EQ("stopping", waiting.receive().error());
+    EXPECT_EQ(1, service.wait());
+    EXPECT_TRUE(contains(service.messages(), "1 request was cut off")) << service.messages();
+}
+
 TEST_F(ServeLifecycle, ASecondSignalEndsItAtOnce)
 {
     Service service = start({catalogue(), "--drain", "600"});

@@ -3,10 +3,16 @@
 #include "kzfp/serve/plan.hpp"
 
 #include <string>
+#include <thread>
+
+#include <arpa/inet.h>
+#include <netinet/in.h>
 
 #include <gtest/gtest.h>
 
 #include "kzfp/serve/clips.hpp"
+#include "kzfp/serve/connections.hpp"
+#include "kzfp/serve/work_queue.hpp"
 
 namespace {
 
@@ -65,6 +71,76 @@ TEST(ServePlan, TakesTheParametersOfLookUps)
     EXPECT_EQ(7u, plan.lookup.candidates);
     EXPECT_TRUE(plan.lookup.passages);
     EXPECT_FALSE(plan.lookup.speeds);
+}
+
+TEST(ServePlan, TakesOneStatementOfTheBodysEnd)
+{
+    const auto reason = [](std::vector<Header> headers) {
+        headers.push_back({"Content-Type", "application/x-kzt"});
+        return refusal_of(head_of("POST", "/v1/match", std::move(headers)));
+    };
+    EXPECT_EQ("", reason({{"Transfer-Encoding", "Chunked"}}));
+    EXPECT_EQ("", reason({{"Content-Length", "3"}}));
+    EXPECT_EQ("bad_framing", reason({{"Transfer-Encoding", "chunked"}, {"Content-Length", "3"}}));
+    EXPECT_EQ("bad_framing", reason({{"Transfer-Encoding", "identity"}}));
+    EXPECT_EQ("bad_framing", reason({{"Transfer-Encoding", "gzip, chunked"}}));
+}
+
+TEST(ServePlan, RefusesParametersWithoutEffect)
+{
+    const auto of = [](const char* method, const char* target, const char* type) {
+        Rules rules;
+        rules.writes = true;
+        rules.access.write = Token("0123456789abcdef");
+        return refusal_of(
+            head_of(method, target,
+                    {{"Content-Type", type}, {"Authorization", "Bearer 0123456789abcdef"}}),
+            rules);
+    };
+    EXPECT_EQ("bad_parameter", of("POST", "/v1/match?passages=1", "application/json"));
+    EXPECT_EQ("bad_parameter", of("POST", "/v1/match?passages=1", "application/xml"));
+    EXPECT_EQ("", of("POST", "/v1/match?passages=0", "application/xml"));
+    EXPECT_EQ("bad_parameter", of("POST", "/v1/tracks?source=a&documents=1", "application/x-kzt"));
+    EXPECT_EQ("", of("POST", "/v1/tracks?source=a&documents=1", "audio/wav"));
+    EXPECT_EQ("bad_parameter", of("GET", "/v1/tracks?source=a&limit=1", ""));
+    EXPECT_EQ("bad_parameter", of("GET", "/v1/tracks?after=1&source=a", ""));
+}
+
+TEST(ServeAccess, NamesEndWhereTheirPortsBegin)
+{
+    for (const auto& [text, name] :
+         {std::pair("A.Example:80", "a.example"), std::pair("[::1]:8080", "::1"),
+          std::pair("localhost", "localhost"), std::pair("::1", "::1"),
+          std::pair("[::1].evil", "[::1].evil"), std::pair("localhost:evil", "localhost:evil")}) {
+        EXPECT_EQ(name, host_name(text));
+    }
+}
+
+TEST(ServeConnections, OfANetworkAreCountedTogether)
+{
+    const auto group = [](const char* text) {
+        sockaddr_in6 address = {};
+        address.sin6_family = AF_INET6;
+        inet_pton(AF_INET6, text, &address.sin6_addr);
+        return group_of(reinterpret_cast<const sockaddr*>(&address));
+    };
+    EXPECT_EQ(group("2001:db8:0:1::1"), group("2001:db8:0:1:ffff:1:2:3"));
+    EXPECT_NE(group("2001:db8:0:1::1"), group("2001:db8:0:2::1"));
+    EXPECT_NE(group("::ffff:192.0.2.1"), group("::ffff:192.0.2.2"));
+}
+
+TEST(ServeWorkQueue, ClosesWhenWhatWasReservedHasCome)
+{
+    WorkQueue queue(1, 4, [](Exchange&) {});
+    ASSERT_TRUE(queue.reserve());
+    Exchange exchange;
+    std::thread late([&] {
+        std::this_thread::sleep_for(std::chrono::milliseconds(200)); // close() has begun by then
+        queue.push(exchange);
+    });
+    const auto left = queue.close();
+    late.join();
+    EXPECT_EQ(&exchange, left.empty() ? nullptr : left.back());
 }
 
 TEST(ServePlan, RefusesBadParameters)

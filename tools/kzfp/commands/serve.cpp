@@ -23,7 +23,7 @@ constexpr const char* kDescription =
 constexpr const char* kFooter =
     "SIGTERM and Ctrl-C end it in order: what was accepted is answered first; a second one ends\n"
     "it at once. A socket that systemd hands over is used instead of --listen.\n"
-    "Exit: 0 it was ended; 1 it could not be started; 2 wrong usage.";
+    "Exit: 0 it was ended; 1 it could not start, or cut off requests at its end; 2 wrong usage.";
 
 void add_access_options(Parser& parser, RunSettings& settings)
 {

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <csignal>
+#include <cstdlib>
 #include <ctime>
 #include <utility>
 
@@ -76,7 +77,6 @@ void check_is_safe(const Listener& listener, const RunSettings& settings)
     }
 }
 
-/// The name of --listen is one of the service's own.
 /// What would never be equal to what requests have.
 void check_names(const RunSettings& settings)
 {
@@ -102,6 +102,7 @@ void check_names(const RunSettings& settings)
     }
 }
 
+/// The name of --listen is one of the service's own.
 std::vector<std::string> names_of(const RunSettings& settings)
 {
     std::vector<std::string> names;
@@ -150,8 +151,8 @@ std::string address_text(const Listener& listener, const RunSettings& settings)
 
 void run(RunSettings settings)
 {
-    check_http();
     check_names(settings);
+    check_http();
     const EndSignals signals;
     const Listener listener = listen_at(settings.listen);
     check_is_safe(listener, settings);
@@ -165,7 +166,12 @@ void run(RunSettings settings)
     }
     notify_manager("STOPPING=1");
     signals.let_through();
-    service.drain(settings.drain_seconds);
+    if (const size_t left = service.drain(settings.drain_seconds); left != 0) {
+        write_message("the time for ending is over: " + std::to_string(left) +
+                      (left == 1 ? " request was cut off" : " requests were cut off") +
+                      "; --drain gives more, --longest-clip bounds what one takes");
+        std::_Exit(1); // their threads cannot be ended; what they change is changed wholly or not
+    }
 }
 
 } // namespace kzfp::serve

@@ -24,6 +24,7 @@ namespace {
 
 constexpr unsigned kRefreshEvery = 10; ///< ticks
 constexpr auto kQuiet = std::chrono::milliseconds(300);
+constexpr auto kGrace = std::chrono::seconds(5); ///< for what is worked on when the time is over
 constexpr auto kLastAnswers = std::chrono::seconds(1);
 constexpr auto kLook = std::chrono::milliseconds(10);
 
@@ -57,12 +58,12 @@ Refusal refusal_of(const CatalogueError& error)
         return {.reply = busy("catalogue_busy", "another program changes the catalogue; try again"),
                 .reason = "catalogue_busy"};
     }
-    write_message(std::string("the catalogue has failed: ") + error.what());
     if (error.status == KZCAT_ERROR_OTHER_PROFILE) {
         return {.reply = error_reply(400, "other_profile",
                                      "the clip was made by another profile; make its trail again"),
                 .reason = "other_profile"};
     }
+    write_message(std::string("the catalogue has failed: ") + error.what());
     if (error.status == KZCAT_ERROR_FULL) {
         return {.reply = error_reply(507, "disk_full", "there is no room to keep it"),
                 .reason = "disk_full"};
@@ -183,7 +184,6 @@ void Service::begin(Exchange& exchange) noexcept
     }
 }
 
-WorkQueue& Service::queue_of(const Exchange& exchange)
 void Service::complete(Exchange& exchange) noexcept
 {
     try {
@@ -193,6 +193,7 @@ void Service::complete(Exchange& exchange) noexcept
     }
 }
 
+WorkQueue& Service::queue_of(const Exchange& exchange)
 {
     return is_change(exchange.plan.task) ? changes_ : lookups_;
 }
@@ -203,6 +204,10 @@ bool Service::takes_longer(Exchange& exchange) noexcept
         return true;
     }
     set_reply(exchange, [this, &exchange] {
+        if (!is_at_once(exchange.plan.task) && queue_of(exchange).is_closed()) {
+            exchange.reason = "stopping";
+            return busy("stopping", "the service stops; try again");
+        }
         if (!is_at_once(exchange.plan.task)) {
             exchange.reason = "queue_full";
             return busy("queue_full", "too many requests wait already; try again in a second");
@@ -227,7 +232,7 @@ Reply Service::answer_at_once(const Exchange& exchange) const
         const Catalogues::Facts facts = catalogue_.facts();
         return {.status = 200,
                 .type = "text/plain; version=0.0.4; charset=utf-8",
-                .body = metrics_.text({.queue_length = lookups_.length() + changes_.length(),
+                .body = metrics_.text({.queue_length = lookups_.length(),
                                        .queue_capacity = lookups_.places(),
                                        .connections = server_->connections(),
                                        .tracks = facts.tracks,
@@ -345,7 +350,7 @@ void Service::tick()
 
 /// Clients that keep their connections are told with their next answer that these end, so it takes
 /// a while without requests until all have been.
-void Service::drain(uint32_t seconds)
+size_t Service::drain(uint32_t seconds)
 {
     drains_ = true;
     server_->stop_accepting();
@@ -353,11 +358,17 @@ void Service::drain(uint32_t seconds)
     for (WorkQueue* const queue : {&lookups_, &changes_}) {
         for (Exchange* const exchange : queue->close()) {
             set_reply(*exchange, [] { return busy("stopping", "the service stops; try again"); });
+            exchange->reason = "stopping";
             finish(*exchange);
         }
     }
+    const auto end = Clock::now() + kGrace;
+    const size_t left = lookups_.busy_at(end) + changes_.busy_at(end);
     wait_for_quiet(Clock::now() + kLastAnswers);
-    server_->stop();
+    if (left == 0) {
+        server_->stop();
+    }
+    return left;
 }
 
 void Service::wait_for_quiet(Clock::time_point end) const

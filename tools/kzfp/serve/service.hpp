@@ -42,16 +42,18 @@ public:
     Service& operator=(const Service&) = delete;
 
     /// Takes no more connections, and answers what was accepted, for up to these seconds. What
-    /// then still waits is told to come again.
-    void drain(uint32_t seconds);
+    /// then still waits is told to come again, and what is worked on has some seconds more. Returns
+    /// how many requests are worked on even then: unless there are none, the process has to be
+    /// ended without destroying the object, which would wait for them.
+    size_t drain(uint32_t seconds);
 
     /// What is to be done about once a second.
     void tick();
 
     void begin(Exchange& exchange) noexcept override;
+    void complete(Exchange& exchange) noexcept override;
     bool takes_longer(Exchange& exchange) noexcept override;
     void submit(Exchange& exchange) noexcept override;
-    void complete(Exchange& exchange) noexcept override;
     void end(const Exchange& exchange, bool sent) noexcept override;
 
 private:

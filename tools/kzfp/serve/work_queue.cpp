@@ -14,7 +14,13 @@ WorkQueue::WorkQueue(size_t threads, size_t places, std::function<void(Exchange&
     }
 }
 
-WorkQueue::~WorkQueue() { close(); }
+WorkQueue::~WorkQueue()
+{
+    close();
+    for (std::thread& thread : threads_) {
+        thread.join();
+    }
+}
 
 bool WorkQueue::reserve()
 {
@@ -23,6 +29,7 @@ bool WorkQueue::reserve()
         return false;
     }
     ++taken_;
+    ++reserved_;
     return true;
 }
 
@@ -30,24 +37,34 @@ void WorkQueue::push(Exchange& exchange)
 {
     {
         const std::lock_guard lock(mutex_);
+        --reserved_;
         waiting_.push_back(&exchange);
+        came_.notify_one();
+        changed_.notify_all(); // while close() cannot return yet
     }
-    came_.notify_one();
 }
 
 std::deque<Exchange*> WorkQueue::close()
 {
-    {
-        const std::lock_guard lock(mutex_);
-        closed_ = true;
-    }
+    std::unique_lock lock(mutex_);
+    closed_ = true;
     came_.notify_all();
-    for (std::thread& thread : threads_) {
-        thread.join();
-    }
-    threads_.clear();
-    const std::lock_guard lock(mutex_);
+    changed_.wait(lock, [this] { return reserved_ == 0; });
+    taken_ = 0;
     return std::exchange(waiting_, {});
+}
+
+size_t WorkQueue::busy_at(std::chrono::steady_clock::time_point end)
+{
+    std::unique_lock lock(mutex_);
+    changed_.wait_until(lock, end, [this] { return busy_ == 0; });
+    return busy_;
+}
+
+bool WorkQueue::is_closed() const
+{
+    const std::lock_guard lock(mutex_);
+    return closed_;
 }
 
 size_t WorkQueue::length() const
@@ -66,6 +83,7 @@ Exchange* WorkQueue::next()
     Exchange* const exchange = waiting_.front();
     waiting_.pop_front();
     --taken_;
+    ++busy_;
     return exchange;
 }
 
@@ -73,6 +91,9 @@ void WorkQueue::run()
 {
     while (Exchange* const exchange = next()) {
         work_(*exchange);
+        const std::lock_guard lock(mutex_);
+        --busy_;
+        changed_.notify_all();
     }
 }
 

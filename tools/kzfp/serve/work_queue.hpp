@@ -2,6 +2,7 @@
 /// Requests that wait for a thread to answer them: a bounded number.
 #pragma once
 
+#include <chrono>
 #include <condition_variable>
 #include <cstddef>
 #include <deque>
@@ -20,18 +21,26 @@ public:
     /// Starts the threads, which hand each exchange to `work`. It throws nothing.
     WorkQueue(size_t threads, size_t places, std::function<void(Exchange&)> work);
 
-    /// Ends the threads; nothing may wait any more.
+    /// Waits for the threads to do what they are at; nothing else may wait any more.
     ~WorkQueue();
     WorkQueue(const WorkQueue&) = delete;
     WorkQueue& operator=(const WorkQueue&) = delete;
 
-    /// Keeps a place for a push() that follows; false when all are taken.
+    /// Keeps a place for a push() that has to follow, also after close() has begun; false when all
+    /// are taken.
     bool reserve();
 
     void push(Exchange& exchange);
 
-    /// Ends the threads once they have done what they are at; returns what still waits.
+    /// From now on no exchange is begun; returns those that still wait, when all that was reserved
+    /// has come.
     std::deque<Exchange*> close();
+
+    /// How many exchanges the threads are still at when this time has come; 0 as soon as none is.
+    size_t busy_at(std::chrono::steady_clock::time_point end);
+
+    /// Whether close() was called.
+    bool is_closed() const;
 
     /// Places that are taken.
     size_t length() const;
@@ -46,7 +55,10 @@ private:
     mutable std::mutex mutex_;
     std::condition_variable came_;
     std::deque<Exchange*> waiting_;
-    size_t taken_ = 0; ///< places, those of reserve() among them
+    std::condition_variable changed_; ///< reserved_ or busy_
+    size_t taken_ = 0;                ///< places, those of reserve() among them
+    size_t reserved_ = 0;             ///< of these, those for which push() is still to come
+    size_t busy_ = 0;                 ///< exchanges that threads are at
     bool closed_ = false;
     std::vector<std::thread> threads_;
 };
