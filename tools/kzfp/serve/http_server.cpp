@@ -2,8 +2,8 @@
 // connection whose answer takes longer is suspended meanwhile.
 //
 // A request that is refused is received to its end first: a client that is still sending would lose
-// the answer together with the connection. Only one that waits for leave to send its body, or wants
-// to send very much, is answered at once.
+// the answer together with the connection. Only one that waits for leave to send its body, wants to
+// send very much, or does not say where its body ends, is answered at once.
 
 #include "kzfp/serve/http_server.hpp"
 
@@ -273,7 +273,9 @@ MHD_Result HttpServer::Inside::take_head(Request& request, const char* method)
         refuse_body(request, body_too_large(exchange.largest_body), "body_too_large");
     }
     const bool waits = header_of(exchange.head, "Expect") != nullptr;
-    return exchange.reply && (waits || length > kMostDiscarded) ? send(request) : MHD_YES;
+    const bool has_end = exchange.reason != "bad_framing";
+    return exchange.reply && (waits || !has_end || length > kMostDiscarded) ? send(request)
+                                                                            : MHD_YES;
 }
 
 MHD_Result HttpServer::Inside::take_body(Request& request, const char* bytes, size_t count)
