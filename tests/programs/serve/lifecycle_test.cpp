@@ -131,9 +131,9 @@ TEST_F(ServeLifecycle, CutsOffWhatTakesTooLongAndSaysSo)
 {
     Service service = start({catalogue(), "--lookups", "1", "--drain", "0", "--max-body",
                              "1000000000", "--longest-clip", "86400"});
-    const std::vector<int16_t> once = piece(1, 120);
+    const std::vector<int16_t> once = piece(77, 120); // a stranger, which takes longest
     std::vector<int16_t> samples;
-    for (int i = 0; i < 60; ++i) {
+    for (int i = 0; i < 100; ++i) {
         samples.insert(samples.end(), once.begin(), once.end());
     }
     const std::string request =
@@ -141,10 +141,13 @@ TEST_F(ServeLifecycle, CutsOffWhatTakesTooLongAndSaysSo)
                      {.headers = {"Content-Type: audio/wav"}, .body = wav(samples)});
     Connection longest(service.port());
     ASSERT_TRUE(longest.send(request));
+    std::this_thread::sleep_for(std::chrono::seconds(1)); // mostly enough for it to be first
     Connection waiting(service.port());
     ASSERT_TRUE(waiting.send(long_request()));
-    while (!contains(service.get("/metrics").body, "\nkzfp_queue_length 1\n")) {
-        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    // The short one would not wait so long for anything but the long one.
+    for (int looks = 0; looks < 100; ++looks) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(10));
+        looks = contains(service.get("/metrics").body, "\nkzfp_queue_length 1\n") ? looks : 0;
     }
     service.send(SIGTERM);
     EXPECT_EQ("stopping", waiting.receive().error());
