@@ -318,7 +318,11 @@ function takeInputs() {
 /** What the server says of itself; the page works without, and learns the rest when it asks. */
 async function greet() {
   try {
-    wantsToken = (await service.options()).token === true;
+    const { token: asksForToken, longest_clip: longestClip } = await service.options();
+    wantsToken = asksForToken === true;
+    if (Number.isFinite(longestClip)) {
+      recogniser.longestClip = longestClip;
+    }
     const { tracks } = await service.health();
     if (Number.isFinite(tracks)) {
       const many = `${tracks.toLocaleString("en")} track${tracks === 1 ? "" : "s"}`;

@@ -11,6 +11,12 @@ import { merged } from "./set_list.js";
 /** Samples that go to the worker at once. */
 const PIECE = 1 << 20;
 
+/** The longest stretch that is asked about at once, in seconds, unless the service takes less. */
+const LONGEST_ASKED = 540;
+
+/** So much of a stretch is in the next one too: what is cut there is whole in one of the two. */
+const OVERLAP = 20;
+
 /** A trail does not say how loud the sound was, so the service cannot. */
 const TOO_QUIET = { verdict: "too quiet", matches: [] };
 
@@ -23,9 +29,27 @@ const LONGEST_DRAWN = 30;
  * @property {number} rate
  */
 
+/**
+ * The stretches that a long recording is asked about in, each overlapping the next.
+ *
+ * @param {number} seconds  of the recording
+ * @param {number} longest  of a stretch
+ * @returns {{begin: number, end: number}[]}
+ */
+export function stretchesOf(seconds, longest) {
+  const stretches = [];
+  let begin = 0;
+  do {
+    stretches.push({ begin, end: Math.min(begin + longest, seconds) });
+    begin += longest - OVERLAP;
+  } while (begin + OVERLAP < seconds);
+  return stretches;
+}
+
 export class Recogniser {
   #makers;
   #service;
+  #longest = LONGEST_ASKED;
 
   /**
    * @param {{trailBuilder: Function, readTrail: Function}} makers  Make and read trails; promises.
@@ -34,6 +58,11 @@ export class Recogniser {
   constructor(makers, service) {
     this.#makers = makers;
     this.#service = service;
+  }
+
+  /** @param {number} seconds  of the longest clip that the service takes */
+  set longestClip(seconds) {
+    this.#longest = Math.max(2 * OVERLAP, Math.min(LONGEST_ASKED, seconds));
   }
 
   /**
@@ -72,9 +101,20 @@ export class Recogniser {
     }
     const answers = [];
     for (const reading of OWN_SPEED) {
-      answers.push(await this.#read(clip, reading, { ...options, passages: true }));
+      answers.push(await this.#readLong(clip, reading, { ...options, passages: true }));
     }
     return merged(answers, clip.samples.length / clip.rate);
+  }
+
+  /** Stretch by stretch: what one asking costs the service has a limit. */
+  async #readLong(clip, reading, options) {
+    const answers = [];
+    for (const { begin, end } of stretchesOf(clip.samples.length / clip.rate, this.#longest)) {
+      const [first, last] = [begin, end].map((seconds) => Math.round(seconds * clip.rate));
+      const stretch = { samples: clip.samples.subarray(first, last), rate: clip.rate };
+      answers.push(fromTheStart(await this.#read(stretch, reading, options), first / clip.rate));
+    }
+    return { ...bestOf(answers), matches: answers.filter(isMatch).flatMap((one) => one.matches) };
   }
 
   /** When one asking of a round fails, nobody waits for the others: they end with it. */

@@ -185,21 +185,21 @@ export function toCsv(entries) {
   const rows = entries.map(({ begin, end, match }) =>
     match
       ? [
-          seconds(begin),
-          seconds(end),
+          secondsText(begin),
+          secondsText(end),
           nameOf(match),
           match.artist ?? "",
           match.source ?? "",
-          seconds(placeOf(match)),
+          secondsText(placeOf(match)),
           match.sure ?? "",
         ]
-      : [seconds(begin), seconds(end), "", "", "", "", ""],
+      : [secondsText(begin), secondsText(end), "", "", "", "", ""],
   );
   const header = ["begin", "end", "title", "artist", "source", "place", "sure"];
   return [header, ...rows].map((row) => row.map(field).join(",") + "\r\n").join("");
 }
 
-function seconds(number) {
+function secondsText(number) {
   return number.toFixed(1);
 }
 

@@ -57,6 +57,7 @@ TEST_F(ServeReports, OptionsSayWhatIsTaken)
                     {"audio", true},
                     {"token", false},
                     {"max_body", 5000},
+                    {"longest_clip", 600},
                     {"write", false}}),
               service.get("/v1/options").json());
 }

@@ -38,7 +38,8 @@ struct ClipRules {
     bool hide_sources; ///< of the path of a source only the name of its file is told
 };
 
-/// Looks up what the body holds. Throws a Refusal, and CatalogueError when the catalogue has failed.
+/// Looks up what the body holds. Throws a Refusal, and CatalogueError when the catalogue has
+/// failed.
 Found find_clip(kzcat_catalogue& catalogue, const Plan& plan, std::string& body,
                 const ClipRules& rules);
 

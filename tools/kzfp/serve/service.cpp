@@ -272,6 +272,7 @@ Reply Service::options() const
     object["audio"] = settings_.rules.audio;
     object["token"] = settings_.rules.access.read.is_set();
     object["max_body"] = settings_.rules.largest_body;
+    object["longest_clip"] = settings_.longest_clip;
     object["write"] = settings_.rules.writes;
     return json_reply(200, to_line(object));
 }

@@ -5,7 +5,7 @@ import { test } from "node:test";
 
 import { levelOf, Level } from "../../../../web/app/level.js";
 import { listen } from "../../../../web/app/listening.js";
-import { Recogniser } from "../../../../web/app/recogniser.js";
+import { Recogniser, stretchesOf } from "../../../../web/app/recogniser.js";
 import { asksPassages, MOMENTS } from "../../../../web/app/schedule.js";
 import { ServiceAway } from "../../../../web/app/service.js";
 import { HeardSound, SilentDevice } from "../../../../web/app/sound.js";
@@ -197,6 +197,29 @@ test("long sound goes piece by piece, all of it", async () => {
   await recogniser.ask(long, [[{ speed: 1, skipped: 1 }]], OPTIONS);
   assert.deepEqual(made, [[2 ** 20 + 400, 100]]);
   assert.deepEqual(freed, [1], "the worker's memory is given back");
+});
+
+test("long recordings are asked about in stretches", async () => {
+  assert.deepEqual(stretchesOf(100, 540), [{ begin: 0, end: 100 }]);
+  assert.deepEqual(stretchesOf(540, 540), [{ begin: 0, end: 540 }]);
+  assert.deepEqual(stretchesOf(1100, 540), [
+    { begin: 0, end: 540 },
+    { begin: 520, end: 1060 },
+    { begin: 1040, end: 1100 },
+  ]);
+  const at = (offset, clip_begin, clip_end) => scored(9, { offset, clip_begin, clip_end });
+  const { made, recogniser } = numbered((number) =>
+    // Of every reading: a track from 30 s on, in two stretches, and then nothing.
+    [at(0, 30, 60), at(40, 0, 20), NONE][(number - 1) % 3],
+  );
+  recogniser.longestClip = 60;
+  const long = { samples: new Float32Array(14000).fill(0.1), rate: 100 };
+  const answer = await recogniser.askPassages(long, OPTIONS);
+  assert.deepEqual(made.slice(0, 3).map(([count]) => count), [6000, 6000, 6000]);
+  assert.equal(made.length, 12, "three stretches, four readings of each");
+  const rounded = ({ clip_begin, clip_end }) => [clip_begin, clip_end].map(Math.round);
+  assert.deepEqual(answer.matches.map(rounded), [[30, 60]]);
+  assert.deepEqual(answer.gaps.map(rounded), [[0, 30], [60, 140]]);
 });
 
 test("about silence nobody is asked", async () => {
