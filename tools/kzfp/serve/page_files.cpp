@@ -67,7 +67,7 @@ std::vector<Header> headers_of(const std::string& tag)
 /// Whether a list of a field names an item; what is behind a semicolon is left out.
 bool names(const std::string* list, std::string_view wanted)
 {
-    std::string_view rest = list == nullptr ? "" : std::string_view(*list);
+    std::string_view rest = list == nullptr ? "" : std::string_view{*list};
     while (!rest.empty()) {
         const size_t end = rest.find(',');
         std::string_view item = rest.substr(0, end);

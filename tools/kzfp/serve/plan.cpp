@@ -97,7 +97,7 @@ Routed routed(const std::string& path)
     if (!path.starts_with(kTracks)) {
         return {.route = path};
     }
-    std::string_view rest = std::string_view(path).substr(kTracks.size());
+    std::string_view rest = std::string_view{path}.substr(kTracks.size());
     const bool is_trail = rest.ends_with(kTrail);
     rest.remove_suffix(is_trail ? kTrail.size() : 0);
     const auto track = rest.empty() ? std::nullopt : track_in(rest);
@@ -129,7 +129,7 @@ std::string allowed_methods(const std::string& route)
 const Way& way_of(const std::string& method, const std::string& route)
 {
     static constexpr Way kPage = {"GET", "/", Task::page, Needs::nothing};
-    const std::string_view wanted = method == "HEAD" ? "GET" : std::string_view(method);
+    const std::string_view wanted = method == "HEAD" ? "GET" : std::string_view{method};
     bool is_route = false;
     for (const Way& way : kWays) {
         if (way.route == route && way.method == wanted) {

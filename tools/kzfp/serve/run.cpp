@@ -149,7 +149,7 @@ std::string address_text(const Listener& listener, const RunSettings& settings)
 
 } // namespace
 
-void run(RunSettings settings)
+void run(const RunSettings& settings)
 {
     check_names(settings);
     check_http();

@@ -29,6 +29,6 @@ struct RunSettings {
 };
 
 /// Serves until a signal ends it. Throws audio::FileError and CatalogueError.
-void run(RunSettings settings);
+void run(const RunSettings& settings);
 
 } // namespace kzfp::serve
