@@ -3,7 +3,7 @@
 # so that one run reports everything; the summary closes the log. `./run check` sets up what this
 # needs.
 #
-#   scripts/check.sh                                        half an hour on two processors
+#   scripts/check.sh                                        about an hour on two processors
 #   scripts/check.sh --long [fuzz seconds] [soak seconds]   a night's work: 1800 and 600
 #
 # ARCH=quick ./run check --long compares documents on five builds only.
